@@ -1,0 +1,33 @@
+# Everything is compiled alike: C++17, warnings as errors, hidden symbols, hardened in release.
+set(CMAKE_CXX_STANDARD 17)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+# A build tree is found by its own place, so that it can be moved and installed as it is.
+set(CMAKE_BUILD_RPATH_USE_ORIGIN ON)
+
+add_compile_options(-Wall -Wextra -Wshadow -Wconversion -Wformat=2 -Wnon-virtual-dtor -Wold-style-cast
+                    -Woverloaded-virtual -Wcast-qual -Werror)
+# Not under the sanitizers, which bring their own.
+if(NOT VORN_SANITIZE)
+  add_compile_options(-fstack-protector-strong $<$<CONFIG:Release,RelWithDebInfo>:-D_FORTIFY_SOURCE=2>)
+  add_link_options(-Wl,-z,relro,-z,now)
+endif()
+
+if(VORN_SANITIZE)
+  add_compile_options(-fsanitize=${VORN_SANITIZE} -fno-omit-frame-pointer -fno-sanitize-recover=all)
+  add_link_options(-fsanitize=${VORN_SANITIZE})
+endif()
+
+if(VORN_COVERAGE)
+  add_compile_options(--coverage -fprofile-update=atomic)
+  add_link_options(--coverage)
+endif()
+
+find_program(CCACHE ccache)
+if(CCACHE)
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CCACHE})
+endif()

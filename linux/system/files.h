@@ -1,0 +1,48 @@
+// Whole files: read at once, replaced at once.
+#ifndef VORN_LINUX_SYSTEM_FILES_H
+#define VORN_LINUX_SYSTEM_FILES_H
+
+#include <sys/stat.h>
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "status.h"
+
+namespace vorn {
+
+// What a file was when it was read, so that a later write notices somebody else's edit.
+struct FileStamp {
+  bool exists = false;
+  dev_t device = 0;
+  ino_t inode = 0;
+  off_t size = 0;
+  std::int64_t modified = 0;  // nanoseconds since the epoch
+  std::int64_t changed = 0;   // likewise, of the inode
+};
+
+struct FileText {
+  std::string text;
+  FileStamp stamp;
+};
+
+// The file at `path`, a path of this system (see Root::Locate). A regular file of at most 64 MiB.
+// Fails with ENOENT when there is none.
+Result<FileText> ReadFile(const std::string& path);
+
+// Likewise; no file reads as an empty one, with a stamp that says so.
+Result<FileText> ReadFileOrNothing(const std::string& path);
+
+// Makes the file at `path` hold `text`, durably (fsync(2) of file and folder), in one step: a reader
+// sees the old file or the new one, whatever happens on the way. An existing file keeps its owner
+// and mode, a new one gets `mode`. Missing folders are made. Fails with kChangedBehind, and writes
+// nothing, when the file is no longer the one that `expected` was taken of.
+Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);
+
+// Removes what a killed ReplaceFile may have left in the folder of `path`.
+void RemoveLeftovers(const std::string& path);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_SYSTEM_FILES_H

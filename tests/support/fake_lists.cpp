@@ -1,0 +1,198 @@
+// String lists and hashes. An operation that may move its object always does, so that whoever keeps
+// the old pointer is found by the address sanitizer.
+#include "fake_lists.h"
+
+#include <algorithm>
+#include <string>
+#include <vector>
+
+#include "fake_platform.h"
+
+FakeList* MakeList() {
+  FakePlatform::Current().Born("KLIBSZLIST");
+  return new FakeList{};
+}
+
+FakeHash* MakeHash() {
+  FakePlatform::Current().Born("KLIBSZHASH");
+  return new FakeHash{};
+}
+
+namespace {
+
+FakeList* Real(KLIBSZLIST* list) { return static_cast<FakeList*>(list); }
+const FakeList* Real(const KLIBSZLIST* list) { return static_cast<const FakeList*>(list); }
+
+void Move(KLIBSZLIST** list) {
+  FakeList* const old = Real(*list);
+  *list = new FakeList(*old);
+  delete old;
+}
+
+void Move(KLIBSZHASH** hash) {
+  FakeHash* const old = Real(*hash);
+  *hash = new FakeHash(*old);
+  delete old;
+}
+
+template <typename Pairs>
+auto FindKey(Pairs& pairs, const std::string& key) {
+  return std::find_if(pairs.begin(), pairs.end(), [&](const auto& pair) { return pair.first == key; });
+}
+
+}  // namespace
+
+void Append(FakeList* list, const std::string& text) {
+  list->items.push_back(text);
+  list->count = static_cast<int32_t>(list->items.size());
+}
+
+void SetPair(FakeHash* hash, const std::string& key, const std::string& value) {
+  const auto found = FindKey(hash->pairs, key);
+  if (found == hash->pairs.end()) {
+    hash->pairs.emplace_back(key, value);
+  } else {
+    found->second = value;
+  }
+}
+
+extern "C" {
+
+KLIBSZLIST* KLIBCSzListAlloc(int capacity) {
+  const bool fails = FakePlatform::Current().Fails("KLIBCSzListAlloc", std::to_string(capacity));
+  return fails ? nullptr : MakeList();
+}
+
+void KLIBCSzListFree(KLIBSZLIST* list) {
+  FakePlatform::Current().Record("KLIBCSzListFree");
+  if (list == nullptr) return;
+  FakePlatform::Current().Died("KLIBSZLIST");
+  delete Real(list);
+}
+
+const char* KLIBCSzListGet(const KLIBSZLIST* list, int index) {
+  if (FakePlatform::Current().Fails("KLIBCSzListGet", std::to_string(index))) return nullptr;
+  if (index < 0 || index >= list->count) return nullptr;
+  return Real(list)->items[static_cast<size_t>(index)].c_str();
+}
+
+int KLIBCSzListPush(KLIBSZLIST** list, const char* text) {
+  if (FakePlatform::Current().Fails("KLIBCSzListPush", text)) return -1;
+  Move(list);
+  Append(Real(*list), text);
+  return 0;
+}
+
+int KLIBCSzListInsert(KLIBSZLIST** list, int index, const char* text) {
+  const std::string arguments = std::to_string(index) + " " + text;
+  if (FakePlatform::Current().Fails("KLIBCSzListInsert", arguments)) return -1;
+  Move(list);
+  FakeList* const moved = Real(*list);
+  moved->items.insert(moved->items.begin() + index, text);
+  moved->count = static_cast<int32_t>(moved->items.size());
+  return 0;
+}
+
+int KLIBCSzListFind(const KLIBSZLIST* list, const char* text) {
+  FakePlatform::Current().Record("KLIBCSzListFind", text);
+  const auto& items = Real(list)->items;
+  const auto found = std::find(items.begin(), items.end(), text);
+  return found == items.end() ? -1 : static_cast<int>(found - items.begin());
+}
+
+int KLIBCSzListSortItems(KLIBSZLIST* list, int option) {
+  FakePlatform::Current().Record("KLIBCSzListSortItems", std::to_string(option));
+  std::sort(Real(list)->items.begin(), Real(list)->items.end());
+  return 0;
+}
+
+KLIBSZHASH* KLIBCSzHashAlloc(int capacity) {
+  const bool fails = FakePlatform::Current().Fails("KLIBCSzHashAlloc", std::to_string(capacity));
+  return fails ? nullptr : MakeHash();
+}
+
+void KLIBCSzHashFree(KLIBSZHASH* hash) {
+  FakePlatform::Current().Record("KLIBCSzHashFree");
+  if (hash == nullptr) return;
+  FakePlatform::Current().Died("KLIBSZHASH");
+  delete Real(hash);
+}
+
+int KLIBCSzHashEnumKey(const KLIBSZHASH* hash, KLIBSZLIST** keys) {
+  if (FakePlatform::Current().Fails("KLIBCSzHashEnumKey")) return -1;
+  Move(keys);
+  for (const auto& pair : Real(hash)->pairs) Append(Real(*keys), pair.first);
+  return 0;
+}
+
+const char* KLIBCSzHashGetValue(const KLIBSZHASH* hash, const char* key) {
+  if (FakePlatform::Current().Fails("KLIBCSzHashGetValue", key)) return nullptr;
+  const auto found = FindKey(Real(hash)->pairs, key);
+  return found == Real(hash)->pairs.end() ? nullptr : found->second.c_str();
+}
+
+int KLIBCSzHashSetValue(KLIBSZHASH** hash, const char* key, const char* value) {
+  const std::string arguments = std::string(key) + " " + value;
+  if (FakePlatform::Current().Fails("KLIBCSzHashSetValue", arguments)) return -1;
+  Move(hash);
+  SetPair(Real(*hash), key, value);
+  return 0;
+}
+
+int KLIBCSzHashRemoveKey(KLIBSZHASH* hash, const char* key) {
+  if (FakePlatform::Current().Fails("KLIBCSzHashRemoveKey", key)) return 0;
+  const auto found = FindKey(Real(hash)->pairs, key);
+  if (found == Real(hash)->pairs.end()) return 0;
+  Real(hash)->pairs.erase(found);
+  return 1;
+}
+
+int VORNNFSStaticMapGet(KLIBSZHASH** hash, const char* filter) {
+  FakePlatform& platform = FakePlatform::Current();
+  if (platform.Fails("VORNNFSStaticMapGet", filter == nullptr ? "(null)" : filter)) return -1;
+  Move(hash);
+  for (const auto& [principal, name] : platform.mappings) {
+    const bool matches = filter == nullptr || (principal + '\n' + name).find(filter) != std::string::npos;
+    if (matches) SetPair(Real(*hash), principal, name);
+  }
+  return 0;
+}
+
+int VORNNFSStaticMapAppend(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
+  if (FakePlatform::Current().Fails("VORNNFSStaticMapAppend")) return -1;
+  Move(table);
+  for (const auto& [principal, name] : Real(pairs)->pairs) SetPair(Real(*table), principal, name);
+  return 0;
+}
+
+int VORNNFSStaticMapRemove(KLIBSZHASH* table, const KLIBSZLIST* principals) {
+  if (FakePlatform::Current().Fails("VORNNFSStaticMapRemove")) return -1;
+  for (const std::string& principal : Real(principals)->items) {
+    const auto found = FindKey(Real(table)->pairs, principal);
+    if (found != Real(table)->pairs.end()) Real(table)->pairs.erase(found);
+  }
+  return 0;
+}
+
+int VORNUserEnum(KLIBSZLIST** list, int type) {
+  FakePlatform& platform = FakePlatform::Current();
+  if (platform.Fails("VORNUserEnum", std::to_string(type))) return -1;
+  Move(list);
+  for (const std::string& user : platform.users) Append(Real(*list), user);
+  return 0;
+}
+
+int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int flags) {
+  FakePlatform& platform = FakePlatform::Current();
+  const std::string arguments = std::to_string(type) + " " + substring + " " + std::to_string(flags);
+  if (platform.Fails("VORNUserEnumBySubstr", arguments)) return -1;
+  char lower[256] = {};
+  std::transform(substring, substring + std::min<size_t>(std::char_traits<char>::length(substring), 255), lower,
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  Move(list);
+  for (const std::string& user : platform.users) {
+    if (user.find(lower) != std::string::npos) Append(Real(*list), user);
+  }
+  return 0;
+}
+}

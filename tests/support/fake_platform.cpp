@@ -1,0 +1,108 @@
+#include "fake_platform.h"
+
+#include <json/reader.h>
+#include <syslog.h>
+
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <stdexcept>
+
+namespace {
+
+FakePlatform* g_current = nullptr;
+
+std::string FormatText(const char* format, va_list arguments) {
+  va_list again;
+  va_copy(again, arguments);
+  const int length = vsnprintf(nullptr, 0, format, again);
+  va_end(again);
+  std::string text(static_cast<size_t>(length) + 1, '\0');
+  vsnprintf(text.data(), text.size(), format, arguments);
+  text.pop_back();
+  return text;
+}
+
+LogLine TakeApart(int priority, const char* format, const std::string& text) {
+  LogLine line{priority, "", 0, text};
+  const size_t colon = text.find(':');
+  const size_t blank = text.find(' ');
+  if (std::string(format).rfind("%s:%d ", 0) != 0 || colon == std::string::npos || blank < colon) return line;
+  line.source = text.substr(0, colon);
+  line.line = std::atoi(text.substr(colon + 1, blank - colon - 1).c_str());
+  line.text = text.substr(blank + 1);
+  return line;
+}
+
+void Log(int priority, const char* format, va_list arguments) {
+  const std::string text = FormatText(format, arguments);
+  if (g_current != nullptr) g_current->log.push_back(TakeApart(priority, format, text));
+}
+
+}  // namespace
+
+FakePlatform::FakePlatform() : previous_(g_current) { g_current = this; }
+
+FakePlatform::~FakePlatform() { g_current = previous_; }
+
+FakePlatform& FakePlatform::Current() {
+  if (g_current == nullptr) throw std::logic_error("a test of the module needs a FakePlatform");
+  return *g_current;
+}
+
+void FakePlatform::Record(const std::string& operation, const std::string& arguments) {
+  calls.push_back(arguments.empty() ? operation : operation + " " + arguments);
+  last_error_ = kNoFailure;
+  if (throwing_ == operation) throw std::runtime_error("thrown on demand");
+}
+
+bool FakePlatform::Fails(const std::string& operation, const std::string& arguments) {
+  Record(operation, arguments);
+  const int overall = ++calls_that_can_fail_;
+  const int count = ++counts_[operation];
+  const auto demanded = failing_.find(operation);
+  const bool fails =
+      overall == fail_at_ || (demanded != failing_.end() && (demanded->second == 0 || demanded->second == count));
+  if (fails) {
+    last_error_ = kReason;
+    failed_calls.push_back(calls.back());
+  }
+  return fails;
+}
+
+int FakePlatform::FailureResult(const std::string& operation) const {
+  const auto found = failure_results_.find(operation);
+  return found == failure_results_.end() ? -1 : found->second;
+}
+
+void FakePlatform::Died(const std::string& kind) {
+  if (--live_objects[kind] == 0) live_objects.erase(kind);
+}
+
+Json::Value Parse(const std::string& json) {
+  Json::Value value;
+  std::string errors;
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+  if (!reader->parse(json.data(), json.data() + json.size(), &value, &errors)) throw std::logic_error(errors);
+  return value;
+}
+
+// These stand before the C library's: what the module logs comes here.
+extern "C" {
+
+void syslog(int priority, const char* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  Log(priority, format, arguments);
+  va_end(arguments);
+}
+
+// What the compiler makes of syslog in a hardened build.
+void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {  // NOLINT(bugprone-reserved-identifier)
+  va_list arguments;
+  va_start(arguments, format);
+  Log(priority, format, arguments);
+  va_end(arguments);
+}
+}

@@ -9,6 +9,7 @@
 #include "log.h"
 #include "nfsconf.h"
 #include "owned.h"
+#include "service.h"
 #include "settings_change.h"
 
 namespace {

@@ -2,6 +2,7 @@
 
 #include "core.h"
 #include "log.h"
+#include "service.h"
 
 namespace {
 
@@ -39,8 +40,6 @@ ServiceAction DecideServiceAction(const SettingsChange& change) {
   if (!change.wanted) return ServiceAction::kStop;
   return change.enabled ? ServiceAction::kRestart : ServiceAction::kStart;
 }
-
-bool IsServiceEnabled() { return KLIBServiceIsEnabled(kService) != 0; }
 
 bool ReadRecord(const CallSite& site, NFSConfRecord* record) {
   if (VORNNFSConfGet(record) >= 0) return true;

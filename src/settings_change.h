@@ -6,9 +6,6 @@
 #include "handler.h"
 #include "nfsconf.h"
 
-// The service, by the platform's name.
-inline constexpr char kService[] = "nfsd";
-
 // One request's way from the stored settings to the wanted ones.
 struct SettingsChange {
   NFSConfRecord stored{};
@@ -25,9 +22,6 @@ enum class ServiceAction { kNone, kStart, kStop, kRestart };
 // What the service needs: nothing while its state stays and nothing affects it. A service that is
 // to be off is stopped even if it is off already.
 ServiceAction DecideServiceAction(const SettingsChange& change);
-
-// Whether the platform counts the service as enabled; when it cannot tell, it does.
-bool IsServiceEnabled();
 
 bool ReadRecord(const CallSite& site, NFSConfRecord* record);
 bool StoreRecord(const CallSite& site, const NFSConfRecord& record);

@@ -49,7 +49,10 @@ std::unique_ptr<void, Unload> LoadModule() {
 
 TEST(Binary, ExportsTheTableAndTheEntryFunctionsAndNothingElse) {
   EXPECT_THAT(SymbolNames("--dynamic --defined-only"),
-              ElementsAreArray({"GetAPITable", "NFSGet", "NFSGetV2", "NFSSet", "NFSSetV2", "gTable"}));
+              ElementsAreArray({"GetAPITable", "NFSAdvGet", "NFSAdvSet", "NFSGet", "NFSGetV2", "NFSIDMapCreate",
+                                "NFSIDMapDelete", "NFSIDMapList", "NFSIDMapSet", "NFSKerberosGet", "NFSKerberosList",
+                                "NFSKerberosUploadKey", "NFSSet", "NFSSetV2", "NFSSharePrivilegeGet",
+                                "NFSSharePrivilegeSet", "gTable"}));
 }
 
 TEST(Binary, RunsNothingWhenItIsLoaded) {

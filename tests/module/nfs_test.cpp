@@ -6,15 +6,9 @@
 #include <string>
 #include <vector>
 
-#include "api_table.h"
+#include "entry_functions.h"
 #include "fake_platform.h"
-
-extern "C" {
-void NFSGet(VORN::APIRequest* request, VORN::APIResponse* response);
-void NFSSet(VORN::APIRequest* request, VORN::APIResponse* response);
-void NFSGetV2(VORN::APIRequest* request, VORN::APIResponse* response);
-void NFSSetV2(VORN::APIRequest* request, VORN::APIResponse* response);
-}
+#include "nfsconf.h"
 
 namespace {
 
@@ -39,12 +33,6 @@ void Furnish(FakePlatform* platform, int enabled = 0) {
 
 bool SameRecord(const NFSConfRecord& a, const NFSConfRecord& b) { return std::memcmp(&a, &b, sizeof a) == 0; }
 
-std::vector<std::string> Texts(const FakePlatform& platform) {
-  std::vector<std::string> texts;
-  for (const LogLine& line : platform.log) texts.push_back(line.text);
-  return texts;
-}
-
 // The data functions that no method runs, called as a driver would.
 void SetDataV2(VORN::APIRequest* request, VORN::APIResponse* response) {
   NFSServiceHandler handler(request, response);
@@ -59,8 +47,6 @@ void GetDataV2(VORN::APIRequest* request, VORN::APIResponse* response) {
   if (handler.GetDataV2(result)) return handler.ReportSuccess(result);
   handler.ReportError();
 }
-
-using Entry = void (*)(VORN::APIRequest*, VORN::APIResponse*);
 
 // ------------------------------------------------------------------------------------------- get
 
@@ -141,7 +127,7 @@ TEST(NFSGet, FailsWithItsTextAndReleasesEverything) {
       const Answer answer = Call(entry, R"({"some": "parameter"})");
       EXPECT_EQ(answer.code, 2302) << failure.operation;
       EXPECT_TRUE(answer.data.isNull()) << failure.operation;
-      EXPECT_THAT(Texts(platform), ElementsAre(failure.text, "Request: {\"some\":\"parameter\"}\n"));
+      EXPECT_THAT(platform.LogTexts(), ElementsAre(failure.text, "Request: {\"some\":\"parameter\"}\n"));
       std::vector<std::string> calls = failure.calls;
       calls.insert(calls.end(), {"SetError", "GetParam"});
       EXPECT_THAT(platform.calls, ElementsAreArray(calls)) << failure.operation;
@@ -257,7 +243,7 @@ TEST(CheckDataV2, ChecksTheThreeKeysOfNFSv4) {
 TEST(NFSSet, StopsAtTheFirstBadKey) {
   FakePlatform platform;
   Call(NFSSet, R"({"enable_nfs": 0, "enable_nfs_v4": 0, "read_size": "x"})");
-  EXPECT_THAT(Texts(platform), ElementsAre(kNoSwitch, testing::StartsWith("Request: ")));
+  EXPECT_THAT(platform.LogTexts(), ElementsAre(kNoSwitch, testing::StartsWith("Request: ")));
   EXPECT_THAT(platform.calls, ElementsAre("GetParam", "SetError", "GetParam"));
 }
 
@@ -467,7 +453,7 @@ TEST(NFSSet, StopsWhereItFailsAndKeepsWhatIsWritten) {
 
       EXPECT_EQ(answer.code, 2302) << failure.name;
       EXPECT_EQ(answer.count, 1) << failure.name;
-      EXPECT_THAT(Texts(platform), ElementsAre(failure.text, testing::StartsWith("Request: {"))) << failure.name;
+      EXPECT_THAT(platform.LogTexts(), ElementsAre(failure.text, testing::StartsWith("Request: {"))) << failure.name;
       std::vector<std::string> written;
       if (platform.domain != "box.example") written.emplace_back("domain");
       if (!SameRecord(platform.record, before)) written.emplace_back("record");
@@ -563,7 +549,7 @@ TEST(SetDataV2, FailsWhicheverCopyCannotBeRead) {
     Furnish(&platform, 1);
     platform.Fail("VORNNFSConfGet", nth);
     EXPECT_EQ(Call(SetDataV2, kDomainAndSizes).code, 2302);
-    EXPECT_THAT(Texts(platform), ElementsAre("Failed to VORNNFSConfGet."));
+    EXPECT_THAT(platform.LogTexts(), ElementsAre("Failed to VORNNFSConfGet."));
     EXPECT_EQ(std::count(platform.calls.begin(), platform.calls.end(), "VORNNFSConfGet"), nth);
     EXPECT_THAT(platform.calls, testing::Not(testing::Contains("KLIBServiceIsEnabled nfsd")));
     EXPECT_THAT(platform.live_objects, IsEmpty());
@@ -577,7 +563,7 @@ TEST(SetDataV2, FailsWithTheTextsOfSetData) {
     Furnish(&platform, failure.enabled);
     platform.Fail(failure.operation);
     EXPECT_EQ(Call(SetDataV2, failure.params).code, 2302) << failure.name;
-    EXPECT_THAT(Texts(platform), ElementsAre(failure.text)) << failure.name;
+    EXPECT_THAT(platform.LogTexts(), ElementsAre(failure.text)) << failure.name;
     EXPECT_THAT(platform.live_objects, IsEmpty()) << failure.name;
   }
 }

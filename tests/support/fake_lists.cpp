@@ -167,6 +167,7 @@ int VORNNFSStaticMapAppend(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
 
 int VORNNFSStaticMapRemove(KLIBSZHASH* table, const KLIBSZLIST* principals) {
   if (FakePlatform::Current().Fails("VORNNFSStaticMapRemove")) return -1;
+  if (table == nullptr) return 0;
   for (const std::string& principal : Real(principals)->items) {
     const auto found = FindKey(Real(table)->pairs, principal);
     if (found != Real(table)->pairs.end()) Real(table)->pairs.erase(found);

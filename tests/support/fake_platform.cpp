@@ -51,6 +51,12 @@ FakePlatform& FakePlatform::Current() {
   return *g_current;
 }
 
+std::vector<std::string> FakePlatform::LogTexts() const {
+  std::vector<std::string> texts;
+  for (const LogLine& line : log) texts.push_back(line.text);
+  return texts;
+}
+
 void FakePlatform::Record(const std::string& operation, const std::string& arguments) {
   calls.push_back(arguments.empty() ? operation : operation + " " + arguments);
   last_error_ = kNoFailure;

@@ -60,6 +60,7 @@ class FakePlatform {
   std::vector<std::string> calls;  // "KLIBServiceStop nfsd 0"; VornConf's end is "~VornConf"
   std::vector<LogLine> log;
   std::vector<std::string> failed_calls;  // the calls that failed on demand
+  std::vector<std::string> LogTexts() const;
 
   // ---- what is still held
   std::map<std::string, int> live_objects;  // by kind; a kind of which none lives is not there

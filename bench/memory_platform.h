@@ -1,0 +1,11 @@
+// What the benchmarks' platform holds, for the floors to answer with.
+#ifndef VORN_BENCH_MEMORY_PLATFORM_H
+#define VORN_BENCH_MEMORY_PLATFORM_H
+
+#include "nfsconf.h"
+
+inline constexpr char kDomain[] = "box.example";
+
+const NFSConfRecord& StoredRecord();
+
+#endif  // VORN_BENCH_MEMORY_PLATFORM_H

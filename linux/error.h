@@ -10,6 +10,9 @@ namespace vorn {
 // Leaves a failure in this thread's error facility and its reason in the log. 0, or -1.
 int ToResult(const Status& status);
 
+// Likewise, without the log: for an answer that callers ask for, such as "not in this list".
+int ToSilentResult(const Status& status);
+
 }  // namespace vorn
 
 #endif  // VORN_LINUX_ERROR_H

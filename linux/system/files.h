@@ -27,20 +27,26 @@ struct FileText {
   FileStamp stamp;
 };
 
-// The file at `path`, a path of this system (see Root::Locate). A regular file of at most 64 MiB.
-// Fails with ENOENT when there is none.
+// The file at `path`, a path of this system as Root::Locate gives it: its last name is no link. A
+// regular file of at most 64 MiB. Fails with ENOENT when there is none.
 Result<FileText> ReadFile(const std::string& path);
 
 // Likewise; no file reads as an empty one, with a stamp that says so.
 Result<FileText> ReadFileOrNothing(const std::string& path);
 
+// Makes the folder at `path`, durably, and those above it; open to read for everybody, whatever
+// umask(2) says. One that is there stays as it is.
+Status MakeFolders(const std::string& path);
+
 // Makes the file at `path` hold `text`, durably (fsync(2) of file and folder), in one step: a reader
 // sees the old file or the new one, whatever happens on the way. An existing file keeps its owner
-// and mode, a new one gets `mode`. Missing folders are made. Fails with kChangedBehind, and writes
-// nothing, when the file is no longer the one that `expected` was taken of.
+// and mode, a new one gets `mode`; neither depends on umask(2). Missing folders are made. Fails with
+// kChangedBehind, and writes nothing, when the file is no longer the one that `expected` was taken
+// of. The caller holds the configuration lock: two writers of one file would disturb each other.
 Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);
 
-// Removes what a killed ReplaceFile may have left in the folder of `path`.
+// Removes the temporary files that killed writers of the file at `path` left beside it.
+// ReplaceFile does so itself; the caller holds the configuration lock.
 void RemoveLeftovers(const std::string& path);
 
 }  // namespace vorn

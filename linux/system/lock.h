@@ -2,12 +2,15 @@
 #ifndef VORN_LINUX_SYSTEM_LOCK_H
 #define VORN_LINUX_SYSTEM_LOCK_H
 
+#include <string>
+
 #include "status.h"
 
 namespace vorn {
 
-// Holds the lock of the current root while it lives. Nests within a thread. The lock belongs to
-// the process's open file (flock(2)), so a killed holder leaves none behind.
+// Holds the lock of the current root while it lives, in the thread that made it. Nests within a
+// thread. The lock is that of an open file (flock(2) on ROOT/run/vorn/config.lock), so a killed
+// holder leaves none behind, and a child of fork(2) shares its parent's until it runs a program.
 class ConfigurationLock {
  public:
   ConfigurationLock();  // waits for its turn
@@ -15,15 +18,18 @@ class ConfigurationLock {
   ConfigurationLock(const ConfigurationLock&) = delete;
   ConfigurationLock& operator=(const ConfigurationLock&) = delete;
 
-  // Whether the lock is held, and if not, why.
+  // Whether the lock was taken, and if not, why.
   const Status& status() const { return status_; }
 
  private:
+  std::string directory_;  // of the root that it is for
   Status status_;
 };
 
-// Lets others have the lock while this object lives, however often the thread holds it: for waits
-// that must not keep others from reading. Takes it again at the end.
+// Lets others have what this thread holds, however often and of however many roots, while this
+// object lives: for waits that must not keep others from reading. At the end the locks are taken
+// again, in the order in which they were taken first. A lock made during the pause ends within it.
+// A lock that cannot be had again fails for those who nest in it afterwards.
 class LockPause {
  public:
   LockPause();

@@ -1,0 +1,198 @@
+#include "files.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+
+#include "file_descriptor.h"
+
+namespace vorn {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr std::size_t kLargestFile = std::size_t{64} << 20;
+
+constexpr char kUnique[] = "XXXXXX";  // as mkstemp(3)
+
+// Beside the target and hidden: readers of a folder such as nfs.conf.d pass it over.
+fs::path TemporaryPath(const fs::path& path, const std::string& ending) {
+  return path.parent_path() / ("." + path.filename().string() + ".vorn-" + ending);
+}
+
+std::int64_t Nanoseconds(const timespec& time) { return std::int64_t{time.tv_sec} * 1'000'000'000 + time.tv_nsec; }
+
+FileStamp StampOf(const struct stat& file) {
+  return {true, file.st_dev, file.st_ino, file.st_size, Nanoseconds(file.st_mtim), Nanoseconds(file.st_ctim)};
+}
+
+bool Same(const FileStamp& a, const FileStamp& b) {
+  if (a.exists != b.exists || !a.exists) return a.exists == b.exists;
+  return a.device == b.device && a.inode == b.inode && a.size == b.size && a.modified == b.modified &&
+         a.changed == b.changed;
+}
+
+Result<std::string> ReadAll(int file, const std::string& path) {
+  std::string text;
+  char buffer[64 * 1024];
+  for (;;) {
+    const ssize_t size = read(file, buffer, sizeof buffer);
+    if (size == 0) return text;
+    if (size < 0 && errno == EINTR) continue;
+    if (size < 0) return Status::System(errno, path);
+    text.append(buffer, static_cast<std::size_t>(size));
+    if (text.size() > kLargestFile) return Status::System(EFBIG, path);
+  }
+}
+
+Status WriteAll(int file, std::string_view text, const std::string& path) {
+  while (!text.empty()) {
+    const ssize_t size = write(file, text.data(), text.size());
+    if (size < 0 && errno == EINTR) continue;
+    if (size < 0) return Status::System(errno, path);
+    text.remove_prefix(static_cast<std::size_t>(size));
+  }
+  return {};
+}
+
+Status SyncFolder(const fs::path& folder) {
+  const FileDescriptor file(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!file || fsync(file.get()) != 0) return Status::System(errno, folder.string());
+  return {};
+}
+
+// A file beside the target that takes its place, or disappears.
+class TemporaryFile {
+ public:
+  explicit TemporaryFile(const fs::path& target) : path_(TemporaryPath(target, kUnique)) {
+    file_ = FileDescriptor(mkostemp(path_.data(), O_CLOEXEC));
+    if (!file_) status_ = Status::System(errno, target.string());
+  }
+  ~TemporaryFile() {
+    if (file_) unlink(path_.c_str());
+  }
+  TemporaryFile(const TemporaryFile&) = delete;
+  TemporaryFile& operator=(const TemporaryFile&) = delete;
+
+  const Status& status() const { return status_; }
+
+  Status Fill(std::string_view text) {
+    if (Status status = WriteAll(file_.get(), text, path_); !status.ok()) return status;
+    if (fsync(file_.get()) != 0) return Status::System(errno, path_);
+    return {};
+  }
+
+  // The owner before the mode: chown(2) clears the set-id bits.
+  Status TakeAfter(const struct stat& original) {
+    struct stat mine {};
+    if (fstat(file_.get(), &mine) != 0) return Status::System(errno, path_);
+    const bool same_owner = mine.st_uid == original.st_uid && mine.st_gid == original.st_gid;
+    if (!same_owner && fchown(file_.get(), original.st_uid, original.st_gid) != 0) return Status::System(errno, path_);
+    return SetMode(original.st_mode & 07777);
+  }
+
+  Status SetMode(mode_t mode) {
+    if (fchmod(file_.get(), mode) != 0) return Status::System(errno, path_);
+    return {};
+  }
+
+  Status MoveTo(const fs::path& target) {
+    if (rename(path_.c_str(), target.c_str()) != 0) return Status::System(errno, target.string());
+    file_.Close();
+    return {};
+  }
+
+ private:
+  std::string path_;
+  FileDescriptor file_;
+  Status status_;
+};
+
+struct Target {
+  bool exists = false;
+  struct stat file {};
+};
+
+Result<Target> Examine(const fs::path& path) {
+  Target target;
+  target.exists = lstat(path.c_str(), &target.file) == 0;
+  if (!target.exists && errno != ENOENT) return Status::System(errno, path.string());
+  if (target.exists && !S_ISREG(target.file.st_mode)) {
+    return Status::Failure(EINVAL, path.string() + " is no regular file");
+  }
+  return target;
+}
+
+// A hand edit between this look and the rename that follows it is lost: editors take no lock.
+Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
+  const Result<Target> target = Examine(path);
+  if (!target.ok()) return target.status();
+  if (Same(target->exists ? StampOf(target->file) : FileStamp{}, expected)) return {};
+  return Status::Failure(kChangedBehind, path.string() + " was changed by somebody else meanwhile");
+}
+
+Status Fill(TemporaryFile* temporary, const Target& target, std::string_view text, mode_t mode) {
+  if (!temporary->status().ok()) return temporary->status();
+  if (Status status = target.exists ? temporary->TakeAfter(target.file) : temporary->SetMode(mode); !status.ok()) {
+    return status;
+  }
+  return temporary->Fill(text);
+}
+
+}  // namespace
+
+Result<FileText> ReadFile(const std::string& path) {
+  // Not blocking: a FIFO or a device must not hold the caller before it is found out.
+  const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY));
+  struct stat stat {};
+  if (!file || fstat(file.get(), &stat) != 0) return Status::System(errno, path);
+  if (!S_ISREG(stat.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
+  Result<std::string> text = ReadAll(file.get(), path);
+  if (!text.ok()) return text.status();
+  return FileText{std::move(*text), StampOf(stat)};
+}
+
+Result<FileText> ReadFileOrNothing(const std::string& path) {
+  Result<FileText> file = ReadFile(path);
+  if (!file.ok() && file.status().code() == ENOENT) return FileText{};
+  return file;
+}
+
+Status MakeFolders(const std::string& path) {
+  const fs::path folder(path);
+  if (folder.empty() || access(path.c_str(), F_OK) == 0) return {};
+  if (Status status = MakeFolders(folder.parent_path()); !status.ok()) return status;
+  if (mkdir(path.c_str(), 0755) != 0 && errno != EEXIST) return Status::System(errno, path);
+  if (chmod(path.c_str(), 0755) != 0) return Status::System(errno, path);
+  return SyncFolder(folder.parent_path());
+}
+
+Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode) {
+  const fs::path folder = fs::path(path).parent_path();
+  if (Status status = MakeFolders(folder); !status.ok()) return status;
+  const Result<Target> target = Examine(path);
+  if (!target.ok()) return target.status();
+
+  RemoveLeftovers(path);
+  TemporaryFile temporary(path);
+  if (Status status = Fill(&temporary, *target, text, mode); !status.ok()) return status;
+  if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
+  if (Status status = temporary.MoveTo(path); !status.ok()) return status;
+  return SyncFolder(folder);
+}
+
+void RemoveLeftovers(const std::string& path) {
+  std::error_code ignored;
+  const std::string begin = TemporaryPath(path, "").filename().string();
+  for (const fs::directory_entry& entry : fs::directory_iterator(fs::path(path).parent_path(), ignored)) {
+    const std::string name = entry.path().filename().string();
+    const bool ours = name.size() == begin.size() + std::strlen(kUnique) && name.compare(0, begin.size(), begin) == 0;
+    if (ours) unlink(entry.path().c_str());
+  }
+}
+
+}  // namespace vorn

@@ -1,0 +1,89 @@
+#include "root.h"
+
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <vector>
+
+namespace vorn {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr int kMaxLinks = 40;  // as path_resolution(7)
+
+std::string WithoutTrailingSlashes(std::string directory) {
+  while (!directory.empty() && directory.back() == '/') directory.pop_back();
+  return directory;
+}
+
+// Resolves a path name by name, below a folder that it never leaves.
+class Resolver {
+ public:
+  Resolver(fs::path top, std::string_view path) : top_(std::move(top)) { Push(fs::path(path).relative_path()); }
+
+  Result<std::string> Resolve() {
+    while (!pending_.empty()) {
+      const fs::path name = std::move(pending_.back());
+      pending_.pop_back();
+      if (Status status = Step(name); !status.ok()) return status;
+    }
+    return (top_ / reached_).string();
+  }
+
+ private:
+  // What is to be visited next comes last.
+  void Push(const fs::path& path) {
+    const std::vector<fs::path> names(path.begin(), path.end());
+    pending_.insert(pending_.end(), names.rbegin(), names.rend());
+  }
+
+  Status Step(const fs::path& name) {
+    if (name.empty() || name == ".") return {};
+    if (name == "..") {
+      reached_ = reached_.parent_path();
+      return {};
+    }
+    std::error_code error;
+    const fs::path here = top_ / reached_ / name;
+    const fs::path target = fs::read_symlink(here, error);
+    if (!error) return Follow(here, target);
+    reached_ /= name;
+    // Not a link, not there, below something that is no folder: whoever opens the file finds out.
+    if (error.value() == EINVAL || error.value() == ENOENT || error.value() == ENOTDIR) return {};
+    return Status::System(error.value(), here.string());
+  }
+
+  Status Follow(const fs::path& link, const fs::path& target) {
+    if (++links_ > kMaxLinks) return Status::System(ELOOP, link.string());
+    if (target.is_absolute()) reached_.clear();
+    Push(target.relative_path());
+    return {};
+  }
+
+  const fs::path top_;
+  fs::path reached_;  // below top_
+  std::vector<fs::path> pending_;
+  int links_ = 0;
+};
+
+}  // namespace
+
+Root::Root(std::string directory) : directory_(WithoutTrailingSlashes(std::move(directory))) {
+  if (directory_.empty()) directory_ = "/";
+}
+
+Root Root::Current() {
+  const char* directory = std::getenv("VORN_ROOT");
+  return Root(directory == nullptr ? "/" : directory);
+}
+
+Result<std::string> Root::Locate(std::string_view path) const {
+  if (directory_.front() != '/') return Status::Failure(EINVAL, "the root " + directory_ + " is no absolute path");
+  if (path.empty() || path.front() != '/') {
+    return Status::Failure(EINVAL, "\"" + std::string(path) + "\" is no absolute path");
+  }
+  return Resolver(directory_, path).Resolve();
+}
+
+}  // namespace vorn

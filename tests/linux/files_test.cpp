@@ -1,0 +1,220 @@
+#include "files.h"
+
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include <cerrno>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+
+#include "injected_failures.h"
+#include "processes.h"
+#include "temporary_root.h"
+
+namespace vorn {
+namespace {
+
+namespace fs = std::filesystem;
+using Names = std::vector<std::string>;
+
+constexpr char kFile[] = "/etc/file";
+
+Status Replace(const TemporaryRoot& root, std::string_view text, mode_t mode = 0644) {
+  const Result<FileText> file = ReadFileOrNothing(root.At(kFile));
+  if (!file.ok()) return file.status();
+  return ReplaceFile(root.At(kFile), text, file->stamp, mode);
+}
+
+mode_t ModeOf(const std::string& path) {
+  struct stat file {};
+  return stat(path.c_str(), &file) == 0 ? file.st_mode & 07777 : 0;
+}
+
+// The clock of inodes has coarse ticks: two edits within one look alike.
+bool ClockOfInodesPasses(const TemporaryRoot& root, std::int64_t time) {
+  return Eventually([&] { return root.Write("/tick", ""), ReadFile(root.At("/tick"))->stamp.changed > time; });
+}
+
+TEST(ReadFile, GivesTheWholeText) {
+  const TemporaryRoot root;
+  const std::string text = std::string("a\0b\r\n", 5) + std::string(200'000, 'x');
+  root.Write(kFile, text);
+  const Result<FileText> file = ReadFile(root.At(kFile));
+  ASSERT_TRUE(file.ok());
+  EXPECT_EQ(file->text.size(), text.size());
+  EXPECT_TRUE(file->text == text);
+  EXPECT_TRUE(file->stamp.exists);
+}
+
+TEST(ReadFile, TellsNoFileFromAnEmptyOne) {
+  const TemporaryRoot root;
+  EXPECT_EQ(ReadFile(root.At(kFile)).status().code(), ENOENT);
+  const Result<FileText> nothing = ReadFileOrNothing(root.At(kFile));
+  ASSERT_TRUE(nothing.ok());
+  EXPECT_FALSE(nothing->stamp.exists);
+  root.Write(kFile, "");
+  EXPECT_TRUE(ReadFileOrNothing(root.At(kFile))->stamp.exists);
+}
+
+TEST(ReadFile, RefusesWhatIsNoRegularFile) {
+  const TemporaryRoot root;
+  fs::create_directory(root.At("/folder"));
+  ASSERT_EQ(mkfifo(root.At("/fifo").c_str(), 0600), 0);
+  fs::create_symlink("/etc/passwd", root.At("/link"));
+  EXPECT_EQ(ReadFile(root.At("/folder")).status().code(), EINVAL);
+  EXPECT_EQ(ReadFile(root.At("/fifo")).status().code(), EINVAL);
+  EXPECT_EQ(ReadFile(root.At("/link")).status().code(), ELOOP);
+  EXPECT_EQ(ReadFileOrNothing(root.At("/folder")).status().code(), EINVAL);
+}
+
+TEST(ReadFile, RefusesAFileOfMoreThan64MiB) {
+  const TemporaryRoot root;
+  root.Write(kFile, "");
+  fs::resize_file(root.At(kFile), (std::uintmax_t{64} << 20) + 1);
+  EXPECT_EQ(ReadFile(root.At(kFile)).status().code(), EFBIG);
+}
+
+TEST(ReplaceFile, MakesTheFileAndTheFoldersAboveItWhateverTheUmaskSays) {
+  const TemporaryRoot root;
+  const mode_t before = umask(077);
+  const Status status = ReplaceFile(root.At("/etc/nfs.conf.d/new.conf"), "text\n", FileStamp{}, 0640);
+  umask(before);
+  ASSERT_TRUE(status.ok()) << status.reason();
+  EXPECT_EQ(root.Read("/etc/nfs.conf.d/new.conf"), "text\n");
+  EXPECT_EQ(ModeOf(root.At("/etc/nfs.conf.d/new.conf")), 0640U);
+  EXPECT_EQ(ModeOf(root.At("/etc/nfs.conf.d")), 0755U);
+}
+
+TEST(ReplaceFile, KeepsModeAndOwner) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  const bool privileged = geteuid() == 0;
+  if (privileged) {
+    ASSERT_EQ(chown(root.At(kFile).c_str(), 12, 34), 0);
+  }
+  ASSERT_EQ(chmod(root.At(kFile).c_str(), 04604), 0);
+  ASSERT_TRUE(Replace(root, "new").ok());
+  struct stat file {};
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &file), 0);
+  EXPECT_EQ(file.st_uid, privileged ? 12U : geteuid());
+  EXPECT_EQ(file.st_gid, privileged ? 34U : getegid());
+  EXPECT_EQ(file.st_mode & 07777, 04604U);
+  EXPECT_EQ(root.Read(kFile), "new");
+}
+
+TEST(ReplaceFile, LeavesTheOldFileToThoseWhoHaveItOpen) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  std::ifstream reader(root.At(kFile));
+  ASSERT_TRUE(Replace(root, "a new text").ok());
+  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(reader), {}), "old");
+}
+
+TEST(ReplaceFile, NoticesAnEditBetweenReadAndWrite) {
+  const TemporaryRoot root;
+  const std::string path = root.At(kFile);
+  const struct {
+    const char* name;
+    std::function<void()> edit;
+  } cases[] = {
+      {"other size", [&] { root.Write(kFile, "longer than before"); }},
+      {"other file of the same text", [&] { root.Write("/etc/x", "old"), fs::rename(root.At("/etc/x"), path); }},
+      {"removed", [&] { fs::remove(path); }},
+      {"other mode", [&] { chmod(path.c_str(), 0600); }},
+  };
+  for (const auto& c : cases) {
+    root.Write(kFile, "old");
+    chmod(path.c_str(), 0644);
+    const Result<FileText> file = ReadFile(path);
+    ASSERT_TRUE(file.ok());
+    ASSERT_TRUE(ClockOfInodesPasses(root, file->stamp.changed));
+    c.edit();
+    const std::optional<std::string> edited = root.Read(kFile);
+    EXPECT_EQ(ReplaceFile(path, "new", file->stamp).code(), kChangedBehind) << c.name;
+    EXPECT_EQ(root.Read(kFile), edited) << c.name;
+  }
+}
+
+TEST(ReplaceFile, NoticesAFileThatAppeared) {
+  const TemporaryRoot root;
+  root.Write(kFile, "somebody's");
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).code(), kChangedBehind);
+  EXPECT_EQ(root.Read(kFile), "somebody's");
+  EXPECT_EQ(root.Names("/etc"), Names{"file"});
+}
+
+TEST(ReplaceFile, RefusesATargetThatIsNoRegularFile) {
+  const TemporaryRoot root;
+  fs::create_directories(root.At("/etc/file"));
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).code(), EINVAL);
+  fs::create_symlink("file", root.At("/etc/link"));
+  EXPECT_EQ(ReplaceFile(root.At("/etc/link"), "new", FileStamp{}).code(), EINVAL);
+  EXPECT_EQ(root.Names("/etc"), (Names{"file", "link"}));
+}
+
+TEST(ReplaceFile, OnAFullDiskLeavesTheOldFileAndNothingElse) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  ChildProcess writer([&] {
+    std::signal(SIGXFSZ, SIG_IGN);
+    const rlimit limit{4096, 4096};
+    if (setrlimit(RLIMIT_FSIZE, &limit) != 0) return 99;
+    return Replace(root, std::string(10'000, 'x')).code();
+  });
+  EXPECT_EQ(writer.Wait(), EFBIG);
+  EXPECT_EQ(root.Read(kFile), "old");
+  EXPECT_EQ(root.Names("/etc"), Names{"file"});
+}
+
+TEST(ReplaceFile, LeavesAWholeFileAndNothingElseWhicheverSystemCallFails) {
+  const struct {
+    const char* name;
+    long number;
+    const char* left;  // in the file
+  } cases[] = {
+      {"openat", SYS_openat, "old"}, {"write", SYS_write, "old"},   {"fsync", SYS_fsync, "old"},
+      {"fchmod", SYS_fchmod, "old"}, {"rename", SYS_rename, "old"},
+  };
+  for (const auto& c : cases) {
+    const TemporaryRoot root;
+    root.Write(kFile, "old");
+    ChildProcess writer([&] {
+      const Result<FileText> file = ReadFile(root.At(kFile));
+      if (!FailSystemCall(c.number, EIO)) return 99;
+      return ReplaceFile(root.At(kFile), "new", file->stamp).code();
+    });
+    EXPECT_EQ(writer.Wait(), EIO) << c.name;
+    EXPECT_EQ(root.Read(kFile), c.left) << c.name;
+    EXPECT_EQ(root.Names("/etc"), Names{"file"}) << c.name;
+  }
+}
+
+TEST(ReplaceFile, LeavesAWholeFileWhereverItsProcessIsKilled) {
+  const TemporaryRoot root;
+  bool ended = false;
+  int kills = 0;
+  for (; !ended; ++kills) {
+    root.Write(kFile, "old");
+    ended = RunUntilSystemCall(kills, [&] { static_cast<void>(Replace(root, "a new text")); });
+    const std::optional<std::string> left = root.Read(kFile);
+    EXPECT_TRUE(left == "old" || left == "a new text") << kills << ": " << left.value_or("no file");
+    ASSERT_TRUE(Replace(root, "next").ok()) << kills;
+    EXPECT_EQ(root.Names("/etc"), Names{"file"}) << kills;
+  }
+  EXPECT_EQ(root.Read(kFile), "next");
+  EXPECT_GT(kills, 10);
+}
+
+TEST(RemoveLeftovers, TakesTheTemporaryFilesOfThatFileOnly) {
+  const TemporaryRoot root;
+  for (const char* name : {"file", ".file.vorn-Ab12Cd", ".file.vorn-", ".file.vorn-toolong", ".other.vorn-Ab12Cd"}) {
+    root.Write("/etc/" + std::string(name), "");
+  }
+  RemoveLeftovers(root.At(kFile));
+  EXPECT_EQ(root.Names("/etc"), (Names{".file.vorn-", ".file.vorn-toolong", ".other.vorn-Ab12Cd", "file"}));
+  RemoveLeftovers(root.At("/no/such/folder"));
+}
+
+}  // namespace
+}  // namespace vorn

@@ -1,0 +1,16 @@
+// The log of this test program: syslog(3) goes here instead of to the system.
+#ifndef VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H
+#define VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H
+
+#include <string>
+#include <vector>
+
+struct LogLine {
+  int priority;  // LOG_ERR, ...
+  std::string text;
+};
+
+// What was logged since the last call, by all threads.
+std::vector<LogLine> TakeLog();
+
+#endif  // VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H

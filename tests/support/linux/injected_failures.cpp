@@ -1,0 +1,55 @@
+#include "injected_failures.h"
+
+#include <linux/filter.h>
+#include <linux/seccomp.h>
+#include <sys/prctl.h>
+#include <sys/ptrace.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstddef>
+#include <stdexcept>
+
+namespace {
+
+// Lets a stopped child run to its next stop. Whether it is still there.
+bool Continue(pid_t child) {
+  int status = 0;
+  if (ptrace(PTRACE_SYSCALL, child, 0, 0) != 0) throw std::runtime_error("ptrace is not allowed");
+  if (waitpid(child, &status, 0) != child) throw std::runtime_error("the child is lost");
+  return WIFSTOPPED(status);
+}
+
+}  // namespace
+
+bool FailSystemCall(long number, int error_number) {
+  sock_filter steps[] = {
+      BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+      BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(number), 0, 1),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | static_cast<unsigned>(error_number)),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW),
+  };
+  const sock_fprog filter{sizeof steps / sizeof *steps, steps};
+  return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 && prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &filter) == 0;
+}
+
+bool RunUntilSystemCall(int count, const std::function<void()>& body) {
+  const pid_t child = fork();
+  if (child < 0) throw std::runtime_error("cannot fork");
+  if (child == 0) {
+    if (ptrace(PTRACE_TRACEME, 0, 0, 0) != 0 || raise(SIGSTOP) != 0) _exit(1);
+    body();
+    _exit(0);
+  }
+  int status = 0;
+  if (waitpid(child, &status, 0) != child || !WIFSTOPPED(status)) throw std::runtime_error("ptrace is not allowed");
+  // Each call stops twice, at its entry and its exit; the first stop here is an exit or an entry of
+  // raise(3), which costs a few calls at the beginning and changes nothing.
+  for (int stop = 0; stop <= 2 * count; ++stop) {
+    if (!Continue(child)) return true;
+  }
+  kill(child, SIGKILL);
+  waitpid(child, &status, 0);
+  return false;
+}

@@ -1,0 +1,17 @@
+// Failing system calls and deaths at any moment, for a child process of a test.
+#ifndef VORN_TESTS_SUPPORT_LINUX_INJECTED_FAILURES_H
+#define VORN_TESTS_SUPPORT_LINUX_INJECTED_FAILURES_H
+
+#include <sys/syscall.h>
+
+#include <functional>
+
+// From now on the system call `number` (SYS_…) of this process fails with `error_number`: seccomp(2).
+// There is no way back. False when the system does not allow it.
+bool FailSystemCall(long number, int error_number);
+
+// Runs `body` in a child process and kills it at its system call number `count` (from 0), before the
+// call is made: ptrace(2). True when the body ended before it made that many.
+bool RunUntilSystemCall(int count, const std::function<void()>& body);
+
+#endif  // VORN_TESTS_SUPPORT_LINUX_INJECTED_FAILURES_H

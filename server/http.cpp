@@ -168,6 +168,7 @@ class HttpServer::Session : public std::enable_shared_from_this<Session> {
  private:
   enum class Phase { kIdle, kHead, kBody, kCall, kWrite, kDrain };
 
+  void NewRequest();
   std::chrono::seconds LimitOf(Phase phase) const;
   void Enter(Phase phase);
   void Advance();
@@ -190,16 +191,25 @@ class HttpServer::Session : public std::enable_shared_from_this<Session> {
   Clock::time_point deadline_;
   beast::flat_buffer buffer_;
   std::optional<Parser> parser_;
-  bool begun_ = false;            // the service has seen the head
+  std::size_t head_bytes_ = 0;    // of this request, read so far
+  bool begun_ = false;            // the head is sound, and what follows it a request of its own
   bool awaits_continue_ = false;  // the client sends the body once it is told to
   std::optional<http::response<http::string_body>> message_;
   bool keep_alive_ = false;
 };
 
 void HttpServer::Session::Start() {
-  parser_.emplace();
+  NewRequest();
   Enter(Phase::kHead);
   Read();
+}
+
+void HttpServer::Session::NewRequest() {
+  parser_.emplace();
+  parser_->header_limit(static_cast<std::uint32_t>(engine_.limits().head_bytes));
+  parser_->body_limit(boost::none);  // the exchange has its own
+  head_bytes_ = 0;
+  begun_ = false;
 }
 
 std::chrono::seconds HttpServer::Session::LimitOf(Phase phase) const {
@@ -241,7 +251,11 @@ void HttpServer::Session::Advance() {
   while (buffer_.size() > 0) {
     if (phase_ == Phase::kIdle) Enter(Phase::kHead);
     Error error;
-    buffer_.consume(parser_->put(buffer_.data(), error));
+    const bool in_head = !parser_->is_header_done();
+    const std::size_t taken = parser_->put(buffer_.data(), error);
+    buffer_.consume(taken);
+    // The parser's own limit is one of each header.
+    if (in_head && (head_bytes_ += taken) > engine_.limits().head_bytes) error = http::error::header_limit;
     if (auto& refusal = parser_->get().body().refusal) return Send(*std::move(refusal));
     if (error == http::error::need_more) break;
     if (error) return Send(Malformed(error));
@@ -256,9 +270,9 @@ void HttpServer::Session::Advance() {
 
 // Shows the head to the service. A response is the answer already.
 std::optional<Response> HttpServer::Session::BeginExchange() {
-  begun_ = true;
   const Request& request = parser_->get();
   if (const char* fault = FramingFault(request)) return Refusal(400, fault);
+  begun_ = true;
   const auto expected = request[http::field::expect];
   if (!expected.empty() && !beast::iequals(expected, "100-continue")) {
     return Refusal(417, "Only 100-continue can be expected.");
@@ -349,8 +363,7 @@ void HttpServer::Session::OnSent(const Error& error) {
     return Drain();
   }
   if (engine_.stopping()) return Close();
-  parser_.emplace();
-  begun_ = false;
+  NewRequest();
   Enter(Phase::kIdle);
   Advance();
 }

@@ -21,8 +21,8 @@ std::size_t Utf8End(std::string_view text) {
   return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
 }
 
-// What JsonCpp lets pass even in its strict mode: numbers and texts that RFC 8259 has no place for.
-// Leaves the structure to JsonCpp.
+// What JsonCpp lets pass even in its strict mode: characters, numbers and texts that RFC 8259 has no
+// place for. Leaves the structure, and so what comes after what, to JsonCpp.
 class LexicalCheck {
  public:
   explicit LexicalCheck(std::string_view text) : text_(text) {}
@@ -48,11 +48,20 @@ class LexicalCheck {
     const char c = Peek();
     if (c == '"') return String();
     if (c == '-' || IsDigit(c)) return Number();
+    if (c >= 'a' && c <= 'z') return Word();
     if (c == '{' || c == '[') ++depth_;
     if (c == '}' || c == ']') --depth_;
     if (depth_ > kMaxJsonDepth) return "nested too deep";
-    ++at_;
-    return nullptr;
+    return Skip("{}[]:, \t\r\n") ? nullptr : "unexpected character";
+  }
+
+  const char* Word() {
+    for (const std::string_view word : {"true", "false", "null"}) {
+      if (text_.substr(at_, word.size()) != word) continue;
+      at_ += word.size();
+      return nullptr;
+    }
+    return "neither true, false nor null";
   }
 
   const char* Number() {

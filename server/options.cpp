@@ -18,8 +18,9 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
   app.footer(kFooter);
   app.add_option("--root", options.root, "Serve the box whose files are below DIR")
       ->type_name("DIR")
+      ->take_last()
       ->capture_default_str();
-  app.add_option("--modules", options.modules, "Load the modules in DIR")->type_name("DIR");
+  app.add_option("--modules", options.modules, "Load the modules in DIR")->type_name("DIR")->take_last();
   app.add_option("--listen", options.listen, "Listen at ADDRESS; may be given several times")
       ->type_name("ADDRESS")
       ->allow_extra_args(false);

@@ -1,0 +1,186 @@
+#include "json_input.h"
+
+#include <json/reader.h>
+#include <unistr.h>
+
+#include <algorithm>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+
+namespace vorn::server {
+namespace {
+
+bool IsDigit(char c) { return c >= '0' && c <= '9'; }
+
+const std::uint8_t* Bytes(std::string_view text) { return reinterpret_cast<const std::uint8_t*>(text.data()); }
+
+// Where `text` stops being UTF-8; its size if it never does.
+std::size_t Utf8End(std::string_view text) {
+  const std::uint8_t* fault = u8_check(Bytes(text), text.size());
+  return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
+}
+
+// What JsonCpp lets pass even in its strict mode: characters, numbers and texts that RFC 8259 has no
+// place for. Leaves the structure, and so what comes after what, to JsonCpp.
+class LexicalCheck {
+ public:
+  explicit LexicalCheck(std::string_view text) : text_(text) {}
+
+  // What is wrong at position(), or null.
+  const char* Run() {
+    if (const std::size_t end = Utf8End(text_); end != text_.size()) return Fault(end, "not UTF-8");
+    while (at_ < text_.size()) {
+      if (const char* fault = Token(); fault != nullptr) return fault;
+    }
+    return nullptr;
+  }
+  std::size_t position() const { return at_; }
+
+ private:
+  const char* Fault(std::size_t at, const char* what) {
+    at_ = at;
+    return what;
+  }
+  char Peek(std::size_t ahead = 0) const { return at_ + ahead < text_.size() ? text_[at_ + ahead] : '\0'; }
+
+  const char* Token() {
+    const char c = Peek();
+    if (c == '"') return String();
+    if (c == '-' || IsDigit(c)) return Number();
+    if (c >= 'a' && c <= 'z') return Word();
+    if (c == '{' || c == '[') ++depth_;
+    if (c == '}' || c == ']') --depth_;
+    if (depth_ > kMaxJsonDepth) return "nested too deep";
+    return Skip("{}[]:, \t\r\n") ? nullptr : "unexpected character";
+  }
+
+  const char* Word() {
+    for (const std::string_view word : {"true", "false", "null"}) {
+      if (text_.substr(at_, word.size()) != word) continue;
+      at_ += word.size();
+      return nullptr;
+    }
+    return "neither true, false nor null";
+  }
+
+  const char* Number() {
+    const std::size_t begin = at_;
+    Skip("-");
+    if (Peek() == '0' && IsDigit(Peek(1))) return Fault(begin, "a number begins with 0");
+    if (!Digits()) return Fault(begin, "not a number");
+    if (Skip(".") && !Digits()) return Fault(begin, "not a number");
+    if (!Skip("eE")) return nullptr;
+    Skip("+-");
+    return Digits() ? nullptr : Fault(begin, "not a number");
+  }
+
+  bool Skip(std::string_view one_of) {
+    if (at_ == text_.size() || one_of.find(Peek()) == std::string_view::npos) return false;
+    ++at_;
+    return true;
+  }
+
+  bool Digits() {
+    const std::size_t begin = at_;
+    while (IsDigit(Peek())) ++at_;
+    return at_ > begin;
+  }
+
+  const char* String() {
+    for (++at_; at_ < text_.size() && Peek() != '"';) {
+      if (static_cast<unsigned char>(Peek()) < 0x20) return "control character in a text";
+      if (Peek() != '\\') {
+        ++at_;
+      } else if (const char* fault = Escape(); fault != nullptr) {
+        return fault;
+      }
+    }
+    ++at_;
+    return nullptr;
+  }
+
+  const char* Escape() {
+    if (Peek(1) != 'u') {
+      if (std::string_view("\"\\/bfnrt").find(Peek(1)) == std::string_view::npos) return "unknown escape in a text";
+      at_ += 2;
+      return nullptr;
+    }
+    const int unit = CodeUnit(at_);
+    if (unit < 0) return "\\u takes four hexadecimal digits";
+    if (unit == 0) return "U+0000 in a text";
+    const bool pair = unit >= 0xD800 && unit < 0xDC00;
+    const int second = pair ? CodeUnit(at_ + 6) : -1;
+    if ((unit >= 0xDC00 && unit < 0xE000) || (pair && (second < 0xDC00 || second >= 0xE000))) {
+      return "half a surrogate pair in a text";
+    }
+    at_ += pair ? 12 : 6;
+    return nullptr;
+  }
+
+  // The value of "\uXXXX" at `at`; negative if there is none.
+  int CodeUnit(std::size_t at) const {
+    if (text_.substr(std::min(at, text_.size()), 2) != "\\u") return -1;
+    int value = 0;
+    for (const char c : text_.substr(at + 2, 4)) {
+      const std::size_t digit = std::string_view("0123456789abcdefABCDEF").find(c);
+      if (digit == std::string_view::npos) return -1;
+      value = value * 16 + static_cast<int>(digit < 16 ? digit : digit - 6);
+    }
+    return at + 6 <= text_.size() ? value : -1;
+  }
+
+  std::string_view text_;
+  std::size_t at_ = 0;
+  int depth_ = 0;
+};
+
+std::string Located(std::string_view text, std::size_t position, const char* what) {
+  const std::string_view before = text.substr(0, position);
+  const std::size_t last_break = before.rfind('\n');
+  const auto line = 1 + std::count(before.begin(), before.end(), '\n');
+  const std::size_t column = last_break == std::string_view::npos ? position + 1 : position - last_break;
+  return "Line " + std::to_string(line) + ", Column " + std::to_string(column) + ": " + what;
+}
+
+std::unique_ptr<Json::CharReader> NewReader() {
+  Json::CharReaderBuilder builder;
+  Json::CharReaderBuilder::strictMode(&builder.settings_);
+  builder["skipBom"] = false;
+  return std::unique_ptr<Json::CharReader>(builder.newCharReader());
+}
+
+// The first of JsonCpp's messages ("* Line 1, Column 2\n  Missing ...\n* ...") on one line.
+std::string FirstMessage(const std::string& messages) {
+  const std::size_t place = messages.find("\n  ");
+  if (messages.compare(0, 2, "* ") != 0 || place == std::string::npos) return messages;
+  const std::size_t end = messages.find('\n', place + 1);
+  return messages.substr(2, place - 2) + ": " + messages.substr(place + 3, end - place - 3);
+}
+
+}  // namespace
+
+bool IsPlainUtf8(std::string_view text) {
+  return Utf8End(text) == text.size() && text.find('\0') == std::string_view::npos;
+}
+
+std::optional<Json::Value> ParseJsonObject(std::string_view text, std::string* error) {
+  LexicalCheck check(text);
+  if (const char* fault = check.Run(); fault != nullptr) {
+    *error = Located(text, check.position(), fault);
+    return std::nullopt;
+  }
+  // Making a reader costs as much as reading a small request.
+  thread_local const std::unique_ptr<Json::CharReader> reader = NewReader();
+  Json::Value value;
+  std::string messages;
+  if (!reader->parse(text.data(), text.data() + text.size(), &value, &messages)) {
+    *error = FirstMessage(messages);
+    return std::nullopt;
+  }
+  if (value.isObject()) return value;
+  *error = "Line 1, Column 1: one JSON object is expected";
+  return std::nullopt;
+}
+
+}  // namespace vorn::server

@@ -1,0 +1,215 @@
+#include "listener.h"
+
+#include <arpa/inet.h>
+#include <fcntl.h>
+#include <netinet/in.h>
+#include <netinet/tcp.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <systemd/sd-daemon.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <charconv>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <utility>
+
+namespace vorn::server {
+namespace {
+
+constexpr std::string_view kUnixScheme = "unix:";
+constexpr std::string_view kRule = "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at";
+constexpr std::string_view kNoTcp = "TCP is for a trial root (--root) alone, because nobody can log in yet";
+
+// Any socket address; `size` is what is used of it.
+struct SocketAddress {
+  sockaddr_storage storage{};
+  socklen_t size = 0;
+
+  const sockaddr* get() const { return reinterpret_cast<const sockaddr*>(&storage); }
+  sockaddr* get() { return reinterpret_cast<sockaddr*>(&storage); }
+  int family() const { return storage.ss_family; }
+
+  template <typename Address>
+  static SocketAddress Of(const Address& address) {
+    SocketAddress any;
+    std::memcpy(&any.storage, &address, sizeof address);
+    any.size = sizeof address;
+    return any;
+  }
+  template <typename Address>
+  Address As() const {
+    Address address;
+    std::memcpy(&address, &storage, sizeof address);
+    return address;
+  }
+};
+
+std::string SystemError(const std::string& what) { return what + ": " + std::strerror(errno); }
+
+std::optional<std::uint16_t> ParsePort(std::string_view text) {
+  std::uint16_t port = 0;
+  const auto [end, failure] = std::from_chars(text.data(), text.data() + text.size(), port);
+  if (failure != std::errc() || end != text.data() + text.size()) return std::nullopt;
+  return port;
+}
+
+std::optional<SocketAddress> ParseTcp(std::string_view address) {
+  const std::size_t colon = address.rfind(':');
+  if (colon == std::string_view::npos) return std::nullopt;
+  const std::string_view host = address.substr(0, colon);
+  const auto port = ParsePort(address.substr(colon + 1));
+  if (!port) return std::nullopt;
+  if (host == "127.0.0.1") {
+    sockaddr_in ipv4{};
+    ipv4.sin_family = AF_INET;
+    ipv4.sin_port = htons(*port);
+    ipv4.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    return SocketAddress::Of(ipv4);
+  }
+  if (host == "[::1]") {
+    sockaddr_in6 ipv6{};
+    ipv6.sin6_family = AF_INET6;
+    ipv6.sin6_port = htons(*port);
+    ipv6.sin6_addr = in6addr_loopback;
+    return SocketAddress::Of(ipv6);
+  }
+  return std::nullopt;
+}
+
+std::optional<SocketAddress> UnixAddress(const std::string& path, std::string* error) {
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  if (path.empty() || path.front() != '/' || path.size() >= sizeof address.sun_path) {
+    *error = "the path of a socket is absolute and at most " + std::to_string(sizeof address.sun_path - 1) + " bytes";
+    return std::nullopt;
+  }
+  path.copy(address.sun_path, path.size());
+  return SocketAddress::Of(address);
+}
+
+// The socket, bound and listening; none with errno set.
+UniqueFd BindAndListen(const SocketAddress& address) {
+  UniqueFd socket(::socket(address.family(), SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+  const int on = 1;
+  if (socket && address.family() != AF_UNIX) {
+    // Connections inherit both.
+    setsockopt(socket.get(), IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
+    setsockopt(socket.get(), SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
+  }
+  if (!socket || bind(socket.get(), address.get(), address.size) != 0 || listen(socket.get(), SOMAXCONN) != 0)
+    return {};
+  return socket;
+}
+
+// Whether somebody accepts connections there.
+bool IsServed(const SocketAddress& address) {
+  const UniqueFd probe(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+  return probe && (connect(probe.get(), address.get(), address.size) == 0 || errno == EAGAIN);
+}
+
+// Removes a socket that its server left behind. False if what is there must stay.
+bool ClearPath(const std::string& path, const SocketAddress& address, std::string* error) {
+  struct stat there {};
+  if (lstat(path.c_str(), &there) != 0) return true;  // binding says more
+  if (!S_ISSOCK(there.st_mode)) *error = path + " is there and is no socket";
+  if (S_ISSOCK(there.st_mode) && IsServed(address)) *error = path + " is served by another program";
+  if (error->empty() && unlink(path.c_str()) != 0) *error = SystemError(path);
+  return error->empty();
+}
+
+std::optional<Listener> OpenUnix(const std::string& path, std::string* error) {
+  const std::optional<SocketAddress> address = UnixAddress(path, error);
+  if (!address || !ClearPath(path, *address, error)) return std::nullopt;
+  // At no moment may others connect.
+  const mode_t before = umask(0117);
+  UniqueFd socket = BindAndListen(*address);
+  umask(before);
+  if (socket) return Listener(std::move(socket), AF_UNIX, std::string(kUnixScheme) + path, path);
+  *error = SystemError(path);
+  return std::nullopt;
+}
+
+SocketAddress LocalAddress(int socket) {
+  SocketAddress address;
+  address.size = sizeof address.storage;
+  if (getsockname(socket, address.get(), &address.size) != 0) address.storage.ss_family = AF_UNSPEC;
+  return address;
+}
+
+// As --listen takes it; empty for an address that is none of ours.
+std::string NameOf(const SocketAddress& address) {
+  if (address.family() == AF_UNIX) return std::string(kUnixScheme) + address.As<sockaddr_un>().sun_path;
+  if (address.family() == AF_INET) {
+    const auto ipv4 = address.As<sockaddr_in>();
+    if (ipv4.sin_addr.s_addr == htonl(INADDR_LOOPBACK)) return "127.0.0.1:" + std::to_string(ntohs(ipv4.sin_port));
+  }
+  if (address.family() == AF_INET6) {
+    const auto ipv6 = address.As<sockaddr_in6>();
+    if (IN6_IS_ADDR_LOOPBACK(&ipv6.sin6_addr)) return "[::1]:" + std::to_string(ntohs(ipv6.sin6_port));
+  }
+  return "";
+}
+
+}  // namespace
+
+Listener::Listener(UniqueFd socket, int family, std::string name, std::string path)
+    : socket_(std::move(socket)), family_(family), name_(std::move(name)), path_(std::move(path)) {}
+
+Listener::Listener(Listener&& other) noexcept
+    : socket_(std::move(other.socket_)),
+      family_(other.family_),
+      name_(std::move(other.name_)),
+      path_(std::exchange(other.path_, {})) {}
+
+Listener::~Listener() {
+  if (!path_.empty()) unlink(path_.c_str());
+}
+
+std::optional<Listener> OpenListener(std::string_view address, bool allow_tcp, std::string* error) {
+  error->clear();
+  if (address.substr(0, kUnixScheme.size()) == kUnixScheme) {
+    return OpenUnix(std::string(address.substr(kUnixScheme.size())), error);
+  }
+  const std::optional<SocketAddress> tcp = ParseTcp(address);
+  if (!tcp) {
+    *error = kRule;
+    return std::nullopt;
+  }
+  if (!allow_tcp) {
+    *error = kNoTcp;
+    return std::nullopt;
+  }
+  UniqueFd socket = BindAndListen(*tcp);
+  if (socket) return AdoptListener(std::move(socket), allow_tcp, error);
+  *error = SystemError(std::string(address));
+  return std::nullopt;
+}
+
+std::optional<Listener> AdoptListener(UniqueFd socket, bool allow_tcp, std::string* error) {
+  const SocketAddress address = LocalAddress(socket.get());
+  std::string name = NameOf(address);
+  if (sd_is_socket(socket.get(), AF_UNSPEC, SOCK_STREAM, 1) <= 0) {
+    *error = "not a listening stream socket";
+  } else if (name.empty()) {
+    *error = kRule;
+  } else if (address.family() != AF_UNIX && !allow_tcp) {
+    *error = kNoTcp;
+  } else {
+    fcntl(socket.get(), F_SETFL, fcntl(socket.get(), F_GETFL) | O_NONBLOCK);
+    return Listener(std::move(socket), address.family(), std::move(name), "");
+  }
+  return std::nullopt;
+}
+
+std::vector<UniqueFd> TakeActivatedSockets() {
+  std::vector<UniqueFd> sockets;
+  const int count = sd_listen_fds(1);
+  for (int i = 0; i < count; ++i) sockets.emplace_back(SD_LISTEN_FDS_START + i);
+  return sockets;
+}
+
+}  // namespace vorn::server

@@ -1,0 +1,125 @@
+// vornd: joins the parts, in the order in which they need each other.
+#include <sys/socket.h>
+#include <syslog.h>
+#include <systemd/sd-daemon.h>
+#include <unistd.h>
+
+#include <climits>
+#include <cstdlib>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <system_error>
+#include <utility>
+#include <variant>
+#include <vector>
+
+#include "http.h"
+#include "listener.h"
+#include "module.h"
+#include "options.h"
+#include "routes.h"
+#include "runtime_folder.h"
+#include "termination.h"
+#include "web_api.h"
+#include "worker_pool.h"
+
+namespace vorn::server {
+namespace {
+
+// systemd puts standard error into the log that syslog(3) ends in: each line would be there twice.
+bool StartedBySystemd() {
+  const char* pid = std::getenv("SYSTEMD_EXEC_PID");
+  return pid != nullptr && pid == std::to_string(getpid());
+}
+
+// Tells systemd, where it waits for that, and nobody otherwise.
+void Notify(const char* state) { sd_notify(0, state); }
+
+// Beside the program where it is installed, else where it was built.
+std::string DefaultModuleFolder() {
+  std::error_code failure;
+  const auto prefix = std::filesystem::read_symlink("/proc/self/exe", failure).parent_path().parent_path();
+  const auto installed = prefix / VORN_MODULE_FOLDER;
+  const auto built = prefix / "modules";
+  return std::filesystem::is_directory(built, failure) ? built.string() : installed.string();
+}
+
+std::optional<std::vector<Listener>> Listen(const Options& options, const RuntimeFolder& folder) {
+  const bool allow_tcp = options.root != "/";
+  std::vector<Listener> listeners;
+  std::string error;
+  const auto keep = [&](const std::string& name, std::optional<Listener> listener) {
+    if (!listener) {
+      syslog(LOG_ERR, "%s: %s", name.c_str(), error.c_str());
+      return false;
+    }
+    syslog(LOG_INFO, "Listening at %s", listener->name().c_str());
+    listeners.push_back(std::move(*listener));
+    return true;
+  };
+  for (UniqueFd& socket : TakeActivatedSockets()) {
+    if (!keep("Socket from systemd", AdoptListener(std::move(socket), allow_tcp, &error))) return std::nullopt;
+  }
+  std::vector<std::string> addresses = options.listen;
+  if (addresses.empty() && listeners.empty()) addresses.push_back("unix:" + folder.path() + "/vornd.sock");
+  for (const std::string& address : addresses) {
+    if (!keep("--listen " + address, OpenListener(address, allow_tcp, &error))) return std::nullopt;
+  }
+  return listeners;
+}
+
+int Serve(const Options& options) {
+  std::string error;
+  const std::optional<RuntimeFolder> folder = RuntimeFolder::Claim(options.root, &error);
+  if (!folder || !CatchTermination(&error)) {
+    syslog(LOG_ERR, "%s", error.c_str());
+    return EXIT_FAILURE;
+  }
+  const std::string module_folder = options.modules.empty() ? DefaultModuleFolder() : options.modules;
+  const std::vector<Module> modules = LoadModules(module_folder);
+  if (modules.empty()) {
+    syslog(LOG_ERR, "%s: there is no module to serve", module_folder.c_str());
+    return EXIT_FAILURE;
+  }
+  std::optional<std::vector<Listener>> listeners = Listen(options, *folder);
+  if (!listeners) return EXIT_FAILURE;
+
+  const Routes routes(modules);
+  WorkerPool pool(WorkerPool::Limits{});
+  WebApi api(routes, pool);
+  HttpServer server(api, std::move(*listeners));
+  Notify("READY=1");
+  WaitForTermination();
+  Notify("STOPPING=1");
+  server.Stop();
+  server.Join();
+  return EXIT_SUCCESS;
+}
+
+// The root without links and dots. The platform library reads it from VORN_ROOT, the first time
+// when it is loaded; there are no threads yet.
+bool SettleRoot(Options* options) {
+  std::error_code failure;
+  options->root = std::filesystem::canonical(options->root, failure).string();
+  if (!failure && std::filesystem::is_directory(options->root, failure) &&
+      setenv("VORN_ROOT", options->root.c_str(), 1) == 0) {
+    return true;
+  }
+  syslog(LOG_ERR, "--root: %s", failure ? failure.message().c_str() : "not a folder");
+  return false;
+}
+
+}  // namespace
+}  // namespace vorn::server
+
+int main(int argc, char** argv) {
+  using namespace vorn::server;  // NOLINT(google-build-using-namespace)
+  std::variant<Options, int> parsed = ParseOptions(argc, argv);
+  if (const int* status = std::get_if<int>(&parsed)) return *status;
+  openlog("vornd", LOG_PID | (StartedBySystemd() ? 0 : LOG_PERROR), LOG_DAEMON);
+  auto& options = std::get<Options>(parsed);
+  const int status = SettleRoot(&options) ? Serve(options) : EXIT_FAILURE;
+  closelog();
+  return status;
+}

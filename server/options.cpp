@@ -1,0 +1,35 @@
+#include "options.h"
+
+#include <CLI/CLI.hpp>
+
+namespace vorn::server {
+namespace {
+
+constexpr const char* kFooter =
+    "\nADDRESS is unix:/PATH or, with a --root of your own, 127.0.0.1:PORT or [::1]:PORT.\n"
+    "Without any, and without sockets from systemd, it is unix:ROOT/run/vorn/vornd.sock.";
+
+}  // namespace
+
+std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
+  Options options;
+  CLI::App app("The web-API server: loads modules and serves their methods over HTTP.", "vornd");
+  app.set_version_flag("--version", std::string("vornd ") + VORN_VERSION);
+  app.footer(kFooter);
+  app.add_option("--root", options.root, "Serve the box whose files are below DIR")
+      ->type_name("DIR")
+      ->take_last()
+      ->capture_default_str();
+  app.add_option("--modules", options.modules, "Load the modules in DIR")->type_name("DIR")->take_last();
+  app.add_option("--listen", options.listen, "Listen at ADDRESS; may be given several times")
+      ->type_name("ADDRESS")
+      ->allow_extra_args(false);
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error) == 0 ? 0 : 2;
+  }
+  return options;
+}
+
+}  // namespace vorn::server

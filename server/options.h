@@ -1,0 +1,23 @@
+// The command line of vornd.
+#ifndef VORN_SERVER_OPTIONS_H
+#define VORN_SERVER_OPTIONS_H
+
+#include <string>
+#include <variant>
+#include <vector>
+
+namespace vorn::server {
+
+struct Options {
+  std::string root = "/";
+  std::string modules;              // empty: where this program's modules are
+  std::vector<std::string> listen;  // empty: the Unix socket below the root
+};
+
+// The options, or the status to exit with when there is nothing more to do: help and version have
+// been printed (0), or what is wrong with the command line (2).
+std::variant<Options, int> ParseOptions(int argc, const char* const* argv);
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_OPTIONS_H

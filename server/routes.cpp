@@ -1,0 +1,95 @@
+#include "routes.h"
+
+#include <syslog.h>
+
+#include <array>
+#include <charconv>
+#include <cstddef>
+#include <optional>
+
+namespace vorn::server {
+namespace {
+
+constexpr std::string_view kPrefix = "/api/";
+
+struct Path {
+  std::string_view api;
+  std::string_view version;
+  std::string_view method;
+};
+
+std::optional<Path> SplitPath(std::string_view path) {
+  if (path.substr(0, kPrefix.size()) != kPrefix) return std::nullopt;
+  path.remove_prefix(kPrefix.size());
+  const std::size_t first = path.find('/');
+  const std::size_t second = first == std::string_view::npos ? first : path.find('/', first + 1);
+  if (second == std::string_view::npos) return std::nullopt;
+  return Path{path.substr(0, first), path.substr(first + 1, second - first - 1), path.substr(second + 1)};
+}
+
+// "v2" is 2. None for anything but the one way to write a number.
+std::optional<int> ParseVersion(std::string_view text) {
+  if (text.substr(0, 1) != "v") return std::nullopt;
+  int version = 0;
+  std::from_chars(text.data() + 1, text.data() + text.size(), version);
+  if ("v" + std::to_string(version) != text) return std::nullopt;
+  return version;
+}
+
+std::string Quoted(std::string_view text) { return '"' + std::string(text) + '"'; }
+
+}  // namespace
+
+std::string Route::Name() const { return std::string(row.api) + " v" + std::to_string(row.version) + " " + row.method; }
+
+Routes::Routes(const std::vector<Module>& modules) {
+  for (const Module& module : modules) {
+    for (const APIRow& row : module.rows) Add(row, module);
+  }
+}
+
+void Routes::Add(const APIRow& row, const Module& module) {
+  const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, Route{row, &module.descriptor});
+  if (!added) syslog(LOG_ERR, "%s: %s is there already", module.path.c_str(), place->second.Name().c_str());
+}
+
+const Route* Routes::Find(std::string_view path, std::string* unknown) const {
+  const std::optional<Path> parts = SplitPath(path);
+  if (!parts) {
+    *unknown = "There is nothing at " + Quoted(path) + ".";
+    return nullptr;
+  }
+  const auto api = apis_.find(parts->api);
+  if (api == apis_.end()) {
+    *unknown = "There is no API " + Quoted(parts->api) + ".";
+    return nullptr;
+  }
+  const std::optional<int> number = ParseVersion(parts->version);
+  const auto version = number ? api->second.find(*number) : api->second.end();
+  if (version == api->second.end()) {
+    *unknown = "The API " + Quoted(parts->api) + " has no version " + Quoted(parts->version) + ".";
+    return nullptr;
+  }
+  const auto method = version->second.find(parts->method);
+  if (method != version->second.end()) return &method->second;
+  *unknown = "Version " + std::to_string(*number) + " of the API " + Quoted(parts->api) + " has no method " +
+             Quoted(parts->method) + ".";
+  return nullptr;
+}
+
+Json::Value Routes::List() const {
+  Json::Value list(Json::arrayValue);
+  for (const auto& [api, versions] : apis_) {
+    for (const auto& [version, methods] : versions) {
+      for (const auto& [method, route] : methods) {
+        Json::Value& row = list.append(Json::Value(Json::objectValue));
+        row["api"] = api;
+        row["version"] = version;
+        row["method"] = method;
+      }
+    }
+  }
+  return list;
+}
+
+}  // namespace vorn::server

@@ -1,0 +1,56 @@
+#include "runtime_folder.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <utility>
+
+namespace vorn::server {
+namespace {
+
+struct FreeText {
+  void operator()(char* text) const { std::free(text); }
+};
+
+// The folder `name` of `parent`, made if it was missing, with links followed. Empty with errno set.
+std::string MakeFolder(const std::string& parent, const char* name) {
+  const std::string path = (parent == "/" ? "" : parent) + "/" + name;
+  if (mkdir(path.c_str(), 0755) != 0 && errno != EEXIST) return "";
+  const std::unique_ptr<char, FreeText> canonical(realpath(path.c_str(), nullptr));
+  return canonical ? canonical.get() : "";
+}
+
+bool IsBelow(const std::string& path, const std::string& root) {
+  return root == "/" || path.compare(0, root.size() + 1, root + "/") == 0;
+}
+
+}  // namespace
+
+RuntimeFolder::RuntimeFolder(std::string path, UniqueFd folder) : path_(std::move(path)), folder_(std::move(folder)) {}
+
+std::optional<RuntimeFolder> RuntimeFolder::Claim(const std::string& root, std::string* error) {
+  std::string path = root;
+  for (const char* name : {"run", "vorn"}) {
+    path = MakeFolder(path, name);
+    if (path.empty()) {
+      *error = root + ": /run/vorn cannot be made: " + std::strerror(errno);
+      return std::nullopt;
+    }
+    if (!IsBelow(path, root)) {
+      *error = root + ": /run/vorn would be " + path + ", which is outside";
+      return std::nullopt;
+    }
+  }
+  UniqueFd folder(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (folder && flock(folder.get(), LOCK_EX | LOCK_NB) == 0) return RuntimeFolder(path, std::move(folder));
+  *error = path + ": " + (errno == EWOULDBLOCK ? "another vornd serves this root" : std::strerror(errno));
+  return std::nullopt;
+}
+
+}  // namespace vorn::server

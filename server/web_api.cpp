@@ -1,0 +1,65 @@
+#include "web_api.h"
+
+#include <string>
+#include <utility>
+
+#include "answer.h"
+#include "body.h"
+#include "browser_guard.h"
+#include "call.h"
+#include "header_value.h"
+
+namespace vorn::server {
+namespace {
+
+using NewBody = std::variant<std::unique_ptr<Body>, Response>;
+
+std::optional<Response> KeepStrangersOut(const Head& head) {
+  if (head.over_tcp && !IsLoopbackHost(head.host.value_or(""))) {
+    return Refusal(421, "This server is localhost, 127.0.0.1 and [::1]; the Host header names another one.");
+  }
+  if (head.origin && !IsLoopbackOrigin(*head.origin)) {
+    return Refusal(403, "Web pages of other sites may not use this server.");
+  }
+  return std::nullopt;
+}
+
+Response MethodNotAllowed(std::string_view path, const std::string& allowed) {
+  Response response = Refusal(405, "At \"" + std::string(path) + "\" only " + allowed + " is possible.");
+  response.headers.emplace_back("Allow", allowed);
+  return response;
+}
+
+NewBody OpenBody(const Head& head) {
+  if (!head.has_body) return std::make_unique<JsonBody>();
+  const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
+  if (!type || type->value != "application/json") {
+    return Refusal(415, "Parameters are sent as application/json, not as \"" + std::string(head.content_type) + "\".");
+  }
+  if (head.content_length > JsonBody::kMaxBytes) return JsonBody::TooLarge();
+  return std::make_unique<JsonBody>();
+}
+
+}  // namespace
+
+WebApi::WebApi(const Routes& routes, WorkerPool& pool) : routes_(routes), pool_(pool) {}
+
+std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
+  if (auto refusal = KeepStrangersOut(head)) return *std::move(refusal);
+  if (auto page = AnswerPage(head)) return *std::move(page);
+  std::string unknown;
+  const Route* route = routes_.Find(head.target, &unknown);
+  if (route == nullptr) return Refusal(404, unknown);
+  if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
+  NewBody body = OpenBody(head);
+  if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
+  return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), pool_);
+}
+
+std::optional<Response> WebApi::AnswerPage(const Head& head) const {
+  if (head.target != "/api" && head.target != "/healthz") return std::nullopt;
+  if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
+  return Success(head.target == "/api" ? routes_.List() : Json::Value());
+}
+
+}  // namespace vorn::server

@@ -1,0 +1,32 @@
+// What the server offers: the methods of the loaded modules, their list, and a sign of life.
+#ifndef VORN_SERVER_WEB_API_H
+#define VORN_SERVER_WEB_API_H
+
+#include <memory>
+#include <optional>
+#include <string_view>
+#include <variant>
+
+#include "http.h"
+#include "routes.h"
+#include "worker_pool.h"
+
+namespace vorn::server {
+
+class WebApi : public Service {
+ public:
+  // Routes and pool must outlive this.
+  WebApi(const Routes& routes, WorkerPool& pool);
+
+  std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
+
+ private:
+  std::optional<Response> AnswerPage(const Head& head) const;
+
+  const Routes& routes_;
+  WorkerPool& pool_;
+};
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_WEB_API_H

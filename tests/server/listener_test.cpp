@@ -1,0 +1,94 @@
+#include "listener.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+
+#include "connection.h"
+#include "sandbox.h"
+
+namespace vorn::server {
+namespace {
+
+std::string Refused(const std::string& address, bool allow_tcp = true) {
+  std::string error;
+  return OpenListener(address, allow_tcp, &error) ? "(opened)" : error;
+}
+
+TEST(Listener, OpensAUnixSocketForOwnerAndGroupAlone) {
+  const Sandbox sandbox;
+  const std::string path = sandbox.File("s");
+  std::string error;
+  {
+    const auto listener = OpenListener("unix:" + path, false, &error);
+    ASSERT_TRUE(listener) << error;
+    EXPECT_EQ(listener->name(), "unix:" + path);
+    EXPECT_EQ(listener->family(), AF_UNIX);
+    struct stat there {};
+    ASSERT_EQ(stat(path.c_str(), &there), 0);
+    EXPECT_EQ(there.st_mode & 07777, 0660U);
+    EXPECT_TRUE(Connection::ToUnix(path).connected());
+  }
+  EXPECT_FALSE(std::filesystem::exists(path)) << "removed with the listener";
+}
+
+TEST(Listener, ReplacesASocketThatNobodyServes) {
+  const Sandbox sandbox;
+  const std::string address = "unix:" + sandbox.File("s");
+  std::string error;
+  OpenListener(address, false, &error)->TakeSocket();
+  const auto gone = OpenListener(address, false, &error);
+  EXPECT_TRUE(gone) << error;
+}
+
+TEST(Listener, LeavesASocketThatIsServed) {
+  const Sandbox sandbox;
+  const std::string address = "unix:" + sandbox.File("s");
+  std::string error;
+  const auto first = OpenListener(address, false, &error);
+  EXPECT_EQ(Refused(address), sandbox.File("s") + " is served by another program");
+  EXPECT_TRUE(Connection::ToUnix(sandbox.File("s")).connected());
+}
+
+TEST(Listener, LeavesAFileThatIsNoSocket) {
+  const Sandbox sandbox;
+  sandbox.Write("s", "precious");
+  EXPECT_EQ(Refused("unix:" + sandbox.File("s")), sandbox.File("s") + " is there and is no socket");
+  EXPECT_EQ(ReadWholeFile(sandbox.File("s")), "precious");
+}
+
+TEST(Listener, OpensLoopbackWhereTcpIsAllowed) {
+  std::string error;
+  auto ipv4 = OpenListener("127.0.0.1:0", true, &error);
+  ASSERT_TRUE(ipv4) << error;
+  EXPECT_TRUE(Connection::ToPort(std::atoi(ipv4->name().c_str() + sizeof "127.0.0.1:" - 1)).connected());
+  EXPECT_NE(Refused(ipv4->name()).find("Address already in use"), std::string::npos);
+  EXPECT_EQ(Refused("127.0.0.1:0", false), "TCP is for a trial root (--root) alone, because nobody can log in yet");
+}
+
+TEST(Listener, RefusesEveryOtherAddress) {
+  for (const char* address :
+       {"", "0.0.0.0:80", "[::]:80", "::1:80", "127.0.0.1", "127.0.0.1:", "127.0.0.1:65536", "127.0.0.1:-1",
+        "127.0.0.1:x", "127.0.0.2:80", "localhost:80", "192.0.2.1:80", ":80", "80", "/run/s", "tcp:127.0.0.1:80"}) {
+    EXPECT_EQ(Refused(address), "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at") << address;
+  }
+  for (const std::string& address : {std::string("unix:"), std::string("unix:s"), "unix:/" + std::string(107, 'x')}) {
+    EXPECT_EQ(Refused(address), "the path of a socket is absolute and at most 107 bytes") << address;
+  }
+}
+
+TEST(Listener, AdoptsListeningSocketsUnderTheSameRules) {
+  std::string error;
+  auto tcp = OpenListener("127.0.0.1:0", true, &error);
+  ASSERT_TRUE(tcp) << error;
+  EXPECT_FALSE(AdoptListener(UniqueFd(dup(tcp->TakeSocket().get())), false, &error));
+  EXPECT_FALSE(AdoptListener(UniqueFd(socket(AF_UNIX, SOCK_STREAM, 0)), true, &error));
+  EXPECT_EQ(error, "not a listening stream socket");
+  EXPECT_FALSE(AdoptListener(UniqueFd(open("/dev/null", O_RDONLY)), true, &error));
+}
+
+}  // namespace
+}  // namespace vorn::server

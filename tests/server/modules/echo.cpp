@@ -1,0 +1,64 @@
+// A module whose methods do what the tests of the server need.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstring>
+#include <fstream>
+#include <iterator>
+#include <stdexcept>
+#include <string>
+#include <thread>
+
+#include "webapi.h"
+
+namespace {
+
+Json::Value Parameters(const VORN::APIRequest& request) { return request.GetParam("", Json::Value()); }
+
+void Echo(VORN::APIRequest* request, VORN::APIResponse* response) { response->SetSuccess(Parameters(*request)); }
+
+void EchoV2(VORN::APIRequest* request, VORN::APIResponse* response) {
+  response->SetSuccess(request->GetParam("value", "none"));
+}
+
+// Fails with the code and the details asked for.
+void Fail(VORN::APIRequest* request, VORN::APIResponse* response) {
+  response->SetError(request->GetParam("code", 1).asInt(), request->GetParam("details", Json::Value()));
+}
+
+void Throw(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) {
+  throw std::runtime_error("thrown on purpose");
+}
+
+void ThrowNumber(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) { throw 7; }
+
+void Silent(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) {}
+
+// Makes the file "begun", and answers once somebody has made the file "release".
+void Wait(VORN::APIRequest* request, VORN::APIResponse* response) {
+  const std::string begun = request->GetParam("begun", "").asString();
+  const std::string release = request->GetParam("release", "").asString();
+  std::ofstream(begun) << "begun";
+  while (access(release.c_str(), F_OK) != 0) std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  response->SetSuccess("released");
+}
+
+// What the server was told of the root.
+void Root(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
+  const char* root = std::getenv("VORN_ROOT");
+  response->SetSuccess(root == nullptr ? Json::Value() : Json::Value(root));
+}
+
+// Bytes that are no UTF-8.
+void Binary(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess("\xff\xfe"); }
+
+const APIRow table[] = {{"Test.Echo", 1, "get", Echo},      {"Test.Echo", 1, "fail", Fail},
+                        {"Test.Echo", 1, "throw", Throw},   {"Test.Echo", 1, "throw_number", ThrowNumber},
+                        {"Test.Echo", 1, "silent", Silent}, {"Test.Echo", 1, "wait", Wait},
+                        {"Test.Echo", 1, "root", Root},     {"Test.Echo", 1, "binary", Binary},
+                        {"Test.Echo", 2, "get", EchoV2},    {nullptr, 0, nullptr, nullptr}};
+
+}  // namespace
+
+extern "C" __attribute__((visibility("default"))) const void* GetAPITable() { return table; }

@@ -1,0 +1,146 @@
+// Calls of methods through the real vornd.
+#include <gmock/gmock.h>
+
+#include <atomic>
+#include <csignal>
+#include <thread>
+#include <vector>
+
+#include "server_process.h"
+
+namespace vorn::server {
+namespace {
+
+using testing::HasSubstr;
+
+class Calls : public testing::Test {
+ protected:
+  ~Calls() override {
+    server_.Signal(SIGTERM);
+    EXPECT_EQ(server_.Wait(), 0) << server_.log();
+  }
+  Reply Call(const std::string& method, const std::string& json = "") {
+    Connection client = server_.Connect();
+    client.Send(Post("/api/Test.Echo/" + method, json));
+    return client.Receive();
+  }
+  // The parameters of "wait".
+  std::string Wait(const std::string& name) const {
+    return R"({"begun": ")" + sandbox_.File("begun-" + name) + R"(", "release": ")" + sandbox_.File("release") + "\"}";
+  }
+  bool HasBegun(const std::string& name) const { return ReadWholeFile(sandbox_.File("begun-" + name)) == "begun"; }
+
+  Sandbox sandbox_;
+  ServerProcess server_{sandbox_};
+};
+
+TEST_F(Calls, ReachTheirMethod) {
+  EXPECT_EQ(Call("v1/get", R"({"a": [1, "ü"]})").Envelope()["data"]["a"][1], "ü");
+  EXPECT_EQ(Call("v1/get").Envelope()["data"], Json::Value(Json::objectValue));
+  EXPECT_EQ(Call("v2/get", R"({"value": 3})").Envelope()["data"], 3);
+  EXPECT_EQ(Call("v2/get").Envelope()["data"], "none");
+  EXPECT_EQ(Call("v1/root").Envelope()["data"], sandbox_.path());
+}
+
+TEST_F(Calls, FailAsTheDescriptorSays) {
+  const Reply known = Call("v1/fail", R"({"code": 2351, "details": ["alice"]})");
+  EXPECT_EQ(known.status, 409);
+  EXPECT_EQ(known.Envelope()["success"], false);
+  EXPECT_EQ(known.Envelope()["error"]["code"], 2351);
+  EXPECT_EQ(known.Envelope()["error"]["text"], "It is there already.");
+  EXPECT_EQ(known.Envelope()["error"]["details"][0], "alice");
+  const Reply unknown = Call("v1/fail", R"({"code": 77})");
+  EXPECT_EQ(unknown.status, 500);
+  EXPECT_EQ(unknown.Envelope()["error"]["code"], 77);
+  EXPECT_FALSE(unknown.Envelope()["error"].isMember("details"));
+}
+
+TEST_F(Calls, OfABrokenMethodAreAnsweredAndLogged) {
+  for (const char* method : {"v1/throw", "v1/throw_number", "v1/silent"}) {
+    const Reply reply = Call(method);
+    EXPECT_EQ(reply.status, 500) << method;
+    EXPECT_EQ(reply.Envelope()["error"]["code"], 2302) << method;
+  }
+  EXPECT_THAT(server_.log(), HasSubstr("Test.Echo v1 throw: no answer: thrown on purpose"));
+  EXPECT_THAT(server_.log(), HasSubstr("Test.Echo v1 throw_number: no answer: an exception of unknown type"));
+  EXPECT_THAT(server_.log(), HasSubstr("Test.Echo v1 silent: no answer: the method ended without one"));
+  EXPECT_EQ(Call("v1/get").status, 200) << "the server goes on";
+}
+
+TEST_F(Calls, WithWrongJsonSayWhere) {
+  const Reply reply = Call("v1/get", "{\"a\": 1,\n \"a\": 2}");
+  EXPECT_EQ(reply.status, 400);
+  EXPECT_EQ(reply.Envelope()["error"]["text"],
+            "The parameters are not valid JSON. Line 2, Column 2: Duplicate key: 'a'.");
+}
+
+TEST_F(Calls, AnswerValidJsonWhateverTheModuleSays) { EXPECT_TRUE(Call("v1/binary").Envelope()["success"].asBool()); }
+
+TEST_F(Calls, AreListed) {
+  Connection client = server_.ConnectTcp();
+  client.Send(Get("/api"));
+  const Json::Value data = client.Receive().Envelope()["data"];
+  ASSERT_EQ(data.size(), 9U);
+  EXPECT_EQ(data[8]["api"], "Test.Echo");
+  EXPECT_EQ(data[8]["version"], 2);
+  client.Send(Get("/healthz"));
+  EXPECT_EQ(client.Receive().status, 200);
+}
+
+TEST_F(Calls, ThatAreSlowDelayNobody) {
+  std::vector<Connection> slow;
+  for (int i = 0; i < 50; ++i) {
+    slow.push_back(server_.Connect());
+    slow.back().Send(Post("/api/Test.Echo/v1/wait", Wait(std::to_string(i))));
+  }
+  EXPECT_TRUE(Eventually([&] { return HasBegun("0") && HasBegun("3"); }));
+  for (int i = 0; i < 20; ++i) EXPECT_EQ(Call("v1/get").status, 200);
+  EXPECT_FALSE(HasBegun("4")) << "one method has its share of the workers and no more";
+  sandbox_.Write("release", "");
+  for (Connection& client : slow) EXPECT_EQ(client.Receive().Envelope()["data"], "released");
+}
+
+TEST_F(Calls, BeyondTheQueueAreRefused) {
+  std::vector<Connection> slow;
+  Reply reply;
+  for (int i = 0; reply.status == 0 && i < 400; ++i) {
+    slow.push_back(server_.Connect());
+    slow.back().Send(Post("/api/Test.Echo/v1/wait", Wait("0")));
+    if (i >= 259) {  // four run, 256 wait
+      Connection last = server_.Connect();
+      last.Send(Post("/api/Test.Echo/v1/get"));
+      reply = last.Receive();
+      if (reply.status == 200) reply.status = 0;  // this one came before the queue was full
+    }
+  }
+  EXPECT_EQ(reply.status, 503);
+  EXPECT_EQ(reply.headers["Retry-After"], "1");
+  sandbox_.Write("release", "");
+  EXPECT_EQ(slow[0].Receive().status, 200);
+  EXPECT_TRUE(Eventually([&] { return Call("v1/get").status == 200; }));
+}
+
+TEST_F(Calls, InParallelEachGetTheirOwnAnswer) {
+  std::atomic<int> right{0};
+  std::vector<std::thread> clients;
+  for (int c = 0; c < 16; ++c) {
+    clients.emplace_back([&, c] {
+      Connection client = c % 2 == 0 ? server_.Connect() : server_.ConnectTcp();
+      for (int i = 0; i < 100; ++i) {
+        const int mine = c * 1000 + i;
+        client.Send(Post("/api/Test.Echo/v1/get", "{\"mine\": " + std::to_string(mine) + "}"));
+        if (client.Receive().Envelope()["data"]["mine"] == mine) ++right;
+      }
+    });
+  }
+  for (std::thread& client : clients) client.join();
+  EXPECT_EQ(right, 1600);
+}
+
+TEST_F(Calls, OfClientsThatLeaveAreForgotten) {
+  for (int i = 0; i < 50; ++i) server_.Connect().Send(Post("/api/Test.Echo/v1/get", "{\"a\": 1}"));
+  EXPECT_EQ(Call("v1/get").status, 200);
+}
+
+}  // namespace
+}  // namespace vorn::server

@@ -1,0 +1,109 @@
+// How the real vornd starts, stops and recovers.
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+#include <csignal>
+#include <filesystem>
+
+#include "server_process.h"
+
+namespace vorn::server {
+namespace {
+
+using testing::HasSubstr;
+
+int StatusOf(Connection client) {
+  client.Send(Get("/healthz"));
+  return client.Receive().status;
+}
+
+TEST(Vornd, ListensAtTheSocketOfItsRoot) {
+  const Sandbox sandbox;
+  const ServerProcess server(sandbox, {"--listen", "unix:" + sandbox.File("run/vorn/vornd.sock")});
+  ASSERT_TRUE(server.ready()) << server.log();
+  EXPECT_EQ(StatusOf(server.Connect()), 200);
+}
+
+TEST(Vornd, ListensThereByDefault) {
+  const Sandbox sandbox;
+  const ServerProcess server(sandbox, {"--modules", TEST_MODULES});  // no --listen
+  ASSERT_TRUE(server.ready()) << server.log();
+  EXPECT_EQ(StatusOf(server.Connect()), 200);
+  struct stat there {};
+  ASSERT_EQ(stat(server.socket().c_str(), &there), 0);
+  EXPECT_EQ(there.st_mode & 07777, 0660U);
+}
+
+TEST(Vornd, FinishesARunningCallAndThenEnds) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  Connection running = server.Connect();
+  running.Send(Post("/api/Test.Echo/v1/wait",
+                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("release") + "\"}"));
+  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  server.Signal(SIGTERM);
+  EXPECT_TRUE(Eventually([&] { return !server.ConnectTcp().connected(); })) << "no new connections";
+  sandbox.Write("release", "");
+  Reply reply = running.Receive();
+  EXPECT_EQ(reply.Envelope()["data"], "released");
+  EXPECT_EQ(reply.headers["Connection"], "close");
+  EXPECT_EQ(server.Wait(), 0) << server.log();
+  EXPECT_FALSE(std::filesystem::exists(server.socket()));
+}
+
+TEST(Vornd, EndsOnInterruptWithIdleClients) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  Connection idle = server.Connect();
+  idle.Send(Get("/healthz"));
+  EXPECT_EQ(idle.Receive().status, 200);
+  server.Signal(SIGINT);
+  EXPECT_TRUE(idle.IsClosedByServer());
+  EXPECT_EQ(server.Wait(), 0) << server.log();
+}
+
+TEST(Vornd, StartsAgainAfterItWasKilled) {
+  const Sandbox sandbox;
+  ServerProcess killed(sandbox);
+  killed.Signal(SIGKILL);
+  EXPECT_EQ(killed.Wait(), 128 + SIGKILL);
+  EXPECT_TRUE(std::filesystem::exists(killed.socket()));
+  const ServerProcess next(sandbox);
+  ASSERT_TRUE(next.ready()) << next.log();
+  EXPECT_EQ(StatusOf(next.Connect()), 200);
+}
+
+TEST(Vornd, IsRefusedARootThatIsServed) {
+  const Sandbox sandbox;
+  const ServerProcess first(sandbox);
+  ServerProcess second(sandbox);
+  EXPECT_FALSE(second.ready());
+  EXPECT_EQ(second.Wait(), 1);
+  EXPECT_THAT(second.log(), HasSubstr("another vornd serves this root"));
+  EXPECT_EQ(StatusOf(first.Connect()), 200);
+}
+
+TEST(Vornd, SaysWhyItDoesNotStart) {
+  const Sandbox sandbox;
+  std::filesystem::create_directory(sandbox.File("empty"));
+  const struct {
+    std::vector<std::string> arguments;
+    const char* text;
+    int status;
+  } cases[] = {
+      {{"--listen", "0.0.0.0:80"}, "--listen 0.0.0.0:80: only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT", 1},
+      {{"--listen", "unix:/nonexistent/s"}, "/nonexistent/s: No such file or directory", 1},
+      {{"--modules", sandbox.File("empty")}, "there is no module to serve", 1},
+      {{"--root", "/nonexistent"}, "--root: No such file or directory", 1},
+      {{"--nonsense"}, "--nonsense", 2},
+  };
+  for (const auto& c : cases) {
+    ServerProcess server(sandbox, c.arguments);
+    EXPECT_FALSE(server.ready()) << c.text;
+    EXPECT_EQ(server.Wait(), c.status) << c.text;
+    EXPECT_THAT(server.log(), HasSubstr(c.text));
+  }
+}
+
+}  // namespace
+}  // namespace vorn::server

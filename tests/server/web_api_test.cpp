@@ -1,0 +1,109 @@
+#include "web_api.h"
+
+#include <gtest/gtest.h>
+
+#include "body.h"
+
+namespace vorn::server {
+namespace {
+
+void Nothing(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess({}); }
+
+class WebApiTest : public testing::Test {
+ protected:
+  static Head Post(std::string_view target) {
+    Head head;
+    head.method = "POST";
+    head.target = target;
+    return head;
+  }
+  static Head PostJson(std::string_view type, std::uint64_t length = 2) {
+    Head head = Post("/api/Nfs/v1/get");
+    head.has_body = true;
+    head.content_type = type;
+    head.content_length = length;
+    return head;
+  }
+  // The status of the answer; 0 when the call goes on.
+  int Begin(const Head& head) {
+    const auto begun = api_.Begin(head);
+    return std::holds_alternative<Response>(begun) ? std::get<Response>(begun).status : 0;
+  }
+
+  std::vector<Module> modules_{{"a.so", {{"Nfs", 1, "get", Nothing}}, {}}};
+  Routes routes_{modules_};
+  WorkerPool pool_{{1, 1, 1}};
+  WebApi api_{routes_, pool_};
+};
+
+TEST_F(WebApiTest, CallsAMethodByPost) {
+  EXPECT_EQ(Begin(Post("/api/Nfs/v1/get")), 0);
+  EXPECT_EQ(Begin(PostJson("application/json")), 0);
+  EXPECT_EQ(Begin(PostJson("Application/JSON; charset=utf-8")), 0);
+}
+
+TEST_F(WebApiTest, RefusesOtherHttpMethodsAndSaysWhichIsAllowed) {
+  Head head = Post("/api/Nfs/v1/get");
+  for (const char* method : {"GET", "PUT", "DELETE", "OPTIONS", "post", "BREW"}) {
+    head.method = method;
+    const auto begun = api_.Begin(head);
+    ASSERT_TRUE(std::holds_alternative<Response>(begun)) << method;
+    EXPECT_EQ(std::get<Response>(begun).status, 405) << method;
+    ASSERT_EQ(std::get<Response>(begun).headers.size(), 1U);
+    EXPECT_EQ(std::get<Response>(begun).headers[0], (std::pair<std::string, std::string>("Allow", "POST")));
+  }
+}
+
+TEST_F(WebApiTest, HasPagesForGet) {
+  for (const char* target : {"/api", "/healthz"}) {
+    Head head = Post(target);
+    EXPECT_EQ(Begin(head), 405) << target;
+    head.method = "GET";
+    EXPECT_EQ(Begin(head), 200) << target;
+    head.method = "HEAD";
+    EXPECT_EQ(Begin(head), 200) << target;
+  }
+}
+
+TEST_F(WebApiTest, KnowsNothingElse) {
+  for (const char* target : {"/", "/api/Nfs/v1/set", "/api/Nfs/v2/get", "/api/Smb/v1/get", "/healthz/", "/API"}) {
+    EXPECT_EQ(Begin(Post(target)), 404) << target;
+  }
+}
+
+TEST_F(WebApiTest, TakesJsonOnly) {
+  for (const char* type : {"", "text/plain", "application/x-www-form-urlencoded", "application/jsonx",
+                           "text/plain; x=application/json", "application/json; charset"}) {
+    EXPECT_EQ(Begin(PostJson(type)), 415) << type;
+  }
+}
+
+TEST_F(WebApiTest, RefusesALargeBodyBeforeItComes) {
+  EXPECT_EQ(Begin(PostJson("application/json", JsonBody::kMaxBytes)), 0);
+  EXPECT_EQ(Begin(PostJson("application/json", JsonBody::kMaxBytes + 1)), 413);
+}
+
+TEST_F(WebApiTest, OverTcpOnlyLoopbackNamesAreServed) {
+  Head head = Post("/api/Nfs/v1/get");
+  head.host = "nas.example";
+  EXPECT_EQ(Begin(head), 0) << "a Unix socket has no name";
+  head.over_tcp = true;
+  EXPECT_EQ(Begin(head), 421);
+  head.host = std::nullopt;
+  EXPECT_EQ(Begin(head), 421);
+  head.host = "localhost:8080";
+  EXPECT_EQ(Begin(head), 0);
+}
+
+TEST_F(WebApiTest, PagesOfOtherSitesAreKeptOut) {
+  Head head = Post("/api/Nfs/v1/get");
+  head.origin = "http://localhost:3000";
+  EXPECT_EQ(Begin(head), 0);
+  for (const char* origin : {"http://evil.example", "null", ""}) {
+    head.origin = origin;
+    EXPECT_EQ(Begin(head), 403) << origin;
+  }
+}
+
+}  // namespace
+}  // namespace vorn::server

@@ -36,7 +36,8 @@ int IsPortConflict(const char* service, int first, int last) {
   const std::string port = std::string(service) + " " + std::to_string(first);
   platform.Record("IsPortConflict", port + " " + std::to_string(last));
   const auto& conflicts = platform.port_conflicts;
-  return std::find(conflicts.begin(), conflicts.end(), port) == conflicts.end() ? 0 : 1;
+  const bool is_taken = std::find(conflicts.begin(), conflicts.end(), port) != conflicts.end();
+  return is_taken ? platform.FailureResult("IsPortConflict") : 0;
 }
 
 }  // namespace WebUtils
@@ -67,7 +68,8 @@ int KLIBServiceReload(const char* service) { return ServiceCall("KLIBServiceRelo
 int KLIBCFileGetSectionValue(const char* path, const char* section, const char* key, char* buffer, int size) {
   FakePlatform& platform = FakePlatform::Current();
   const std::string place = std::string(path) + " " + section + " " + key;
-  if (platform.Fails("KLIBCFileGetSectionValue", place) || !platform.has_realm) return -1;
+  if (platform.Fails("KLIBCFileGetSectionValue", place)) return -1;
+  if (!platform.has_realm || platform.realm.size() >= static_cast<size_t>(size)) return platform.Refuse();
   return snprintf(buffer, static_cast<size_t>(size), "%s", platform.realm.c_str());
 }
 
@@ -77,7 +79,7 @@ int KLIBCUnicodeUTF8StrUpper(const char* text, char* buffer, int size) {
   std::string upper = text;
   std::transform(upper.begin(), upper.end(), upper.begin(),
                  [](unsigned char c) { return static_cast<char>(std::toupper(c)); });
-  if (upper.size() >= static_cast<size_t>(size)) return -1;
+  if (upper.size() >= static_cast<size_t>(size)) return platform.Refuse();
   return snprintf(buffer, static_cast<size_t>(size), "%s", upper.c_str());
 }
 

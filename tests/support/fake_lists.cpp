@@ -80,7 +80,7 @@ int KLIBCSzListPush(KLIBSZLIST** list, const char* text) {
   if (FakePlatform::Current().Fails("KLIBCSzListPush", text)) return -1;
   Move(list);
   Append(Real(*list), text);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int KLIBCSzListInsert(KLIBSZLIST** list, int index, const char* text) {
@@ -90,7 +90,7 @@ int KLIBCSzListInsert(KLIBSZLIST** list, int index, const char* text) {
   FakeList* const moved = Real(*list);
   moved->items.insert(moved->items.begin() + index, text);
   moved->count = static_cast<int32_t>(moved->items.size());
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int KLIBCSzListFind(const KLIBSZLIST* list, const char* text) {
@@ -103,7 +103,7 @@ int KLIBCSzListFind(const KLIBSZLIST* list, const char* text) {
 int KLIBCSzListSortItems(KLIBSZLIST* list, int option) {
   FakePlatform::Current().Record("KLIBCSzListSortItems", std::to_string(option));
   std::sort(Real(list)->items.begin(), Real(list)->items.end());
-  return 0;
+  return FakePlatform::kDone;
 }
 
 KLIBSZHASH* KLIBCSzHashAlloc(int capacity) {
@@ -122,7 +122,7 @@ int KLIBCSzHashEnumKey(const KLIBSZHASH* hash, KLIBSZLIST** keys) {
   if (FakePlatform::Current().Fails("KLIBCSzHashEnumKey")) return -1;
   Move(keys);
   for (const auto& pair : Real(hash)->pairs) Append(Real(*keys), pair.first);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 const char* KLIBCSzHashGetValue(const KLIBSZHASH* hash, const char* key) {
@@ -136,7 +136,7 @@ int KLIBCSzHashSetValue(KLIBSZHASH** hash, const char* key, const char* value) {
   if (FakePlatform::Current().Fails("KLIBCSzHashSetValue", arguments)) return -1;
   Move(hash);
   SetPair(Real(*hash), key, value);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int KLIBCSzHashRemoveKey(KLIBSZHASH* hash, const char* key) {
@@ -155,24 +155,24 @@ int VORNNFSStaticMapGet(KLIBSZHASH** hash, const char* filter) {
     const bool matches = filter == nullptr || (principal + '\n' + name).find(filter) != std::string::npos;
     if (matches) SetPair(Real(*hash), principal, name);
   }
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNNFSStaticMapAppend(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
   if (FakePlatform::Current().Fails("VORNNFSStaticMapAppend")) return -1;
   Move(table);
   for (const auto& [principal, name] : Real(pairs)->pairs) SetPair(Real(*table), principal, name);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNNFSStaticMapRemove(KLIBSZHASH* table, const KLIBSZLIST* principals) {
   if (FakePlatform::Current().Fails("VORNNFSStaticMapRemove")) return -1;
-  if (table == nullptr) return 0;
+  if (table == nullptr) return FakePlatform::kDone;
   for (const std::string& principal : Real(principals)->items) {
     const auto found = FindKey(Real(table)->pairs, principal);
     if (found != Real(table)->pairs.end()) Real(table)->pairs.erase(found);
   }
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNUserEnum(KLIBSZLIST** list, int type) {
@@ -180,7 +180,7 @@ int VORNUserEnum(KLIBSZLIST** list, int type) {
   if (platform.Fails("VORNUserEnum", std::to_string(type))) return -1;
   Move(list);
   for (const std::string& user : platform.users) Append(Real(*list), user);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int flags) {
@@ -194,6 +194,6 @@ int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int
   for (const std::string& user : platform.users) {
     if (user.find(lower) != std::string::npos) Append(Real(*list), user);
   }
-  return 0;
+  return FakePlatform::kDone;
 }
 }

@@ -34,7 +34,7 @@ ExportRuleList* CopyRules(const std::string& path, const std::vector<ExportRule>
 
 int Answered(const char* operation, const std::string& arguments) {
   FakePlatform& platform = FakePlatform::Current();
-  return platform.Fails(operation, arguments) ? platform.FailureResult(operation) : 0;
+  return platform.Fails(operation, arguments) ? platform.FailureResult(operation) : FakePlatform::kDone;
 }
 
 }  // namespace
@@ -45,14 +45,14 @@ int VORNNFSConfGet(NFSConfRecord* record) {
   FakePlatform& platform = FakePlatform::Current();
   if (platform.Fails("VORNNFSConfGet")) return -1;
   *record = platform.record;
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNNFSConfSet(const NFSConfRecord* record) {
   FakePlatform& platform = FakePlatform::Current();
   if (platform.Fails("VORNNFSConfSet")) return -1;
   platform.record = *record;
-  return 0;
+  return FakePlatform::kDone;
 }
 
 int VORNNFSUDPPrefSizeSet(int read_size, int write_size) {
@@ -79,7 +79,7 @@ int VORNNFSIDMapSet(const char* path, const _tag_nfs_id_map_* record) {
   if (platform.Fails("VORNNFSIDMapSet", path)) return -1;
   platform.domain = record->domain == nullptr ? "" : record->domain;
   platform.mappings = PairsOf(record->table);
-  return 0;
+  return FakePlatform::kDone;
 }
 
 void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
@@ -143,7 +143,7 @@ int VORNNFSRuleExtSetAll(const char* path, const ExportRuleList* list) {
   for (const ExportRule* rule = list == nullptr ? nullptr : list->first; rule != nullptr; rule = rule->next) {
     platform.rules.push_back(*rule);
   }
-  return 0;
+  return FakePlatform::kDone;
 }
 
 void VORNNFSRuleExtFree(ExportRuleList* list) {
@@ -168,7 +168,7 @@ int VORNShareGet(const char* name, VORNSHARE** share) {
   if (found == platform.shares.end()) return -1;
   *share = new VORNSHARE{found->second};
   platform.Born("VORNSHARE");
-  return 0;
+  return FakePlatform::kDone;
 }
 
 void VORNShareFree(VORNSHARE* share) {

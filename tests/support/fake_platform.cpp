@@ -6,6 +6,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 #include <stdexcept>
 
@@ -40,6 +41,12 @@ void Log(int priority, const char* format, va_list arguments) {
   if (g_current != nullptr) g_current->log.push_back(TakeApart(priority, format, text));
 }
 
+bool IsRelease(const std::string& operation) {
+  constexpr char kEnding[] = "Free";
+  const size_t ending = operation.rfind(kEnding);
+  return operation[0] == '~' || (ending != std::string::npos && ending + std::strlen(kEnding) == operation.size());
+}
+
 }  // namespace
 
 FakePlatform::FakePlatform() : previous_(g_current) { g_current = this; }
@@ -57,10 +64,17 @@ std::vector<std::string> FakePlatform::LogTexts() const {
   return texts;
 }
 
+std::vector<std::string> FakePlatform::CallsAfterFailure() const {
+  return {calls.begin() + static_cast<std::ptrdiff_t>(failed_after_), calls.end()};
+}
+
 void FakePlatform::Record(const std::string& operation, const std::string& arguments) {
   calls.push_back(arguments.empty() ? operation : operation + " " + arguments);
   last_error_ = kNoFailure;
-  if (throwing_ == operation) throw std::runtime_error("thrown on demand");
+  const bool throws = !IsRelease(operation) && ++calls_that_can_throw_ == throw_at_;
+  if (!throws && throwing_ != operation) return;
+  failed_after_ = calls.size();
+  throw std::runtime_error("thrown on demand");
 }
 
 bool FakePlatform::Fails(const std::string& operation, const std::string& arguments) {
@@ -73,8 +87,14 @@ bool FakePlatform::Fails(const std::string& operation, const std::string& argume
   if (fails) {
     last_error_ = kReason;
     failed_calls.push_back(calls.back());
+    failed_after_ = calls.size();
   }
   return fails;
+}
+
+int FakePlatform::Refuse() {
+  last_error_ = kReason;
+  return -1;
 }
 
 int FakePlatform::FailureResult(const std::string& operation) const {

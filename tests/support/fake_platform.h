@@ -61,6 +61,8 @@ class FakePlatform {
   std::vector<LogLine> log;
   std::vector<std::string> failed_calls;  // the calls that failed on demand
   std::vector<std::string> LogTexts() const;
+  // What was called after the last call that failed or threw on demand.
+  std::vector<std::string> CallsAfterFailure() const;
 
   // ---- what is still held
   std::map<std::string, int> live_objects;  // by kind; a kind of which none lives is not there
@@ -74,6 +76,8 @@ class FakePlatform {
   void FailWith(const std::string& operation, int result) { failure_results_[operation] = result; }
   // `operation` throws std::runtime_error("thrown on demand").
   void Throw(const std::string& operation) { throwing_ = operation; }
+  // The n-th call (from 1) does, releases left out: those must not.
+  void ThrowCall(int n) { throw_at_ = n; }
 
   // ---- for the operations' bodies
   void Record(const std::string& operation, const std::string& arguments = "");
@@ -82,12 +86,17 @@ class FakePlatform {
   int FailureResult(const std::string& operation) const;
   void Born(const std::string& kind) { ++live_objects[kind]; }
   void Died(const std::string& kind);
+  // The failing result of an operation that what the box holds makes fail.
+  int Refuse();
   int last_error() const { return last_error_; }
 
  private:
   FakePlatform* const previous_;
   int fail_at_ = 0;
   int calls_that_can_fail_ = 0;
+  int throw_at_ = 0;
+  int calls_that_can_throw_ = 0;
+  size_t failed_after_ = 0;  // calls made when the last one failed on demand, itself included
   int last_error_ = kNoFailure;
   std::map<std::string, int> failing_;
   std::map<std::string, int> counts_;
@@ -99,6 +108,9 @@ class FakePlatform {
   // reason too late prints the wrong one.
   static constexpr int kReason = 0x0AB;
   static constexpr int kNoFailure = 0xDEAD;
+
+  // What an operation answers on success where every non-negative number says so.
+  static constexpr int kDone = 3;
 };
 
 // One answer of the module to one request.

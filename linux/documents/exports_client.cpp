@@ -1,0 +1,176 @@
+#include "exports_client.h"
+
+#include <arpa/inet.h>
+#include <netinet/in.h>
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <optional>
+
+#include "exports_text.h"
+
+namespace vorn {
+namespace {
+
+constexpr std::size_t kLongestName = 253;  // RFC 1035, without the final dot
+constexpr std::size_t kLongestLabel = 63;
+// rpc.mountd(8) reads the table that exportfs(8) writes, where every option is spelled out, and stops
+// at a client that exceeds kLongestExportClient there.
+constexpr std::size_t kLongestClient = kLongestName + 1;
+
+bool IsDigit(char c) { return c >= '0' && c <= '9'; }
+bool IsLetter(char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z'); }
+// The underscore is no host name's by RFC 1123, but common.
+bool IsNameCharacter(char c) { return IsLetter(c) || IsDigit(c) || c == '-' || c == '_'; }
+
+Status Refuse(std::string_view client, const std::string& why) {
+  return Status::Failure(kRefusedText, "export client \"" + std::string(client) + "\": " + why);
+}
+
+struct Address {
+  int family = AF_UNSPEC;
+  std::array<std::uint8_t, 16> bytes{};
+
+  int bits() const { return family == AF_INET ? 32 : 128; }
+};
+
+std::optional<Address> ReadAddress(std::string_view text) {
+  const std::string address_text(text);
+  if (text.find('\0') != std::string_view::npos) return std::nullopt;
+  for (const int family : {AF_INET, AF_INET6}) {
+    Address address;
+    address.family = family;
+    if (inet_pton(family, address_text.c_str(), address.bytes.data()) == 1) return address;
+  }
+  return std::nullopt;
+}
+
+// The length of a prefix given as a number, or as a mask without gaps.
+std::optional<int> ReadPrefixLength(std::string_view text, const Address& network) {
+  if (const auto mask = ReadAddress(text)) {
+    int length = 0;
+    while (length < network.bits() && (mask->bytes[length / 8] & (0x80 >> (length % 8))) != 0) ++length;
+    int ones = 0;
+    for (const std::uint8_t byte : mask->bytes) ones += __builtin_popcount(byte);
+    return mask->family == network.family && ones == length ? std::optional(length) : std::nullopt;
+  }
+  const bool number = !text.empty() && text.size() <= 3 && std::all_of(text.begin(), text.end(), IsDigit);
+  if (!number || (text.size() > 1 && text[0] == '0')) return std::nullopt;
+  const int length = std::stoi(std::string(text));
+  return length <= network.bits() ? std::optional(length) : std::nullopt;
+}
+
+Status CheckNetwork(std::string_view client) {
+  const std::size_t slash = client.find('/');
+  const auto network = ReadAddress(client.substr(0, slash));
+  if (!network) return Refuse(client, "what stands before \"/\" is no address");
+  if (!ReadPrefixLength(client.substr(slash + 1), *network)) {
+    return Refuse(client, "what follows \"/\" is no prefix length and no mask of this network");
+  }
+  return {};
+}
+
+Status CheckNetgroup(std::string_view client) {
+  const auto allowed = [](char c) { return IsNameCharacter(c) || c == '.' || c == '+'; };
+  if (client.size() < 2 || !std::all_of(client.begin() + 1, client.end(), allowed)) {
+    return Refuse(client, "no name of a netgroup");
+  }
+  return {};
+}
+
+// The length of a set of characters, "[a-z0]", at the beginning of `text`; 0 when it is none.
+std::size_t SetLength(std::string_view text) {
+  std::size_t at = 1;
+  if (at < text.size() && (text[at] == '!' || text[at] == '^')) ++at;
+  const std::size_t first = at;
+  while (at < text.size() && (IsNameCharacter(text[at]) || text[at] == '.')) ++at;
+  return at > first && at < text.size() && text[at] == ']' ? at + 1 : 0;
+}
+
+Status CheckPattern(std::string_view client) {
+  for (std::size_t at = 0; at < client.size(); ++at) {
+    const char c = client[at];
+    if (IsNameCharacter(c) || c == '.' || c == '*' || c == '?') continue;
+    const std::size_t length = c == '[' ? SetLength(client.substr(at)) : 0;
+    if (length == 0) return Refuse(client, c == '[' ? "a bracket without its partner" : "no pattern of host names");
+    at += length - 1;
+  }
+  return {};
+}
+
+Status CheckHostName(std::string_view client) {
+  std::string_view name = client;
+  if (name.size() > 1 && name.back() == '.') name.remove_suffix(1);
+  if (name.size() > kLongestName) return Refuse(client, "too long");
+  std::string_view label;
+  for (std::size_t begin = 0; begin <= name.size(); begin += label.size() + 1) {
+    label = name.substr(begin, name.find('.', begin) - begin);
+    const bool outer_hyphen = !label.empty() && (label.front() == '-' || label.back() == '-');
+    if (label.empty() || label.size() > kLongestLabel || outer_hyphen ||
+        !std::all_of(label.begin(), label.end(), IsNameCharacter)) {
+      return Refuse(client, "neither a host name nor an address");
+    }
+  }
+  in_addr address{};
+  const bool like_address = std::all_of(label.begin(), label.end(), IsDigit);
+  if (like_address || inet_aton(std::string(client).c_str(), &address) != 0) {
+    return Refuse(client, "not a whole address");
+  }
+  return {};
+}
+
+bool IsPattern(std::string_view client) { return client.find_first_of("*?[") != std::string_view::npos; }
+
+std::string LowerCase(std::string_view text) {
+  std::string lower(text);
+  for (char& c : lower) c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+  return lower;
+}
+
+std::string AddressText(const Address& address) {
+  std::array<char, INET6_ADDRSTRLEN> text{};
+  return inet_ntop(address.family, address.bytes.data(), text.data(), text.size());
+}
+
+}  // namespace
+
+Status CheckExportClient(std::string_view client) {
+  if (client.empty()) return Refuse(client, "an empty client would admit everybody; \"*\" says so");
+  if (client.size() > kLongestClient) return Refuse(client.substr(0, 40), "too long");
+  if (client.front() == '@') return CheckNetgroup(client);
+  if (client.substr(0, 4) == "gss/") return Refuse(client, "obsolete; name the security flavours instead");
+  if (client.find('/') != std::string_view::npos) return CheckNetwork(client);
+  if (ReadAddress(client)) return {};
+  // A word that begins with a hyphen is no client but the defaults for those that follow.
+  if (client.front() == '-') return Refuse(client, "begins with a hyphen");
+  return IsPattern(client) ? CheckPattern(client) : CheckHostName(client);
+}
+
+std::string ExportClientKey(std::string_view client) {
+  const std::size_t slash = std::min(client.find('/'), client.size());
+  const auto address = ReadAddress(client.substr(0, slash));
+  if (!address) return LowerCase(client);
+  return AddressText(*address) + LowerCase(client.substr(slash));
+}
+
+std::string ExportNetworkKey(std::string_view client) {
+  const std::size_t slash = client.find('/');
+  auto address = ReadAddress(client.substr(0, slash));
+  if (!address) return LowerCase(client);
+  const auto length =
+      slash == std::string_view::npos ? address->bits() : ReadPrefixLength(client.substr(slash + 1), *address);
+  if (!length) return LowerCase(client);
+  for (int bit = *length; bit < address->bits(); ++bit) {
+    auto& byte = address->bytes[static_cast<std::size_t>(bit / 8)];
+    byte = static_cast<std::uint8_t>(byte & ~(0x80 >> (bit % 8)));
+  }
+  return AddressText(*address) + "/" + std::to_string(*length);
+}
+
+bool IsExportHostName(std::string_view client) {
+  return !client.empty() && client.front() != '@' && client.find('/') == std::string_view::npos && !IsPattern(client) &&
+         !ReadAddress(client);
+}
+
+}  // namespace vorn

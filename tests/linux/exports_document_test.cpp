@@ -1,0 +1,338 @@
+#include "exports_document.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <map>
+#include <random>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "exportfs_judge.h"
+#include "exports_client.h"
+
+namespace vorn {
+namespace {
+
+using std::string_literals::operator""s;
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+// What is exported to whom, and how: as far as exportfs(8) gets.
+using Table = std::map<std::pair<std::string, std::string>, std::string>;
+
+Table TableOf(const std::string& text) {
+  Table table;
+  for (const ExportLine& line : ExportsDocument(text).Lines()) {
+    for (ExportEntry entry : line.entries) {
+      // Whom the resolver does not know has no place in the table.
+      if (!CheckExportClient(entry.client).ok()) continue;
+      entry.options.others.clear();
+      table.insert({{line.path, ExportClientKey(entry.client)}, entry.options.Text()});
+    }
+    if (!line.fault.empty()) break;
+  }
+  return table;
+}
+
+std::vector<std::string> Clients(const ExportsDocument& document, const std::string& path) {
+  std::vector<std::string> clients;
+  for (const ExportEntry& entry : document.Entries(path)) clients.push_back(entry.client);
+  return clients;
+}
+
+ExportEntry Entry(const std::string& client, const std::string& options) {
+  ExportOptionReader reader;
+  EXPECT_TRUE(reader.Apply(options).ok()) << options;
+  return {client, reader.Options(), {}};
+}
+
+// The last line shows whether exportfs has read that far.
+const std::string kLast = "\n/last 10.9.9.9(rw)\n";
+
+const std::vector<std::string> kHosts = {"alpha", "beta.example", "gamma"};
+
+const std::vector<std::string> kFiles = {
+    "",
+    "\n\n# nothing\n",
+    "/a alpha(rw)" + kLast,
+    "/a alpha" + kLast,
+    "/a" + kLast,
+    "/a -rw" + kLast,
+    "/a -" + kLast,
+    "/a -sec=krb5,rw alpha(ro) gamma(sec=sys) beta.example -all_squash 10.0.0.4(async)" + kLast,
+    "/a alpha(ro) -rw" + kLast,
+    "/a alpha(sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i)" + kLast,
+    "/a (ro)" + kLast,
+    "/a alpha (rw)" + kLast,
+    "/a -rw alpha (ro) gamma(async) " + kLast,
+    "/a/ alpha(rw)\n//a gamma(ro)\n/a/./ *" + kLast,
+    "\"/a b\" alpha(rw)" + kLast,
+    "/a\\040b alpha(rw)" + kLast,
+    "/a\" \"b alpha(rw)" + kLast,
+    "/\\101\\134\\061 alpha(rw)" + kLast,
+    "/\\134101 alpha(rw)" + kLast,
+    "/a\\134\\061 alpha(rw)" + kLast,
+    "/ha#sh alpha(rw) # comment" + kLast,
+    "/a alpha(rw)#comment" + kLast,
+    "/a alpha(rw) # comment \\\n/b gamma(rw)" + kLast,
+    "/a \\\n alpha(rw) \\\n\tgamma(ro)" + kLast,
+    "/a alpha(rw,\\\n no_wdelay)" + kLast,
+    "/a\\\nalpha(rw)" + kLast,
+    "\\\n/a alpha(rw)" + kLast,
+    "# c \\\n/a alpha(rw)" + kLast,
+    "/a alpha(rw) \\\n# gamma" + kLast,
+    "/a \\\n" + kLast,
+    "   /a alpha(rw)\n\t/b alpha(rw)" + kLast,
+    "/a alpha(rw" + kLast,
+    "/a gamma(ro) alpha(rw)x" + kLast,
+    "/a alpha(rw)(ro)" + kLast,
+    "/a alpha(rw),gamma(rw)" + kLast,
+    "/a \"alpha(rw\n,async)\"" + kLast,
+    "/a alpha(rw, async)" + kLast,
+    "/a \"alpha( rw,async)\"" + kLast,
+    "/a alpha\"(rw)\"" + kLast,
+    "/a \"alpha\"(rw)" + kLast,
+    "/a -\"rw,async\" alpha" + kLast,
+    "/a alpha(\\162w)" + kLast,
+    "/a alpha\\050rw)" + kLast,
+    "/a gamma alpha(foo)" + kLast,
+    "/a -foo alpha" + kLast,
+    "/a alpha(sec=foo)" + kLast,
+    "/a alpha(fsid=x)" + kLast,
+    "/a alpha(rw)\r\n# dos\r" + kLast,
+    "/a alpha(rw) \r" + kLast,
+    "/a alpha(rw)\f10.0.0.2(rw)" + kLast,
+    "/a\v10.0.0.1(rw) 10.0.0.3" + kLast,
+    "\f/a alpha(rw)" + kLast,
+    "/a alpha(rw)\n\r" + kLast,
+    "\"\" alpha(rw)" + kLast,
+    "/a \"\" alpha(rw)" + kLast,
+    "/a alpha(rw)\0gamma(ro)"s + kLast,
+    "\0/a alpha(rw)"s + kLast,
+    "/a \"alpha(rw)\0x\""s + kLast,
+    "/a alpha(rw)",
+    "/a alpha(rw) alpha(ro) ALPHA(async)\n/a alpha(all_squash)" + kLast,
+    "/a 2001:db8::1(rw) 2001:0db8::1(ro) 10.0.0.1(rw) 10.0.0.1/32(ro)" + kLast,
+    "/a *(rw) (ro)" + kLast,
+    "\"/a alpha(rw)" + kLast,
+    "\"/a\nb\" alpha(rw)" + kLast,
+    "\"/a alpha(rw)\n\"/b alpha(rw)" + kLast,
+    "\"/a alpha(rw)\n" + std::string(1100, '#') + kLast,
+    "/a " + std::string(250, '*') + "(rw)" + kLast,
+    "/a " + std::string(509, '*') + "(rw)" + kLast,
+    "/" + std::string(1023, 'a') + " alpha" + kLast,
+    "/" + std::string(1024, 'a') + " alpha" + kLast,
+    "relative alpha" + kLast,
+    "/ alpha(rw)" + kLast,
+};
+
+TEST(ExportsDocument, ReadsEveryFileAsExportfsDoes) {
+  const ExportfsJudge judge;
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  const auto verdicts = judge.Judge(kFiles, kHosts);
+  for (std::size_t i = 0; i < kFiles.size(); ++i) {
+    EXPECT_EQ(TableOf(kFiles[i]), TableOf(verdicts[i].table)) << kFiles[i] << verdicts[i].messages;
+  }
+}
+
+// Files of random words, most of them right.
+class FileMaker {
+ public:
+  explicit FileMaker(unsigned seed) : random_(seed) {}
+
+  std::string Make() {
+    std::string file;
+    for (int lines = Up(8); lines >= 0; --lines) file += Line();
+    return file;
+  }
+
+  template <typename List>
+  std::string Any(const List& list) {
+    return *(std::begin(list) + Up(static_cast<int>(std::size(list)) - 1));
+  }
+
+ private:
+  int Up(int most) { return std::uniform_int_distribution<int>(0, most)(random_); }
+  bool Seldom() { return Up(60) == 0; }
+
+  std::string Line() {
+    static const char* const kPlain[] = {"\n", "# comment\n", "  # c \\\n", "\t\n", "\\\n"};
+    if (Up(4) == 0) return Any(kPlain);
+    static const char* const kPaths[] = {"/mnt/a",       "/mnt/b",           "/mnt/a/", "\"/mnt/a b\"",
+                                         "/mnt/a\\040b", "/mnt/b\\043\" \"", "//mnt/b", "  /mnt/c"};
+    std::string line = Any(kPaths);
+    for (int words = Up(4); words > 0; --words) line += Blank() + Word();
+    static const char* const kEnds[] = {"\n", " \n", " # end\n", " \\\n\n", "\r\n"};
+    return line + Any(kEnds);
+  }
+
+  std::string Blank() { return Up(5) != 0 ? " " : Up(1) != 0 ? " \\\n\t" : "\t "; }
+
+  std::string Word() {
+    static const char* const kFaults[] = {"alpha(rw", "\"", "gamma(foo)", "alpha(rw)x", "-bar", "\\"};
+    if (Seldom()) return Any(kFaults);
+    static const char* const kClients[] = {"alpha", "beta.example", "*", "10.0.0.0/8", "@group", "*.ex[a-m]ple", "::1"};
+    if (Up(6) == 0) return "-" + Options();
+    return Any(kClients) + (Up(4) != 0 ? "(" + Options() + ")" : "");
+  }
+
+  std::string Options() {
+    static const char* const kOptions[] = {"rw",       "ro",        "async",     "no_root_squash", "all_squash",
+                                           "sec=krb5", "sec=sys",   "insecure",  "sec=krb5i:krb5", "crossmnt",
+                                           "fsid=5",   "no_wdelay", "anonuid=7", "subtree_check",  "no_all_squash"};
+    std::string options = Any(kOptions);
+    for (int more = Up(3); more > 0; --more) options += "," + Any(kOptions);
+    return options;
+  }
+
+  std::mt19937 random_;
+};
+
+TEST(ExportsDocument, ReadsRandomFilesAsExportfsDoes) {
+  const ExportfsJudge judge;
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  std::vector<std::string> files;
+  for (unsigned seed = 0; seed < 200; ++seed) files.push_back(FileMaker(seed).Make());
+  const auto verdicts = judge.Judge(files, kHosts);
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    EXPECT_EQ(TableOf(files[i]), TableOf(verdicts[i].table)) << "seed " << i << ":\n"
+                                                             << files[i] << verdicts[i].messages;
+  }
+}
+
+// Rewriting one path keeps every other line, and what exportfs makes of it.
+TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
+  const ExportfsJudge judge;
+  std::vector<std::string> edited;
+  for (unsigned seed = 0; seed < 200; ++seed) {
+    FileMaker maker(seed);
+    ExportsDocument document(maker.Make());
+    const std::string before = document.text();
+    std::vector<ExportEntry> entries = document.Entries("/mnt/b");
+    entries.push_back(Entry("fresh-" + std::to_string(seed), "rw,sec=krb5:sys,anonuid=5"));
+    if (!document.Replace("/mnt/b", entries).ok()) {
+      EXPECT_EQ(document.text(), before) << "seed " << seed;
+      continue;
+    }
+    ExportsDocument again(document.text());
+    ASSERT_TRUE(again.Replace("/mnt/b", again.Entries("/mnt/b")).ok()) << "seed " << seed;
+    EXPECT_EQ(again.text(), document.text()) << "seed " << seed;
+    ASSERT_TRUE(again.Replace("/mnt/b", {}).ok()) << "seed " << seed;
+    EXPECT_THAT(again.Entries("/mnt/b"), testing::IsEmpty()) << "seed " << seed;
+    edited.push_back(document.text());
+  }
+  EXPECT_GT(edited.size(), 150U);
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  const auto verdicts = judge.Judge(edited, kHosts);
+  for (std::size_t i = 0; i < edited.size(); ++i) {
+    Table ours = TableOf(edited[i]);
+    for (auto entry = ours.begin(); entry != ours.end();) {
+      const bool unknown_host = entry->first.second.rfind("fresh-", 0) == 0;
+      entry = unknown_host ? ours.erase(entry) : std::next(entry);
+    }
+    EXPECT_EQ(ours, TableOf(verdicts[i].table)) << edited[i] << verdicts[i].messages;
+  }
+}
+
+TEST(ExportsDocument, FindsTheClientsOfAPathInAllItsLines) {
+  const ExportsDocument document("/a b(rw)\n/b x\n\"/a\" c d # more\n/a/ e b(ro)\n/a/c y\n");
+  EXPECT_THAT(Clients(document, "/a"), ElementsAre("b", "c", "d", "e"));
+  EXPECT_FALSE(document.Entries("/a").front().options.flavors.front().access.read_only);
+  EXPECT_THAT(Clients(document, "/a/"), ElementsAre("b", "c", "d", "e"));
+  EXPECT_THAT(Clients(document, "/"), ElementsAre());
+}
+
+struct EditCase {
+  const char* name;
+  std::string before;
+  std::vector<ExportEntry> entries;  // of "/a"
+  std::string after;
+};
+
+TEST(ExportsDocument, ReplacesTheLinesOfAPathByOne) {
+  const std::vector<ExportEntry> one = {Entry("h", "rw")};
+  const std::string line = "/a h(rw,sync,root_squash,sec=sys)\n";
+  const EditCase cases[] = {
+      {"empty file", "", one, line},
+      {"new line at the end", "# c\n/b x\n", one, "# c\n/b x\n" + line},
+      {"no line break at the end", "/b x", one, "/b x\n" + line},
+      {"comment without a line break", "/b x # c", one, "/b x # c\n" + line},
+      {"comment that ends in a backslash", "# c \\\n", one, "# c \\\n\n" + line},
+      {"continued to nothing", "/b x \\\n", one, "/b x \\\n\n" + line},
+      {"in its place", "/b x\n/a y(ro)\n/c z\n", one, "/b x\n" + line + "/c z\n"},
+      {"comment kept", "/a y(ro)   # mine\n/c z\n", one, "/a h(rw,sync,root_squash,sec=sys) # mine\n/c z\n"},
+      {"several lines become one", "/a x\n/b y\n/a z # gone\n# stays\n", one, line + "/b y\n# stays\n"},
+      {"spelling of the path kept", "  \"/a\"\tx\n", one, "  \"/a\" h(rw,sync,root_squash,sec=sys)\n"},
+      {"continuations go", "/a \\\n x \\\n y\n/b z\n", one, line + "/b z\n"},
+      {"no entries, no line", "/b x\n/a y # c\n/c z\n", {}, "/b x\n/c z\n"},
+      {"no entries and no line", "/b x\n", {}, "/b x\n"},
+      {"faulty line of its own", "/a x(foo)\n/b y\n", one, line + "/b y\n"},
+      {"faulty lines of others", "/b x(foo)\n/a y\n/c z(\n", one, "/b x(foo)\n" + line + "/c z(\n"},
+  };
+  for (const EditCase& c : cases) {
+    ExportsDocument document(c.before);
+    const Status status = document.Replace("/a", c.entries);
+    EXPECT_TRUE(status.ok()) << c.name << ": " << status.reason();
+    EXPECT_EQ(document.text(), c.after) << c.name;
+  }
+}
+
+TEST(ExportsDocument, KeepsTheWordsOfEntriesThatStay) {
+  ExportsDocument document("/a \"b\"(rw,async) -no_wdelay c\n");
+  ASSERT_TRUE(document.Replace("/a", document.Entries("/a")).ok());
+  EXPECT_EQ(document.text(), "/a \"b\"(rw,async) c(ro,sync,no_wdelay,root_squash,sec=sys)\n");
+}
+
+TEST(ExportsDocument, EscapesWhatThePathNeeds) {
+  ExportsDocument document("");
+  for (const char* path : {"/a b", "/new\nline", "/qu\"ote", "/back\\101slash", "/#"}) {
+    ASSERT_TRUE(document.Replace(path, {Entry("h", "")}).ok()) << path;
+    EXPECT_THAT(Clients(document, path), ElementsAre("h")) << path;
+  }
+}
+
+TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
+  const std::string before = "/b x\n";
+  const std::vector<ExportEntry> refused[] = {{Entry("a(rw) b", "")},
+                                              {Entry("", "")},
+                                              {Entry("-x", "")},
+                                              {Entry("h", ""), Entry("H", "rw")},
+                                              {Entry(std::string(510, 'x'), "")},
+                                              {{"h", {}, "h(rw)"}},
+                                              {{"h", {}, "h(ro) # "}, Entry("i", "")},
+                                              {{"h", {}, "h(ro)\n/b z"}}};
+  for (const auto& entries : refused) {
+    ExportsDocument document(before);
+    EXPECT_EQ(document.Replace("/a", entries).code(), kRefusedText) << entries.front().client;
+    EXPECT_EQ(document.text(), before) << entries.front().client;
+  }
+}
+
+TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
+  ExportsDocument document("\"/b x\n");
+  EXPECT_EQ(document.Replace("/a", {Entry("h", "")}).code(), kRefusedText);
+}
+
+TEST(ExportsDocument, TellsWhereExportfsGivesUpAndWhy) {
+  const ExportsDocument document("# c\n/a x \\\n y\n/b z(rw,foo) w\n/c v\n");
+  const auto lines = document.Lines();
+  ASSERT_EQ(lines.size(), 3U);
+  EXPECT_EQ(lines[0].fault, "");
+  EXPECT_THAT(lines[1].fault, HasSubstr("\"foo\""));
+  EXPECT_EQ(document.LineNumber(lines[1].span.begin), 4U);
+  EXPECT_EQ(lines[2].path, "/c");
+}
+
+TEST(ExportsDocument, HoldsTenThousandPathsInLinearTime) {
+  std::string text;
+  for (int i = 0; i < 10000; ++i) text += "/volume1/share" + std::to_string(i) + " 10.0.0.1(rw) 10.0.0.2(ro)\n";
+  ExportsDocument document(text);
+  EXPECT_EQ(document.Lines().size(), 10000U);
+  ASSERT_TRUE(document.Replace("/volume1/share5000", {}).ok());
+  EXPECT_EQ(document.Lines().size(), 9999U);
+}
+
+}  // namespace
+}  // namespace vorn

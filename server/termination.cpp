@@ -1,22 +1,19 @@
 #include "termination.h"
 
-#include <sys/eventfd.h>
-#include <unistd.h>
+#include <semaphore.h>
 
 #include <cerrno>
 #include <csignal>
-#include <cstdint>
 #include <cstring>
 
 namespace vorn::server {
 namespace {
 
-int event_fd = -1;  // the only thing that a signal handler can tell a thread through
+sem_t terminated;  // one of the few things that a signal handler may touch
 
 void OnSignal(int /*number*/) {
   const int saved = errno;
-  const std::uint64_t one = 1;
-  static_cast<void>(!write(event_fd, &one, sizeof one));
+  sem_post(&terminated);
   errno = saved;
 }
 
@@ -30,15 +27,16 @@ bool Handle(int number, void (*handler)(int)) {
 }  // namespace
 
 bool CatchTermination(std::string* error) {
-  event_fd = eventfd(0, EFD_CLOEXEC);
-  if (event_fd >= 0 && Handle(SIGTERM, OnSignal) && Handle(SIGINT, OnSignal) && Handle(SIGPIPE, SIG_IGN)) return true;
+  if (sem_init(&terminated, 0, 0) == 0 && Handle(SIGTERM, OnSignal) && Handle(SIGINT, OnSignal) &&
+      Handle(SIGPIPE, SIG_IGN)) {
+    return true;
+  }
   *error = std::string("signals: ") + std::strerror(errno);
   return false;
 }
 
 void WaitForTermination() {
-  std::uint64_t count = 0;
-  while (read(event_fd, &count, sizeof count) < 0 && errno == EINTR) {
+  while (sem_wait(&terminated) != 0 && errno == EINTR) {
   }
 }
 

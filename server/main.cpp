@@ -21,6 +21,7 @@
 #include "routes.h"
 #include "runtime_folder.h"
 #include "termination.h"
+#include "upload.h"
 #include "web_api.h"
 #include "worker_pool.h"
 
@@ -72,7 +73,9 @@ std::optional<std::vector<Listener>> Listen(const Options& options, const Runtim
 int Serve(const Options& options) {
   std::string error;
   const std::optional<RuntimeFolder> folder = RuntimeFolder::Claim(options.root, &error);
-  if (!folder || !CatchTermination(&error)) {
+  std::optional<UploadFolder> uploads;
+  if (folder) uploads = UploadFolder::Open(folder->path() + "/uploads", &error);
+  if (!uploads || !CatchTermination(&error)) {
     syslog(LOG_ERR, "%s", error.c_str());
     return EXIT_FAILURE;
   }
@@ -87,7 +90,7 @@ int Serve(const Options& options) {
 
   const Routes routes(modules);
   WorkerPool pool(WorkerPool::Limits{});
-  WebApi api(routes, pool);
+  WebApi api(routes, *uploads, pool);
   HttpServer server(api, std::move(*listeners));
   Notify("READY=1");
   WaitForTermination();

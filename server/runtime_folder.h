@@ -1,4 +1,4 @@
-// ROOT/run/vorn, the folder that the server keeps its socket in.
+// ROOT/run/vorn, the folder that the server keeps its socket and its uploads in.
 #ifndef VORN_SERVER_RUNTIME_FOLDER_H
 #define VORN_SERVER_RUNTIME_FOLDER_H
 

@@ -7,7 +7,9 @@
 #include "body.h"
 #include "browser_guard.h"
 #include "call.h"
+#include "form_body.h"
 #include "header_value.h"
+#include "multipart.h"
 
 namespace vorn::server {
 namespace {
@@ -30,19 +32,33 @@ Response MethodNotAllowed(std::string_view path, const std::string& allowed) {
   return response;
 }
 
-NewBody OpenBody(const Head& head) {
-  if (!head.has_body) return std::make_unique<JsonBody>();
-  const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
-  if (!type || type->value != "application/json") {
-    return Refusal(415, "Parameters are sent as application/json, not as \"" + std::string(head.content_type) + "\".");
-  }
+NewBody OpenJson(const Head& head) {
   if (head.content_length > JsonBody::kMaxBytes) return JsonBody::TooLarge();
   return std::make_unique<JsonBody>();
 }
 
+NewBody OpenForm(const Head& head, const HeaderValue& type, const UploadFolder& uploads) {
+  const auto boundary = type.parameters.find("boundary");
+  if (boundary == type.parameters.end() || !MultipartParser::IsBoundary(boundary->second)) {
+    return Refusal(400, "The Content-Type of the form names no proper boundary.");
+  }
+  if (head.content_length > FormBody::kMaxBytes) return FormBody::TooLarge();
+  return std::make_unique<FormBody>(boundary->second, uploads);
+}
+
+NewBody OpenBody(const Head& head, const UploadFolder& uploads) {
+  if (!head.has_body) return std::make_unique<JsonBody>();
+  const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
+  if (type && type->value == "application/json") return OpenJson(head);
+  if (type && type->value == "multipart/form-data") return OpenForm(head, *type, uploads);
+  return Refusal(415, "Parameters are sent as application/json, files as multipart/form-data; not as \"" +
+                          std::string(head.content_type) + "\".");
+}
+
 }  // namespace
 
-WebApi::WebApi(const Routes& routes, WorkerPool& pool) : routes_(routes), pool_(pool) {}
+WebApi::WebApi(const Routes& routes, const UploadFolder& uploads, WorkerPool& pool)
+    : routes_(routes), uploads_(uploads), pool_(pool) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepStrangersOut(head)) return *std::move(refusal);
@@ -51,7 +67,7 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
   const Route* route = routes_.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
   if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
-  NewBody body = OpenBody(head);
+  NewBody body = OpenBody(head, uploads_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
   return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), pool_);
 }

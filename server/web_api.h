@@ -9,14 +9,15 @@
 
 #include "http.h"
 #include "routes.h"
+#include "upload.h"
 #include "worker_pool.h"
 
 namespace vorn::server {
 
 class WebApi : public Service {
  public:
-  // Routes and pool must outlive this.
-  WebApi(const Routes& routes, WorkerPool& pool);
+  // All must outlive this.
+  WebApi(const Routes& routes, const UploadFolder& uploads, WorkerPool& pool);
 
   std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
 
@@ -24,6 +25,7 @@ class WebApi : public Service {
   std::optional<Response> AnswerPage(const Head& head) const;
 
   const Routes& routes_;
+  const UploadFolder& uploads_;
   WorkerPool& pool_;
 };
 

@@ -80,9 +80,9 @@ TEST_F(Calls, AreListed) {
   Connection client = server_.ConnectTcp();
   client.Send(Get("/api"));
   const Json::Value data = client.Receive().Envelope()["data"];
-  ASSERT_EQ(data.size(), 9U);
-  EXPECT_EQ(data[8]["api"], "Test.Echo");
-  EXPECT_EQ(data[8]["version"], 2);
+  ASSERT_EQ(data.size(), 10U);
+  EXPECT_EQ(data[9]["api"], "Test.Echo");
+  EXPECT_EQ(data[9]["version"], 2);
   client.Send(Get("/healthz"));
   EXPECT_EQ(client.Receive().status, 200);
 }

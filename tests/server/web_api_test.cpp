@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include "body.h"
+#include "form_body.h"
+#include "sandbox.h"
 
 namespace vorn::server {
 namespace {
@@ -33,7 +35,10 @@ class WebApiTest : public testing::Test {
   std::vector<Module> modules_{{"a.so", {{"Nfs", 1, "get", Nothing}}, {}}};
   Routes routes_{modules_};
   WorkerPool pool_{{1, 1, 1}};
-  WebApi api_{routes_, pool_};
+  Sandbox sandbox_;
+  std::string error_;
+  std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
+  WebApi api_{routes_, *uploads_, pool_};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {
@@ -75,6 +80,15 @@ TEST_F(WebApiTest, TakesJsonOnly) {
   for (const char* type : {"", "text/plain", "application/x-www-form-urlencoded", "application/jsonx",
                            "text/plain; x=application/json", "application/json; charset"}) {
     EXPECT_EQ(Begin(PostJson(type)), 415) << type;
+  }
+}
+
+TEST_F(WebApiTest, TakesFormsWithAProperBoundary) {
+  EXPECT_EQ(Begin(PostJson("multipart/form-data; boundary=x", FormBody::kMaxBytes)), 0);
+  EXPECT_EQ(Begin(PostJson("multipart/form-data; boundary=x", FormBody::kMaxBytes + 1)), 413);
+  for (const char* type : {"multipart/form-data", "multipart/form-data; boundary=",
+                           "multipart/form-data; boundary=\"\"", "multipart/form-data; boundary=\"a\\\"b\""}) {
+    EXPECT_NE(Begin(PostJson(type)), 0) << type;
   }
 }
 

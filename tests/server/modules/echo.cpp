@@ -1,5 +1,6 @@
 // A module whose methods do what the tests of the server need.
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -50,6 +51,18 @@ void Root(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   response->SetSuccess(root == nullptr ? Json::Value() : Json::Value(root));
 }
 
+// The uploaded file: its size, mode and first byte, and how the server named it. "remove" removes it.
+void Upload(VORN::APIRequest* request, VORN::APIResponse* response) {
+  const std::string path = request->GetParam("keytab_file_tmp", "").asString();
+  struct stat there {};
+  Json::Value result = Parameters(*request);
+  result["size"] = stat(path.c_str(), &there) == 0 ? Json::Int64(there.st_size) : Json::Int64(-1);
+  result["mode"] = there.st_mode & 0777;
+  result["first"] = std::ifstream(path).get();
+  if (request->GetParam("remove", "").asString() == "yes") unlink(path.c_str());
+  response->SetSuccess(result);
+}
+
 // Bytes that are no UTF-8.
 void Binary(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess("\xff\xfe"); }
 
@@ -57,7 +70,8 @@ const APIRow table[] = {{"Test.Echo", 1, "get", Echo},      {"Test.Echo", 1, "fa
                         {"Test.Echo", 1, "throw", Throw},   {"Test.Echo", 1, "throw_number", ThrowNumber},
                         {"Test.Echo", 1, "silent", Silent}, {"Test.Echo", 1, "wait", Wait},
                         {"Test.Echo", 1, "root", Root},     {"Test.Echo", 1, "binary", Binary},
-                        {"Test.Echo", 2, "get", EchoV2},    {nullptr, 0, nullptr, nullptr}};
+                        {"Test.Echo", 1, "upload", Upload}, {"Test.Echo", 2, "get", EchoV2},
+                        {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace
 

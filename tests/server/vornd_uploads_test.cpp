@@ -1,0 +1,95 @@
+// Files sent to the real vornd.
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <csignal>
+#include <filesystem>
+
+#include "server_process.h"
+
+namespace vorn::server {
+namespace {
+
+std::string Part(const std::string& disposition, const std::string& data) {
+  return "--b\r\nContent-Disposition: form-data; " + disposition + "\r\n\r\n" + data + "\r\n";
+}
+
+std::string FormHead(std::size_t size, const std::string& method = "upload") {
+  return "POST /api/Test.Echo/v1/" + method +
+         " HTTP/1.1\r\nHost: localhost\r\nContent-Type: multipart/form-data; boundary=b\r\nContent-Length: " +
+         std::to_string(size) + "\r\n\r\n";
+}
+
+class Uploads : public testing::Test {
+ protected:
+  ~Uploads() override {
+    server_.Signal(SIGTERM);
+    EXPECT_EQ(server_.Wait(), 0) << server_.log();
+  }
+  Reply Send(const std::string& form) {
+    Connection client = server_.Connect();
+    client.Send(FormHead(form.size()) + form);
+    return client.Receive();
+  }
+  bool NothingIsLeft() const { return std::filesystem::is_empty(sandbox_.File("run/vorn/uploads")); }
+
+  const std::string file_ = "name=keytab_file; filename=k";
+  Sandbox sandbox_;
+  ServerProcess server_{sandbox_};
+};
+
+TEST_F(Uploads, ReachTheMethodAsPrivateFiles) {
+  const Reply reply = Send(Part("name=note", "text") + Part(file_, "keytab") + "--b--\r\n");
+  const Json::Value data = reply.Envelope()["data"];
+  EXPECT_EQ(data["size"], 6) << reply.body;
+  EXPECT_EQ(data["mode"], 0600);
+  EXPECT_EQ(data["first"], 'k');
+  EXPECT_EQ(data["note"], "text");
+  EXPECT_TRUE(NothingIsLeft());
+}
+
+TEST_F(Uploads, ThatTheMethodRemovesAreNoTrouble) {
+  EXPECT_EQ(Send(Part(file_, "k") + Part("name=remove", "yes") + "--b--").Envelope()["data"]["size"], 1);
+  EXPECT_TRUE(NothingIsLeft());
+}
+
+TEST_F(Uploads, OfTheLargestSizeAreTakenAndLargerOnesRefused) {
+  EXPECT_EQ(Send(Part(file_, std::string(1024 * 1024, 'x')) + "--b--").Envelope()["data"]["size"], 1024 * 1024);
+  EXPECT_EQ(Send(Part(file_, std::string(1024 * 1024 + 1, 'x')) + "--b--").status, 413);
+  EXPECT_EQ(Send(std::string(2 * 1024 * 1024, 'x')).status, 413);
+  EXPECT_TRUE(NothingIsLeft());
+}
+
+TEST_F(Uploads, NeverReadAFileOfTheServer) {
+  EXPECT_EQ(Send(Part("name=keytab_file_tmp", "/etc/passwd") + "--b--").status, 400);
+  Connection client = server_.Connect();
+  client.Send(Post("/api/Test.Echo/v1/upload", R"({"keytab_file_tmp": "/etc/passwd"})"));
+  EXPECT_EQ(client.Receive().status, 400);
+}
+
+TEST_F(Uploads, ThatBreakOffLeaveNothing) {
+  {
+    Connection client = server_.Connect();
+    client.Send(FormHead(1000) + Part(file_, "half"));
+    EXPECT_TRUE(Eventually([this] { return !NothingIsLeft(); }));
+  }
+  EXPECT_TRUE(Eventually([this] { return NothingIsLeft(); }));
+}
+
+TEST_F(Uploads, OfAKilledServerAreRemovedByTheNext) {
+  const Sandbox sandbox;
+  ServerProcess killed(sandbox);
+  Connection client = killed.Connect();
+  client.Send(FormHead(1000) + Part(file_, "half"));
+  const std::string folder = sandbox.File("run/vorn/uploads");
+  EXPECT_TRUE(Eventually([&] { return !std::filesystem::is_empty(folder); }));
+  killed.Signal(SIGKILL);
+  killed.Wait();
+  EXPECT_FALSE(std::filesystem::is_empty(folder));
+  const ServerProcess next(sandbox);
+  EXPECT_TRUE(next.ready());
+  EXPECT_TRUE(std::filesystem::is_empty(folder));
+}
+
+}  // namespace
+}  // namespace vorn::server

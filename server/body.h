@@ -4,6 +4,7 @@
 
 #include <json/value.h>
 
+#include <cstddef>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -34,7 +35,7 @@ Response ReservedName(std::string_view name);
 // One JSON object, or nothing at all for an empty one.
 class JsonBody : public Body {
  public:
-  static constexpr std::size_t kMaxBytes = 1024 * 1024;
+  static constexpr std::size_t kMaxBytes = std::size_t{1024} * 1024;
   static Response TooLarge();
 
   std::optional<Response> Receive(std::string_view piece) override;

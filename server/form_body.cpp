@@ -12,7 +12,7 @@
 namespace vorn::server {
 namespace {
 
-constexpr std::size_t kMaxTextBytes = 64 * 1024;  // of one part
+constexpr std::size_t kMaxTextBytes = std::size_t{64} * 1024;  // of one part
 
 std::string Quoted(const std::string& name) { return "\"" + name + "\""; }
 

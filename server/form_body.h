@@ -21,8 +21,8 @@ namespace vorn::server {
 // its own as it comes; the parameter NAME_tmp is that file's path.
 class FormBody : public Body, private PartReceiver {
  public:
-  static constexpr std::size_t kMaxFileBytes = 1024 * 1024;
-  static constexpr std::size_t kMaxBytes = kMaxFileBytes + 64 * 1024;  // and what is around the file
+  static constexpr std::size_t kMaxFileBytes = std::size_t{1024} * 1024;
+  static constexpr std::size_t kMaxBytes = kMaxFileBytes + std::size_t{64} * 1024;  // and what is around the file
   static Response TooLarge();
 
   // The folder must outlive this.

@@ -33,7 +33,7 @@ using Protocol = asio::generic::stream_protocol;  // Unix and TCP alike
 using Socket = asio::basic_stream_socket<Protocol, asio::io_context::executor_type>;
 using Acceptor = asio::basic_socket_acceptor<Protocol, asio::io_context::executor_type>;
 
-constexpr std::size_t kReadBytes = 8 * 1024;
+constexpr std::size_t kReadBytes = std::size_t{8} * 1024;
 
 // Hands each piece of a body to the exchange, as it comes.
 struct StreamedBody {

@@ -62,7 +62,7 @@ class Service {
 };
 
 struct HttpLimits {
-  std::size_t head_bytes = 16 * 1024;
+  std::size_t head_bytes = std::size_t{16} * 1024;
   std::size_t connections = 800;  // further ones wait until one ends; below the usual 1024 descriptors
   // A connection is closed about a second after it was due at the latest.
   std::chrono::seconds head{10};   // from a request's first byte (a connection's begin) to its last header

@@ -208,6 +208,7 @@ std::optional<Listener> AdoptListener(UniqueFd socket, bool allow_tcp, std::stri
 std::vector<UniqueFd> TakeActivatedSockets() {
   std::vector<UniqueFd> sockets;
   const int count = sd_listen_fds(1);
+  sockets.reserve(static_cast<std::size_t>(count > 0 ? count : 0));
   for (int i = 0; i < count; ++i) sockets.emplace_back(SD_LISTEN_FDS_START + i);
   return sockets;
 }

@@ -20,14 +20,15 @@ struct FreeText {
 
 // The folder `name` of `parent`, made if it was missing, with links followed. Empty with errno set.
 std::string MakeFolder(const std::string& parent, const char* name) {
-  const std::string path = (parent == "/" ? "" : parent) + "/" + name;
+  std::string path = parent == "/" ? "" : parent;
+  path.append("/").append(name);
   if (mkdir(path.c_str(), 0755) != 0 && errno != EEXIST) return "";
   const std::unique_ptr<char, FreeText> canonical(realpath(path.c_str(), nullptr));
   return canonical ? canonical.get() : "";
 }
 
 bool IsBelow(const std::string& path, const std::string& root) {
-  return root == "/" || path.compare(0, root.size() + 1, root + "/") == 0;
+  return root == "/" || (path.compare(0, root.size(), root) == 0 && path[root.size()] == '/');
 }
 
 }  // namespace

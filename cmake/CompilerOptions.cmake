@@ -11,6 +11,8 @@ set(CMAKE_BUILD_RPATH_USE_ORIGIN ON)
 
 add_compile_options(-Wall -Wextra -Wshadow -Wconversion -Wformat=2 -Wnon-virtual-dtor -Wold-style-cast
                     -Woverloaded-virtual -Wcast-qual -Werror)
+# Part of -Wconversion for clang, and not for g++.
+add_compile_options($<$<CXX_COMPILER_ID:Clang>:-Wno-sign-conversion>)
 # Not under the sanitizers, which bring their own.
 if(NOT VORN_SANITIZE)
   add_compile_options(-fstack-protector-strong $<$<CONFIG:Release,RelWithDebInfo>:-D_FORTIFY_SOURCE=2>)

@@ -1,0 +1,59 @@
+// The INI document: what no edit concerns comes back, and an edit does what it says.
+#include <cstdint>
+#include <cstdlib>
+
+#include "ini_document.h"
+
+namespace {
+
+using vorn::IniDocument;
+
+void Require(bool condition) {
+  if (!condition) std::abort();
+}
+
+std::string EntriesOf(const IniDocument& document, std::string_view section) {
+  std::string text;
+  for (const vorn::IniEntry& entry : document.Entries(section)) text += entry.key + "\n" + entry.value + "\n";
+  return text;
+}
+
+// What the edited text reads as is what the edited document says.
+void RequireSameAfterReading(const IniDocument& document) {
+  const std::optional<IniDocument> again = IniDocument::Parse(document.Text());
+  Require(again.has_value());
+  for (const char* section : {"General", "Static"}) {
+    Require(EntriesOf(document, section) == EntriesOf(*again, section));
+  }
+}
+
+// The first line is the key, the second the value, the rest the file.
+std::string_view TakeLine(std::string_view* text) {
+  const std::string_view line = text->substr(0, text->find('\n'));
+  text->remove_prefix(std::min(line.size() + 1, text->size()));
+  return line;
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  std::string_view text(reinterpret_cast<const char*>(data), size);
+  const auto key = vorn::IniKey::From(TakeLine(&text));
+  const auto value = vorn::IniValue::From(TakeLine(&text));
+  std::optional<IniDocument> document = IniDocument::Parse(text);
+  if (!document) return 0;
+  Require(document->Text() == text);
+  if (!key || !value) return 0;
+
+  document->EndLastLine();
+  const std::string others = EntriesOf(*document, "General");
+  document->Set(*vorn::IniSection::From("Static"), *key, *value);
+  Require(document->Get("Static", key->text()) == value->text());
+  Require(EntriesOf(*document, "General") == others);
+  RequireSameAfterReading(*document);
+  Require(document->Remove("Static", key->text()));
+  Require(!document->Get("Static", key->text()));
+  Require(EntriesOf(*document, "General") == others);
+  RequireSameAfterReading(*document);
+  return 0;
+}

@@ -1,0 +1,235 @@
+#include "ini_document.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <random>
+
+#include "ini_judge.h"
+
+namespace vorn {
+namespace {
+
+using testing::ElementsAre;
+
+IniDocument Parsed(std::string_view text) {
+  std::optional<IniDocument> document = IniDocument::Parse(text);
+  EXPECT_TRUE(document.has_value());
+  return std::move(*document);
+}
+
+void Set(IniDocument* document, std::string_view section, std::string_view key, std::string_view value) {
+  document->Set(*IniSection::From(section), *IniKey::From(key), *IniValue::From(value));
+}
+
+// What the document says of two sections, as the judge tells it.
+IniContent ContentOf(const IniDocument& document) {
+  IniContent content;
+  for (const char* section : {"a", "b c"}) {
+    for (const IniEntry& entry : document.Entries(section)) content[section][FoldIniName(entry.key)] = entry.value;
+  }
+  return content;
+}
+
+struct ReadCase {
+  const char* name;
+  std::string_view text;
+  const char* value;  // of k in a; null: none
+};
+
+const ReadCase kReadCases[] = {
+    {"plain", "[a]\nk=v\n", "v"},
+    {"blanks around", " [ a ] \n\t k \t=  v w \t\n", "v w"},
+    {"names in any case", "[A]\nK=v\n", "v"},
+    {"the last of several", "[a]\nk=v\nk=w\n", "w"},
+    {"the last of several blocks", "[a]\nk=v\n[b c]\nk=x\n[a]\nk=w\n", "w"},
+    {"an empty one counts for nothing", "[a]\nk=v\nk=\nk=\"\"\n", "v"},
+    {"comment after a value", "[a]\nk=v#w\n", "v"},
+    {"comment of the other kind", "[a]\nk=v ;w\n", "v"},
+    {"a comment only", "[a]\nk= # v\n", nullptr},
+    {"comment lines", "[a]\n# k=v\n ;k=v\n", nullptr},
+    {"double quotes", "[a]\nk = \" v # w;\" # comment\n", " v # w;"},
+    {"single quotes", "[a]\nk = 'v \" w'\n", "v \" w"},
+    {"text after quotes", "[a]\nk = \"v\"w\n", "v"},
+    {"quote that is not closed", "[a]\nk = \"v\n", nullptr},
+    {"quotes inside", "[a]\nk = o\"v'\n", "o\"v'"},
+    {"equals sign in a value", "[a]\nk=v=w\n", "v=w"},
+    {"bracket in a value", "[a]\nk=[v]\n", "[v]"},
+    {"hash in another key", "[a]\nx#k=v\n", nullptr},
+    {"line feeds with carriage returns", "[a]\r\nk=v\r\n", "v"},
+    {"no line feed at the end", "[a]\nk=v", nullptr},
+    {"continued line", "[a]\nk=v\\\nw\n", "v  w"},
+    {"continued key", "[a]\n\\\nk\\\n=v\n", "v"},
+    {"continued comment", "[a]\n# x\\\nk=v\n", nullptr},
+    {"continued section", "[a\\\n]\nk=v\n", "v"},
+    {"continued into the end", "[a]\nk=v\\\n", nullptr},
+    {"carriage return does not continue", "[a]\r\nk=v\\\r\nw\r\n", "v\\"},
+    {"text after a section", "[a] x\nk=v\n", "v"},
+    {"section with an argument", "[a \"x\"]\nk=v\n", nullptr},
+    {"section whose argument is not closed", "[a \"x]\nk=v\n", "v"},
+    {"section that is not closed", "[a]\nk=v\n[a\nk=w\n", "v"},
+    {"bracket at a key's beginning", "[a]\n[k=w\nk=v\n", nullptr},
+    {"no section", "k=v\n", nullptr},
+    {"no assignment", "[a]\nk\nk:v\n=v\n", nullptr},
+    {"form feeds belong to a value's beginning only", "[a]\nk=\fv\f\n", "\fv"},
+    {"byte-order mark", "\xef\xbb\xbf[a]\nk=v\n", nullptr},
+    {"bytes beyond ASCII", "[a]\nk=\xc3\xa9\xa0\n", "\xc3\xa9\xa0"},
+};
+
+TEST(IniDocument, ReadsWhatNfsUtilsReads) {
+  for (const ReadCase& c : kReadCases) {
+    const IniDocument document = Parsed(c.text);
+    EXPECT_EQ(document.Get("a", "k").value_or("none"), c.value == nullptr ? "none" : c.value) << c.name;
+    IniContent judged = ReadByNfsconf(c.text);
+    EXPECT_EQ(document.Get("a", "k").value_or(""), judged["a"]["k"]) << c.name;
+    EXPECT_EQ(document.Text(), c.text) << c.name;
+  }
+}
+
+TEST(IniDocument, RefusesATextWithANulByte) {
+  EXPECT_FALSE(IniDocument::Parse(std::string_view("[a]\nk=v\0\n", 9)).has_value());
+}
+
+TEST(IniDocument, ListsASectionsKeysInOrder) {
+  const IniDocument document = Parsed("[a]\nz=1\nY=2\nz=3\nx=\n[b]\nz=4\n[A]\nw=5\n");
+  std::vector<std::string> texts;
+  for (const IniEntry& entry : document.Entries("a")) texts.push_back(entry.key + "=" + entry.value);
+  EXPECT_THAT(texts, ElementsAre("Y=2", "z=3", "w=5"));
+}
+
+TEST(IniDocument, NamesTheLineThatCounts) {
+  const IniDocument document = Parsed("[a]\nk=v\\\nw\n\nj=1\nk=2\n");
+  EXPECT_EQ(document.LineOf("a", "j"), 5);
+  EXPECT_EQ(document.LineOf("a", "k"), 6);
+  EXPECT_EQ(document.LineOf("a", "x"), 0);
+}
+
+struct EditCase {
+  const char* name;
+  std::string_view before;
+  const char* value;  // of k in a; null: removed
+  std::string_view after;
+};
+
+const EditCase kEditCases[] = {
+    {"changed in place", "# ours\n[a]\n k =  v \t; kept\n\n[b]\nk=1\n", "w",
+     "# ours\n[a]\n k =  w \t; kept\n\n[b]\nk=1\n"},
+    {"last line with a comment", "[a]\nk= v # x", "w", "[a]\nk= w # x\n"},
+    {"equal value changes nothing", "[a]\nk= v \n[b]\n\nx", "v", "[a]\nk= v \n[b]\n\nx"},
+    {"new key after the section's last", "[a]\nj=1\n\n# of b\n[b]\n", "v", "[a]\nj=1\nk = v\n\n# of b\n[b]\n"},
+    {"new key in a section without one", "[a]\n# what\n[b]\n", "v", "[a]\nk = v\n# what\n[b]\n"},
+    {"new key in the last of several blocks", "[a]\nj=1\n[b]\n[a]\n", "v", "[a]\nj=1\n[b]\n[a]\nk = v\n"},
+    {"new section", "[b]\nk=1\n", "v", "[b]\nk=1\n\n[a]\nk = v\n"},
+    {"new section in an empty file", "", "v", "[a]\nk = v\n"},
+    {"new section below a blank line", "# x\n\n", "v", "# x\n\n[a]\nk = v\n"},
+    {"new section where lines end by two characters", "# x\r\n", "v", "# x\r\n\r\n[a]\r\nk = v\r\n"},
+    {"changed where lines end by two characters", "[a]\r\nk=v\r\n", "w", "[a]\r\nk=w\r\n"},
+    {"the last of several lines", "[a]\nk=1\nk=2\n", "v", "[a]\nk=1\nk=v\n"},
+    {"an empty value", "[a]\nk =\n", "v", "[a]\nk =v\n"},
+    {"an empty value before a comment", "[a]\nk = # x\n", "v", "[a]\nk = v# x\n"},
+    {"quoted where it must be", "[a]\nk=v\n", " #;", "[a]\nk=\" #;\"\n"},
+    {"quoted the other way", "[a]\nk=v\n", "\"w;", "[a]\nk='\"w;'\n"},
+    {"backslash at the end", "[a]\nk=v\nj=1\n", "w\\", "[a]\nk=\"w\\\"\nj=1\n"},
+    {"quotes that were there", "[a]\nk=\"v\" # x\n", "w", "[a]\nk=w # x\n"},
+    {"text after the old quotes", "[a]\n k=\"v\"x # y\n", "w", "[a]\nk = w\n"},
+    {"old quote that is not closed", "[a]\nk=\"v\n", "w", "[a]\nk = w\n"},
+    {"continued old value", "[a]\nk=1\\\n2 # x\nj=1\n", "w", "[a]\nk=w # x\nj=1\n"},
+    {"equal value on a last line without line feed", "[a]\nk=v", "v", "[a]\nk=v\n"},
+    {"last line that ends in a backslash", "[a]\nj=v\\", "w", "[a]\nj=v\\\n\nk = w\n"},
+    {"comment without line feed", "[b]\n# x", "v", "[b]\n# x\n\n[a]\nk = v\n"},
+    {"section with an argument is another", "[a \"x\"]\nk=1\n", "v", "[a \"x\"]\nk=1\n\n[a]\nk = v\n"},
+    {"removed", "[a]\n# x\nk=v # y\nj=1\n", nullptr, "[a]\n# x\nj=1\n"},
+    {"removed wherever it stands", "[a]\nk=1\n[b]\nk=2\n[A]\nK=3\nk=\n", nullptr, "[a]\n[b]\nk=2\n[A]\n"},
+    {"nothing to remove", "[a]\nj=1\nk=2", nullptr, "[a]\nj=1\nk=2"},
+    {"removed with what counted for nothing", "[a]\nk=1\nk=2", nullptr, "[a]\n"},
+};
+
+TEST(IniDocument, ChangesOneLineAndNoOtherByte) {
+  for (const EditCase& c : kEditCases) {
+    IniDocument document = Parsed(c.before);
+    if (c.value != nullptr) {
+      Set(&document, "a", "k", c.value);
+    } else {
+      document.Remove("a", "k");
+    }
+    EXPECT_EQ(document.Text(), c.after) << c.name;
+    EXPECT_EQ(document.Get("a", "k").value_or("none"), c.value == nullptr ? "none" : c.value) << c.name;
+    IniContent judged = ReadByNfsconf(c.after);
+    EXPECT_EQ(document.Get("a", "k").value_or(""), judged["a"]["k"]) << c.name;
+  }
+}
+
+TEST(IniDocument, TakesANewKeyWhereTheRemovedOneWas) {
+  IniDocument document = Parsed("[a]\nj=1\n# x\nk=2\n\n[b]\n");
+  ASSERT_TRUE(document.Remove("a", "k"));
+  ASSERT_FALSE(document.Remove("a", "k"));
+  Set(&document, "a", "l", "3");
+  EXPECT_EQ(document.Text(), "[a]\nj=1\nl = 3\n# x\n\n[b]\n");
+}
+
+TEST(IniDocument, GivesALastLineEffectWhenItEndsIt) {
+  IniDocument document = Parsed("[a]\nk=v");
+  EXPECT_FALSE(document.Get("a", "k").has_value());
+  document.EndLastLine();
+  EXPECT_EQ(document.Get("a", "k"), "v");
+  document.EndLastLine();
+  EXPECT_EQ(document.Text(), "[a]\nk=v\n");
+}
+
+std::string RandomText(std::mt19937* random) {
+  const char* const pieces[] = {"[a]",  "[B c]", "[a \"x\"]", "[a",   "\n",   "\n",  "\r\n",
+                                "\\\n", "k",     "=",         "K = ", "j\t=", " v ", "\"",
+                                "'w'",  "#",     "; x",       "\\",   "\f",   "k=v", "\n[a]\n"};
+  std::uniform_int_distribution<std::size_t> piece(0, std::size(pieces) - 1);
+  std::uniform_int_distribution<int> count(0, 40);
+  std::string text = "[a]\n";
+  for (int i = count(*random); i > 0; --i) text += pieces[piece(*random)];
+  return text;
+}
+
+TEST(IniDocument, AgreesWithNfsUtilsOnAnyText) {
+  std::mt19937 random(20260801);
+  for (int i = 0; i < 300; ++i) {
+    const std::string text = RandomText(&random);
+    IniContent judged = ReadByNfsconf(text);
+    for (auto section = judged.begin(); section != judged.end();) {
+      const bool ours = section->first == "a" || section->first == "b c";
+      section = ours && !section->second.empty() ? std::next(section) : judged.erase(section);
+    }
+    EXPECT_EQ(ContentOf(Parsed(text)), judged) << testing::PrintToString(text);
+  }
+}
+
+TEST(IniDocument, KeepsEveryOtherValueWhateverIsEdited) {
+  std::mt19937 random(20260802);
+  for (int i = 0; i < 2000; ++i) {
+    IniDocument document = Parsed(RandomText(&random));
+    document.EndLastLine();
+    IniContent expected = ContentOf(document);
+    if (i % 3 == 0) {
+      document.Remove("a", "k");
+      expected["a"].erase("k");
+      if (expected["a"].empty()) expected.erase("a");
+    } else {
+      const char* value = i % 3 == 1 ? "new" : " #\"";
+      Set(&document, "a", "k", value);
+      expected["a"]["k"] = value;
+    }
+    EXPECT_EQ(ContentOf(document), expected) << document.Text();
+    EXPECT_EQ(ContentOf(Parsed(document.Text())), expected) << document.Text();
+  }
+}
+
+// A loop over all lines for each of them would take hours here; the limit is the test's own.
+TEST(IniDocument, GrowsWithItsTextOnly) {
+  std::string text = "[a]\n";
+  for (int i = 0; i < 100'000; ++i) text += "key" + std::to_string(i) + " = value\n";
+  IniDocument document = Parsed(text + "[b]\nx=1\n");
+  for (int i = 0; i < 100'000; ++i) Set(&document, "a", "key" + std::to_string(i), "other");
+  for (int i = 100'000; i < 200'000; ++i) Set(&document, "a", "key" + std::to_string(i), "new");
+  for (int i = 199'999; i >= 0; i -= 2) EXPECT_TRUE(document.Remove("a", "key" + std::to_string(i)));
+  EXPECT_EQ(document.Entries("a").size(), 100'000U);
+}
+
+}  // namespace
+}  // namespace vorn

@@ -1,0 +1,40 @@
+#include "ini_judge.h"
+
+#include <sstream>
+
+#include "ini_text.h"
+#include "processes.h"
+#include "temporary_root.h"
+
+namespace {
+
+std::string Unquoted(const std::string& value) {
+  const bool quoted =
+      value.size() > 1 && (value.front() == '"' || value.front() == '\'') && value.back() == value.front();
+  return quoted ? value.substr(1, value.size() - 2) : value;
+}
+
+}  // namespace
+
+IniContent ReadByNfsconf(std::string_view text) {
+  const TemporaryRoot root;
+  root.Write("/file.conf", text);
+  std::istringstream dump(RunProgram({"nfsconf", "--file", root.At("/file.conf"), "--dump"}).output);
+  IniContent content;
+  std::string section;
+  for (std::string line; std::getline(dump, line);) {
+    const std::size_t equals = line.find(" = ");
+    if (!line.empty() && line[0] == '[') {
+      section = vorn::FoldIniName(line.substr(1, line.size() - 2));
+    } else if (equals != std::string::npos) {
+      content[section][vorn::FoldIniName(line.substr(1, equals - 1))] = Unquoted(line.substr(equals + 3));
+    }
+  }
+  return content;
+}
+
+std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key) {
+  std::string value = RunProgram({"nfsconf", "--file", path, "--get", section, key}).output;
+  if (!value.empty() && value.back() == '\n') value.pop_back();
+  return value;
+}

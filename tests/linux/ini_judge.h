@@ -1,0 +1,20 @@
+// What nfs-utils itself reads in an INI file: nfsconf(8).
+#ifndef VORN_TESTS_LINUX_INI_JUDGE_H
+#define VORN_TESTS_LINUX_INI_JUDGE_H
+
+#include <map>
+#include <string>
+#include <string_view>
+
+// Every section (with its argument, as "name \"argument\"") and every key that has a value. Names
+// are in lower case.
+using IniContent = std::map<std::string, std::map<std::string, std::string>>;
+
+// The content of a file holding `text`.
+IniContent ReadByNfsconf(std::string_view text);
+
+// The value in the file at `path` and, as its services read it, in the folder `path`.d; empty when
+// there is none.
+std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key);
+
+#endif  // VORN_TESTS_LINUX_INI_JUDGE_H

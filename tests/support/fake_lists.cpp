@@ -3,6 +3,7 @@
 #include "fake_lists.h"
 
 #include <algorithm>
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -34,6 +35,9 @@ void Move(KLIBSZHASH** hash) {
   *hash = new FakeHash(*old);
   delete old;
 }
+
+// Ignoring case.
+bool Contains(const std::string& text, const char* part) { return strcasestr(text.c_str(), part) != nullptr; }
 
 template <typename Pairs>
 auto FindKey(Pairs& pairs, const std::string& key) {
@@ -152,8 +156,8 @@ int VORNNFSStaticMapGet(KLIBSZHASH** hash, const char* filter) {
   if (platform.Fails("VORNNFSStaticMapGet", filter == nullptr ? "(null)" : filter)) return -1;
   Move(hash);
   for (const auto& [principal, name] : platform.mappings) {
-    const bool matches = filter == nullptr || (principal + '\n' + name).find(filter) != std::string::npos;
-    if (matches) SetPair(Real(*hash), principal, name);
+    if (filter == nullptr || Contains(principal, filter) || Contains(name, filter))
+      SetPair(Real(*hash), principal, name);
   }
   return FakePlatform::kDone;
 }
@@ -187,12 +191,9 @@ int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int
   FakePlatform& platform = FakePlatform::Current();
   const std::string arguments = std::to_string(type) + " " + substring + " " + std::to_string(flags);
   if (platform.Fails("VORNUserEnumBySubstr", arguments)) return -1;
-  char lower[256] = {};
-  std::transform(substring, substring + std::min<size_t>(std::char_traits<char>::length(substring), 255), lower,
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   Move(list);
   for (const std::string& user : platform.users) {
-    if (user.find(lower) != std::string::npos) Append(Real(*list), user);
+    if (Contains(user, substring)) Append(Real(*list), user);
   }
   return FakePlatform::kDone;
 }

@@ -8,6 +8,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <new>
 #include <stdexcept>
 
 namespace {
@@ -15,13 +16,9 @@ namespace {
 FakePlatform* g_current = nullptr;
 
 std::string FormatText(const char* format, va_list arguments) {
-  va_list again;
-  va_copy(again, arguments);
-  const int length = vsnprintf(nullptr, 0, format, again);
-  va_end(again);
-  std::string text(static_cast<size_t>(length) + 1, '\0');
-  vsnprintf(text.data(), text.size(), format, arguments);
-  text.pop_back();
+  char* text = nullptr;
+  if (vasprintf(&text, format, arguments) < 0) throw std::bad_alloc();
+  const std::unique_ptr<char, decltype(&std::free)> owner(text, &std::free);
   return text;
 }
 
@@ -31,7 +28,7 @@ LogLine TakeApart(int priority, const char* format, const std::string& text) {
   const size_t blank = text.find(' ');
   if (std::string(format).rfind("%s:%d ", 0) != 0 || colon == std::string::npos || blank < colon) return line;
   line.source = text.substr(0, colon);
-  line.line = std::atoi(text.substr(colon + 1, blank - colon - 1).c_str());
+  line.line = std::stoi(text.substr(colon + 1, blank - colon - 1));
   line.text = text.substr(blank + 1);
   return line;
 }

@@ -38,9 +38,9 @@ class FakePlatform {
 
   // ---- what the box holds, for tests to set and to look at
   NFSConfRecord record{};
-  bool has_domain = true;
-  std::string domain = "box.example";
+  bool has_domain = true;  // of the ID map, as its table
   bool has_table = true;
+  std::string domain = "box.example";
   Pairs mappings;
   int enabled = 0;  // what KLIBServiceIsEnabled answers
   int kerberos_support = 1;
@@ -92,11 +92,11 @@ class FakePlatform {
 
  private:
   FakePlatform* const previous_;
+  size_t failed_after_ = 0;  // calls made when the last one failed on demand, itself included
   int fail_at_ = 0;
   int calls_that_can_fail_ = 0;
   int throw_at_ = 0;
   int calls_that_can_throw_ = 0;
-  size_t failed_after_ = 0;  // calls made when the last one failed on demand, itself included
   int last_error_ = kNoFailure;
   std::map<std::string, int> failing_;
   std::map<std::string, int> counts_;

@@ -35,7 +35,7 @@ struct CallSite {
 class ServiceHandler {
  public:
   ServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~ServiceHandler();
+  ~ServiceHandler() = default;
   ServiceHandler(const ServiceHandler&) = delete;
   ServiceHandler& operator=(const ServiceHandler&) = delete;
 

@@ -11,8 +11,7 @@
 
 class NFSIDMapServiceHandler : public ServiceHandler {
  public:
-  NFSIDMapServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~NFSIDMapServiceHandler();
+  using ServiceHandler::ServiceHandler;
 
   // The methods.
   void List();

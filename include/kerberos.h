@@ -6,8 +6,7 @@
 
 class NFSKerberosServiceHandler : public ServiceHandler {
  public:
-  NFSKerberosServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~NFSKerberosServiceHandler();
+  using ServiceHandler::ServiceHandler;
 
   // The methods "get", "upload_key" and "list".
   void Get();

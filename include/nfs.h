@@ -7,8 +7,7 @@
 
 class NFSServiceHandler : public ServiceHandler {
  public:
-  NFSServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~NFSServiceHandler();
+  using ServiceHandler::ServiceHandler;
 
   // The methods. Version 2 answers as version 1: it runs the same data functions.
   void Get();

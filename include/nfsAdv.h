@@ -7,8 +7,7 @@
 
 class NFSServiceAdvHandler : public ServiceHandler {
  public:
-  NFSServiceAdvHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~NFSServiceAdvHandler();
+  using ServiceHandler::ServiceHandler;
 
   void Get();
   void Set();

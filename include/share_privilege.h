@@ -6,8 +6,7 @@
 
 class NFSSharePrivilegeHandler : public ServiceHandler {
  public:
-  NFSSharePrivilegeHandler(VORN::APIRequest* request, VORN::APIResponse* response);
-  ~NFSSharePrivilegeHandler();
+  using ServiceHandler::ServiceHandler;
 
   // The methods "load" and "save".
   void Get();

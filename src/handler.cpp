@@ -21,8 +21,6 @@ std::string Serialise(const Json::Value& value) {
 ServiceHandler::ServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response)
     : error_(kNoError), request_(request), response_(response) {}
 
-ServiceHandler::~ServiceHandler() = default;
-
 void ServiceHandler::SetError(int code) {
   if (error_ == kNoError) error_ = code;
 }

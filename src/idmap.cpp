@@ -216,11 +216,6 @@ void PushIDs(const std::vector<std::string>& ids, StringList* principals) {
 
 }  // namespace
 
-NFSIDMapServiceHandler::NFSIDMapServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response)
-    : ServiceHandler(request, response) {}
-
-NFSIDMapServiceHandler::~NFSIDMapServiceHandler() = default;
-
 void NFSIDMapServiceHandler::AnswerStep(const CallSite& site, const Step& step) {
   const Json::Value params = Parameters();
   Json::Value result;

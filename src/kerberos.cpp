@@ -44,11 +44,6 @@ int ImportKeytab(const std::string& path) {
 
 }  // namespace
 
-NFSKerberosServiceHandler::NFSKerberosServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response)
-    : ServiceHandler(request, response) {}
-
-NFSKerberosServiceHandler::~NFSKerberosServiceHandler() = default;
-
 void NFSKerberosServiceHandler::Get() {
   AnswerWith(HERE, [this](Json::Value& result) { return GetData(result); });
 }

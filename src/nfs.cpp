@@ -95,11 +95,6 @@ bool SaveDomain(const Json::Value& params, SettingsChange* change, IDMap* id_map
 
 }  // namespace
 
-NFSServiceHandler::NFSServiceHandler(VORN::APIRequest* request, VORN::APIResponse* response)
-    : ServiceHandler(request, response) {}
-
-NFSServiceHandler::~NFSServiceHandler() = default;
-
 void NFSServiceHandler::Get() {
   AnswerWith(HERE, [this](Json::Value& result) { return GetData(result); });
 }

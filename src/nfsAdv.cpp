@@ -65,11 +65,6 @@ void ReloadFirewall() {
 
 }  // namespace
 
-NFSServiceAdvHandler::NFSServiceAdvHandler(VORN::APIRequest* request, VORN::APIResponse* response)
-    : ServiceHandler(request, response) {}
-
-NFSServiceAdvHandler::~NFSServiceAdvHandler() = default;
-
 void NFSServiceAdvHandler::Get() {
   AnswerWith(HERE, [this](Json::Value& result) { return GetData(result); });
 }

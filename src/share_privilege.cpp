@@ -169,11 +169,6 @@ Json::Value RulesToJson(const ExportRuleList& list) {
 
 }  // namespace
 
-NFSSharePrivilegeHandler::NFSSharePrivilegeHandler(VORN::APIRequest* request, VORN::APIResponse* response)
-    : ServiceHandler(request, response) {}
-
-NFSSharePrivilegeHandler::~NFSSharePrivilegeHandler() = default;
-
 void NFSSharePrivilegeHandler::Get() {
   AnswerWith(HERE, [this](Json::Value& result) { return GetData(Parameters(), result); });
 }

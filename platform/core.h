@@ -122,8 +122,8 @@ int KLIBCUnicodeUTF8StrUpper(const char* text, char* buffer, int size);
 int KLIBCFileExist(const char* path);
 
 // Runs `program` with up to four arguments (the first null ends them) and waits for it: no shell,
-// an empty standard input, its output to the log. Its exit status, 0 for success; negative when it
-// could not be run, was ended by a signal, exited with a status other than 0, or took too long.
+// an empty standard input, its output to the log. 0 when it exited with status 0; negative when it
+// could not be run, exited with another status, was ended by a signal, or took longer than a minute.
 int KLIBCExec(const char* program, const char* a1, const char* a2, const char* a3, const char* a4);
 
 // The path of a share, from its handle (see share.h). It lives as long as the handle.

@@ -1,16 +1,9 @@
 #include "lock.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-#include <sys/stat.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <filesystem>
 #include <vector>
 
-#include "file_descriptor.h"
-#include "files.h"
+#include "file_lock.h"
 #include "root.h"
 
 namespace vorn {
@@ -33,37 +26,8 @@ Held* Find(const std::string& directory) {
   return found == layer.end() ? nullptr : &*found;
 }
 
-Result<FileDescriptor> Open(const std::string& path) {
-  FileDescriptor file(open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
-  if (!file) return Status::System(errno, path);
-  return file;
-}
-
-Status WaitFor(const FileDescriptor& file, const std::string& path) {
-  while (flock(file.get(), LOCK_EX) != 0) {
-    if (errno != EINTR) return Status::System(errno, path);
-  }
-  return {};
-}
-
-// Whether the locked file is the one that newcomers find: somebody may have removed it.
-bool IsAt(const FileDescriptor& file, const std::string& path) {
-  struct stat mine {};
-  struct stat theirs {};
-  return fstat(file.get(), &mine) == 0 && stat(path.c_str(), &theirs) == 0 && mine.st_dev == theirs.st_dev &&
-         mine.st_ino == theirs.st_ino;
-}
-
 Result<FileDescriptor> Take(const std::string& directory) {
-  const Result<std::string> path = Root(directory).Locate("/run/vorn/config.lock");
-  if (!path.ok()) return path.status();
-  if (Status status = MakeFolders(std::filesystem::path(*path).parent_path()); !status.ok()) return status;
-  for (;;) {
-    Result<FileDescriptor> file = Open(*path);
-    if (!file.ok()) return file;
-    if (Status status = WaitFor(*file, *path); !status.ok()) return status;
-    if (IsAt(*file, *path)) return file;
-  }
+  return TakeFileLock(Root(directory), "/run/vorn/config.lock");
 }
 
 Status TakeAgain(Held* held) {

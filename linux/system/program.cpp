@@ -1,0 +1,174 @@
+#include "program.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <spawn.h>
+#include <sys/pidfd.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "file_descriptor.h"
+#include "root.h"
+
+namespace vorn {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+constexpr std::size_t kLongestLine = 1024;  // a longer one is cut into several
+
+// Hands on whole lines.
+class LineSplitter {
+ public:
+  explicit LineSplitter(const std::function<void(std::string_view)>& line) : line_(line) {}
+  ~LineSplitter() {
+    if (!rest_.empty()) line_(rest_);
+  }
+  LineSplitter(const LineSplitter&) = delete;
+  LineSplitter& operator=(const LineSplitter&) = delete;
+
+  void Take(std::string_view text) {
+    for (const char c : text) {
+      if (c != '\n') rest_.push_back(c);
+      if (c != '\n' && rest_.size() < kLongestLine) continue;
+      line_(rest_);
+      rest_.clear();
+    }
+  }
+
+ private:
+  const std::function<void(std::string_view)>& line_;
+  std::string rest_;
+};
+
+// What posix_spawn(3) is to do in the child; freed with the object.
+class SpawnPlan {
+ public:
+  explicit SpawnPlan(int output) {
+    posix_spawn_file_actions_init(&actions_);
+    posix_spawn_file_actions_addopen(&actions_, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+    posix_spawn_file_actions_adddup2(&actions_, output, STDOUT_FILENO);
+    posix_spawn_file_actions_adddup2(&actions_, output, STDERR_FILENO);
+    posix_spawn_file_actions_addclosefrom_np(&actions_, STDERR_FILENO + 1);
+    posix_spawnattr_init(&attributes_);
+    sigset_t signals;
+    sigemptyset(&signals);
+    posix_spawnattr_setsigmask(&attributes_, &signals);
+    sigfillset(&signals);
+    posix_spawnattr_setsigdefault(&attributes_, &signals);
+    posix_spawnattr_setpgroup(&attributes_, 0);
+    posix_spawnattr_setflags(&attributes_, POSIX_SPAWN_SETPGROUP | POSIX_SPAWN_SETSIGDEF | POSIX_SPAWN_SETSIGMASK);
+  }
+  ~SpawnPlan() {
+    posix_spawn_file_actions_destroy(&actions_);
+    posix_spawnattr_destroy(&attributes_);
+  }
+  SpawnPlan(const SpawnPlan&) = delete;
+  SpawnPlan& operator=(const SpawnPlan&) = delete;
+
+  const posix_spawn_file_actions_t* actions() const { return &actions_; }
+  const posix_spawnattr_t* attributes() const { return &attributes_; }
+
+ private:
+  posix_spawn_file_actions_t actions_{};
+  posix_spawnattr_t attributes_{};
+};
+
+std::vector<char*> Pointers(std::vector<std::string>* texts) {
+  std::vector<char*> pointers;
+  for (std::string& text : *texts) pointers.push_back(text.data());
+  pointers.push_back(nullptr);
+  return pointers;
+}
+
+// A started program and the end of the pipe that it writes to.
+class Child {
+ public:
+  static Result<Child> Start(const std::string& path, const std::vector<std::string>& arguments) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) return Status::System(errno, "pipe");
+    FileDescriptor output(ends[0]);
+    const FileDescriptor input(ends[1]);
+    std::vector<std::string> words{path};
+    words.insert(words.end(), arguments.begin(), arguments.end());
+    std::vector<std::string> environment{"PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin",
+                                         "LANG=C.UTF-8", "VORN_ROOT=" + Root::Current().directory()};
+    const SpawnPlan plan(input.get());
+    pid_t id = -1;
+    const int error = posix_spawn(&id, path.c_str(), plan.actions(), plan.attributes(), Pointers(&words).data(),
+                                  Pointers(&environment).data());
+    if (error != 0) return Status::System(error, path);
+    fcntl(output.get(), F_SETFL, O_NONBLOCK);
+    return Child(id, std::move(output), FileDescriptor(pidfd_open(id, 0)));
+  }
+
+  // Takes output until the program has ended, or the time is over; true when it has ended.
+  bool Follow(std::chrono::milliseconds limit, LineSplitter* lines) {
+    const auto deadline = Clock::now() + limit;
+    for (;;) {
+      const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now()).count();
+      // Output first: a program that has ended may have left some, and one that goes on writing must not keep us.
+      pollfd events[] = {{process_.get(), POLLIN, 0}, {output_.get(), POLLIN, 0}};
+      poll(events, output_ ? 2 : 1, static_cast<int>(std::max<long long>(left, 0)));
+      if (events[1].revents != 0) Drain(lines);
+      if ((events[0].revents & POLLIN) != 0) return true;
+      if (left <= 0) return false;
+    }
+  }
+
+  void Signal(int number) const { kill(-id_, number); }
+
+  // Its status as waitpid(2) has it. The program has ended, or is about to.
+  int Reap() const {
+    int status = 0;
+    while (waitpid(id_, &status, 0) < 0 && errno == EINTR) {
+    }
+    return status;
+  }
+
+ private:
+  Child(pid_t id, FileDescriptor output, FileDescriptor process)
+      : id_(id), output_(std::move(output)), process_(std::move(process)) {}
+
+  void Drain(LineSplitter* lines) {
+    char buffer[4096];
+    const ssize_t size = read(output_.get(), buffer, sizeof buffer);
+    if (size > 0) lines->Take({buffer, static_cast<std::size_t>(size)});
+    if (size == 0) output_.Close();
+  }
+
+  pid_t id_;
+  FileDescriptor output_;
+  FileDescriptor process_;
+};
+
+Status Judge(const std::string& path, int status, bool in_time) {
+  if (!in_time) return Status::Failure(kProgramFailed, path + " took too long and was ended");
+  if (WIFSIGNALED(status)) {
+    return Status::Failure(kProgramFailed, path + " was ended by signal " + std::to_string(WTERMSIG(status)));
+  }
+  if (WEXITSTATUS(status) == 0) return {};
+  return Status::Failure(kProgramFailed, path + " exited with status " + std::to_string(WEXITSTATUS(status)));
+}
+
+}  // namespace
+
+Status RunProgram(const std::string& path, const std::vector<std::string>& arguments,
+                  const std::function<void(std::string_view)>& line, const ProgramOptions& options) {
+  Result<Child> child = Child::Start(path, arguments);
+  if (!child.ok()) return child.status();
+  LineSplitter lines(line);
+  const bool in_time = child->Follow(options.limit, &lines);
+  if (!in_time) {
+    child->Signal(SIGTERM);
+    child->Follow(options.patience, &lines);
+    child->Signal(SIGKILL);
+  }
+  return Judge(path, child->Reap(), in_time);
+}
+
+}  // namespace vorn

@@ -1,0 +1,127 @@
+#include <gmock/gmock.h>
+
+#include "service.h"
+#include "stand_in_manager.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::HasSubstr;
+using vorn::Status;
+
+class SystemdEngine : public testing::Test {
+ protected:
+  SystemdEngine() { SetThreads("8\n"); }
+
+  void SetThreads(const char* text) { folder_.Write("/threads", text); }
+
+  std::unique_ptr<vorn::ServiceEngine> Engine() {
+    vorn::SystemdOptions options;
+    options.bus_address = manager_.address();
+    options.threads_file = folder_.At("/threads");
+    options.job_limit = std::chrono::seconds(limit_);
+    return vorn::MakeSystemdEngine(options);
+  }
+
+  StandInManager manager_;
+  TemporaryRoot folder_;
+  int limit_ = 60;
+};
+
+const std::vector<std::string> kBringUp = {"Reload",
+                                           "ResetFailedUnit nfs-idmapd.service",
+                                           "ResetFailedUnit nfs-mountd.service",
+                                           "ResetFailedUnit nfs-server.service",
+                                           "Subscribe",
+                                           "TryRestartUnit rpc-statd.service replace"};
+
+std::vector<std::string> Joined(std::vector<std::string> a, const std::vector<std::string>& b) {
+  a.insert(a.end(), b.begin(), b.end());
+  return a;
+}
+
+TEST_F(SystemdEngine, CountsAnEnabledUnitAsEnabled) {
+  for (const auto& [state, enabled] : std::vector<std::pair<const char*, bool>>{
+           {"enabled", true}, {"enabled-runtime", true}, {"disabled", false}, {"masked", false}, {"static", false}}) {
+    manager_.SetUnitFileState(state);
+    const auto answer = Engine()->IsEnabled();
+    ASSERT_TRUE(answer.ok()) << answer.status().reason();
+    EXPECT_EQ(*answer, enabled) << state;
+  }
+}
+
+TEST_F(SystemdEngine, EnablesAndStarts) {
+  const Status status = Engine()->Start();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(manager_.TakeCalls(),
+              ElementsAreArray(Joined(Joined({"EnableUnitFiles nfs-server.service", "Reload"}, kBringUp),
+                                      {"StartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, StopsAndDisables) {
+  EXPECT_TRUE(Engine()->Stop().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "StopUnit nfs-server.service replace",
+                                                "DisableUnitFiles nfs-server.service", "Reload"));
+}
+
+TEST_F(SystemdEngine, ForgetsOldFailuresAndMovesTheStatusDaemonBeforeARestart) {
+  EXPECT_TRUE(Engine()->Restart().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"RestartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, HasNothingToReloadWhereTheKernelServesNobody) {
+  SetThreads("0\n");
+  EXPECT_TRUE(Engine()->Reload().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre());
+}
+
+TEST_F(SystemdEngine, FailsWhenTheUnitStartsButTheKernelServesNobody) {
+  SetThreads("0\n");
+  const Status status = Engine()->Start();
+  EXPECT_EQ(status.code(), vorn::kServiceFailed);
+  EXPECT_THAT(status.reason(), HasSubstr("no threads"));
+}
+
+TEST_F(SystemdEngine, FailsWithTheNameOfTheJobAndItsOutcome) {
+  for (const char* outcome : {"failed", "timeout", "dependency", "canceled"}) {
+    manager_.End("RestartUnit nfs-server.service", outcome);
+    const Status status = Engine()->Restart();
+    EXPECT_EQ(status.code(), vorn::kServiceFailed);
+    EXPECT_THAT(status.reason(), HasSubstr(std::string("RestartUnit nfs-server.service: the job ended as ") + outcome));
+  }
+}
+
+TEST_F(SystemdEngine, DoesNotWaitForEverForAJob) {
+  limit_ = 0;
+  manager_.End("StopUnit nfs-server.service", "never");
+  EXPECT_THAT(Engine()->Stop().reason(), HasSubstr("no end in sight"));
+}
+
+TEST_F(SystemdEngine, StopsWhereACallIsRefused) {
+  for (const char* call : {"EnableUnitFiles nfs-server.service", "StartUnit nfs-server.service",
+                           "TryRestartUnit rpc-statd.service", "Reload", "Subscribe"}) {
+    StandInManager manager;
+    manager.Refuse(call);
+    vorn::SystemdOptions options;
+    options.bus_address = manager.address();
+    options.threads_file = folder_.At("/threads");
+    const Status status = vorn::MakeSystemdEngine(options)->Start();
+    EXPECT_EQ(status.code(), vorn::kServiceFailed) << call;
+    EXPECT_THAT(status.reason(), HasSubstr("is refused")) << call;
+    EXPECT_THAT(manager.TakeCalls().back(), HasSubstr(call)) << call;
+  }
+}
+
+TEST_F(SystemdEngine, IsNotStoppedByAnOldFailureThatCannotBeForgotten) {
+  manager_.Refuse("ResetFailedUnit nfs-idmapd.service");
+  EXPECT_TRUE(Engine()->Start().ok());
+}
+
+TEST_F(SystemdEngine, SaysThatThereIsNoBus) {
+  vorn::SystemdOptions options;
+  options.bus_address = "unix:path=" + folder_.At("/nobody");
+  EXPECT_THAT(vorn::MakeSystemdEngine(options)->IsEnabled().status().reason(), HasSubstr("the system bus"));
+}
+
+}  // namespace

@@ -1,0 +1,60 @@
+// A stand-in for systemd's manager on a bus of its own: it takes the calls that the service engine
+// makes, writes them down, and ends jobs as it is told to.
+#ifndef VORN_TESTS_LINUX_STAND_IN_MANAGER_H
+#define VORN_TESTS_LINUX_STAND_IN_MANAGER_H
+
+#include <atomic>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <set>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "processes.h"
+#include "temporary_root.h"
+
+struct sd_bus;
+struct sd_bus_message;
+
+class StandInManager {
+ public:
+  StandInManager();  // with a dbus-daemon of its own
+  ~StandInManager();
+  StandInManager(const StandInManager&) = delete;
+  StandInManager& operator=(const StandInManager&) = delete;
+
+  const std::string& address() const { return address_; }
+
+  // What was called, in order: "StartUnit nfs-server.service replace".
+  std::vector<std::string> TakeCalls();
+
+  // "MethodName unit" answers with an error.
+  void Refuse(const std::string& call);
+  // The job of "MethodName unit" ends as `outcome`; "never" for one that does not.
+  void End(const std::string& call, const std::string& outcome);
+  void SetUnitFileState(const std::string& state);
+
+  // For the bus' callbacks.
+  int Take(sd_bus_message* message, const char* types);
+
+ private:
+  void Serve();
+  int AnswerJob(sd_bus_message* message, const std::string& call);
+
+  TemporaryRoot folder_;
+  std::string address_;
+  std::unique_ptr<ChildProcess> daemon_;
+  std::mutex mutex_;
+  std::vector<std::string> calls_;
+  std::set<std::string> refused_;
+  std::map<std::string, std::string> outcomes_;
+  std::string unit_file_state_ = "disabled";
+  int jobs_ = 0;
+  sd_bus* bus_ = nullptr;
+  std::atomic<bool> stop_{false};
+  std::thread thread_;
+};
+
+#endif  // VORN_TESTS_LINUX_STAND_IN_MANAGER_H

@@ -30,12 +30,6 @@ FileStamp StampOf(const struct stat& file) {
   return {true, file.st_dev, file.st_ino, file.st_size, Nanoseconds(file.st_mtim), Nanoseconds(file.st_ctim)};
 }
 
-bool Same(const FileStamp& a, const FileStamp& b) {
-  if (a.exists != b.exists || !a.exists) return a.exists == b.exists;
-  return a.device == b.device && a.inode == b.inode && a.size == b.size && a.modified == b.modified &&
-         a.changed == b.changed;
-}
-
 Result<std::string> ReadAll(int file, const std::string& path) {
   std::string text;
   char buffer[64 * 1024];
@@ -131,7 +125,7 @@ Result<Target> Examine(const fs::path& path) {
 Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
   const Result<Target> target = Examine(path);
   if (!target.ok()) return target.status();
-  if (Same(target->exists ? StampOf(target->file) : FileStamp{}, expected)) return {};
+  if (IsSameFile(target->exists ? StampOf(target->file) : FileStamp{}, expected)) return {};
   return Status::Failure(kChangedBehind, path.string() + " was changed by somebody else meanwhile");
 }
 
@@ -144,6 +138,12 @@ Status Fill(TemporaryFile* temporary, const Target& target, std::string_view tex
 }
 
 }  // namespace
+
+bool IsSameFile(const FileStamp& a, const FileStamp& b) {
+  if (a.exists != b.exists || !a.exists) return a.exists == b.exists;
+  return a.device == b.device && a.inode == b.inode && a.size == b.size && a.modified == b.modified &&
+         a.changed == b.changed;
+}
 
 Result<FileText> ReadFile(const std::string& path) {
   // Not blocking: a FIFO or a device must not hold the caller before it is found out.

@@ -22,6 +22,9 @@ struct FileStamp {
   std::int64_t changed = 0;   // likewise, of the inode
 };
 
+// Whether both are of one file in one state.
+bool IsSameFile(const FileStamp& a, const FileStamp& b);
+
 struct FileText {
   std::string text;
   FileStamp stamp;

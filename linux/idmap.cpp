@@ -1,0 +1,269 @@
+#include <netdb.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+#include <map>
+#include <memory>
+
+#include "error.h"
+#include "ini_file.h"
+#include "lists.h"
+#include "lock.h"
+#include "nfsconf.h"
+#include "unicode.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kFile[] = "/etc/idmapd.conf";
+
+// What a record holds besides its mappings, in the first of its own words.
+struct Holding {
+  ConfigurationLock lock;
+  std::string path;  // the file that it was read of
+  FileStamp stamp;
+};
+
+Holding* HoldingOf(const _tag_nfs_id_map_* record) { return static_cast<Holding*>(record->platform[0]); }
+
+// ---------------------------------------------------------------------------------------------
+// The domain that holds where the file names none: idmapd.conf(5).
+
+std::string CanonicalHostName() {
+  char name[HOST_NAME_MAX + 1] = "";
+  if (gethostname(name, sizeof name - 1) != 0) return "";
+  addrinfo hints{};
+  hints.ai_flags = AI_CANONNAME;
+  addrinfo* found = nullptr;
+  if (getaddrinfo(name, nullptr, &hints, &found) != 0) return name;
+  const std::unique_ptr<addrinfo, void (*)(addrinfo*)> owner(found, &freeaddrinfo);
+  return found->ai_canonname == nullptr ? name : found->ai_canonname;
+}
+
+std::string DefaultDomain() {
+  const std::string host = CanonicalHostName();
+  const std::size_t dot = host.find('.');
+  return dot == std::string::npos || dot + 1 == host.size() ? "localdomain" : host.substr(dot + 1);
+}
+
+std::string EffectiveDomain(const IniDocument& document) {
+  const std::optional<std::string> domain = document.Get("General", "Domain");
+  return domain ? *domain : DefaultDomain();
+}
+
+// ---------------------------------------------------------------------------------------------
+// Reading.
+
+Status FillTable(const IniDocument& document, KLIBSZHASH** table) {
+  for (const IniEntry& entry : document.Entries("Static")) {
+    if (KLIBCSzHashSetValue(table, entry.key.c_str(), entry.value.c_str()) < 0) {
+      return Status::Failure(KLIBCErrGet(), "the table of mappings cannot be filled");
+    }
+  }
+  return {};
+}
+
+struct Free {
+  void operator()(_tag_nfs_id_map_* record) const { VORNNFSIDMapFree(record); }
+};
+using IDMap = std::unique_ptr<_tag_nfs_id_map_, Free>;
+
+Result<IDMap> ReadIDMap() {
+  IDMap record(new _tag_nfs_id_map_{});
+  auto* holding = new Holding;
+  record->platform[0] = holding;
+  if (!holding->lock.status().ok()) return holding->lock.status();
+  const Result<IniFile> file = IniFile::Open(kFile);
+  if (!file.ok()) return file.status();
+  holding->path = file->path();
+  holding->stamp = file->stamp();
+  record->domain = strdup(EffectiveDomain(file->document()).c_str());
+  record->table = KLIBCSzHashAlloc(0);
+  if (record->domain == nullptr || record->table == nullptr) return Status::System(ENOMEM, kFile);
+  if (Status status = FillTable(file->document(), &record->table); !status.ok()) return status;
+  return record;
+}
+
+// ---------------------------------------------------------------------------------------------
+// Writing.
+
+struct Mapping {
+  IniKey principal;
+  IniValue local_name;
+};
+using Mappings = std::map<std::string, Mapping>;  // by the principal as the reader compares it
+
+// The wanted mappings. The reader takes two principals that differ in case for one: a table with both
+// cannot be stored.
+Result<Mappings> Check(const KLIBSZHASH& table) {
+  Mappings mappings;
+  for (const auto& [principal, local_name] : table.pairs) {
+    const std::optional<IniKey> key = IniKey::From(principal);
+    const std::optional<IniValue> value = IniValue::From(local_name);
+    if (!key || !value)
+      return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry a principal or its local name");
+    if (!mappings.emplace(FoldIniName(principal), Mapping{*key, *value}).second) {
+      return Status::Failure(kRefusedText, "idmapd.conf(5) cannot tell two principals that differ in case only");
+    }
+  }
+  return mappings;
+}
+
+bool IsStored(const IniDocument& document, const Mappings& mappings) {
+  const std::vector<IniEntry> stored = document.Entries("Static");
+  if (stored.size() != mappings.size()) return false;
+  for (const IniEntry& entry : stored) {
+    const auto wanted = mappings.find(FoldIniName(entry.key));
+    if (wanted == mappings.end() || wanted->second.principal.text() != entry.key) return false;
+    if (wanted->second.local_name.text() != entry.value) return false;
+  }
+  return true;
+}
+
+// In the table's order, so that new mappings come in the order in which they were made.
+void StoreMappings(const KLIBSZHASH& table, const Mappings& mappings, IniDocument* document) {
+  const IniSection section = *IniSection::From("Static");
+  document->EndLastLine();  // or it would come to life later, whether it is wanted or not
+  for (const IniEntry& entry : document->Entries("Static")) {
+    const auto wanted = mappings.find(FoldIniName(entry.key));
+    const bool stays = wanted != mappings.end() && wanted->second.principal.text() == entry.key;
+    if (!stays) document->Remove("Static", entry.key);
+  }
+  for (const KLIBSZHASH::Pair& pair : table.pairs) {
+    const Mapping& mapping = mappings.at(FoldIniName(pair.first));
+    document->Set(section, mapping.principal, mapping.local_name);
+  }
+}
+
+std::vector<std::string> Words(const std::string& list) {
+  std::vector<std::string> words;
+  for (std::size_t at = 0; (at = list.find_first_not_of(" \t,", at)) != std::string::npos;) {
+    const std::size_t end = std::min(list.find_first_of(" \t,", at), list.size());
+    words.push_back(list.substr(at, end - at));
+    at = end;
+  }
+  return words;
+}
+
+// Static mappings count only where the method "static" does, and the first method that knows a
+// principal decides. Without methods for GSS those for names hold: idmapd.conf(5).
+Status HonourStaticMappings(IniDocument* document) {
+  const IniKey key = *IniKey::From("GSS-Methods");
+  const std::string names = document->Get("Translation", "Method").value_or("nsswitch");
+  const std::string methods = document->Get("Translation", key.text()).value_or(names);
+  const std::vector<std::string> words = Words(methods);
+  if (!words.empty() && words.front() == "static") return {};
+  std::string value = "static";
+  for (const std::string& word : words) value += word == "static" ? "" : "," + word;
+  const std::optional<IniValue> text = IniValue::From(value);
+  if (!text) return Status::Failure(kSyntax, "the translation methods cannot be written back");
+  document->Set(*IniSection::From("Translation"), key, *text);
+  return {};
+}
+
+Status StoreTable(const KLIBSZHASH& table, IniDocument* document) {
+  const Result<Mappings> mappings = Check(table);
+  if (!mappings.ok()) return mappings.status();
+  if (!IsStored(*document, *mappings)) StoreMappings(table, *mappings, document);
+  return mappings->empty() ? Status() : HonourStaticMappings(document);
+}
+
+Status StoreDomain(const std::string& domain, IniDocument* document) {
+  if (domain == EffectiveDomain(*document)) return {};
+  if (domain.empty()) {
+    document->Remove("General", "Domain");
+    return {};
+  }
+  const std::optional<IniValue> value = IniValue::From(domain);
+  if (!value) return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry the domain");
+  document->Set(*IniSection::From("General"), *IniKey::From("Domain"), *value);
+  return {};
+}
+
+Status CheckUnchangedSince(const Holding* holding, const IniFile& file) {
+  if (holding == nullptr || holding->path != file.path() || IsSameFile(holding->stamp, file.stamp())) return {};
+  return Status::Failure(kChangedBehind, file.path() + " was changed by somebody else meanwhile");
+}
+
+Status WriteIDMap(const char* path, const _tag_nfs_id_map_* record) {
+  if (path == nullptr || record == nullptr) return Status::Failure(EINVAL, "no path, or no record");
+  const ConfigurationLock lock;
+  if (!lock.status().ok()) return lock.status();
+  Result<IniFile> file = IniFile::Open(path);
+  if (!file.ok()) return file.status();
+  Holding* holding = HoldingOf(record);
+  if (Status status = CheckUnchangedSince(holding, *file); !status.ok()) return status;
+
+  IniDocument* document = &file->document();
+  if (record->domain != nullptr) {
+    if (Status status = StoreDomain(record->domain, document); !status.ok()) return status;
+  }
+  if (record->table != nullptr) {
+    if (Status status = StoreTable(*record->table, document); !status.ok()) return status;
+  }
+  const Result<FileStamp> stamp = file->Save();
+  if (stamp.ok() && holding != nullptr && holding->path == file->path()) holding->stamp = *stamp;
+  return stamp.status();
+}
+
+// ---------------------------------------------------------------------------------------------
+// Mappings without a record.
+
+Status ReadMappings(KLIBSZHASH** hash, const char* filter) {
+  if (hash == nullptr || *hash == nullptr) return Status::Failure(EINVAL, "no hash");
+  const Result<IniFile> file = IniFile::Open(kFile);
+  if (!file.ok()) return file.status();
+  const CaselessSubstring wanted(filter == nullptr ? "" : filter);
+  for (const IniEntry& entry : file->document().Entries("Static")) {
+    if (!wanted.IsIn(entry.key) && !wanted.IsIn(entry.value)) continue;
+    if (KLIBCSzHashSetValue(hash, entry.key.c_str(), entry.value.c_str()) < 0) {
+      return Status::Failure(KLIBCErrGet(), "the table of mappings cannot be filled");
+    }
+  }
+  return {};
+}
+
+}  // namespace
+}  // namespace vorn
+
+_tag_nfs_id_map_* VORNNFSIDMapGet() {
+  vorn::Result<vorn::IDMap> record = vorn::ReadIDMap();
+  if (record.ok()) return record->release();
+  vorn::ToResult(record.status());
+  return nullptr;
+}
+
+int VORNNFSIDMapSet(const char* path, const _tag_nfs_id_map_* record) {
+  return vorn::ToResult(vorn::WriteIDMap(path, record));
+}
+
+void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
+  if (record == nullptr) return;
+  std::free(record->domain);
+  KLIBCSzHashFree(record->table);
+  delete vorn::HoldingOf(record);
+  delete record;
+}
+
+int VORNNFSStaticMapGet(KLIBSZHASH** hash, const char* filter) {
+  return vorn::ToResult(vorn::ReadMappings(hash, filter));
+}
+
+int VORNNFSStaticMapAppend(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
+  if (pairs == nullptr) return vorn::ToResult(vorn::Status::Failure(EINVAL, "no pairs"));
+  for (const KLIBSZHASH::Pair& pair : pairs->pairs) {
+    if (KLIBCSzHashSetValue(table, pair.first.c_str(), pair.second.c_str()) < 0) return -1;
+  }
+  return 0;
+}
+
+int VORNNFSStaticMapRemove(KLIBSZHASH* table, const KLIBSZLIST* principals) {
+  if (table == nullptr || principals == nullptr) {
+    return vorn::ToResult(vorn::Status::Failure(EINVAL, "no table, or no principals"));
+  }
+  for (int i = 0; i < principals->count; ++i) KLIBCSzHashRemoveKey(table, KLIBCSzListGet(principals, i));
+  return 0;
+}

@@ -1,0 +1,221 @@
+#include "nfsconf.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+#include <vector>
+
+#include "error.h"
+#include "ini_file.h"
+#include "lock.h"
+#include "root.h"
+
+namespace vorn {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr char kFolder[] = "/etc/nfs.conf.d";
+constexpr char kFile[] = "/etc/nfs.conf.d/vorn.conf";
+constexpr char kHeading[] =
+    "# The NFS settings of this box, kept by its management. Other lines here are left alone.\n";
+constexpr int kLargestPort = 65535;
+
+// What nfs-utils has no key for, and what it must not see while it is switched off.
+constexpr char kOurs[] = "vorn";
+
+// ---------------------------------------------------------------------------------------------
+// Reading: nfs.conf(5) and the files beside it, as the services put them together.
+
+class ServiceConfiguration {
+ public:
+  static Result<ServiceConfiguration> Open() {
+    ServiceConfiguration configuration;
+    if (Status status = configuration.Add("/etc/nfs.conf"); !status.ok()) return status;
+    const Result<std::vector<std::string>> names = Names();
+    if (!names.ok()) return names.status();
+    for (const std::string& name : *names) {
+      if (Status status = configuration.Add(std::string(kFolder) + "/" + name); !status.ok()) return status;
+    }
+    return configuration;
+  }
+
+  // Each reads a value, which stays as it is when no file has one.
+  Status Read(const char* section, const char* key, int largest, std::int32_t* value) const {
+    const Result<std::optional<int>> number = Deciding(section, key).Number(section, key, largest);
+    if (number.ok() && *number) *value = **number;
+    return number.status();
+  }
+  Status Read(const char* section, const char* key, std::int32_t* value) const {
+    const Result<std::optional<bool>> on = Deciding(section, key).Switch(section, key);
+    if (on.ok() && *on) *value = **on ? 1 : 0;
+    return on.status();
+  }
+  Status Read(const char* section, const char* key, char* text, std::size_t size) const {
+    const IniFile& file = Deciding(section, key);
+    const std::string value = file.document().Get(section, key).value_or("");
+    if (value.size() >= size) return file.Refuse(section, key, "is longer than " + std::to_string(size - 1) + " bytes");
+    std::memcpy(text, value.c_str(), value.size() + 1);
+    return {};
+  }
+
+ private:
+  Status Add(const std::string& path) {
+    Result<IniFile> file = IniFile::Open(path);
+    if (file.ok()) files_.push_back(std::move(*file));
+    return file.status();
+  }
+
+  // In the order of strverscmp(3), which is the services'.
+  static Result<std::vector<std::string>> Names() {
+    const Result<std::string> folder = Root::Current().Locate(kFolder);
+    if (!folder.ok()) return folder.status();
+    std::vector<std::string> names;
+    std::error_code ignored;
+    for (const fs::directory_entry& entry : fs::directory_iterator(*folder, ignored)) {
+      const fs::path name = entry.path().filename();
+      const bool counts = name.extension() == ".conf" && !entry.is_directory(ignored);
+      if (counts && name.native().front() != '.') names.push_back(name);
+    }
+    const auto before = [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; };
+    std::sort(names.begin(), names.end(), before);
+    return names;
+  }
+
+  // The last file that has a value, or any one.
+  const IniFile& Deciding(const char* section, const char* key) const {
+    const auto has = [&](const IniFile& file) { return file.document().Get(section, key).has_value(); };
+    const auto last = std::find_if(files_.rbegin(), files_.rend(), has);
+    return last == files_.rend() ? files_.front() : *last;
+  }
+
+  std::vector<IniFile> files_;
+};
+
+// Our own switch, or if nobody ever set it: whether an administrator fixed one of the ports.
+Status ReadPorts(const ServiceConfiguration& configuration, NFSConfRecord* record) {
+  std::int32_t statd = 0;
+  std::int32_t nlm = 0;
+  if (Status s = configuration.Read("statd", "port", kLargestPort, &statd); !s.ok()) return s;
+  if (Status s = configuration.Read("lockd", "port", kLargestPort, &nlm); !s.ok()) return s;
+  record->custom_port_enable = statd != 0 || nlm != 0 ? 1 : 0;
+  if (Status s = configuration.Read(kOurs, "custom-ports", &record->custom_port_enable); !s.ok()) return s;
+  if (Status s = configuration.Read(kOurs, "statd-port", kLargestPort, &record->statd_port); !s.ok()) return s;
+  if (Status s = configuration.Read(kOurs, "nlm-port", kLargestPort, &record->nlm_port); !s.ok()) return s;
+  if (record->custom_port_enable == 0) return {};
+  record->statd_port = statd;
+  record->nlm_port = nlm;
+  return {};
+}
+
+Status ReadRecord(NFSConfRecord* result) {
+  if (result == nullptr) return Status::Failure(EINVAL, "no record");
+  const Result<ServiceConfiguration> configuration = ServiceConfiguration::Open();
+  if (!configuration.ok()) return configuration.status();
+  NFSConfRecord record{};
+  record.enable_nfs_v4 = 1;  // as rpc.nfsd(8) without a key; sizes, ports and rpc.mountd's groups begin at 0
+  constexpr int kAny = std::numeric_limits<std::int32_t>::max();
+  if (Status s = configuration->Read(kOurs, "read-size", kAny, &record.read_size); !s.ok()) return s;
+  if (Status s = configuration->Read(kOurs, "write-size", kAny, &record.write_size); !s.ok()) return s;
+  if (Status s = configuration->Read("nfsd", "vers4", &record.enable_nfs_v4); !s.ok()) return s;
+  if (Status s = configuration->Read("mountd", "manage-gids", &record.unix_pri_enable); !s.ok()) return s;
+  if (Status s = ReadPorts(*configuration, &record); !s.ok()) return s;
+  char* principal = record.kerberos_principal;
+  if (Status s = configuration->Read(kOurs, "kerberos-principal", principal, sizeof record.kerberos_principal);
+      !s.ok()) {
+    return s;
+  }
+  *result = record;
+  return {};
+}
+
+// ---------------------------------------------------------------------------------------------
+// Writing: our own file only.
+
+void Put(IniDocument* document, const char* section, const char* key, const IniValue& value) {
+  document->Set(*IniSection::From(section), *IniKey::From(key), value);
+}
+
+void PutSwitch(IniDocument* document, const char* section, const char* key, bool on) {
+  Put(document, section, key, *IniValue::From(on ? "y" : "n"));
+}
+
+// A minor version that is asked for by name brings version 4 back to life, so each is denied with it;
+// with it on, they are the administrator's to choose in nfs.conf.
+void PutVersion4(IniDocument* document, bool on) {
+  PutSwitch(document, "nfsd", "vers4", on);
+  for (const char* minor : {"vers4.0", "vers4.1", "vers4.2"}) {
+    if (on) {
+      document->Remove("nfsd", minor);
+    } else {
+      PutSwitch(document, "nfsd", minor, false);
+    }
+  }
+}
+
+void PutPorts(IniDocument* document, const NFSConfRecord& record) {
+  const bool on = record.custom_port_enable != 0;
+  PutSwitch(document, kOurs, "custom-ports", on);
+  Put(document, kOurs, "statd-port", IniValue::From(record.statd_port));
+  Put(document, kOurs, "nlm-port", IniValue::From(record.nlm_port));
+  const struct {
+    const char* section;
+    const char* key;
+    std::int32_t port;
+  } keys[] = {
+      {"statd", "port", record.statd_port}, {"lockd", "port", record.nlm_port}, {"lockd", "udp-port", record.nlm_port}};
+  for (const auto& k : keys) {
+    if (on) {
+      Put(document, k.section, k.key, IniValue::From(k.port));
+    } else {
+      document->Remove(k.section, k.key);
+    }
+  }
+}
+
+Status PutPrincipal(IniDocument* document, const NFSConfRecord& record) {
+  const char* text = record.kerberos_principal;
+  const std::size_t length = strnlen(text, sizeof record.kerberos_principal);
+  if (length == sizeof record.kerberos_principal) return Status::Failure(kRefusedText, "the principal does not end");
+  if (length == 0) {
+    document->Remove(kOurs, "kerberos-principal");
+    return {};
+  }
+  const std::optional<IniValue> value = IniValue::From(text);
+  if (!value) return Status::Failure(kRefusedText, "nfs.conf(5) cannot carry the principal");
+  Put(document, kOurs, "kerberos-principal", *value);
+  return {};
+}
+
+Status CheckNumbers(const NFSConfRecord& record) {
+  const auto is_port = [](std::int32_t port) { return port >= 0 && port <= kLargestPort; };
+  if (record.read_size < 0 || record.write_size < 0) return Status::Failure(EINVAL, "a transfer size is negative");
+  if (!is_port(record.statd_port) || !is_port(record.nlm_port))
+    return Status::Failure(EINVAL, "a port is out of range");
+  return {};
+}
+
+Status WriteRecord(const NFSConfRecord* record) {
+  if (record == nullptr) return Status::Failure(EINVAL, "no record");
+  if (Status status = CheckNumbers(*record); !status.ok()) return status;
+  const ConfigurationLock lock;
+  if (!lock.status().ok()) return lock.status();
+  Result<IniFile> file = IniFile::Open(kFile, kHeading);
+  if (!file.ok()) return file.status();
+  IniDocument* document = &file->document();
+  PutVersion4(document, record->enable_nfs_v4 != 0);
+  PutSwitch(document, "mountd", "manage-gids", record->unix_pri_enable != 0);
+  Put(document, kOurs, "read-size", IniValue::From(record->read_size));
+  Put(document, kOurs, "write-size", IniValue::From(record->write_size));
+  if (Status status = PutPrincipal(document, *record); !status.ok()) return status;
+  PutPorts(document, *record);
+  return file->Save().status();
+}
+
+}  // namespace
+}  // namespace vorn
+
+int VORNNFSConfGet(NFSConfRecord* record) { return vorn::ToResult(vorn::ReadRecord(record)); }
+
+int VORNNFSConfSet(const NFSConfRecord* record) { return vorn::ToResult(vorn::WriteRecord(record)); }

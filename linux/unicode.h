@@ -1,0 +1,28 @@
+// Upper and lower case, as Unicode has them.
+#ifndef VORN_LINUX_UNICODE_H
+#define VORN_LINUX_UNICODE_H
+
+#include <string>
+#include <string_view>
+
+#include "status.h"
+
+namespace vorn {
+
+// Unicode's full case mapping, of no particular language. Fails on text that is no UTF-8.
+Result<std::string> UpperCase(std::string_view text);
+
+// A test for "contains this text, upper and lower case being the same". Text that is no UTF-8 is
+// compared byte for byte.
+class CaselessSubstring {
+ public:
+  explicit CaselessSubstring(std::string_view substring);
+  bool IsIn(std::string_view text) const;
+
+ private:
+  std::string substring_;
+};
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_UNICODE_H

@@ -18,7 +18,8 @@ bool IsLoopbackHost(std::string_view host) {
   const std::string lower = LowerAscii(host);
   for (const std::string_view name : {"localhost", "127.0.0.1", "[::1]"}) {
     if (lower.compare(0, name.size(), name) != 0) continue;
-    const std::string_view rest = std::string_view(lower).substr(name.size());
+    std::string_view rest = lower;
+    rest.remove_prefix(name.size());
     return rest.empty() || (rest.front() == ':' && IsPort(rest.substr(1)));
   }
   return false;

@@ -44,7 +44,8 @@ std::optional<RuntimeFolder> RuntimeFolder::Claim(const std::string& root, std::
       return std::nullopt;
     }
     if (!IsBelow(path, root)) {
-      *error = root + ": /run/vorn would be " + path + ", which is outside";
+      *error = path;
+      error->append(" is outside of the root ").append(root);
       return std::nullopt;
     }
   }

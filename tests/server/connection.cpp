@@ -61,14 +61,6 @@ Connection Connection::ToPort(int port) {
   return Connection(ConnectTo(address, AF_INET));
 }
 
-Connection Connection::ToLoopback6(int port) {
-  sockaddr_in6 address{};
-  address.sin6_family = AF_INET6;
-  address.sin6_port = htons(static_cast<in_port_t>(port));
-  address.sin6_addr = in6addr_loopback;
-  return Connection(ConnectTo(address, AF_INET6));
-}
-
 bool Connection::Send(std::string_view bytes) {
   while (!bytes.empty()) {
     const ssize_t sent = send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);

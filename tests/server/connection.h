@@ -24,7 +24,6 @@ class Connection {
  public:
   static Connection ToUnix(const std::string& path);
   static Connection ToPort(int port);  // of 127.0.0.1
-  static Connection ToLoopback6(int port);
 
   bool connected() const { return static_cast<bool>(socket_); }
 

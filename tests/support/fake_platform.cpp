@@ -23,7 +23,7 @@ std::string FormatText(const char* format, va_list arguments) {
 }
 
 LogLine TakeApart(int priority, const char* format, const std::string& text) {
-  LogLine line{priority, "", 0, text};
+  LogLine line{priority, "", 0, text, 0};
   const size_t colon = text.find(':');
   const size_t blank = text.find(' ');
   if (std::string(format).rfind("%s:%d ", 0) != 0 || colon == std::string::npos || blank < colon) return line;
@@ -35,7 +35,9 @@ LogLine TakeApart(int priority, const char* format, const std::string& text) {
 
 void Log(int priority, const char* format, va_list arguments) {
   const std::string text = FormatText(format, arguments);
-  if (g_current != nullptr) g_current->log.push_back(TakeApart(priority, format, text));
+  if (g_current == nullptr) return;
+  g_current->log.push_back(TakeApart(priority, format, text));
+  g_current->log.back().calls = g_current->calls.size();
 }
 
 bool IsRelease(const std::string& operation) {

@@ -110,7 +110,7 @@ bool EnumerateSuggested(const std::string& filter, StringList* users) {
 
 // ------------------------------------------------------------------------------------ changing
 
-// A list of the local users; null, and logged, on failure.
+// Fills `users` with the local users. False, and logged, if that fails or the list itself is missing.
 bool EnumerateUsers(StringList* users) {
   if (!*users) {
     LOG_ERROR("Failed to KLIBCSzListAlloc.");

@@ -5,7 +5,7 @@
 
 #include <set>
 #include <string>
-#include <vector>
+#include <utility>
 
 #include "entry_functions.h"
 #include "expect_failure.h"

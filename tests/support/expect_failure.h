@@ -29,7 +29,7 @@ inline void ExpectLog(const FakePlatform& platform, const std::string& source, c
   }
 }
 
-// One answer, `code`; `texts` and then the request in the log; nothing left behind.
+// One answer, `code`; `texts` in the log and, last of all that is done, the request; nothing left behind.
 inline void ExpectFailure(const FakePlatform& platform, const Answer& answer, const std::string& params, int code,
                           const std::string& source, std::vector<std::string> texts) {
   SCOPED_TRACE(params);
@@ -37,6 +37,8 @@ inline void ExpectFailure(const FakePlatform& platform, const Answer& answer, co
   EXPECT_EQ(answer.count, 1);
   texts.push_back(RequestText(params));
   ExpectLog(platform, source, texts);
+  ASSERT_FALSE(platform.log.empty());
+  EXPECT_EQ(platform.log.back().calls, platform.calls.size());
   EXPECT_THAT(platform.live_objects, testing::IsEmpty());
 }
 

@@ -15,7 +15,7 @@ namespace {
 
 FakePlatform* g_current = nullptr;
 
-std::string FormatText(const char* format, va_list arguments) {
+[[gnu::format(printf, 1, 0)]] std::string FormatText(const char* format, va_list arguments) {
   char* text = nullptr;
   if (vasprintf(&text, format, arguments) < 0) throw std::bad_alloc();
   const std::unique_ptr<char, decltype(&std::free)> owner(text, &std::free);
@@ -23,7 +23,7 @@ std::string FormatText(const char* format, va_list arguments) {
 }
 
 LogLine TakeApart(int priority, const char* format, const std::string& text) {
-  LogLine line{priority, "", 0, text};
+  LogLine line{priority, "", 0, text, 0};
   const size_t colon = text.find(':');
   const size_t blank = text.find(' ');
   if (std::string(format).rfind("%s:%d ", 0) != 0 || colon == std::string::npos || blank < colon) return line;
@@ -33,9 +33,11 @@ LogLine TakeApart(int priority, const char* format, const std::string& text) {
   return line;
 }
 
-void Log(int priority, const char* format, va_list arguments) {
+[[gnu::format(printf, 2, 0)]] void Log(int priority, const char* format, va_list arguments) {
   const std::string text = FormatText(format, arguments);
-  if (g_current != nullptr) g_current->log.push_back(TakeApart(priority, format, text));
+  if (g_current == nullptr) return;
+  g_current->log.push_back(TakeApart(priority, format, text));
+  g_current->log.back().calls = g_current->calls.size();
 }
 
 bool IsRelease(const std::string& operation) {
@@ -122,7 +124,8 @@ void syslog(int priority, const char* format, ...) {
 }
 
 // What the compiler makes of syslog in a hardened build.
-void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {  // NOLINT(bugprone-reserved-identifier)
+// NOLINTNEXTLINE(bugprone-reserved-identifier)
+[[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);
   Log(priority, format, arguments);

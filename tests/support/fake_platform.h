@@ -21,6 +21,7 @@ struct LogLine {
   std::string source;  // of the "source:line " that every text begins with; "" if it does not
   int line;
   std::string text;  // without that beginning
+  size_t calls;      // how many the module had made by then
 };
 
 // A mapping or an account table in the order in which it was given.

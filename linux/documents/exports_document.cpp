@@ -1,6 +1,7 @@
 #include "exports_document.h"
 
 #include <algorithm>
+#include <iterator>
 #include <set>
 #include <utility>
 
@@ -25,8 +26,8 @@ std::size_t LineEnd(std::string_view text, std::size_t position) {
 // Reads one line, from its path on. After a fault the line ends where it does to the eye.
 class LineReader {
  public:
-  LineReader(std::string_view text, std::size_t line_begin) : text_(text), reader_(text, line_begin) {
-    line_.span.begin = line_begin;
+  LineReader(std::string_view text, const ExportSpan& span) : text_(text), reader_(text, span.path) {
+    line_.span = span;
   }
 
   ExportLine Read() {
@@ -43,7 +44,6 @@ class LineReader {
   }
 
   bool ReadPath() {
-    reader_.SkipToPath();
     word_begin_ = reader_.position();
     const Found found = reader_.ReadWord(kLongestExportPath, &word_);
     if (found == Found::kNothing) return Fail("the line begins with something that is no path");
@@ -117,33 +117,34 @@ class LineReader {
 // marks and backslashes, nearly all, end at the next line break, whatever they say.
 ExportSpan NextLine(std::string_view text, std::size_t position) {
   ExportsReader reader(text, position);
-  const std::size_t begin = reader.SkipToPath();
-  if (reader.at_end()) return {text.size(), text.size()};
-  const std::size_t newline = text.find('\n', begin);
-  const std::size_t end = newline == std::string_view::npos ? text.size() : newline + 1;
-  const std::string_view line = text.substr(begin, end - begin);
+  ExportSpan span;
+  span.begin = reader.SkipToPath();
+  span.path = reader.position();
+  const std::size_t newline = text.find('\n', span.path);
+  span.end = newline == std::string_view::npos ? text.size() : newline + 1;
+  const std::string_view line = text.substr(span.path, span.end - span.path);
   const bool simple = line.find('\\') == std::string_view::npos && line.find('"') == std::string_view::npos;
-  return simple ? ExportSpan{begin, end} : LineReader(text, begin).Read().span;
+  return simple ? span : LineReader(text, span).Read().span;
 }
 
-template <typename Visitor>
-void ForEachLine(std::string_view text, const Visitor& visit) {
-  for (ExportSpan line = NextLine(text, 0); line.begin < line.end; line = NextLine(text, line.end)) visit(line);
-}
-
-bool IsNormal(std::string_view path) {
-  return path.find("//") == std::string_view::npos && path.find("/.") == std::string_view::npos &&
-         (path.size() < 2 || path.back() != '/');
+// The first word as it is written, where it needs no decoding; else empty.
+std::string_view PlainWord(std::string_view line) {
+  char last = '\0';
+  for (std::size_t i = 0; i < line.size(); ++i) {
+    const char c = line[i];
+    const bool special = c == '"' || c == '\\' || (last == '/' && (c == '/' || c == '.'));
+    if (special) return {};
+    if (ExportsReader::EndsWord(c)) return last == '/' && i > 1 ? std::string_view() : line.substr(0, i);
+    last = c;
+  }
+  return {};
 }
 
 // Whether a line is one of `path`, which is in normal form.
-bool Names(std::string_view text, ExportSpan line, std::string_view path) {
-  ExportsReader reader(text, line.begin);
-  reader.SkipToPath();
-  const std::string_view rest = text.substr(reader.position(), line.end - reader.position());
-  const std::string_view raw = rest.substr(0, rest.find_first_of(std::string_view(" \t\n\v\f\r\0", 7)));
-  if (raw == path) return true;
-  if (raw.find_first_of("\\\"") == std::string_view::npos && IsNormal(raw)) return false;
+bool Names(std::string_view text, const ExportSpan& span, std::string_view path) {
+  const std::string_view plain = PlainWord(text.substr(span.path, span.end - span.path));
+  if (!plain.empty()) return plain == path;
+  ExportsReader reader(text, span.path);
   std::string word;
   return reader.ReadWord(kLongestExportPath, &word) == Found::kWord && NormalExportPath(word) == path;
 }
@@ -164,85 +165,103 @@ void AppendEntries(std::string* line, const std::vector<ExportEntry>& entries) {
   }
 }
 
-bool SameEntries(const std::vector<ExportEntry>& a, const std::vector<ExportEntry>& b) {
-  return std::equal(a.begin(), a.end(), b.begin(), b.end(), [](const ExportEntry& x, const ExportEntry& y) {
-    return x.client == y.client && x.options == y.options;
-  });
+std::string_view Text(std::string_view text, const ExportSpan& line) {
+  return text.substr(line.begin, line.end - line.begin);
 }
 
-// The lines that are not of `path`, one after the other, without their ends: what stands at the end
-// of the file may need a line break before another line can follow.
-std::vector<std::string_view> Foreign(std::string_view text, const std::string& path) {
-  std::vector<std::string_view> lines;
-  ForEachLine(text, [&](ExportSpan line) {
-    if (Names(text, line, path)) return;
-    const std::string_view whole = text.substr(line.begin, line.end - line.begin);
-    lines.push_back(whole.substr(0, whole.find_last_not_of("\\\n") + 1));
-  });
-  return lines;
-}
+// What stands last in the file may need a line break before another line can follow.
+std::string_view WithoutEnd(std::string_view line) { return line.substr(0, line.find_last_not_of("\\\n") + 1); }
 
 }  // namespace
 
+bool operator==(const ExportEntry& a, const ExportEntry& b) { return a.client == b.client && a.options == b.options; }
+
+ExportsDocument::ExportsDocument(std::string text) : text_(std::move(text)) {
+  lines_.reserve(text_.size() / 64 + 1);
+  ExportSpan line = NextLine(text_, 0);
+  for (; line.path < text_.size(); line = NextLine(text_, line.end)) lines_.push_back(line);
+}
+
 std::vector<ExportLine> ExportsDocument::Lines() const {
   std::vector<ExportLine> lines;
-  ForEachLine(text_, [&](ExportSpan line) { lines.push_back(LineReader(text_, line.begin).Read()); });
+  lines.reserve(lines_.size());
+  for (const ExportSpan& line : lines_) lines.push_back(LineReader(text_, line).Read());
   return lines;
 }
 
+ExportsDocument::Spans ExportsDocument::LinesOf(std::string_view path) const {
+  Spans own;
+  std::copy_if(lines_.begin(), lines_.end(), std::back_inserter(own),
+               [&](const ExportSpan& line) { return Names(text_, line, path); });
+  return own;
+}
+
+ExportsDocument::Spans ExportsDocument::LinesBut(const Spans& own) const {
+  Spans others;
+  others.reserve(lines_.size());
+  std::set_difference(lines_.begin(), lines_.end(), own.begin(), own.end(), std::back_inserter(others),
+                      [](const ExportSpan& a, const ExportSpan& b) { return a.begin < b.begin; });
+  return others;
+}
+
 std::vector<ExportEntry> ExportsDocument::Entries(std::string_view path) const {
-  const std::string normal = NormalExportPath(path);
+  return EntriesIn(LinesOf(NormalExportPath(path)));
+}
+
+std::vector<ExportEntry> ExportsDocument::EntriesIn(const Spans& own) const {
   std::vector<ExportEntry> entries;
   std::set<std::string> seen;
-  ForEachLine(text_, [&](ExportSpan line) {
-    if (!Names(text_, line, normal)) return;
-    for (ExportEntry& entry : LineReader(text_, line.begin).Read().entries) {
+  for (const ExportSpan& line : own) {
+    for (ExportEntry& entry : LineReader(text_, line).Read().entries) {
       if (seen.insert(ExportClientKey(entry.client)).second) entries.push_back(std::move(entry));
     }
-  });
+  }
   return entries;
 }
 
 Status ExportsDocument::Replace(std::string_view path, const std::vector<ExportEntry>& entries) {
   const std::string normal = NormalExportPath(path);
-  ExportsDocument edited(Rendered(normal, entries));
-  Status status = CheckEdit(edited, normal, entries);
-  if (status.ok()) text_ = std::move(edited.text_);
-  return status;
+  const std::string where = "the exports of " + normal + " cannot be written: ";
+  const Spans own = LinesOf(normal);
+  ExportsDocument edited(Rendered(own, normal, entries));
+  const Spans written = edited.LinesOf(normal);
+  if (!(edited.EntriesIn(written) == entries)) return Status::Failure(kRefusedText, where + "they do not read back");
+  if (!SameLines(LinesBut(own), edited, edited.LinesBut(written))) {
+    return Status::Failure(kRefusedText, where + "the file's other lines would change");
+  }
+  *this = std::move(edited);
+  return {};
 }
 
-std::string ExportsDocument::Rendered(const std::string& path, const std::vector<ExportEntry>& entries) const {
+bool ExportsDocument::SameLines(const Spans& lines, const ExportsDocument& other, const Spans& other_lines) const {
+  return std::equal(lines.begin(), lines.end(), other_lines.begin(), other_lines.end(),
+                    [&](const ExportSpan& a, const ExportSpan& b) {
+                      return Text(text_, a) == Text(other.text_, b) ||
+                             WithoutEnd(Text(text_, a)) == WithoutEnd(Text(other.text_, b));
+                    });
+}
+
+std::string ExportsDocument::Rendered(const Spans& own, const std::string& path,
+                                      const std::vector<ExportEntry>& entries) const {
   std::string out;
   out.reserve(text_.size() + 512);
   std::size_t copied = 0;
   bool missing = !entries.empty();
-  ForEachLine(text_, [&](ExportSpan span) {
-    if (!Names(text_, span, path)) return;
+  for (const ExportSpan& span : own) {
     out.append(text_, copied, span.begin - copied);
     copied = span.end;
-    if (!missing) return;
-    const ExportLine line = LineReader(text_, span.begin).Read();
+    if (!missing) continue;
+    const ExportLine line = LineReader(text_, span).Read();
     out.append(text_, span.begin, line.path_end - span.begin);
     AppendEntries(&out, entries);
     out.append(line.comment.empty() ? "" : " ").append(line.comment).append("\n");
     missing = false;
-  });
+  }
   out.append(text_, copied);
   if (!missing) return out;
   out.append(Separator(out)).append(EncodeExportsWord(path));
   AppendEntries(&out, entries);
   return out.append("\n");
-}
-
-Status ExportsDocument::CheckEdit(const ExportsDocument& edited, const std::string& path,
-                                  const std::vector<ExportEntry>& entries) const {
-  const std::string where = "the exports of " + path + " cannot be written: ";
-  if (!SameEntries(edited.Entries(path), entries))
-    return Status::Failure(kRefusedText, where + "they do not read back");
-  if (Foreign(edited.text_, path) != Foreign(text_, path)) {
-    return Status::Failure(kRefusedText, where + "the file's other lines would change");
-  }
-  return {};
 }
 
 std::size_t ExportsDocument::LineNumber(std::size_t position) const {

@@ -21,9 +21,13 @@ struct ExportEntry {
   std::string word;
 };
 
-// The beginning and end of a line, with its continuations and its line break.
+// The same client with the same options, however the two are written.
+bool operator==(const ExportEntry& a, const ExportEntry& b);
+
+// Where a line is: with its continuations and its line break.
 struct ExportSpan {
   std::size_t begin = 0;
+  std::size_t path = 0;  // its first word, after blanks
   std::size_t end = 0;
 };
 
@@ -41,7 +45,7 @@ struct ExportLine {
 
 class ExportsDocument {
  public:
-  explicit ExportsDocument(std::string text) : text_(std::move(text)) {}
+  explicit ExportsDocument(std::string text);
 
   const std::string& text() const { return text_; }
 
@@ -62,11 +66,16 @@ class ExportsDocument {
   std::size_t LineNumber(std::size_t position) const;
 
  private:
-  std::string Rendered(const std::string& path, const std::vector<ExportEntry>& entries) const;
-  Status CheckEdit(const ExportsDocument& edited, const std::string& path,
-                   const std::vector<ExportEntry>& entries) const;
+  using Spans = std::vector<ExportSpan>;
+
+  Spans LinesOf(std::string_view path) const;
+  Spans LinesBut(const Spans& own) const;
+  std::vector<ExportEntry> EntriesIn(const Spans& own) const;
+  std::string Rendered(const Spans& own, const std::string& path, const std::vector<ExportEntry>& entries) const;
+  bool SameLines(const Spans& lines, const ExportsDocument& other, const Spans& other_lines) const;
 
   std::string text_;
+  Spans lines_;
 };
 
 }  // namespace vorn

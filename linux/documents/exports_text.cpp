@@ -7,9 +7,6 @@ namespace {
 
 constexpr int kEnd = -1;
 
-// A NUL is a blank to exportfs(8), which looks it up in a C string of blanks.
-bool IsBlank(int c) { return c == ' ' || c == '\t' || c == '\0'; }
-bool EndsWord(int c) { return IsBlank(c) || (c >= '\t' && c <= '\r'); }
 bool IsOctal(char c) { return c >= '0' && c <= '7'; }
 
 // Makes one byte of an escape that has just been completed. As in exportfs(8), the backslash may

@@ -19,6 +19,9 @@ class ExportsReader {
  public:
   enum class Found { kWord, kNothing, kTooLong };
 
+  // Whether a byte ends a word outside of quotation marks.
+  static bool EndsWord(int c) { return IsBlank(c) || (c >= '\t' && c <= '\r'); }
+
   explicit ExportsReader(std::string_view text, std::size_t position = 0) : text_(text), position_(position) {}
 
   std::size_t position() const { return position_; }
@@ -39,6 +42,9 @@ class ExportsReader {
   std::size_t word_end() const { return word_end_; }
 
  private:
+  // A NUL is a blank to exportfs(8), which looks it up in a C string of blanks.
+  static bool IsBlank(int c) { return c == ' ' || c == '\t' || c == '\0'; }
+
   int Next();
   void SkipComment();
 

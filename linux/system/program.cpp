@@ -4,7 +4,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <spawn.h>
-#include <sys/pidfd.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -103,7 +103,7 @@ class Child {
                                   Pointers(&environment).data());
     if (error != 0) return Status::System(error, path);
     fcntl(output.get(), F_SETFL, O_NONBLOCK);
-    return Child(id, std::move(output), FileDescriptor(pidfd_open(id, 0)));
+    return Child(id, std::move(output), FileDescriptor(static_cast<int>(syscall(SYS_pidfd_open, id, 0))));
   }
 
   // Takes output until the program has ended, or the time is over; true when it has ended.

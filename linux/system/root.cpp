@@ -86,4 +86,10 @@ Result<std::string> Root::Locate(std::string_view path) const {
   return Resolver(directory_, path).Resolve();
 }
 
+std::string Root::OnBox(const std::string& located) const {
+  if (is_box()) return located;
+  const std::string path = located.substr(directory_.size());
+  return path.empty() ? "/" : path;
+}
+
 }  // namespace vorn

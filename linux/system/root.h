@@ -27,6 +27,9 @@ class Root {
   // folder above it) need not exist. Fails on a loop of links and on a relative path.
   Result<std::string> Locate(std::string_view path) const;
 
+  // What the box calls a place that Locate found: "/volume1/data", without links.
+  std::string OnBox(const std::string& located) const;
+
  private:
   std::string directory_;
 };

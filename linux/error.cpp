@@ -19,6 +19,14 @@ const char* BaseName(const char* path) {
   return slash == nullptr ? path : slash + 1;
 }
 
+// A refused text may be in the reason, line breaks and all; it must not make log lines of its own.
+std::string OnOneLine(std::string text) {
+  for (char& c : text) {
+    if (static_cast<unsigned char>(c) < ' ' || c == '\x7f') c = '?';
+  }
+  return text;
+}
+
 }  // namespace
 
 namespace vorn {
@@ -31,7 +39,7 @@ int ToSilentResult(const Status& status) {
 
 int ToResult(const Status& status) {
   if (ToSilentResult(status) == 0) return 0;
-  syslog(LOG_ERR, "%s:%d %s", last_error.file, last_error.line, status.reason().c_str());
+  syslog(LOG_ERR, "%s:%d %s", last_error.file, last_error.line, OnOneLine(status.reason()).c_str());
   return -1;
 }
 

@@ -81,8 +81,9 @@ using Entries = std::unique_ptr<KeytabEntry, FreeEntries>;
 Result<Entries> List(const char* path) {
   const Result<std::string> place = Root::Current().Locate(path);
   if (!place.ok()) return place.status();
-  const Result<FileText> file = ReadFile(*place);
+  const Result<FileText> file = ReadFileOrNothing(*place);
   if (!file.ok()) return file.status();
+  if (!file->stamp.exists) return Entries();  // a box without Kerberos has no keys
   const Result<std::vector<KeytabKey>> keys = ReadKeytab(file->text);
   if (!keys.ok()) return keys.status();
   Entries list;

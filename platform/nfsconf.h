@@ -120,7 +120,7 @@ static_assert(offsetof(KeytabEntry, principal) == 4, "record layout");
 static_assert(offsetof(KeytabEntry, enc_type) == 518, "record layout");
 static_assert(offsetof(KeytabEntry, next) == 584, "record layout");
 
-// Lists the keys of the keytab at `path`, in file order. The list (null when the keytab is empty)
+// Lists the keys of the keytab at `path`, in file order. The list (null when there is no key, or no file)
 // belongs to the caller, also when the operation failed half-way, and goes with one
 // VORNNFSKeytabInfoFree.
 int VORNNFSKeytabInfoGet(const char* path, KeytabEntry** list);

@@ -63,7 +63,8 @@ bool IsJob(const std::string& method) { return method.size() > 4 && method.subst
 StandInManager::StandInManager() {
   address_ = "unix:path=" + folder_.At("/bus");
   folder_.Write("/bus.conf", "<busconfig><type>session</type><listen>" + address_ +
-                                 "</listen><policy context=\"default\"><allow send_destination=\"*\"/>"
+                                 "</listen><policy context=\"default\"><allow send_destination=\"*\" "
+                                 "eavesdrop=\"true\"/><allow eavesdrop=\"true\"/>"
                                  "<allow own=\"*\"/></policy></busconfig>");
   const std::string option = "--config-file=" + folder_.At("/bus.conf");
   daemon_ = std::make_unique<ChildProcess>([option] {

@@ -1,0 +1,66 @@
+#include "idmap_judge.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <fstream>
+#include <functional>
+#include <stdexcept>
+
+#include "processes.h"
+#include "temporary_root.h"
+
+extern "C" {
+#include <sys/types.h>
+// Needs the types above, and says nothing of C++ itself.
+#include <nfsidmap.h>
+}
+
+namespace {
+
+void Silent(const char* /*format*/, ...) {}
+
+// Asks in a process of its own: the library reads its file once.
+std::vector<std::string> Ask(const std::string& path, const std::function<void(std::ostream&)>& questions) {
+  const TemporaryRoot scratch;
+  ChildProcess child([&] {
+    std::string file = path;
+    nfs4_set_debug(0, Silent);
+    if (nfs4_init_name_mapping(file.data()) != 0) return 1;
+    std::ofstream answers(scratch.At("/answers"));
+    questions(answers);
+    return answers.flush() ? 0 : 2;
+  });
+  if (child.Wait() != 0) throw std::runtime_error("the ID-mapping library refuses " + path);
+  std::ifstream answers(scratch.At("/answers"));
+  std::vector<std::string> lines;
+  for (std::string line; std::getline(answers, line);) lines.push_back(line);
+  return lines;
+}
+
+}  // namespace
+
+std::vector<std::optional<unsigned>> MapByLibrary(const std::string& path, const std::vector<std::string>& principals) {
+  const std::vector<std::string> lines = Ask(path, [&](std::ostream& answers) {
+    for (std::string principal : principals) {
+      char mechanism[] = "krb5";
+      uid_t user = 0;
+      gid_t group = 0;
+      const bool mapped = nfs4_gss_princ_to_ids(mechanism, principal.data(), &user, &group) == 0;
+      answers << (mapped ? std::to_string(user) : "none") << "\n";
+    }
+  });
+  std::vector<std::optional<unsigned>> users;
+  for (const std::string& line : lines) {
+    users.push_back(line == "none" ? std::nullopt : std::optional<unsigned>(std::stoul(line)));
+  }
+  return users;
+}
+
+std::string DomainByLibrary(const std::string& path) {
+  const std::vector<std::string> lines = Ask(path, [](std::ostream& answers) {
+    char domain[512] = "";
+    nfs4_get_default_domain(nullptr, domain, sizeof domain);
+    answers << domain << "\n";
+  });
+  return lines.empty() ? "" : lines.front();
+}

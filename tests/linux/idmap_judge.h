@@ -1,0 +1,16 @@
+// What the ID-mapping library of nfs-utils makes of an idmapd.conf: libnfsidmap.
+#ifndef VORN_TESTS_LINUX_IDMAP_JUDGE_H
+#define VORN_TESTS_LINUX_IDMAP_JUDGE_H
+
+#include <optional>
+#include <string>
+#include <vector>
+
+// The local user ids of Kerberos principals; none where a principal is mapped to nobody. The local
+// names are those of this system's users.
+std::vector<std::optional<unsigned>> MapByLibrary(const std::string& path, const std::vector<std::string>& principals);
+
+// The NFSv4 domain.
+std::string DomainByLibrary(const std::string& path);
+
+#endif  // VORN_TESTS_LINUX_IDMAP_JUDGE_H

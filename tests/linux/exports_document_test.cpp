@@ -311,7 +311,7 @@ TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
 }
 
 TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
-  for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)"}) {
+  for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)", "/b \"x)\n"}) {
     ExportsDocument document(text);
     EXPECT_EQ(document.Replace("/a", {Entry("h", "")}).code(), kRefusedText) << text;
     EXPECT_EQ(document.text(), text);

@@ -169,8 +169,14 @@ std::string_view Text(std::string_view text, const ExportSpan& line) {
   return text.substr(line.begin, line.end - line.begin);
 }
 
-// What stands last in the file may need a line break before another line can follow.
 std::string_view WithoutEnd(std::string_view line) { return line.substr(0, line.find_last_not_of("\\\n") + 1); }
+
+// The last line of a file may need a line break before another can follow. That must not make a
+// fault of it, as it would of an open quotation.
+bool SameLastLine(std::string_view text, const ExportSpan& line, std::string_view other, const ExportSpan& same) {
+  if (WithoutEnd(Text(text, line)) != WithoutEnd(Text(other, same))) return false;
+  return LineReader(other, same).Read().fault.empty() || !LineReader(text, line).Read().fault.empty();
+}
 
 }  // namespace
 
@@ -236,8 +242,8 @@ Status ExportsDocument::Replace(std::string_view path, const std::vector<ExportE
 bool ExportsDocument::SameLines(const Spans& lines, const ExportsDocument& other, const Spans& other_lines) const {
   return std::equal(lines.begin(), lines.end(), other_lines.begin(), other_lines.end(),
                     [&](const ExportSpan& a, const ExportSpan& b) {
-                      return Text(text_, a) == Text(other.text_, b) ||
-                             WithoutEnd(Text(text_, a)) == WithoutEnd(Text(other.text_, b));
+                      if (a.end == text_.size()) return SameLastLine(text_, a, other.text_, b);
+                      return Text(text_, a) == Text(other.text_, b);
                     });
 }
 

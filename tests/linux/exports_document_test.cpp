@@ -311,8 +311,11 @@ TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
 }
 
 TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
-  ExportsDocument document("\"/b x\n");
-  EXPECT_EQ(document.Replace("/a", {Entry("h", "")}).code(), kRefusedText);
+  for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)", "/b \"x)\n"}) {
+    ExportsDocument document(text);
+    EXPECT_EQ(document.Replace("/a", {Entry("h", "")}).code(), kRefusedText) << text;
+    EXPECT_EQ(document.text(), text);
+  }
 }
 
 TEST(ExportsDocument, TellsWhereExportfsGivesUpAndWhy) {

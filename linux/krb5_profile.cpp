@@ -55,7 +55,7 @@ class Flattener {
     if (++depth_ > kDeepestInclude) return Status::Failure(kSyntax, path + " is included too deep");
     const Result<FileText> file = ReadFile(path);
     if (!file.ok()) return file.status();
-    const Status status = AddText(file->text);
+    Status status = AddText(file->text);
     --depth_;
     return status;
   }
@@ -114,7 +114,7 @@ class Flattener {
     std::error_code error;
     for (const fs::directory_entry& entry : fs::directory_iterator(*place, error)) {
       const std::string name = entry.path().filename();
-      if (IsIncluded(name)) paths.push_back(path + "/" + name);
+      if (IsIncluded(name)) paths.push_back((fs::path(path) / name).string());
     }
     if (error) return Status::System(error.value(), *place);
     std::sort(paths.begin(), paths.end());

@@ -90,10 +90,11 @@ bool IsEndedIniLine(std::string_view line) {
 
 IniLine ReadIniLine(std::string_view line) {
   const std::string joined = Joined(line);
-  const std::size_t begin = joined.find_first_not_of(kSpace);
-  if (begin == kNone || joined[begin] == '#' || joined[begin] == ';') return {};
-  if (joined[begin] == '[') return ReadSection(std::string_view(joined).substr(begin));
-  return ReadAssignment(joined, begin);
+  const std::string_view text = joined;
+  const std::size_t begin = text.find_first_not_of(kSpace);
+  if (begin == kNone || text[begin] == '#' || text[begin] == ';') return {};
+  if (text[begin] == '[') return ReadSection(text.substr(begin));
+  return ReadAssignment(text, begin);
 }
 
 }  // namespace vorn

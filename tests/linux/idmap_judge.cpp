@@ -50,6 +50,7 @@ std::vector<std::optional<unsigned>> MapByLibrary(const std::string& path, const
     }
   });
   std::vector<std::optional<unsigned>> users;
+  users.reserve(lines.size());
   for (const std::string& line : lines) {
     users.push_back(line == "none" ? std::nullopt : std::optional<unsigned>(std::stoul(line)));
   }

@@ -28,6 +28,7 @@ class List {
 
   std::vector<std::string> Items() const {
     std::vector<std::string> items;
+    items.reserve(static_cast<std::size_t>(list_->count));
     for (int i = 0; i < list_->count; ++i) items.emplace_back(KLIBCSzListGet(list_, i));
     return items;
   }

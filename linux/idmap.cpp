@@ -1,6 +1,7 @@
 #include <netdb.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
@@ -25,9 +26,10 @@ struct Holding {
   ConfigurationLock lock;
   std::string path;  // the file that it was read of
   FileStamp stamp;
+  std::string domain;  // as it was handed out
 };
 
-Holding* HoldingOf(const _tag_nfs_id_map_* record) { return static_cast<Holding*>(record->platform[0]); }
+Holding* HoldingOf(const _tag_nfs_id_map_& record) { return static_cast<Holding*>(record.platform[0]); }
 
 // ---------------------------------------------------------------------------------------------
 // The domain that holds where the file names none: idmapd.conf(5).
@@ -49,10 +51,7 @@ std::string DefaultDomain() {
   return dot == std::string::npos || dot + 1 == host.size() ? "localdomain" : host.substr(dot + 1);
 }
 
-std::string EffectiveDomain(const IniDocument& document) {
-  const std::optional<std::string> domain = document.Get("General", "Domain");
-  return domain ? *domain : DefaultDomain();
-}
+std::optional<std::string> DomainIn(const IniDocument& document) { return document.Get("General", "Domain"); }
 
 // ---------------------------------------------------------------------------------------------
 // Reading.
@@ -71,7 +70,17 @@ struct Free {
 };
 using IDMap = std::unique_ptr<_tag_nfs_id_map_, Free>;
 
+// Nobody waits for this record's lock while a name server is asked.
+Result<std::string> DomainBeforeLocking() {
+  const Result<IniFile> file = IniFile::Open(kFile);
+  if (!file.ok()) return file.status();
+  const std::optional<std::string> stored = DomainIn(file->document());
+  return stored ? *stored : DefaultDomain();
+}
+
 Result<IDMap> ReadIDMap() {
+  const Result<std::string> domain_before = DomainBeforeLocking();
+  if (!domain_before.ok()) return domain_before.status();
   IDMap record(new _tag_nfs_id_map_{});
   auto* holding = new Holding;
   record->platform[0] = holding;
@@ -80,7 +89,8 @@ Result<IDMap> ReadIDMap() {
   if (!file.ok()) return file.status();
   holding->path = file->path();
   holding->stamp = file->stamp();
-  record->domain = strdup(EffectiveDomain(file->document()).c_str());
+  holding->domain = DomainIn(file->document()).value_or(*domain_before);
+  record->domain = strdup(holding->domain.c_str());
   record->table = KLIBCSzHashAlloc(0);
   if (record->domain == nullptr || record->table == nullptr) return Status::System(ENOMEM, kFile);
   if (Status status = FillTable(file->document(), &record->table); !status.ok()) return status;
@@ -172,7 +182,6 @@ Status StoreTable(const KLIBSZHASH& table, IniDocument* document) {
 }
 
 Status StoreDomain(const std::string& domain, IniDocument* document) {
-  if (domain == EffectiveDomain(*document)) return {};
   if (domain.empty()) {
     document->Remove("General", "Domain");
     return {};
@@ -183,9 +192,21 @@ Status StoreDomain(const std::string& domain, IniDocument* document) {
   return {};
 }
 
-Status CheckUnchangedSince(const Holding* holding, const IniFile& file) {
-  if (holding == nullptr || holding->path != file.path() || IsSameFile(holding->stamp, file.stamp())) return {};
-  return Status::Failure(kChangedBehind, file.path() + " was changed by somebody else meanwhile");
+// What the record holds, if it was read of that file.
+Holding* HoldingOf(const _tag_nfs_id_map_& record, const IniFile& file) {
+  Holding* holding = HoldingOf(record);
+  return holding != nullptr && holding->path == file.path() ? holding : nullptr;
+}
+
+// A default domain that the caller left alone is not written down.
+bool IsNewDomain(const char* domain, const Holding* holding) {
+  return domain != nullptr && (holding == nullptr || domain != holding->domain);
+}
+
+// What a further write of the same record begins with.
+void Remember(const FileStamp& stamp, const _tag_nfs_id_map_& record, Holding* holding) {
+  holding->stamp = stamp;
+  if (record.domain != nullptr) holding->domain = record.domain;
 }
 
 Status WriteIDMap(const char* path, const _tag_nfs_id_map_* record) {
@@ -194,19 +215,21 @@ Status WriteIDMap(const char* path, const _tag_nfs_id_map_* record) {
   if (!lock.status().ok()) return lock.status();
   Result<IniFile> file = IniFile::Open(path);
   if (!file.ok()) return file.status();
-  Holding* holding = HoldingOf(record);
-  if (Status status = CheckUnchangedSince(holding, *file); !status.ok()) return status;
-
+  Holding* holding = HoldingOf(*record, *file);
+  if (holding != nullptr && !IsSameFile(holding->stamp, file->stamp())) {
+    return Status::Failure(kChangedBehind, file->path() + " was changed by somebody else meanwhile");
+  }
   IniDocument* document = &file->document();
-  if (record->domain != nullptr) {
+  if (IsNewDomain(record->domain, holding)) {
     if (Status status = StoreDomain(record->domain, document); !status.ok()) return status;
   }
   if (record->table != nullptr) {
     if (Status status = StoreTable(*record->table, document); !status.ok()) return status;
   }
   const Result<FileStamp> stamp = file->Save();
-  if (stamp.ok() && holding != nullptr && holding->path == file->path()) holding->stamp = *stamp;
-  return stamp.status();
+  if (!stamp.ok()) return stamp.status();
+  if (holding != nullptr) Remember(*stamp, *record, holding);
+  return {};
 }
 
 // ---------------------------------------------------------------------------------------------
@@ -244,7 +267,7 @@ void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
   if (record == nullptr) return;
   std::free(record->domain);
   KLIBCSzHashFree(record->table);
-  delete vorn::HoldingOf(record);
+  delete vorn::HoldingOf(*record);
   delete record;
 }
 

@@ -2,12 +2,11 @@
 
 #include <pwd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <functional>
 #include <memory>
-#include <optional>
 #include <sstream>
 #include <vector>
 

@@ -39,13 +39,19 @@ class BusError {
   std::string text(int result) const {
     return error_.message != nullptr ? error_.message : std::string(std::strerror(-result));
   }
+  bool is_no_unit() const {
+    return sd_bus_error_has_name(&error_, "org.freedesktop.systemd1.NoSuchUnit") > 0 ||
+           sd_bus_error_has_name(&error_, "org.freedesktop.systemd1.UnitMasked") > 0;
+  }
 
  private:
   sd_bus_error error_ = SD_BUS_ERROR_NULL;
 };
 
-Status Failed(const std::string& what, const std::string& why) {
-  return Status::Failure(kServiceFailed, what + ": " + why);
+constexpr char kOddAnswer[] = "an answer of another kind";
+
+Status Failed(const std::string& what, const std::string& why, int code = kServiceFailed) {
+  return Status::Failure(code, what + ": " + why);
 }
 
 Result<Bus> Connect(const std::string& address) {
@@ -72,50 +78,33 @@ class Manager {
     return std::unique_ptr<Manager>(new Manager(std::move(*bus), options.job_limit));
   }
 
-  // Calls a method that answers with one text.
-  Result<std::string> Ask(const char* method, const char* argument) {
-    BusError error;
-    sd_bus_message* reply = nullptr;
-    const int result = sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, method, error.get(), &reply,
-                                          "s", argument);
-    const Message owned(reply);
-    if (result < 0) return Failed(std::string(method) + " " + argument, error.text(result));
-    const char* text = nullptr;
-    // A unit's state is a text, a unit itself an object path.
-    if (sd_bus_message_read(reply, "s", &text) < 0 && sd_bus_message_read(reply, "o", &text) < 0) {
-      return Failed(method, "an answer of another kind");
-    }
-    return std::string(text);
+  // The state of a unit's file, as systemctl(1) is-enabled prints it.
+  Result<std::string> UnitFileState(const char* unit) {
+    const Result<Message> reply = Call("GetUnitFileState", unit, "s", unit);
+    if (!reply.ok()) return reply.status();
+    const char* state = nullptr;
+    if (sd_bus_message_read(reply->get(), "s", &state) < 0) return Failed("GetUnitFileState", kOddAnswer);
+    return std::string(state);
   }
 
-  Status Reload() {
-    BusError error;
-    const int result =
-        sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, "Reload", error.get(), nullptr, nullptr);
-    return result < 0 ? Failed("systemctl daemon-reload", error.text(result)) : Status();
-  }
+  // Has systemd read its files again.
+  Status Reload() { return Call("Reload", "", "").status(); }
 
-  Status Enable() { return ChangeUnitFiles("EnableUnitFiles", true); }
-  Status Disable() { return ChangeUnitFiles("DisableUnitFiles", false); }
+  Status Enable(const char* unit) { return Call("EnableUnitFiles", unit, "asbb", 1, unit, 0, 1).status(); }
+  Status Disable(const char* unit) { return Call("DisableUnitFiles", unit, "asb", 1, unit, 0).status(); }
 
   // A unit that was never loaded has nothing to forget.
-  void ForgetFailure(const char* unit) {
-    sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, "ResetFailedUnit", nullptr, nullptr, "s",
-                       unit);
-  }
+  void ForgetFailure(const char* unit) { static_cast<void>(Call("ResetFailedUnit", unit, "s", unit)); }
 
-  // Starts a job ("StartUnit", "StopUnit", ...) and waits for its end.
+  // Starts a job ("StartUnit", "StopUnit", ...) and waits for its end. kUnknownService where there is no such
+  // unit, or it is masked.
   Status RunJob(const char* method, const char* unit) {
     if (Status status = WatchJobs(); !status.ok()) return status;
-    BusError error;
-    sd_bus_message* reply = nullptr;
-    const int result = sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, method, error.get(), &reply,
-                                          "ss", unit, "replace");
-    const Message owned(reply);
-    const std::string what = std::string(method) + " " + unit;
-    if (result < 0) return Failed(what, error.text(result));
+    const Result<Message> reply = Call(method, unit, "ss", unit, "replace");
+    if (!reply.ok()) return reply.status();
+    const std::string what = Describe(method, unit);
     const char* job = nullptr;
-    if (sd_bus_message_read(reply, "o", &job) < 0) return Failed(what, "an answer of another kind");
+    if (sd_bus_message_read(reply->get(), "o", &job) < 0) return Failed(what, kOddAnswer);
     const Result<std::string> outcome = WaitFor(job);
     if (!outcome.ok()) return Failed(what, outcome.status().reason());
     return *outcome == "done" || *outcome == "skipped" ? Status() : Failed(what, "the job ended as " + *outcome);
@@ -124,27 +113,31 @@ class Manager {
  private:
   Manager(Bus bus, std::chrono::seconds job_limit) : bus_(std::move(bus)), job_limit_(job_limit) {}
 
-  Status ChangeUnitFiles(const char* method, bool enable) {
+  static std::string Describe(const std::string& method, const std::string& unit) {
+    return unit.empty() ? method : method + " " + unit;
+  }
+
+  // `types` and `arguments` as sd_bus_call_method(3) has them; `unit` is for the reason of a failure.
+  template <typename... Arguments>
+  Result<Message> Call(const char* method, const char* unit, const char* types, Arguments... arguments) {
     BusError error;
-    const int result = enable ? sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, method,
-                                                   error.get(), nullptr, "asbb", 1, kUnit, 0, 1)
-                              : sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, method,
-                                                   error.get(), nullptr, "asb", 1, kUnit, 0);
-    return result < 0 ? Failed(std::string(method) + " " + kUnit, error.text(result)) : Reload();
+    sd_bus_message* reply = nullptr;
+    const int result = sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, method, error.get(), &reply,
+                                          types, arguments...);
+    Message owned(reply);
+    if (result >= 0) return owned;
+    return Failed(Describe(method, unit), error.text(result), error.is_no_unit() ? kUnknownService : kServiceFailed);
   }
 
   // Ended jobs are collected from before the first one begins, so that none ends unseen.
   Status WatchJobs() {
     if (watching_) return {};
-    int result = sd_bus_match_signal(bus_.get(), nullptr, kDestination, kManagerPath, kManager, "JobRemoved",
-                                     OnJobRemoved, this);
-    BusError error;
-    if (result >= 0) {
-      result = sd_bus_call_method(bus_.get(), kDestination, kManagerPath, kManager, "Subscribe", error.get(), nullptr,
-                                  nullptr);
-    }
-    watching_ = result >= 0;
-    return watching_ ? Status() : Failed("Subscribe", error.text(result));
+    const int result = sd_bus_match_signal(bus_.get(), nullptr, kDestination, kManagerPath, kManager, "JobRemoved",
+                                           OnJobRemoved, this);
+    if (result < 0) return Failed("the system bus", std::strerror(-result));
+    const Status status = Call("Subscribe", "", "").status();
+    watching_ = status.ok();
+    return status;
   }
 
   static int OnJobRemoved(sd_bus_message* message, void* self, sd_bus_error* /*error*/) {
@@ -184,22 +177,23 @@ class SystemdEngine : public ServiceEngine {
   Result<bool> IsEnabled() override {
     const auto manager = Manager::Open(options_);
     if (!manager.ok()) return manager.status();
-    const Result<std::string> state = (*manager)->Ask("GetUnitFileState", kUnit);
+    const Result<std::string> state = (*manager)->UnitFileState(kUnit);
     if (!state.ok()) return state.status();
     return *state == "enabled" || *state == "enabled-runtime";
   }
 
   Status Start() override {
     return With([this](Manager& manager) {
-      if (Status status = manager.Enable(); !status.ok()) return status;
-      return BringUp(manager, "StartUnit");
+      const Status enabled = manager.Enable(kUnit);
+      return enabled.ok() ? BringUp(manager, "StartUnit") : enabled;
     });
   }
 
   Status Stop() override {
     return With([](Manager& manager) {
       if (Status status = manager.RunJob("StopUnit", kUnit); !status.ok()) return status;
-      return manager.Disable();
+      if (Status status = manager.Disable(kUnit); !status.ok()) return status;
+      return manager.Reload();
     });
   }
 
@@ -225,11 +219,16 @@ class SystemdEngine : public ServiceEngine {
     if (Status status = manager.Reload(); !status.ok()) return status;
     // A handful of quick restarts makes systemd refuse further ones for good.
     for (const char* unit : {"nfs-idmapd.service", "nfs-mountd.service", kUnit}) manager.ForgetFailure(unit);
-    // It alone takes new ports, for itself and for the lock manager. Where it does not run it will be
-    // started with the service.
-    if (Status status = manager.RunJob("TryRestartUnit", "rpc-statd.service"); !status.ok()) return status;
+    if (Status status = MoveStatusDaemon(manager); !status.ok()) return status;
     if (Status status = manager.RunJob(method, kUnit); !status.ok()) return status;
     return HasThreads() ? Status() : Failed(kUnit, "it started, but the kernel's server has no threads");
+  }
+
+  // It alone takes new ports, for itself and for the lock manager. Where it does not run it will be started with
+  // the service; a box for NFSv4 alone may have masked it.
+  static Status MoveStatusDaemon(Manager& manager) {
+    const Status status = manager.RunJob("TryRestartUnit", "rpc-statd.service");
+    return status.code() == kUnknownService ? Status() : status;
   }
 
   // The unit counts as active even when the kernel serves nobody.

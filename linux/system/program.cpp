@@ -21,6 +21,9 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t kLongestLine = 1024;  // a longer one is cut into several
 
+constexpr std::size_t kReadSize = 4096;
+constexpr int kMostReads = 16;  // pipe(7): a pipe holds 64 KiB
+
 // Hands on whole lines.
 class LineSplitter {
  public:
@@ -103,7 +106,13 @@ class Child {
                                   Pointers(&environment).data());
     if (error != 0) return Status::System(error, path);
     fcntl(output.get(), F_SETFL, O_NONBLOCK);
-    return Child(id, std::move(output), FileDescriptor(static_cast<int>(syscall(SYS_pidfd_open, id, 0))));
+    FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, id, 0)));
+    const int process_error = errno;
+    Child child(id, std::move(output), std::move(process));
+    if (child.process_) return child;
+    child.Signal(SIGKILL);
+    child.Reap();
+    return Status::System(process_error, path);
   }
 
   // Takes output until the program has ended, or the time is over; true when it has ended.
@@ -111,11 +120,14 @@ class Child {
     const auto deadline = Clock::now() + limit;
     for (;;) {
       const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now()).count();
-      // Output first: a program that has ended may have left some, and one that goes on writing must not keep us.
+      // A program that has ended may have left as much as the pipe holds; one that it started and that goes on
+      // writing must not keep us.
       pollfd events[] = {{process_.get(), POLLIN, 0}, {output_.get(), POLLIN, 0}};
       poll(events, output_ ? 2 : 1, static_cast<int>(std::max<long long>(left, 0)));
-      if (events[1].revents != 0) Drain(lines);
-      if ((events[0].revents & POLLIN) != 0) return true;
+      const bool ended = (events[0].revents & POLLIN) != 0;
+      for (int reads = ended ? kMostReads : 1; reads > 0 && Drain(lines); --reads) {
+      }
+      if (ended) return true;
       if (left <= 0) return false;
     }
   }
@@ -134,11 +146,13 @@ class Child {
   Child(pid_t id, FileDescriptor output, FileDescriptor process)
       : id_(id), output_(std::move(output)), process_(std::move(process)) {}
 
-  void Drain(LineSplitter* lines) {
-    char buffer[4096];
+  // Takes what one read(2) gives; false when there was nothing.
+  bool Drain(LineSplitter* lines) {
+    char buffer[kReadSize];
     const ssize_t size = read(output_.get(), buffer, sizeof buffer);
     if (size > 0) lines->Take({buffer, static_cast<std::size_t>(size)});
     if (size == 0) output_.Close();
+    return size > 0;
   }
 
   pid_t id_;

@@ -1,11 +1,15 @@
 #include "program.h"
 
 #include <gmock/gmock.h>
+#include <signal.h>
+#include <sys/wait.h>
 
 #include <string>
 #include <vector>
 
+#include "captured_log.h"
 #include "core.h"
+#include "injected_failures.h"
 #include "processes.h"
 #include "temporary_root.h"
 
@@ -82,9 +86,33 @@ TEST(RunProgram, EndsAProgramThatTakesTooLongWithAllThatItStarted) {
 }
 
 TEST(RunProgram, DoesNotWaitForWhoeverKeepsTheOutputOpen) {
-  const Outcome outcome = RunScript("sleep 1000 & echo done", {std::chrono::minutes(5), milliseconds(100)});
+  const Outcome outcome = RunScript("sleep 1000 & echo $!", {std::chrono::minutes(5), milliseconds(100)});
   EXPECT_TRUE(outcome.status.ok());
-  EXPECT_THAT(outcome.lines, ElementsAre("done"));
+  ASSERT_EQ(outcome.lines.size(), 1U);
+  EXPECT_EQ(kill(std::stoi(outcome.lines[0]), SIGKILL), 0) << "what a program leaves behind is its own affair";
+}
+
+TEST(RunProgram, TakesAllThatAProgramLeftInThePipe) {
+  const Outcome outcome = RunScript("exec seq 10000");
+  ASSERT_EQ(outcome.lines.size(), 10000U);
+  EXPECT_EQ(outcome.lines.back(), "10000");
+}
+
+TEST(RunProgram, FailsWhereItCannotWatchTheProgram) {
+  const TemporaryRoot root;
+  ChildProcess child([] {
+    if (!FailSystemCall(SYS_pidfd_open, EMFILE)) return 1;
+    return RunScript("sleep 1000").status.code() == EMFILE ? 0 : 2;
+  });
+  EXPECT_EQ(child.Wait(), 0);
+}
+
+TEST(RunProgram, KeepsNoDescriptorAndNoProcess) {
+  const auto open_files = [] { return RunScript("ls /proc/$PPID/fd | wc -l").lines; };
+  const auto before = open_files();
+  for (const char* script : {"exit 0", "exit 1", "kill -9 $$"}) RunScript(script);
+  EXPECT_EQ(open_files(), before);
+  EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "a child is left";
 }
 
 TEST(RunProgram, CutsEndlessLinesAndKeepsEveryByte) {
@@ -107,6 +135,26 @@ TEST(KLIBCExec, RunsAProgramOfTheRoot) {
   EXPECT_EQ(KLIBCErrGet(), vorn::kProgramFailed);
   EXPECT_LT(KLIBCExec("/usr/vorn/missing.sh", nullptr, nullptr, nullptr, nullptr), 0);
   EXPECT_EQ(KLIBCErrGet(), ENOENT);
+}
+
+TEST(KLIBCExec, LogsWhatTheProgramSaysUpToAHundredLines) {
+  const TemporaryRoot root;
+  root.Write("/usr/vorn/script.sh", "#!/bin/sh\nseq 250\n");
+  ASSERT_EQ(chmod(root.At("/usr/vorn/script.sh").c_str(), 0755), 0);
+  TakeLog();
+  EXPECT_EQ(KLIBCExec("/usr/vorn/script.sh", nullptr, nullptr, nullptr, nullptr), 0);
+  const std::vector<LogLine> log = TakeLog();
+  ASSERT_EQ(log.size(), 101U);
+  EXPECT_EQ(log.front().text, "/usr/vorn/script.sh: 1");
+  EXPECT_EQ(log.back().text, "/usr/vorn/script.sh: 150 more lines");
+}
+
+TEST(KLIBCExec, LetsOthersHaveTheConfigurationMeanwhile) {
+  const TemporaryRoot root;
+  root.Write("/usr/vorn/script.sh", "#!/bin/sh\nflock -n \"$VORN_ROOT/run/vorn/config.lock\" true\n");
+  ASSERT_EQ(chmod(root.At("/usr/vorn/script.sh").c_str(), 0755), 0);
+  const VornConf configuration;
+  EXPECT_EQ(KLIBCExec("/usr/vorn/script.sh", nullptr, nullptr, nullptr, nullptr), 0);
 }
 
 }  // namespace

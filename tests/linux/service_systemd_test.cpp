@@ -36,6 +36,11 @@ const std::vector<std::string> kBringUp = {"Reload",
                                            "Subscribe",
                                            "TryRestartUnit rpc-statd.service replace"};
 
+// As exportfs(8) writes it.
+constexpr char kTable[] =
+    "/volume1/data\t10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,no_all_squash,no_subtree_check,"
+    "secure_locks,acl,no_pnfs,anonuid=65534,anongid=65534,sec=sys,rw,secure,root_squash,no_all_squash)\n";
+
 std::vector<std::string> Joined(std::vector<std::string> a, const std::vector<std::string>& b) {
   a.insert(a.end(), b.begin(), b.end());
   return a;
@@ -54,9 +59,8 @@ TEST_F(SystemdEngine, CountsAnEnabledUnitAsEnabled) {
 TEST_F(SystemdEngine, EnablesAndStarts) {
   const Status status = Engine()->Start();
   EXPECT_TRUE(status.ok()) << status.reason();
-  EXPECT_THAT(manager_.TakeCalls(),
-              ElementsAreArray(Joined(Joined({"EnableUnitFiles nfs-server.service", "Reload"}, kBringUp),
-                                      {"StartUnit nfs-server.service replace"})));
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(Joined({"EnableUnitFiles nfs-server.service"}, kBringUp),
+                                                            {"StartUnit nfs-server.service replace"})));
 }
 
 TEST_F(SystemdEngine, StopsAndDisables) {
@@ -68,6 +72,35 @@ TEST_F(SystemdEngine, StopsAndDisables) {
 TEST_F(SystemdEngine, ForgetsOldFailuresAndMovesTheStatusDaemonBeforeARestart) {
   EXPECT_TRUE(Engine()->Restart().ok());
   EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"RestartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, NeedsNoStatusDaemon) {
+  for (const char* error : {"NoSuchUnit", "UnitMasked"}) {
+    manager_.Refuse("TryRestartUnit rpc-statd.service", error);
+    const Status status = Engine()->Start();
+    EXPECT_TRUE(status.ok()) << error << ": " << status.reason();
+  }
+}
+
+TEST_F(SystemdEngine, FailsWithoutTheServersUnit) {
+  manager_.Refuse("RestartUnit nfs-server.service", "NoSuchUnit");
+  EXPECT_THAT(Engine()->Restart().reason(), HasSubstr("RestartUnit nfs-server.service is refused"));
+}
+
+TEST_F(SystemdEngine, ReloadsAndFindsTheTableThatTheFileAsksFor) {
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n");
+  folder_.Write("/var/lib/nfs/etab", kTable);
+  const Status status = Engine()->Reload();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "ReloadUnit nfs-server.service replace"));
+}
+
+TEST_F(SystemdEngine, NamesTheLineThatAReloadDidNotTake) {
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n\n/volume1/media 10.0.0.2(ro)\n");
+  folder_.Write("/var/lib/nfs/etab", kTable);
+  const Status status = Engine()->Reload();
+  EXPECT_EQ(status.code(), vorn::kServiceFailed);
+  EXPECT_THAT(status.reason(), HasSubstr("line 3 (/volume1/media)"));
 }
 
 TEST_F(SystemdEngine, HasNothingToReloadWhereTheKernelServesNobody) {

@@ -63,23 +63,25 @@ bool IsJob(const std::string& method) { return method.size() > 4 && method.subst
 StandInManager::StandInManager() {
   address_ = "unix:path=" + folder_.At("/bus");
   folder_.Write("/bus.conf", "<busconfig><type>session</type><listen>" + address_ +
-                                 "</listen><policy context=\"default\"><allow send_destination=\"*\" "
-                                 "eavesdrop=\"true\"/><allow eavesdrop=\"true\"/>"
-                                 "<allow own=\"*\"/></policy></busconfig>");
+                                 "</listen><policy context=\"default\"><allow send_destination=\"*\"/>"
+                                 "<allow receive_sender=\"*\"/><allow own=\"*\"/></policy></busconfig>");
   const std::string option = "--config-file=" + folder_.At("/bus.conf");
   daemon_ = std::make_unique<ChildProcess>([option] {
     execlp("dbus-daemon", "dbus-daemon", option.c_str(), "--nofork", nullptr);
     return 127;
   });
-  const std::string socket = folder_.At("/bus");
-  if (!Eventually([&] { return access(socket.c_str(), F_OK) == 0; })) throw std::runtime_error("no dbus-daemon");
-  Must(sd_bus_new(&bus_), "bus");
-  Must(sd_bus_set_address(bus_, address_.c_str()), "address");
-  Must(sd_bus_set_bus_client(bus_, 1), "client");
-  Must(sd_bus_start(bus_), "start");
+  if (!Eventually([this] { return Connect(); })) throw std::runtime_error("no dbus-daemon");
   Must(sd_bus_add_object_vtable(bus_, nullptr, kPath, kInterface, kMethods, this), "object");
   Must(sd_bus_request_name(bus_, kName, 0), "name");
   thread_ = std::thread([this] { Serve(); });
+}
+
+bool StandInManager::Connect() {
+  bus_ = sd_bus_flush_close_unref(bus_);
+  Must(sd_bus_new(&bus_), "bus");
+  Must(sd_bus_set_address(bus_, address_.c_str()), "address");
+  Must(sd_bus_set_bus_client(bus_, 1), "client");
+  return sd_bus_start(bus_) >= 0;
 }
 
 StandInManager::~StandInManager() {
@@ -101,9 +103,9 @@ std::vector<std::string> StandInManager::TakeCalls() {
   return std::exchange(calls_, {});
 }
 
-void StandInManager::Refuse(const std::string& call) {
+void StandInManager::Refuse(const std::string& call, const std::string& error) {
   const std::lock_guard<std::mutex> guard(mutex_);
-  refused_.insert(call);
+  refused_[call] = std::string(kName) + "." + error;
 }
 
 void StandInManager::End(const std::string& call, const std::string& outcome) {
@@ -122,8 +124,8 @@ int StandInManager::Take(sd_bus_message* message, const char* types) {
   calls_.push_back(call);
   const std::string method = sd_bus_message_get_member(message);
   const std::string named = call.substr(0, call.find(' ', method.size() + 1));
-  if (refused_.count(named) != 0) {
-    return sd_bus_reply_method_errorf(message, "org.freedesktop.systemd1.Refused", "%s is refused", named.c_str());
+  if (const auto refused = refused_.find(named); refused != refused_.end()) {
+    return sd_bus_reply_method_errorf(message, refused->second.c_str(), "%s is refused", named.c_str());
   }
   if (method == "GetUnitFileState") return sd_bus_reply_method_return(message, "s", unit_file_state_.c_str());
   if (method == "EnableUnitFiles") return sd_bus_reply_method_return(message, "ba(sss)", 1, 0);

@@ -7,7 +7,6 @@
 #include <map>
 #include <memory>
 #include <mutex>
-#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -30,8 +29,8 @@ class StandInManager {
   // What was called, in order: "StartUnit nfs-server.service replace".
   std::vector<std::string> TakeCalls();
 
-  // "MethodName unit" answers with an error.
-  void Refuse(const std::string& call);
+  // "MethodName unit" answers with an error: org.freedesktop.systemd1.`error`.
+  void Refuse(const std::string& call, const std::string& error = "Refused");
   // The job of "MethodName unit" ends as `outcome`; "never" for one that does not.
   void End(const std::string& call, const std::string& outcome);
   void SetUnitFileState(const std::string& state);
@@ -40,6 +39,7 @@ class StandInManager {
   int Take(sd_bus_message* message, const char* types);
 
  private:
+  bool Connect();
   void Serve();
   int AnswerJob(sd_bus_message* message, const std::string& call);
 
@@ -48,7 +48,7 @@ class StandInManager {
   std::unique_ptr<ChildProcess> daemon_;
   std::mutex mutex_;
   std::vector<std::string> calls_;
-  std::set<std::string> refused_;
+  std::map<std::string, std::string> refused_;  // call to error
   std::map<std::string, std::string> outcomes_;
   std::string unit_file_state_ = "disabled";
   int jobs_ = 0;

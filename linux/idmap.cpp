@@ -1,15 +1,14 @@
 #include <netdb.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
 #include <cstring>
-#include <map>
 #include <memory>
 
 #include "error.h"
+#include "idmap_mappings.h"
 #include "ini_file.h"
 #include "lists.h"
 #include "lock.h"
@@ -100,87 +99,6 @@ Result<IDMap> ReadIDMap() {
 // ---------------------------------------------------------------------------------------------
 // Writing.
 
-struct Mapping {
-  IniKey principal;
-  IniValue local_name;
-};
-using Mappings = std::map<std::string, Mapping>;  // by the principal as the reader compares it
-
-// The wanted mappings. The reader takes two principals that differ in case for one: a table with both
-// cannot be stored.
-Result<Mappings> Check(const KLIBSZHASH& table) {
-  Mappings mappings;
-  for (const auto& [principal, local_name] : table.pairs) {
-    const std::optional<IniKey> key = IniKey::From(principal);
-    const std::optional<IniValue> value = IniValue::From(local_name);
-    if (!key || !value)
-      return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry a principal or its local name");
-    if (!mappings.emplace(FoldIniName(principal), Mapping{*key, *value}).second) {
-      return Status::Failure(kRefusedText, "idmapd.conf(5) cannot tell two principals that differ in case only");
-    }
-  }
-  return mappings;
-}
-
-bool IsStored(const IniDocument& document, const Mappings& mappings) {
-  const std::vector<IniEntry> stored = document.Entries("Static");
-  if (stored.size() != mappings.size()) return false;
-  for (const IniEntry& entry : stored) {
-    const auto wanted = mappings.find(FoldIniName(entry.key));
-    if (wanted == mappings.end() || wanted->second.principal.text() != entry.key) return false;
-    if (wanted->second.local_name.text() != entry.value) return false;
-  }
-  return true;
-}
-
-// In the table's order, so that new mappings come in the order in which they were made.
-void StoreMappings(const KLIBSZHASH& table, const Mappings& mappings, IniDocument* document) {
-  const IniSection section = *IniSection::From("Static");
-  document->EndLastLine();  // or it would come to life later, whether it is wanted or not
-  for (const IniEntry& entry : document->Entries("Static")) {
-    const auto wanted = mappings.find(FoldIniName(entry.key));
-    const bool stays = wanted != mappings.end() && wanted->second.principal.text() == entry.key;
-    if (!stays) document->Remove("Static", entry.key);
-  }
-  for (const KLIBSZHASH::Pair& pair : table.pairs) {
-    const Mapping& mapping = mappings.at(FoldIniName(pair.first));
-    document->Set(section, mapping.principal, mapping.local_name);
-  }
-}
-
-std::vector<std::string> Words(const std::string& list) {
-  std::vector<std::string> words;
-  for (std::size_t at = 0; (at = list.find_first_not_of(" \t,", at)) != std::string::npos;) {
-    const std::size_t end = std::min(list.find_first_of(" \t,", at), list.size());
-    words.push_back(list.substr(at, end - at));
-    at = end;
-  }
-  return words;
-}
-
-// Static mappings count only where the method "static" does, and the first method that knows a
-// principal decides. Without methods for GSS those for names hold: idmapd.conf(5).
-Status HonourStaticMappings(IniDocument* document) {
-  const IniKey key = *IniKey::From("GSS-Methods");
-  const std::string names = document->Get("Translation", "Method").value_or("nsswitch");
-  const std::string methods = document->Get("Translation", key.text()).value_or(names);
-  const std::vector<std::string> words = Words(methods);
-  if (!words.empty() && words.front() == "static") return {};
-  std::string value = "static";
-  for (const std::string& word : words) value += word == "static" ? "" : "," + word;
-  const std::optional<IniValue> text = IniValue::From(value);
-  if (!text) return Status::Failure(kSyntax, "the translation methods cannot be written back");
-  document->Set(*IniSection::From("Translation"), key, *text);
-  return {};
-}
-
-Status StoreTable(const KLIBSZHASH& table, IniDocument* document) {
-  const Result<Mappings> mappings = Check(table);
-  if (!mappings.ok()) return mappings.status();
-  if (!IsStored(*document, *mappings)) StoreMappings(table, *mappings, document);
-  return mappings->empty() ? Status() : HonourStaticMappings(document);
-}
-
 Status StoreDomain(const std::string& domain, IniDocument* document) {
   if (domain.empty()) {
     document->Remove("General", "Domain");
@@ -224,7 +142,7 @@ Status WriteIDMap(const char* path, const _tag_nfs_id_map_* record) {
     if (Status status = StoreDomain(record->domain, document); !status.ok()) return status;
   }
   if (record->table != nullptr) {
-    if (Status status = StoreTable(*record->table, document); !status.ok()) return status;
+    if (Status status = StoreMappings(*record->table, document); !status.ok()) return status;
   }
   const Result<FileStamp> stamp = file->Save();
   if (!stamp.ok()) return stamp.status();

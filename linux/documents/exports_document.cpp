@@ -113,37 +113,52 @@ class LineReader {
   ExportLine line_;
 };
 
-// The next line that begins at or after `position`; empty when there is none. Lines without quotation
-// marks and backslashes, nearly all, end at the next line break, whatever they say.
-ExportSpan NextLine(std::string_view text, std::size_t position) {
-  ExportsReader reader(text, position);
-  ExportSpan span;
-  span.begin = reader.SkipToPath();
-  span.path = reader.position();
-  const std::size_t newline = text.find('\n', span.path);
-  span.end = newline == std::string_view::npos ? text.size() : newline + 1;
-  const std::string_view line = text.substr(span.path, span.end - span.path);
-  const bool simple = line.find('\\') == std::string_view::npos && line.find('"') == std::string_view::npos;
-  return simple ? span : LineReader(text, span).Read().span;
-}
+// Finds one line after the other. Lines without quotation marks and backslashes, nearly all, end at
+// the next line break, whatever they say.
+class LineFinder {
+ public:
+  explicit LineFinder(std::string_view text) : text_(text) {}
 
-// The first word as it is written, where it needs no decoding; else empty.
-std::string_view PlainWord(std::string_view line) {
-  char last = '\0';
-  for (std::size_t i = 0; i < line.size(); ++i) {
-    const char c = line[i];
-    const bool special = c == '"' || c == '\\' || (last == '/' && (c == '/' || c == '.'));
-    if (special) return {};
-    if (ExportsReader::EndsWord(c)) return last == '/' && i > 1 ? std::string_view() : line.substr(0, i);
-    last = c;
+  // The next line that begins at or after `position`, which never goes back; at the end of the text
+  // its path begins there.
+  ExportSpan Next(std::size_t position) {
+    ExportsReader reader(text_, position);
+    ExportSpan span{position, position, position};
+    if (position == text_.size() || text_[position] != '/') span.begin = reader.SkipToPath();
+    span.path = reader.position();
+    const std::size_t newline = text_.find('\n', span.path);
+    span.end = newline == std::string_view::npos ? text_.size() : newline + 1;
+    const bool simple =
+        Following('"', span.path, &quotation_) >= span.end && Following('\\', span.path, &backslash_) >= span.end;
+    return simple ? span : LineReader(text_, span).Read().span;
   }
-  return {};
-}
 
-// Whether a line is one of `path`, which is in normal form.
+ private:
+  // Where `c` follows `position`; `last` remembers it, so that the whole text is searched but once.
+  std::size_t Following(char c, std::size_t position, std::size_t* last) const {
+    if (*last < position || position == 0) *last = std::min(text_.find(c, position), text_.size());
+    return *last;
+  }
+
+  std::string_view text_;
+  std::size_t quotation_ = 0;
+  std::size_t backslash_ = 0;
+};
+
+bool IsPlain(char c) { return c != '"' && c != '\\' && !ExportsReader::EndsWord(c); }
+
+// Whether a line is one of `path`, which is in normal form. Only a path that is not written as it is
+// has to be decoded.
 bool Names(std::string_view text, const ExportSpan& span, std::string_view path) {
-  const std::string_view plain = PlainWord(text.substr(span.path, span.end - span.path));
-  if (!plain.empty()) return plain == path;
+  std::size_t end = span.path;
+  char last = '\0';
+  bool normal = true;
+  for (; end < span.end && IsPlain(text[end]); last = text[end++]) {
+    normal = normal && (last != '/' || (text[end] != '/' && text[end] != '.'));
+  }
+  const std::string_view plain = text.substr(span.path, end - span.path);
+  const bool whole = end == span.end || ExportsReader::EndsWord(text[end]);
+  if (whole && normal && (last != '/' || plain.size() == 1)) return plain == path;
   ExportsReader reader(text, span.path);
   std::string word;
   return reader.ReadWord(kLongestExportPath, &word) == Found::kWord && NormalExportPath(word) == path;
@@ -184,8 +199,10 @@ bool operator==(const ExportEntry& a, const ExportEntry& b) { return a.client ==
 
 ExportsDocument::ExportsDocument(std::string text) : text_(std::move(text)) {
   lines_.reserve(text_.size() / 64 + 1);
-  ExportSpan line = NextLine(text_, 0);
-  for (; line.path < text_.size(); line = NextLine(text_, line.end)) lines_.push_back(line);
+  LineFinder finder(text_);
+  for (ExportSpan line = finder.Next(0); line.path < text_.size(); line = finder.Next(line.end)) {
+    lines_.push_back(line);
+  }
 }
 
 std::vector<ExportLine> ExportsDocument::Lines() const {
@@ -200,14 +217,6 @@ ExportsDocument::Spans ExportsDocument::LinesOf(std::string_view path) const {
   std::copy_if(lines_.begin(), lines_.end(), std::back_inserter(own),
                [&](const ExportSpan& line) { return Names(text_, line, path); });
   return own;
-}
-
-ExportsDocument::Spans ExportsDocument::LinesBut(const Spans& own) const {
-  Spans others;
-  others.reserve(lines_.size());
-  std::set_difference(lines_.begin(), lines_.end(), own.begin(), own.end(), std::back_inserter(others),
-                      [](const ExportSpan& a, const ExportSpan& b) { return a.begin < b.begin; });
-  return others;
 }
 
 std::vector<ExportEntry> ExportsDocument::Entries(std::string_view path) const {
@@ -230,21 +239,37 @@ Status ExportsDocument::Replace(std::string_view path, const std::vector<ExportE
   const std::string where = "the exports of " + normal + " cannot be written: ";
   const Spans own = LinesOf(normal);
   ExportsDocument edited(Rendered(own, normal, entries));
-  const Spans written = edited.LinesOf(normal);
-  if (!(edited.EntriesIn(written) == entries)) return Status::Failure(kRefusedText, where + "they do not read back");
-  if (!SameLines(LinesBut(own), edited, edited.LinesBut(written))) {
-    return Status::Failure(kRefusedText, where + "the file's other lines would change");
+  const auto added = Added(own, edited);
+  if (!added) return Status::Failure(kRefusedText, where + "the file's other lines would change");
+  const auto is_own = [&](const ExportSpan& line) { return Names(edited.text_, line, normal); };
+  if (!std::all_of(added->begin(), added->end(), is_own) || !(edited.EntriesIn(*added) == entries)) {
+    return Status::Failure(kRefusedText, where + "they do not read back");
   }
   *this = std::move(edited);
   return {};
 }
 
-bool ExportsDocument::SameLines(const Spans& lines, const ExportsDocument& other, const Spans& other_lines) const {
-  return std::equal(lines.begin(), lines.end(), other_lines.begin(), other_lines.end(),
-                    [&](const ExportSpan& a, const ExportSpan& b) {
-                      if (a.end == text_.size()) return SameLastLine(text_, a, other.text_, b);
-                      return Text(text_, a) == Text(other.text_, b);
-                    });
+// The lines that the edited file has beside all those that are not `own`; none when one is missing.
+std::optional<ExportsDocument::Spans> ExportsDocument::Added(const Spans& own, const ExportsDocument& edited) const {
+  Spans added;
+  auto mine = own.begin();
+  auto next = edited.lines_.begin();
+  for (const ExportSpan& line : lines_) {
+    if (mine != own.end() && mine->begin == line.begin) {
+      ++mine;
+      continue;
+    }
+    const bool last = line.end == text_.size();
+    const auto same = [&](const ExportSpan& other) {
+      if (last) return SameLastLine(text_, line, edited.text_, other);
+      return Text(text_, line) == Text(edited.text_, other);
+    };
+    while (next != edited.lines_.end() && !same(*next)) added.push_back(*next++);
+    if (next == edited.lines_.end()) return std::nullopt;
+    ++next;
+  }
+  added.insert(added.end(), next, edited.lines_.end());
+  return added;
 }
 
 std::string ExportsDocument::Rendered(const Spans& own, const std::string& path,

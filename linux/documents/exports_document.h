@@ -3,6 +3,7 @@
 #define VORN_LINUX_DOCUMENTS_EXPORTS_DOCUMENT_H
 
 #include <cstddef>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -69,10 +70,9 @@ class ExportsDocument {
   using Spans = std::vector<ExportSpan>;
 
   Spans LinesOf(std::string_view path) const;
-  Spans LinesBut(const Spans& own) const;
   std::vector<ExportEntry> EntriesIn(const Spans& own) const;
   std::string Rendered(const Spans& own, const std::string& path, const std::vector<ExportEntry>& entries) const;
-  bool SameLines(const Spans& lines, const ExportsDocument& other, const Spans& other_lines) const;
+  std::optional<Spans> Added(const Spans& own, const ExportsDocument& edited) const;
 
   std::string text_;
   Spans lines_;

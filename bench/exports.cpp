@@ -1,0 +1,139 @@
+// Load and save the rules of one share among many, through the contract, beside the Augeas library
+// doing the same edit and beside the floor: reading and scanning the same bytes and, for a save,
+// rewriting them durably.
+#include <augeas.h>
+#include <benchmark/benchmark.h>
+
+#include <cstddef>
+#include <cstdlib>
+#include <memory>
+#include <string>
+
+#include "files.h"
+#include "nfsconf.h"
+#include "temporary_root.h"
+
+namespace {
+
+constexpr const char* kFile = "/etc/exports";
+
+struct FreeList {
+  void operator()(ExportRuleList* list) const { VORNNFSRuleExtFree(list); }
+};
+using List = std::unique_ptr<ExportRuleList, FreeList>;
+
+struct CloseAugeas {
+  void operator()(augeas* tree) const { aug_close(tree); }
+};
+
+// A root whose exports file has so many shares, two clients each, and the path of the one in the middle.
+struct Box {
+  explicit Box(long shares) : path("/volume1/share" + std::to_string(shares / 2)) {
+    std::string text = "# The shares of this box.\n";
+    for (long i = 0; i < shares; ++i) {
+      text += "/volume1/share" + std::to_string(i) + " 10.0.0.0/8(rw,async,no_subtree_check,no_root_squash)";
+      text += " client" + std::to_string(i) + ".example(ro,sync,no_subtree_check,all_squash)\n";
+    }
+    root.Write(kFile, text);
+    root.Write("/etc/passwd", "admin:x:1024:100::/:/bin/sh\nnobody:x:65534:65534::/:/bin/sh\n");
+  }
+
+  TemporaryRoot root;
+  std::string path;
+};
+
+List Load(const Box& box) {
+  ExportRuleList* list = nullptr;
+  if (VORNNFSRuleExtGet(kFile, box.path.c_str(), &list) != 2) std::abort();
+  return List(list);
+}
+
+void LoadShare(benchmark::State& state, long shares) {
+  const Box box(shares);
+  for (auto step : state) benchmark::DoNotOptimize(Load(box));
+}
+
+void SaveShare(benchmark::State& state, long shares) {
+  const Box box(shares);
+  const List list = Load(box);
+  for (auto step : state) {
+    list->first->privilege ^= 1;
+    if (VORNNFSRuleExtSetAll(box.path.c_str(), list.get()) != 0) state.SkipWithError("not saved");
+  }
+}
+
+vorn::FileText ReadAndScan(const std::string& path) {
+  auto file = vorn::ReadFile(path);
+  if (!file.ok()) std::abort();
+  std::size_t lines = 0;
+  for (std::size_t at = 0; (at = file->text.find('\n', at)) != std::string::npos; ++at) ++lines;
+  benchmark::DoNotOptimize(lines);
+  return std::move(*file);
+}
+
+void LoadFloor(benchmark::State& state, long shares) {
+  const Box box(shares);
+  for (auto step : state) benchmark::DoNotOptimize(ReadAndScan(box.root.At(kFile)));
+}
+
+void SaveFloor(benchmark::State& state, long shares) {
+  const Box box(shares);
+  for (auto step : state) {
+    const vorn::FileText file = ReadAndScan(box.root.At(kFile));
+    if (!vorn::ReplaceFile(box.root.At(kFile), file.text, file.stamp).ok()) state.SkipWithError("not saved");
+  }
+}
+
+// Augeas, with the one lens that is needed.
+std::unique_ptr<augeas, CloseAugeas> OpenTree(const Box& box) {
+  const unsigned flags = AUG_NO_MODL_AUTOLOAD | AUG_NO_LOAD;
+  std::unique_ptr<augeas, CloseAugeas> tree(aug_init(box.root.directory().c_str(), nullptr, flags));
+  if (!tree || aug_transform(tree.get(), "Exports", kFile, 0) != 0 || aug_load(tree.get()) != 0) std::abort();
+  return tree;
+}
+
+std::string TreePath(const Box& box) { return "/files/etc/exports/dir[. = \"" + box.path + "\"]/client"; }
+
+void LoadPeer(benchmark::State& state, long shares) {
+  const Box box(shares);
+  for (auto step : state) {
+    const auto tree = OpenTree(box);
+    if (aug_match(tree.get(), TreePath(box).c_str(), nullptr) != 2) std::abort();
+  }
+}
+
+void SavePeer(benchmark::State& state, long shares) {
+  const Box box(shares);
+  const std::string option = TreePath(box) + "[1]/option[1]";
+  bool writable = false;
+  for (auto step : state) {
+    const auto tree = OpenTree(box);
+    const bool set = aug_set(tree.get(), option.c_str(), writable ? "rw" : "ro") == 0;
+    if (!set || aug_save(tree.get()) != 0) state.SkipWithError("not saved");
+    writable = !writable;
+  }
+}
+
+using Measurement = void (*)(benchmark::State&, long);
+
+benchmark::internal::Benchmark* Add(const std::string& name, Measurement measurement, long shares) {
+  return benchmark::RegisterBenchmark(name.c_str(), measurement, shares)->Unit(benchmark::kMicrosecond)->UseRealTime();
+}
+
+void Register(const std::string& name, Measurement measured, Measurement floor, Measurement peer) {
+  for (const long shares : {10L, 1000L, 10000L}) {
+    const std::string full = name + "/" + std::to_string(shares);
+    Add(full, measured, shares);
+    Add(full + "/floor", floor, shares);
+    Add(full + "/peer", peer, shares)->Iterations(1)->Repetitions(3);
+  }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  benchmark::Initialize(&argc, argv);
+  Register("load", LoadShare, LoadFloor, LoadPeer);
+  Register("save", SaveShare, SaveFloor, SavePeer);
+  benchmark::RunSpecifiedBenchmarks();
+}

@@ -1,83 +1,63 @@
+// What a running server does not take leaves its clients alone and waits for the next start, and the log says so.
 #include "live.h"
 
 #include <syslog.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdlib>
 #include <string>
 
 #include "error.h"
 #include "files.h"
+#include "lock.h"
 #include "nfsconf.h"
 #include "root.h"
-#include "service.h"
 
 namespace vorn {
 namespace {
 
 constexpr char kDropIn[] = "/etc/systemd/system/nfs-server.service.d/vorn.conf";
 
-// nfsd(7): one limit for both directions.
-constexpr char kKernelFile[] = "/proc/fs/nfsd/max_block_size";
+// A size that the kernel refuses must not keep NFS from starting, hence "-".
+constexpr char kDropInText[] =
+    "# Kept by the NFS settings: gives the kernel the transfer sizes of nfs.conf.d/vorn.conf.\n"
+    "[Service]\n"
+    "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n";
 
-std::string DropInText(int size) {
-  if (size <= 0) return "";
-  const std::string number = std::to_string(size);
-  return "# Written by the NFS settings: the largest transfer, in bytes.\n[Service]\n"
-         "ExecStartPre=/bin/sh -c 'echo " +
-         number + " >" + kKernelFile + "'\n";
-}
-
-Status RemoveDropIn(const std::string& path) {
-  if (unlink(path.c_str()) == 0 || errno == ENOENT) return {};
-  return Status::System(errno, path);
-}
-
-// 0 leaves the size to the kernel.
-Status WriteDropIn(int size) {
-  const Result<std::string> path = Root::Current().Locate(kDropIn);
-  if (!path.ok()) return path.status();
-  const Result<FileText> before = ReadFileOrNothing(*path);
-  if (!before.ok()) return before.status();
-  const std::string text = DropInText(size);
-  if (text == before->text) return {};
-  return text.empty() ? RemoveDropIn(*path) : ReplaceFile(*path, text, before->stamp);
-}
-
-// The limit in force; 0 while the server has not run yet, or there is none on this system.
-int SizeInForce() {
-  const Result<FileText> file = ReadFileOrNothing(kKernelFile);
-  return file.ok() && Root::Current().is_box() ? std::atoi(file->text.c_str()) : 0;
-}
-
-// Raising is worth a restart, over which clients wait and go on. Lowering under mounted clients
-// hangs their writes, so it waits for the next start.
-Status ApplySizes(int read_size, int write_size) {
+// The kernel takes a new size only while its server has no threads. A restart for its sake would have every
+// client wait for the grace period, those that are mounted would go on with the sizes that they have, and
+// a caller who stores the record only afterwards would have to let go of the configuration half-way.
+Status AnnounceSizes(int read_size, int write_size) {
+  if (std::min(read_size, write_size) < 0) return Status::Failure(EINVAL, "a transfer size is negative");
+  if (Status status = PrepareTransferSizes(); !status.ok()) return status;
   const int size = std::max(read_size, write_size);
-  if (Status status = WriteDropIn(size); !status.ok()) return status;
-  const int in_force = SizeInForce();
-  if (size <= in_force) {
-    syslog(LOG_NOTICE, "transfer sizes of at most %d bytes take effect when NFS starts the next time", size);
-    return {};
+  if (size == 0) {
+    syslog(LOG_NOTICE, "the kernel chooses the size of NFS transfers again when the box has booted");
+  } else {
+    syslog(LOG_NOTICE,
+           "NFS takes transfers of at most %d bytes when it starts the next time; clients that are "
+           "mounted with more must mount again then",
+           size);
   }
-  syslog(LOG_NOTICE, "NFS restarts to raise its transfer sizes from %d to %d bytes", in_force, size);
-  return RestartService();
+  return {};
 }
 
 }  // namespace
 
 Status PrepareTransferSizes() {
-  NFSConfRecord record;
-  if (VORNNFSConfGet(&record) < 0) return Status::Failure(KLIBCErrGet(), "the transfer sizes cannot be read");
-  return WriteDropIn(std::max(record.read_size, record.write_size));
+  const ConfigurationLock lock;
+  if (!lock.status().ok()) return lock.status();
+  const Result<std::string> path = Root::Current().Locate(kDropIn);
+  if (!path.ok()) return path.status();
+  const Result<FileText> before = ReadFileOrNothing(*path);
+  if (!before.ok()) return before.status();
+  return before->text == kDropInText ? Status() : ReplaceFile(*path, kDropInText, before->stamp);
 }
 
 }  // namespace vorn
 
 int VORNNFSUDPPrefSizeSet(int read_size, int write_size) {
-  return vorn::ToResult(vorn::ApplySizes(read_size, write_size));
+  return vorn::ToResult(vorn::AnnounceSizes(read_size, write_size));
 }
 
 // rpc.mountd(8) reads the switch when it starts, and its unit cannot be restarted without the

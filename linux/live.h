@@ -6,8 +6,8 @@
 
 namespace vorn {
 
-// Has the server's next start take the configured transfer sizes: a drop-in of its unit writes
-// them to the kernel, which takes them only while it has no server threads.
+// Makes sure that each start of the server, whoever asks for it, takes the transfer sizes that are configured
+// then: a drop-in of its unit has them handed to the kernel.
 Status PrepareTransferSizes();
 
 }  // namespace vorn

@@ -13,17 +13,15 @@
 
 namespace vorn {
 
-Result<std::unique_ptr<ServiceEngine>> ChooseEngine() {
+namespace {
+
+// The one that the settings of the current root ask for.
+Result<std::unique_ptr<ServiceEngine>> EngineOf(std::string_view service) {
+  if (service != "nfsd")
+    return Status::Failure(kUnknownService, "there is no service \"" + std::string(service) + "\"");
   const Result<Settings> settings = Settings::Load();
   if (!settings.ok()) return settings.status();
   return settings->engine == Settings::Engine::kSystemd ? MakeSystemdEngine() : MakeLocalEngine();
-}
-
-namespace {
-
-Result<std::unique_ptr<ServiceEngine>> EngineOf(std::string_view service) {
-  if (service == "nfsd") return ChooseEngine();
-  return Status::Failure(kUnknownService, "there is no service \"" + std::string(service) + "\"");
 }
 
 // One operation at a time, over all threads and processes. Nobody waits for it with the
@@ -53,11 +51,6 @@ Status Restart(ServiceEngine& engine) {
 }
 
 }  // namespace
-
-Status RestartService() {
-  return Operate("nfsd", [](ServiceEngine& engine) { return engine.Restart(); });
-}
-
 }  // namespace vorn
 
 using vorn::Operate;

@@ -36,12 +36,6 @@ std::unique_ptr<ServiceEngine> MakeSystemdEngine(SystemdOptions options = {});
 // would have been done.
 std::unique_ptr<ServiceEngine> MakeLocalEngine();
 
-// The engine that the settings of the current root ask for.
-Result<std::unique_ptr<ServiceEngine>> ChooseEngine();
-
-// Restarts the NFS service as it is configured in systemd, in its turn.
-Status RestartService();
-
 }  // namespace vorn
 
 #endif  // VORN_LINUX_SERVICE_H

@@ -1,22 +1,37 @@
 #!/bin/sh
 # S83nfsd.sh reloadidmap: has the running NFS service forget what it knew of ID mappings and keytabs
-# and use the files as they are now. On a trial root (VORN_ROOT) it only says what it would do.
+# and use the files as they are now.
+# S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured; the service's
+# unit calls it before each start.
+# On a trial root (VORN_ROOT) it only says what it would do.
 set -u
+
+root=${VORN_ROOT:-/}
+root=${root%/}
 
 say() {
 	echo "S83nfsd: $*"
 }
 
 run() {
-	if [ "${VORN_ROOT:-/}" != / ]; then
+	if [ -n "$root" ]; then
 		say "would run: $*"
 		return 0
 	fi
 	"$@"
 }
 
+# tell FILE VALUE: a file of the kernel's, where there is one.
+tell() {
+	if [ -n "$root" ]; then
+		say "would write $2 to $1"
+		return 0
+	fi
+	[ ! -e "$1" ] || echo "$2" >"$1"
+}
+
 is_active() {
-	[ "${VORN_ROOT:-/}" = / ] && systemctl -q is-active "$1"
+	[ -z "$root" ] && systemctl -q is-active "$1"
 }
 
 # The daemon keeps the map it read when it started, and the kernel keeps its answers in the security
@@ -31,22 +46,34 @@ reload_idmap() {
 		run systemctl try-restart rpc-svcgssd.service || status=1
 	fi
 	run systemctl try-restart nfs-idmapd.service || status=1
-	flush=/proc/net/rpc/auth.rpcsec.context/flush
-	if [ "${VORN_ROOT:-/}" != / ]; then
-		say "would flush the kernel's security contexts"
-	elif [ -w "$flush" ]; then
-		echo 1 >"$flush" || status=1
-	fi
+	tell /proc/net/rpc/auth.rpcsec.context/flush 1 || status=1
 	[ "$status" = 0 ] || say "the ID map was not taken up"
 	return "$status"
+}
+
+# The kernel has one limit for both directions, which it takes only while its server has no threads.
+# Without a configured size it keeps its own choice, or until it boots what it was told last.
+transfer_sizes() {
+	largest=0
+	for key in read-size write-size; do
+		size=$(nfsconf --file "$root/etc/nfs.conf" --get vorn "$key")
+		case $size in
+		'' | *[!0-9]*) continue ;;
+		esac
+		[ "$size" -le "$largest" ] || largest=$size
+	done
+	[ "$largest" = 0 ] || tell /proc/fs/nfsd/max_block_size "$largest"
 }
 
 case "${1-}" in
 reloadidmap)
 	reload_idmap
 	;;
+transfersizes)
+	transfer_sizes
+	;;
 *)
-	echo "usage: $0 reloadidmap" >&2
+	echo "usage: $0 reloadidmap | transfersizes" >&2
 	exit 2
 	;;
 esac

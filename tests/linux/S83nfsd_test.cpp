@@ -1,0 +1,140 @@
+// The service script, with stand-ins for the service manager and for the kernel's files.
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+#include "processes.h"
+#include "temporary_root.h"
+
+namespace {
+
+using testing::HasSubstr;
+
+constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
+constexpr char kLimit[] = "/fs/nfsd/max_block_size";
+
+// A box in namespaces of its own: a systemctl that writes down what it is asked, and in place of /proc and
+// /etc/nfs.conf.d files of the test's.
+class Box {
+ public:
+  Box() {
+    folder_.Write("/bin/systemctl", "#!/bin/sh\necho \"$*\" >>" + folder_.At("/calls") +
+                                        "\ncase \"$*\" in *is-active*) [ -e " + folder_.At("/gssproxy") +
+                                        " ];; *) [ ! -e " + folder_.At("/broken") + " ];; esac\n");
+    chmod(folder_.At("/bin/systemctl").c_str(), 0755);
+    folder_.Write("/conf.d/vorn.conf", "");
+    folder_.Write("/nfs.conf", "");
+    folder_.Write("/proc" + std::string(kFlush), "");
+    folder_.Write("/proc" + std::string(kLimit), "");
+  }
+
+  void RunsGssProxy() const { folder_.Write("/gssproxy", ""); }
+  void HasBrokenServices() const { folder_.Write("/broken", ""); }
+  void HasNoKernelServer() const { RunProgram({"rm", "-r", folder_.At("/proc/fs"), folder_.At("/proc/net")}); }
+  void IsConfigured(const std::string& text) const { folder_.Write("/conf.d/vorn.conf", text); }
+
+  ProgramResult Run(const std::string& word) const {
+    const std::string place = folder_.directory();
+    return RunProgram({"unshare", "-Urm", "sh", "-ec",
+                       "mount --bind " + place +
+                           "/nfs.conf /etc/nfs.conf\n"
+                           "mount --bind " +
+                           place +
+                           "/conf.d /etc/nfs.conf.d\n"
+                           "mount --bind " +
+                           place +
+                           "/proc /proc\n"
+                           "PATH=" +
+                           place + "/bin:$PATH VORN_ROOT=/ exec " BOX_SCRIPT " " + word});
+  }
+
+  std::string Calls() const { return folder_.Read("/calls").value_or(""); }
+  std::string Kernel(const char* file) const { return folder_.Read("/proc" + std::string(file)).value_or(""); }
+
+ private:
+  TemporaryRoot folder_;
+};
+
+TEST(ReloadIDMap, RestartsBothDaemonsAndThenHasTheKernelForgetItsAnswers) {
+  const Box box;
+  const ProgramResult result = box.Run("reloadidmap");
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_EQ(box.Calls(),
+            "-q is-active gssproxy.service\ntry-restart rpc-svcgssd.service\ntry-restart nfs-idmapd.service\n");
+  EXPECT_EQ(box.Kernel(kFlush), "1\n");
+}
+
+TEST(ReloadIDMap, SaysThatGssproxyIgnoresTheMap) {
+  const Box box;
+  box.RunsGssProxy();
+  const ProgramResult result = box.Run("reloadidmap");
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("gssproxy serves Kerberos here"));
+  EXPECT_EQ(box.Calls(), "-q is-active gssproxy.service\ntry-restart nfs-idmapd.service\n");
+  EXPECT_EQ(box.Kernel(kFlush), "1\n");
+}
+
+TEST(ReloadIDMap, FailsWhereADaemonDoesNotCome) {
+  const Box box;
+  box.HasBrokenServices();
+  const ProgramResult result = box.Run("reloadidmap");
+  EXPECT_EQ(result.status, 1);
+  EXPECT_THAT(result.output, HasSubstr("the ID map was not taken up"));
+  EXPECT_EQ(box.Kernel(kFlush), "1\n") << "what can be done is done";
+}
+
+TEST(ReloadIDMap, NeedsNoKernelServer) {
+  const Box box;
+  box.HasNoKernelServer();
+  const ProgramResult result = box.Run("reloadidmap");
+  EXPECT_EQ(result.status, 0) << result.errors;
+}
+
+TEST(ReloadIDMap, OnlySaysOnATrialRootWhatItWouldDo) {
+  const TemporaryRoot root;
+  const ProgramResult result = RunProgram({BOX_SCRIPT, "reloadidmap"});
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_EQ(result.output,
+            "S83nfsd: would run: systemctl try-restart rpc-svcgssd.service\n"
+            "S83nfsd: would run: systemctl try-restart nfs-idmapd.service\n"
+            "S83nfsd: would write 1 to /proc/net/rpc/auth.rpcsec.context/flush\n");
+  EXPECT_THAT(root.Names(""), testing::IsEmpty());
+}
+
+TEST(TransferSizes, GiveTheKernelTheLargerOne) {
+  const struct {
+    const char* configuration;
+    const char* limit;
+  } cases[] = {{"[vorn]\nread-size = 65536\nwrite-size = 131072\n", "131072\n"},
+               {"[vorn]\nread-size = 131072\nwrite-size = 65536\n", "131072\n"},
+               {"[vorn]\nread-size = 8192\nwrite-size = 0\n", "8192\n"},
+               {"[vorn]\nwrite-size = 8192\n", "8192\n"},
+               {"[vorn]\nread-size = 0\nwrite-size = 0\n", ""},
+               {"[vorn]\nread-size = many\nwrite-size = -1\n", ""},
+               {"", ""}};
+  for (const auto& c : cases) {
+    const Box box;
+    box.IsConfigured(c.configuration);
+    const ProgramResult result = box.Run("transfersizes");
+    EXPECT_EQ(result.status, 0) << c.configuration << result.errors;
+    EXPECT_EQ(box.Kernel(kLimit), c.limit) << c.configuration;
+  }
+}
+
+TEST(TransferSizes, AreReadBelowATrialRoot) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "");
+  root.Write("/etc/nfs.conf.d/vorn.conf", "[vorn]\nread-size = 65536\nwrite-size = 8192\n");
+  EXPECT_EQ(RunProgram({BOX_SCRIPT, "transfersizes"}).output,
+            "S83nfsd: would write 65536 to /proc/fs/nfsd/max_block_size\n");
+}
+
+TEST(ServiceScript, RefusesOtherWords) {
+  const TemporaryRoot root;
+  for (const char* word : {"", "start", "reload"}) {
+    const ProgramResult result = RunProgram({BOX_SCRIPT, word});
+    EXPECT_EQ(result.status, 2) << word;
+    EXPECT_THAT(result.errors, HasSubstr("usage:"));
+  }
+}
+
+}  // namespace

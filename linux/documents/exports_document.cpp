@@ -65,7 +65,7 @@ class LineReader {
       Found found = ReadClientWord();
       if (found == Found::kNothing && !first) return;
       if (found == Found::kWord && word_.substr(0, 1) == "-") {
-        if (!Apply(&defaults_, std::string_view(word_).substr(1))) return;
+        if (!Apply(&defaults_, std::string_view{word_}.substr(1))) return;
         has_defaults_ = true;
         found = ReadClientWord();
       }
@@ -86,7 +86,7 @@ class LineReader {
     const std::size_t open = std::min(word_.find('('), word_.size());
     if (open < word_.size()) {
       if (word_.find(')', open) != word_.size() - 1) return Fail("the options of a client do not end with \")\"");
-      const std::string_view list = std::string_view(word_).substr(open + 1, word_.size() - open - 2);
+      const std::string_view list = std::string_view{word_}.substr(open + 1, word_.size() - open - 2);
       if (!Apply(&options, list)) return false;
     }
     ExportEntry entry{open == 0 ? "*" : word_.substr(0, open), options.Options(), {}};

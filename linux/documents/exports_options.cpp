@@ -83,7 +83,7 @@ bool IsOtherWord(const std::string& word) {
   const auto begins = [&word](std::string_view prefix) { return StartsWith(word, prefix); };
   if (std::any_of(kFreePrefixes.begin(), kFreePrefixes.end(), begins)) return true;
   if (begins("fsid=")) return IsFileSystemID(word.substr(5));
-  return (begins("squash_uids=") || begins("squash_gids=")) && IsIDRange(std::string_view(word).substr(12));
+  return (begins("squash_uids=") || begins("squash_gids=")) && IsIDRange(std::string_view{word}.substr(12));
 }
 
 void AppendWord(std::string* list, std::string_view word) {

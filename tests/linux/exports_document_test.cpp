@@ -15,7 +15,7 @@
 namespace vorn {
 namespace {
 
-using std::string_literals::operator""s;
+using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it is used
 using testing::ElementsAre;
 using testing::HasSubstr;
 
@@ -158,30 +158,31 @@ class FileMaker {
   bool Seldom() { return Up(60) == 0; }
 
   std::string Line() {
-    static const char* const kPlain[] = {"\n", "# comment\n", "  # c \\\n", "\t\n", "\\\n"};
+    static constexpr const char* kPlain[] = {"\n", "# comment\n", "  # c \\\n", "\t\n", "\\\n"};
     if (Up(4) == 0) return Any(kPlain);
-    static const char* const kPaths[] = {"/mnt/a",       "/mnt/b",           "/mnt/a/", "\"/mnt/a b\"",
-                                         "/mnt/a\\040b", "/mnt/b\\043\" \"", "//mnt/b", "  /mnt/c"};
+    static constexpr const char* kPaths[] = {"/mnt/a",       "/mnt/b",           "/mnt/a/", "\"/mnt/a b\"",
+                                             "/mnt/a\\040b", "/mnt/b\\043\" \"", "//mnt/b", "  /mnt/c"};
     std::string line = Any(kPaths);
     for (int words = Up(4); words > 0; --words) line += Blank() + Word();
-    static const char* const kEnds[] = {"\n", " \n", " # end\n", " \\\n\n", "\r\n"};
+    static constexpr const char* kEnds[] = {"\n", " \n", " # end\n", " \\\n\n", "\r\n"};
     return line + Any(kEnds);
   }
 
   std::string Blank() { return Up(5) != 0 ? " " : Up(1) != 0 ? " \\\n\t" : "\t "; }
 
   std::string Word() {
-    static const char* const kFaults[] = {"alpha(rw", "\"", "gamma(foo)", "alpha(rw)x", "-bar", "\\"};
+    static constexpr const char* kFaults[] = {"alpha(rw", "\"", "gamma(foo)", "alpha(rw)x", "-bar", "\\"};
     if (Seldom()) return Any(kFaults);
-    static const char* const kClients[] = {"alpha", "beta.example", "*", "10.0.0.0/8", "@group", "*.ex[a-m]ple", "::1"};
+    static constexpr const char* kClients[] = {"alpha",  "beta.example", "*",  "10.0.0.0/8",
+                                               "@group", "*.ex[a-m]ple", "::1"};
     if (Up(6) == 0) return "-" + Options();
     return Any(kClients) + (Up(4) != 0 ? "(" + Options() + ")" : "");
   }
 
   std::string Options() {
-    static const char* const kOptions[] = {"rw",       "ro",        "async",     "no_root_squash", "all_squash",
-                                           "sec=krb5", "sec=sys",   "insecure",  "sec=krb5i:krb5", "crossmnt",
-                                           "fsid=5",   "no_wdelay", "anonuid=7", "subtree_check",  "no_all_squash"};
+    static constexpr const char* kOptions[] = {"rw",       "ro",        "async",     "no_root_squash", "all_squash",
+                                               "sec=krb5", "sec=sys",   "insecure",  "sec=krb5i:krb5", "crossmnt",
+                                               "fsid=5",   "no_wdelay", "anonuid=7", "subtree_check",  "no_all_squash"};
     std::string options = Any(kOptions);
     for (int more = Up(3); more > 0; --more) options += "," + Any(kOptions);
     return options;

@@ -8,7 +8,7 @@ namespace vorn {
 namespace {
 
 using Found = ExportsReader::Found;
-using std::string_literals::operator""s;
+using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it is used
 
 struct WordCase {
   const char* name;

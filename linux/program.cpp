@@ -21,7 +21,7 @@ Status Run(const char* program, const std::vector<std::string>& arguments) {
   if (!path.ok()) return path.status();
   const LockPause pause;
   int count = 0;
-  const Status status = RunProgram(*path, arguments, [&](std::string_view line) {
+  Status status = RunProgram(*path, arguments, [&](std::string_view line) {
     if (count++ >= kMostLines) return;
     syslog(LOG_INFO, "%s: %.*s", program, static_cast<int>(line.size()), line.data());
   });

@@ -135,7 +135,7 @@ class Manager {
     const int result = sd_bus_match_signal(bus_.get(), nullptr, kDestination, kManagerPath, kManager, "JobRemoved",
                                            OnJobRemoved, this);
     if (result < 0) return Failed("the system bus", std::strerror(-result));
-    const Status status = Call("Subscribe", "", "").status();
+    Status status = Call("Subscribe", "", "").status();
     watching_ = status.ok();
     return status;
   }

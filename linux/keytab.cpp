@@ -12,6 +12,7 @@
 #include "error.h"
 #include "file_descriptor.h"
 #include "files.h"
+#include "ini_text.h"
 #include "keytab_file.h"
 #include "lock.h"
 #include "nfsconf.h"
@@ -40,6 +41,12 @@ const std::string& OwnPrincipal(const std::vector<KeytabKey>& keys) {
   return found == keys.end() ? keys.front().principal : found->principal;
 }
 
+// Whether the configuration record can carry it: once the keytab is installed it has to.
+Status CheckPrincipal(const std::string& principal) {
+  if (principal.size() < sizeof(KeytabEntry::principal) && IniValue::From(principal)) return {};
+  return Status::Failure(kRefusedText, "nfs.conf(5) cannot carry the principal " + principal);
+}
+
 // Keys are for root alone, whatever mode an older file had.
 Status Install(const std::string& content) {
   const Result<std::string> path = Root::Current().Locate(kFile);
@@ -66,7 +73,7 @@ Status Import(const std::string& path) {
   if (!keys.ok()) return keys.status();
   if (keys->empty()) return Status::Failure(kNoKeytab, "not a keytab to use: there is no key in it");
   const std::string& principal = OwnPrincipal(*keys);
-  if (principal.size() >= sizeof(KeytabEntry::principal)) return Status::Failure(kRefusedText, "too long a principal");
+  if (Status status = CheckPrincipal(principal); !status.ok()) return status;
   const ConfigurationLock lock;
   if (!lock.status().ok()) return lock.status();
   const Status installed = Install(*content);

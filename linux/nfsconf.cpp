@@ -1,100 +1,30 @@
 #include "nfsconf.h"
 
-#include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <filesystem>
-#include <vector>
+#include <limits>
+#include <optional>
 
 #include "error.h"
 #include "ini_file.h"
 #include "lock.h"
-#include "root.h"
+#include "nfs_configuration.h"
 
 namespace vorn {
 namespace {
 
-namespace fs = std::filesystem;
-
-constexpr char kFolder[] = "/etc/nfs.conf.d";
 constexpr char kFile[] = "/etc/nfs.conf.d/vorn.conf";
 constexpr char kHeading[] =
     "# The NFS settings of this box, kept by its management. Other lines here are left alone.\n";
-constexpr int kLargestPort = 65535;
 
 // What nfs-utils has no key for, and what it must not see while it is switched off.
 constexpr char kOurs[] = "vorn";
 
 // ---------------------------------------------------------------------------------------------
-// Reading: nfs.conf(5) and the files beside it, as the services put them together.
-
-class ServiceConfiguration {
- public:
-  static Result<ServiceConfiguration> Open() {
-    ServiceConfiguration configuration;
-    if (Status status = configuration.Add("/etc/nfs.conf"); !status.ok()) return status;
-    const Result<std::vector<std::string>> names = Names();
-    if (!names.ok()) return names.status();
-    for (const std::string& name : *names) {
-      if (Status status = configuration.Add(std::string(kFolder) + "/" + name); !status.ok()) return status;
-    }
-    return configuration;
-  }
-
-  // Each reads a value, which stays as it is when no file has one.
-  Status Read(const char* section, const char* key, int largest, std::int32_t* value) const {
-    const Result<std::optional<int>> number = Deciding(section, key).Number(section, key, largest);
-    if (number.ok() && *number) *value = **number;
-    return number.status();
-  }
-  Status Read(const char* section, const char* key, std::int32_t* value) const {
-    const Result<std::optional<bool>> on = Deciding(section, key).Switch(section, key);
-    if (on.ok() && *on) *value = **on ? 1 : 0;
-    return on.status();
-  }
-  Status Read(const char* section, const char* key, char* text, std::size_t size) const {
-    const IniFile& file = Deciding(section, key);
-    const std::string value = file.document().Get(section, key).value_or("");
-    if (value.size() >= size) return file.Refuse(section, key, "is longer than " + std::to_string(size - 1) + " bytes");
-    std::memcpy(text, value.c_str(), value.size() + 1);
-    return {};
-  }
-
- private:
-  Status Add(const std::string& path) {
-    Result<IniFile> file = IniFile::Open(path);
-    if (file.ok()) files_.push_back(std::move(*file));
-    return file.status();
-  }
-
-  // In the order of strverscmp(3), which is the services'.
-  static Result<std::vector<std::string>> Names() {
-    const Result<std::string> folder = Root::Current().Locate(kFolder);
-    if (!folder.ok()) return folder.status();
-    std::vector<std::string> names;
-    std::error_code ignored;
-    for (const fs::directory_entry& entry : fs::directory_iterator(*folder, ignored)) {
-      const fs::path name = entry.path().filename();
-      const bool counts = name.extension() == ".conf" && !entry.is_directory(ignored);
-      if (counts && name.native().front() != '.') names.push_back(name);
-    }
-    const auto before = [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; };
-    std::sort(names.begin(), names.end(), before);
-    return names;
-  }
-
-  // The last file that has a value, or any one.
-  const IniFile& Deciding(const char* section, const char* key) const {
-    const auto has = [&](const IniFile& file) { return file.document().Get(section, key).has_value(); };
-    const auto last = std::find_if(files_.rbegin(), files_.rend(), has);
-    return last == files_.rend() ? files_.front() : *last;
-  }
-
-  std::vector<IniFile> files_;
-};
+// Reading.
 
 // Our own switch, or if nobody ever set it: whether an administrator fixed one of the ports.
-Status ReadPorts(const ServiceConfiguration& configuration, NFSConfRecord* record) {
+Status ReadPorts(const NFSConfiguration& configuration, NFSConfRecord* record) {
   std::int32_t statd = 0;
   std::int32_t nlm = 0;
   if (Status s = configuration.Read("statd", "port", kLargestPort, &statd); !s.ok()) return s;
@@ -111,7 +41,7 @@ Status ReadPorts(const ServiceConfiguration& configuration, NFSConfRecord* recor
 
 Status ReadRecord(NFSConfRecord* result) {
   if (result == nullptr) return Status::Failure(EINVAL, "no record");
-  const Result<ServiceConfiguration> configuration = ServiceConfiguration::Open();
+  const Result<NFSConfiguration> configuration = NFSConfiguration::Open();
   if (!configuration.ok()) return configuration.status();
   NFSConfRecord record{};
   record.enable_nfs_v4 = 1;  // as rpc.nfsd(8) without a key; sizes, ports and rpc.mountd's groups begin at 0

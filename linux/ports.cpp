@@ -1,24 +1,25 @@
 // Whether a port is free for a service: WebUtils::IsPortConflict.
-#include <arpa/inet.h>
-#include <netinet/in.h>
-#include <rpc/pmap_clnt.h>
-#include <rpc/pmap_prot.h>
-#include <sys/socket.h>
+#include <netconfig.h>
+#include <rpc/rpc.h>
+#include <rpc/rpcb_clnt.h>
+#include <rpc/rpcb_prot.h>
 
 #include <algorithm>
+#include <cstdlib>
 #include <fstream>
+#include <memory>
 #include <set>
 #include <sstream>
 #include <string>
+#include <utility>
 
 #include "error.h"
+#include "nfs_configuration.h"
 #include "nfs_ports.h"
 #include "webapi.h"
 
 namespace vorn {
 namespace {
-
-constexpr int kHighestPort = 65535;
 
 // RFC 1833's program numbers.
 constexpr unsigned long kStatusProgram = 100024;
@@ -29,25 +30,35 @@ unsigned long ProgramOf(const std::string& service) {
   return service == "nfs_nlm" ? kLockProgram : 0;
 }
 
-// The ports that rpcbind(8) knows to be of the service itself. None where no rpcbind answers: then
-// nothing of the service can be registered either.
-std::set<int> OwnPorts(const std::string& service) {
-  std::set<int> own;
-  sockaddr_in local{};
-  local.sin_family = AF_INET;
-  local.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  pmaplist* const registered = pmap_getmaps(&local);
-  for (const pmaplist* entry = registered; entry != nullptr; entry = entry->pml_next) {
-    if (entry->pml_map.pm_prog == ProgramOf(service)) own.insert(static_cast<int>(entry->pml_map.pm_port));
+// A protocol ("tcp", "udp"; IPv4 and IPv6 alike) and a port of it.
+using Socket = std::pair<std::string, int>;
+
+// RFC 5665: the last two numbers of "0.0.0.0.8.1" and "::.8.1" are the port's bytes. 0 for an address without.
+int PortOf(const std::string& address) {
+  const std::size_t low = address.rfind('.');
+  if (low == std::string::npos || low == 0) return 0;
+  const std::size_t high = address.rfind('.', low - 1);
+  if (high == std::string::npos) return 0;
+  return std::atoi(address.c_str() + high + 1) * 256 + std::atoi(address.c_str() + low + 1);
+}
+
+// What rpcbind(8) knows to be of the service itself. Nothing where no rpcbind answers: then nothing of the
+// service can be registered either.
+std::set<Socket> OwnSockets(const std::string& service) {
+  std::set<Socket> own;
+  const std::unique_ptr<netconfig, decltype(&freenetconfigent)> local(getnetconfigent("local"), freenetconfigent);
+  rpcblist* registered = local ? rpcb_getmaps(local.get(), "localhost") : nullptr;
+  for (const rpcblist* entry = registered; entry != nullptr; entry = entry->rpcb_next) {
+    const rpcb& map = entry->rpcb_map;
+    if (map.r_prog == ProgramOf(service)) own.emplace(std::string(map.r_netid).substr(0, 3), PortOf(map.r_addr));
   }
-  if (registered != nullptr)
-    xdr_free(reinterpret_cast<xdrproc_t>(xdr_pmaplist_ptr), const_cast<pmaplist**>(&registered));
+  xdr_free(reinterpret_cast<xdrproc_t>(xdr_rpcblist_ptr), &registered);
   return own;
 }
 
 // Local ports in a table of proc(5): "0: 0100007F:0016 00000000:0000 0A ...". `state` is what a socket
 // that waits for others has there.
-void AddListeners(const char* table, const std::string& state, std::set<int>* ports) {
+void AddListeners(const char* table, const char* protocol, const std::string& state, std::set<Socket>* sockets) {
   std::ifstream lines(table);
   std::string line;
   std::getline(lines, line);
@@ -59,31 +70,33 @@ void AddListeners(const char* table, const std::string& state, std::set<int>* po
     std::string found;
     words >> number >> local >> remote >> found;
     const std::size_t colon = local.rfind(':');
-    if (found == state && colon != std::string::npos) ports->insert(std::stoi(local.substr(colon + 1), nullptr, 16));
+    if (found != state || colon == std::string::npos) continue;
+    sockets->emplace(protocol, std::stoi(local.substr(colon + 1), nullptr, 16));
   }
 }
 
-std::set<int> ListeningPorts() {
-  std::set<int> ports;
-  AddListeners("/proc/net/tcp", "0A", &ports);
-  AddListeners("/proc/net/tcp6", "0A", &ports);
-  AddListeners("/proc/net/udp", "07", &ports);
-  AddListeners("/proc/net/udp6", "07", &ports);
-  return ports;
+std::set<Socket> ListeningSockets() {
+  std::set<Socket> sockets;
+  AddListeners("/proc/net/tcp", "tcp", "0A", &sockets);
+  AddListeners("/proc/net/tcp6", "tcp", "0A", &sockets);
+  AddListeners("/proc/net/udp", "udp", "07", &sockets);
+  AddListeners("/proc/net/udp6", "udp", "07", &sockets);
+  return sockets;
 }
 
 Result<bool> IsConflict(const std::string& service, int first, int last) {
-  if (first < 1 || last > kHighestPort || first > last) return true;
+  if (first < 1 || last > kLargestPort || first > last) return true;
+  const auto within = [&](int port) { return port >= first && port <= last; };
   const auto configured = ConfiguredPorts();
   if (!configured.ok()) return configured.status();
   const bool taken = std::any_of(configured->begin(), configured->end(), [&](const ConfiguredPort& port) {
-    return port.service != service && port.port >= first && port.port <= last;
+    return port.service != service && within(port.port);
   });
   if (taken) return true;
-  const std::set<int> own = OwnPorts(service);
-  const std::set<int> listening = ListeningPorts();
-  return std::any_of(listening.lower_bound(first), listening.upper_bound(last),
-                     [&](int port) { return own.count(port) == 0; });
+  const std::set<Socket> own = OwnSockets(service);
+  const std::set<Socket> listening = ListeningSockets();
+  return std::any_of(listening.begin(), listening.end(),
+                     [&](const Socket& socket) { return within(socket.second) && own.count(socket) == 0; });
 }
 
 }  // namespace

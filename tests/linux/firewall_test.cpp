@@ -1,91 +1,107 @@
+// The firewall's table, in a network of the test's own. The judge is nft(8).
 #include "firewall.h"
 
 #include <gmock/gmock.h>
-#include <sched.h>
-#include <unistd.h>
 
-#include <fstream>
-#include <string>
+#include <cerrno>
 
+#include "core.h"
+#include "injected_failures.h"
 #include "nfsconf.h"
 #include "processes.h"
+#include "status.h"
 #include "temporary_root.h"
 
 namespace {
 
+using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
 
-// A network of this process's own, in which it may do as it likes; false where the system has none to give.
-bool EnterOwnNetwork() {
-  const uid_t user = getuid();
-  if (user == 0) return unshare(CLONE_NEWNET) == 0;
-  if (unshare(CLONE_NEWUSER | CLONE_NEWNET) != 0) return false;
-  std::ofstream("/proc/self/setgroups") << "deny";
-  std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
-  return true;
-}
-
-std::string Nft(const std::string& command) {
-  const ProgramResult result = RunProgram({"sh", "-c", "nft " + command});
-  return result.output + result.errors;
+std::string Ruleset() {
+  const ProgramResult result = RunProgram({"nft", "list", "ruleset"});
+  EXPECT_EQ(result.status, 0) << result.errors;
+  return result.output;
 }
 
 class Firewall : public testing::Test {
  protected:
-  void SetUp() override {
-    root_.Write("/etc/vorn/platform.conf", "[platform]\nfirewall = yes\n");
-    if (!EnterOwnNetwork()) GTEST_SKIP() << "no network namespaces here";
-    if (Nft("add table inet probe") != "") GTEST_SKIP() << "no nftables here: " << Nft("add table inet probe");
-    Nft("delete table inet probe");
+  Firewall() {
+    EXPECT_EQ(RunProgram({"nft", "flush", "ruleset"}).status, 0);
+    Switch("yes");
   }
 
-  static void UsePorts(int statd_port, int nlm_port, int custom) {
-    NFSConfRecord record;
-    ASSERT_EQ(VORNNFSConfGet(&record), 0);
-    record.statd_port = statd_port;
-    record.nlm_port = nlm_port;
-    record.custom_port_enable = custom;
+  void Switch(const std::string& state) const {
+    root_.Write("/etc/vorn/platform.conf", "[platform]\nfirewall = " + state + "\n");
+  }
+
+  static void SetPorts(int statd, int nlm) {
+    NFSConfRecord record{};
+    record.statd_port = statd;
+    record.nlm_port = nlm;
+    record.custom_port_enable = 1;
     ASSERT_EQ(VORNNFSConfSet(&record), 0);
   }
 
-  TemporaryRoot root_;
+  const TemporaryRoot root_;
 };
 
-TEST_F(Firewall, AcceptsTheConfiguredPortsAndForgetsTheOldOnes) {
-  UsePorts(4000, 4001, 1);
+TEST_F(Firewall, AcceptsTheConfiguredPortsInATableOfItsOwn) {
+  SetPorts(4000, 4001);
+  root_.Write("/etc/nfs.conf", "[mountd]\nport = 20048\n");
   ASSERT_EQ(VORNFwRuleHup(), 0);
-  EXPECT_THAT(Nft("list table inet vorn"), testing::AllOf(HasSubstr("2049"), HasSubstr("111"), HasSubstr("4000"),
-                                                          HasSubstr("4001"), HasSubstr("udp")));
-  UsePorts(5000, 4001, 1);
-  ASSERT_EQ(VORNFwRuleHup(), 0);
-  EXPECT_THAT(Nft("list table inet vorn"), testing::AllOf(HasSubstr("5000"), Not(HasSubstr("4000"))));
-  UsePorts(5000, 4001, 0);
-  ASSERT_EQ(VORNFwRuleHup(), 0);
-  EXPECT_THAT(Nft("list table inet vorn"), testing::AllOf(HasSubstr("2049"), Not(HasSubstr("5000"))));
+  const std::string accept = "\t\tmeta l4proto { tcp, udp } th dport ";
+  EXPECT_EQ(Ruleset(),
+            "table inet vorn {\n\tchain nfs {\n"
+            "\t\ttype filter hook input priority filter; policy accept;\n" +
+                accept + "111 accept comment \"rpcbind\"\n" + accept + "2049 accept comment \"nfs\"\n" + accept +
+                "20048 accept comment \"nfs_mountd\"\n" + accept + "4000 accept comment \"nfs_statd\"\n" + accept +
+                "4001 accept comment \"nfs_nlm\"\n\t}\n}\n");
 }
 
-TEST_F(Firewall, LeavesForeignTablesAlone) {
-  Nft("add table inet administrator");
-  Nft("add chain inet administrator input '{ type filter hook input priority 0 ; policy drop ; }'");
-  const std::string before = Nft("list table inet administrator");
-  ASSERT_THAT(before, HasSubstr("policy drop"));
+TEST_F(Firewall, FollowsAChangeWithoutATraceOfTheOldPorts) {
+  SetPorts(4000, 4001);
   ASSERT_EQ(VORNFwRuleHup(), 0);
-  EXPECT_EQ(Nft("list table inet administrator"), before);
+  SetPorts(5000, 5001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  EXPECT_THAT(Ruleset(), AllOf(HasSubstr("dport 5000"), HasSubstr("dport 5001"), Not(HasSubstr("dport 400"))));
 }
 
-TEST_F(Firewall, DoesNothingWhereItIsSwitchedOff) {
-  root_.Write("/etc/vorn/platform.conf", "[platform]\nfirewall = no\n");
+TEST_F(Firewall, LeavesOtherTablesAlone) {
+  const std::string theirs = "table inet site { chain input { type filter hook input priority 0; policy drop; }; }";
+  ASSERT_EQ(RunProgram({"nft", theirs}).status, 0);
+  const std::string before = Ruleset();
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  EXPECT_THAT(Ruleset(), HasSubstr(before));
+}
+
+TEST_F(Firewall, IsLeftAloneWhileItIsSwitchedOff) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const std::string before = Ruleset();
+  Switch("no");
+  SetPorts(5000, 5001);
   EXPECT_EQ(VORNFwRuleHup(), 0);
-  EXPECT_EQ(Nft("list tables"), "");
+  EXPECT_EQ(Ruleset(), before);
 }
 
-TEST_F(Firewall, KeepsTheOldRulesWhenTheSettingsCannotBeRead) {
+TEST_F(Firewall, KeepsTheOldRulesWhereThePortsCannotBeRead) {
+  SetPorts(4000, 4001);
   ASSERT_EQ(VORNFwRuleHup(), 0);
-  const std::string before = Nft("list table inet vorn");
-  root_.Write("/etc/nfs.conf.d/vorn.conf", "[vorn]\nstatd-port = many\n");
+  const std::string before = Ruleset();
+  root_.Write("/etc/nfs.conf", "[mountd]\nport = many\n");
   EXPECT_LT(VORNFwRuleHup(), 0);
-  EXPECT_EQ(Nft("list table inet vorn"), before);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+  EXPECT_EQ(Ruleset(), before);
+}
+
+TEST_F(Firewall, FailsWithTheReasonWhereTheKernelCannotBeAsked) {
+  ChildProcess child([] {
+    if (!FailSystemCall(SYS_sendmsg, EPERM)) return 1;
+    return VORNFwRuleHup() < 0 && KLIBCErrGet() == vorn::kServiceFailed ? 0 : 2;
+  });
+  EXPECT_EQ(child.Wait(), 0);
+  EXPECT_EQ(Ruleset(), "");
 }
 
 }  // namespace

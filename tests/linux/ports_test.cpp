@@ -1,13 +1,14 @@
+// WebUtils::IsPortConflict, in a network of the test's own.
 #include <arpa/inet.h>
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 #include <netinet/in.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
-#include <climits>
-#include <string>
-
+#include "core.h"
+#include "file_descriptor.h"
 #include "nfsconf.h"
+#include "stand_in_rpcbind.h"
+#include "status.h"
 #include "temporary_root.h"
 #include "webapi.h"
 
@@ -15,97 +16,103 @@ namespace {
 
 using WebUtils::IsPortConflict;
 
-// A socket that somebody else has at a port that the system chose.
-class Somebody {
- public:
-  Somebody(int family, int type) : socket_(socket(family, type, 0)) {
-    sockaddr_in6 address{};
-    address.sin6_family = static_cast<sa_family_t>(family);  // all zeros are any address, of either family
-    socklen_t size = family == AF_INET ? sizeof(sockaddr_in) : sizeof(sockaddr_in6);
-    auto* const plain = reinterpret_cast<sockaddr*>(&address);
-    const bool bound = bind(socket_, plain, size) == 0 && getsockname(socket_, plain, &size) == 0;
-    if (bound) port_ = ntohs(address.sin6_port);  // at the same place in both
-    if (bound && type == SOCK_STREAM) listen(socket_, 1);
+constexpr unsigned long kStatusProgram = 100024;
+constexpr unsigned long kLockProgram = 100021;
+
+// A socket that waits for others, on all addresses.
+vorn::FileDescriptor Listen(int family, int type, int port) {
+  vorn::FileDescriptor descriptor(socket(family, type, 0));
+  const int on = 1;
+  sockaddr_storage address{};
+  address.ss_family = static_cast<sa_family_t>(family);
+  if (family == AF_INET6) {
+    setsockopt(descriptor.get(), IPPROTO_IPV6, IPV6_V6ONLY, &on, sizeof on);
+    reinterpret_cast<sockaddr_in6*>(&address)->sin6_port = htons(static_cast<std::uint16_t>(port));
+  } else {
+    reinterpret_cast<sockaddr_in*>(&address)->sin_port = htons(static_cast<std::uint16_t>(port));
   }
-  ~Somebody() { close(socket_); }
-  Somebody(const Somebody&) = delete;
-  Somebody& operator=(const Somebody&) = delete;
-
-  int port() const { return port_; }
-
- private:
-  int socket_;
-  int port_ = 0;
-};
-
-// One that was free a moment ago.
-int FreePort() { return Somebody(AF_INET6, SOCK_STREAM).port(); }
-
-class Ports : public testing::Test {
- protected:
-  void Configure(int statd_port, int nlm_port, bool custom) {
-    NFSConfRecord record;
-    ASSERT_EQ(VORNNFSConfGet(&record), 0);
-    record.statd_port = statd_port;
-    record.nlm_port = nlm_port;
-    record.custom_port_enable = custom ? 1 : 0;
-    ASSERT_EQ(VORNNFSConfSet(&record), 0);
-  }
-
-  TemporaryRoot root_;
-};
-
-TEST_F(Ports, AreNumbersFrom1To65535) {
-  for (const int port : {INT_MIN, -1, 0, 65536, INT_MAX}) {
-    EXPECT_NE(IsPortConflict("nfs_statd", port, port), 0) << port;
-  }
-  EXPECT_NE(IsPortConflict("nfs_statd", 40000, 39999), 0) << "a range that ends before it begins";
+  setsockopt(descriptor.get(), SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
+  EXPECT_EQ(bind(descriptor.get(), reinterpret_cast<sockaddr*>(&address), sizeof address), 0) << port;
+  EXPECT_TRUE(type != SOCK_STREAM || listen(descriptor.get(), 1) == 0) << port;
+  return descriptor;
 }
 
-TEST_F(Ports, MayBeGivenWhereNobodyHasThem) {
-  const int port = FreePort();
-  EXPECT_EQ(IsPortConflict("nfs_statd", port, port), 0);
+TEST(PortConflict, IsEverythingThatIsNoPort) {
+  const TemporaryRoot root;
+  const struct {
+    int first;
+    int last;
+    int conflict;
+  } cases[] = {
+      {0, 0, 1},    {-1, -1, 1},     {1, 1, 0},       {65535, 65535, 0},      {65536, 65536, 1},    {65535, 65536, 1},
+      {0, 4000, 1}, {4001, 4000, 1}, {4000, 4001, 0}, {-2147483647, 4000, 1}, {4000, 2147483647, 1}};
+  for (const auto& c : cases) EXPECT_EQ(IsPortConflict("nfs_statd", c.first, c.last), c.conflict) << c.first;
 }
 
-TEST_F(Ports, AreTakenBySocketsOfEveryKind) {
+TEST(PortConflict, IsASocketOfAnyKindThatSomebodyListensOn) {
+  const TemporaryRoot root;
   for (const int family : {AF_INET, AF_INET6}) {
     for (const int type : {SOCK_STREAM, SOCK_DGRAM}) {
-      const Somebody somebody(family, type);
-      ASSERT_GT(somebody.port(), 0);
-      EXPECT_NE(IsPortConflict("nfs_nlm", somebody.port(), somebody.port()), 0) << family << ' ' << type;
-      EXPECT_NE(IsPortConflict("nfs_nlm", somebody.port() - 1, somebody.port()), 0) << "as the last of a range";
+      SCOPED_TRACE(std::to_string(family) + " " + std::to_string(type));
+      const vorn::FileDescriptor socket = Listen(family, type, 5000);
+      EXPECT_EQ(IsPortConflict("nfs_statd", 5000, 5000), 1);
+      EXPECT_EQ(IsPortConflict("nfs_statd", 4990, 5000), 1);
+      EXPECT_EQ(IsPortConflict("nfs_statd", 5000, 5010), 1);
+      EXPECT_EQ(IsPortConflict("nfs_statd", 4999, 4999), 0);
+      EXPECT_EQ(IsPortConflict("nfs_statd", 5001, 5001), 0);
     }
+  }
+  EXPECT_EQ(IsPortConflict("nfs_statd", 5000, 5000), 0) << "nobody listens any longer";
+}
+
+TEST(PortConflict, IsNotTheServicesOwnSocket) {
+  const TemporaryRoot root;
+  const StandInRpcbind rpcbind({{100000, "tcp", "0.0.0.0.0.111"},
+                                {100000, "local", "/run/rpcbind.sock"},
+                                {kStatusProgram, "tcp", "0.0.0.0.15.160"},
+                                {kStatusProgram, "tcp6", "::.15.160"},
+                                {kStatusProgram, "udp6", "::.15.161"},
+                                {kLockProgram, "tcp", "0.0.0.0.15.162"}});
+  const vorn::FileDescriptor sockets[] = {Listen(AF_INET, SOCK_STREAM, 4000), Listen(AF_INET6, SOCK_STREAM, 4000),
+                                          Listen(AF_INET, SOCK_DGRAM, 4001), Listen(AF_INET, SOCK_STREAM, 4002)};
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 0);
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4001, 4001), 0);
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4002, 4002), 1) << "the lock manager's";
+  EXPECT_EQ(IsPortConflict("nfs_nlm", 4002, 4002), 0);
+  EXPECT_EQ(IsPortConflict("nfs_nlm", 4000, 4000), 1) << "the status daemon's";
+  EXPECT_EQ(IsPortConflict("rpcbind", 4000, 4000), 1) << "a service without a program";
+  const vorn::FileDescriptor foreign = Listen(AF_INET, SOCK_DGRAM, 4000);
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 1) << "somebody else's, of the other protocol";
+}
+
+TEST(PortConflict, IsTheConfiguredPortOfAnotherService) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[nfsd]\nport = 20490\n[mountd]\nport = 20000\n");
+  root.Write("/etc/nfs.conf.d/site.conf", "[mountd]\nport = 20048\n");
+  NFSConfRecord record{};
+  record.statd_port = 4000;
+  record.nlm_port = 4001;
+  const struct {
+    const char* service;
+    int port;
+    bool custom_ports;
+    int conflict;
+  } cases[] = {{"nfs_statd", 111, true, 1},   {"nfs_statd", 20490, true, 1}, {"nfs_statd", 2049, true, 0},
+               {"nfs_statd", 20048, true, 1}, {"nfs_statd", 20000, true, 0}, {"nfs_statd", 4000, true, 0},
+               {"nfs_statd", 4001, true, 1},  {"nfs_nlm", 4000, true, 1},    {"nfs_nlm", 4001, true, 0},
+               {"nfs_statd", 4001, false, 0}, {"nfs_nlm", 4000, false, 0}};
+  for (const auto& c : cases) {
+    record.custom_port_enable = c.custom_ports ? 1 : 0;
+    ASSERT_EQ(VORNNFSConfSet(&record), 0);
+    EXPECT_EQ(IsPortConflict(c.service, c.port, c.port), c.conflict) << c.service << " " << c.port;
   }
 }
 
-TEST_F(Ports, OfTheProtocolsAreTaken) {
-  EXPECT_NE(IsPortConflict("nfs_statd", 111, 111), 0);
-  EXPECT_NE(IsPortConflict("nfs_statd", 2049, 2049), 0);
-  EXPECT_NE(IsPortConflict("nfs_statd", 2040, 2060), 0);
-}
-
-TEST_F(Ports, OfTheAdministratorsSettingsAreTaken) {
-  const int mountd = FreePort();
-  root_.Write("/etc/nfs.conf", "[mountd]\nport = " + std::to_string(mountd) + "\n");
-  EXPECT_NE(IsPortConflict("nfs_statd", mountd, mountd), 0);
-}
-
-TEST_F(Ports, OfTheOtherDaemonAreTakenWhileCustomPortsAreOn) {
-  const int statd = FreePort();
-  const int nlm = FreePort();
-  if (statd == nlm) GTEST_SKIP() << "the system gave the same port twice";
-  Configure(statd, nlm, true);
-  EXPECT_NE(IsPortConflict("nfs_nlm", statd, statd), 0);
-  EXPECT_NE(IsPortConflict("nfs_statd", nlm, nlm), 0);
-  EXPECT_EQ(IsPortConflict("nfs_statd", statd, statd), 0) << "its own";
-  Configure(statd, nlm, false);
-  EXPECT_EQ(IsPortConflict("nfs_nlm", statd, statd), 0);
-}
-
-TEST_F(Ports, AreNotGivenAwayWhenTheSettingsCannotBeRead) {
-  root_.Write("/etc/nfs.conf.d/vorn.conf", "[vorn]\nstatd-port = many\n");
-  const int port = FreePort();
-  EXPECT_NE(IsPortConflict("nfs_statd", port, port), 0);
+TEST(PortConflict, IsWhatNobodyCanVouchFor) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[mountd]\nport = many\n");
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 1);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
 }
 
 }  // namespace

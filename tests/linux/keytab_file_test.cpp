@@ -1,0 +1,116 @@
+#include "keytab_file.h"
+
+#include <gmock/gmock.h>
+
+#include "keytab_maker.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::SizeIs;
+using vorn::KeytabKey;
+using vorn::ReadKeytab;
+
+const std::string& ThreeKeys() {
+  static const std::string content = MakeKeytab({{"nfs/box.example@LAB.TEST", 3, "aes256-cts-hmac-sha1-96"},
+                                                 {"host/box.example@LAB.TEST", 300, "arcfour-hmac"},
+                                                 {"alice@LAB.TEST", 1, "aes128-cts-hmac-sha256-128"}});
+  return content;
+}
+
+std::vector<std::string> Keys(const std::string& content) {
+  const auto keys = ReadKeytab(content);
+  if (!keys.ok()) return {keys.status().reason()};
+  std::vector<std::string> lines;
+  for (const KeytabKey& key : *keys)
+    lines.push_back(std::to_string(key.version) + " " + key.principal + " (" + key.enc_type + ")");
+  return lines;
+}
+
+TEST(Keytab, HasItsKeysInFileOrder) {
+  EXPECT_THAT(Keys(ThreeKeys()), ElementsAre("3 nfs/box.example@LAB.TEST (aes256-cts-hmac-sha1-96)",
+                                             "300 host/box.example@LAB.TEST (arcfour-hmac)",
+                                             "1 alice@LAB.TEST (aes128-cts-hmac-sha256-128)"));
+  EXPECT_THAT(Keys(ThreeKeys()), ElementsAreArray(ListedByKlist(ThreeKeys())));
+}
+
+TEST(Keytab, OfARealmIsReadAsKlistReadsItWithTheHoleOfARemovedKey) {
+  const std::string content = MakeKeytabOfARealm();
+  EXPECT_THAT(content, HasSubstr(std::string(8, '\0'))) << "no hole";
+  const auto keys = Keys(content);
+  EXPECT_THAT(keys, SizeIs(4));
+  EXPECT_THAT(keys, ElementsAreArray(ListedByKlist(content)));
+}
+
+TEST(Keytab, MayHaveNoKey) { EXPECT_THAT(Keys(EncodeFile({})), IsEmpty()); }
+
+TEST(Keytab, NamesAnEncryptionTypeThatNobodyKnowsByItsNumber) {
+  EXPECT_THAT(Keys(EncodeFile({EncodeEntry("alice", "LAB.TEST", 99)})), ElementsAre("1 alice@LAB.TEST (etype 99)"));
+}
+
+TEST(Keytab, QuotesWhatAPrincipalMustNotHold) {
+  EXPECT_THAT(Keys(EncodeFile({EncodeEntry("a/b@c\n", "R", 17)})),
+              ElementsAre("1 a\\/b\\@c\\n@R (aes128-cts-hmac-sha1-96)"));
+}
+
+// The library itself takes every one of these for a keytab that ends there.
+TEST(Keytab, IsNoneWhenItIsCutOffButBetweenTwoEntries) {
+  const std::string& whole = ThreeKeys();
+  int accepted = 0;
+  for (std::size_t size = 0; size < whole.size(); ++size) {
+    const auto keys = ReadKeytab(whole.substr(0, size));
+    if (!keys.ok()) {
+      EXPECT_EQ(keys.status().code(), vorn::kNoKeytab) << size;
+      continue;
+    }
+    EXPECT_THAT(*keys, SizeIs(accepted)) << size;
+    ++accepted;
+  }
+  EXPECT_EQ(accepted, 3) << "after the version, and behind the first and the second entry";
+}
+
+TEST(Keytab, IsNoneWhenItIsDamaged) {
+  const std::string entry = EncodeEntry("alice", "LAB.TEST", 17);
+  const std::string good = EncodeFile({entry});
+  ASSERT_TRUE(ReadKeytab(good).ok());
+  std::string many_components = entry;
+  many_components.replace(0, 2, "\xFF\xFF");
+  std::string long_realm = entry;
+  long_realm.replace(2, 2, "\x7F\xFF");
+  const struct {
+    const char* name;
+    std::string content;
+  } cases[] = {{"empty", ""},
+               {"text", "nfs/box.example@LAB.TEST\n"},
+               {"another version", "\x05\x03" + good.substr(2)},
+               {"a byte too many", good + "x"},
+               {"an entry without a size", good + std::string(4, '\0')},
+               {"an entry that is larger than the file", good + std::string("\0\0\1\0abc", 7)},
+               {"a hole that is larger than the file", good + "\xFF\xFF\xFF\x00 abc"},
+               {"the largest hole", good + std::string("\x80\0\0\0", 4)},
+               {"an empty entry", EncodeFile({entry, "x"})},
+               {"more components than there are", EncodeFile({many_components})},
+               {"a realm that is longer than the file", EncodeFile({long_realm})},
+               {"a damaged entry before a good one", EncodeFile({long_realm, entry})}};
+  for (const auto& c : cases) EXPECT_EQ(ReadKeytab(c.content).status().code(), vorn::kNoKeytab) << c.name;
+}
+
+TEST(Keytab, SurvivesAnyChangedByte) {
+  for (std::size_t at = 0; at < ThreeKeys().size(); ++at) {
+    for (const char byte : {'\0', '\x7F', '\x80', '\xFF'}) {
+      std::string damaged = ThreeKeys();
+      damaged[at] = byte;
+      const auto keys = ReadKeytab(damaged);
+      if (!keys.ok()) {
+        EXPECT_EQ(keys.status().code(), vorn::kNoKeytab) << at;
+      } else {
+        EXPECT_LE(keys->size(), 3U) << at;
+      }
+    }
+  }
+}
+
+}  // namespace

@@ -6,47 +6,14 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdint>
 #include <memory>
 #include <utility>
 
 #include "file_descriptor.h"
+#include "keytab_frame.h"
 
 namespace vorn {
 namespace {
-
-Status NoKeytab(const std::string& why) { return Status::Failure(kNoKeytab, "not a keytab: " + why); }
-
-// ---------------------------------------------------------------------------------------------
-// The file's own frame: a version, then entries, each behind its size in bytes, big-endian; a
-// negative size is a hole.
-
-constexpr std::string_view kVersion("\x05\x02", 2);
-
-std::int32_t SizeAt(std::string_view content, std::size_t at) {
-  std::uint32_t size = 0;
-  for (std::size_t i = 0; i < 4; ++i) size = size << 8 | static_cast<unsigned char>(content[at + i]);
-  return static_cast<std::int32_t>(size);
-}
-
-// How many entries there are, where they end with the file.
-Result<std::size_t> CountEntries(std::string_view content) {
-  if (content.substr(0, kVersion.size()) != kVersion) return NoKeytab("it does not begin as one");
-  std::size_t count = 0;
-  for (std::size_t at = kVersion.size(); at < content.size();) {
-    if (content.size() - at < 4) return NoKeytab("the last entry is cut off");
-    const std::int64_t size = SizeAt(content, at);
-    const auto length = static_cast<std::size_t>(size < 0 ? -size : size);
-    at += 4;
-    if (size == 0 || length > content.size() - at) return NoKeytab("the last entry is cut off");
-    at += length;
-    if (size > 0) ++count;
-  }
-  return count;
-}
-
-// ---------------------------------------------------------------------------------------------
-// The library.
 
 struct Free {
   void operator()(krb5_context context) const { krb5_free_context(context); }
@@ -130,7 +97,7 @@ std::string ErrorText(krb5_context context, krb5_error_code error) {
 }  // namespace
 
 Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content) {
-  const Result<std::size_t> count = CountEntries(content);
+  const Result<std::size_t> count = CountKeytabEntries(content);
   if (!count.ok()) return count.status();
   const Result<FileDescriptor> file = Unnamed(content);
   if (!file.ok()) return file.status();

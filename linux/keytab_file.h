@@ -17,8 +17,8 @@ struct KeytabKey {
 };
 
 // The keys of a keytab with this content, in file order. Fails with kNoKeytab unless the library reads it to
-// its last byte: it takes a file that was cut off for one that ends there, so the sizes of the entries are
-// added up besides.
+// its last byte. The library takes a file that was cut off for one that ends there, reads beyond a damaged entry, and
+// loses memory over it, so it gets to see only a file whose frame is whole.
 Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content);
 
 }  // namespace vorn

@@ -5,7 +5,6 @@
 #include <rpc/rpcb_prot.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <fstream>
 #include <memory>
 #include <set>
@@ -36,10 +35,14 @@ using Socket = std::pair<std::string, int>;
 // RFC 5665: the last two numbers of "0.0.0.0.8.1" and "::.8.1" are the port's bytes. 0 for an address without.
 int PortOf(const std::string& address) {
   const std::size_t low = address.rfind('.');
-  if (low == std::string::npos || low == 0) return 0;
-  const std::size_t high = address.rfind('.', low - 1);
+  const std::size_t high = low == std::string::npos || low == 0 ? low : address.rfind('.', low - 1);
   if (high == std::string::npos) return 0;
-  return std::atoi(address.c_str() + high + 1) * 256 + std::atoi(address.c_str() + low + 1);
+  std::istringstream bytes(address.substr(high + 1));
+  int most = 0;
+  char dot = 0;
+  int least = 0;
+  bytes >> most >> dot >> least;
+  return bytes ? most * 256 + least : 0;
 }
 
 // What rpcbind(8) knows to be of the service itself. Nothing where no rpcbind answers: then nothing of the

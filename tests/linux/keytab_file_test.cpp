@@ -72,30 +72,43 @@ TEST(Keytab, IsNoneWhenItIsCutOffButBetweenTwoEntries) {
   EXPECT_EQ(accepted, 3) << "after the version, and behind the first and the second entry";
 }
 
+// An entry in which `size` bytes at `at` are others.
+std::string Changed(std::string entry, std::size_t at, std::size_t size, const std::string& bytes) {
+  return entry.replace(at, size, bytes);
+}
+
 TEST(Keytab, IsNoneWhenItIsDamaged) {
   const std::string entry = EncodeEntry("alice", "LAB.TEST", 17);
   const std::string good = EncodeFile({entry});
   ASSERT_TRUE(ReadKeytab(good).ok());
-  std::string many_components = entry;
-  many_components.replace(0, 2, "\xFF\xFF");
-  std::string long_realm = entry;
-  long_realm.replace(2, 2, "\x7F\xFF");
+  const std::string zero(2, '\0');
+  const std::size_t realm = 2;
+  const std::size_t name = realm + 2 + 8;
+  const std::size_t key = entry.size() - 18;
   const struct {
-    const char* name;
+    const char* what;
     std::string content;
-  } cases[] = {{"empty", ""},
-               {"text", "nfs/box.example@LAB.TEST\n"},
-               {"another version", "\x05\x03" + good.substr(2)},
-               {"a byte too many", good + "x"},
-               {"an entry without a size", good + std::string(4, '\0')},
-               {"an entry that is larger than the file", good + std::string("\0\0\1\0abc", 7)},
-               {"a hole that is larger than the file", good + "\xFF\xFF\xFF\x00 abc"},
-               {"the largest hole", good + std::string("\x80\0\0\0", 4)},
-               {"an empty entry", EncodeFile({entry, "x"})},
-               {"more components than there are", EncodeFile({many_components})},
-               {"a realm that is longer than the file", EncodeFile({long_realm})},
-               {"a damaged entry before a good one", EncodeFile({long_realm, entry})}};
-  for (const auto& c : cases) EXPECT_EQ(ReadKeytab(c.content).status().code(), vorn::kNoKeytab) << c.name;
+  } cases[] = {
+      {"empty", ""},
+      {"text", "nfs/box.example@LAB.TEST\n"},
+      {"another version", "\x05\x03" + good.substr(2)},
+      {"a byte too many", good + "x"},
+      {"an entry without a size", good + std::string(4, '\0')},
+      {"an entry that is larger than the file", good + std::string("\0\0\1\0abc", 7)},
+      {"a hole that is larger than the file", good + "\xFF\xFF\xFF\x00 abc"},
+      {"the largest hole", good + std::string("\x80\0\0\0", 4)},
+      {"an entry of one byte", EncodeFile({entry, "x"})},
+      {"no component", EncodeFile({Changed(entry, 0, 2, zero)})},
+      {"more components than there are", EncodeFile({Changed(entry, 0, 2, "\x7F\xFF")})},
+      {"no realm", EncodeFile({Changed(entry, realm, 10, zero)})},
+      {"a realm that is longer than the entry", EncodeFile({Changed(entry, realm, 2, "\x7F\xFF")})},
+      {"a name that reaches into the next entry",
+       EncodeFile({Changed(entry, name, 2, std::string("\0\x2C", 2)), entry})},
+      {"a name of a negative length", EncodeFile({Changed(entry, name, 2, "\x80\x05") + std::string(0x8005, 'k')})},
+      {"no key", EncodeFile({Changed(entry, key, 18, zero)})},
+      {"a key that reaches into the next entry", EncodeFile({Changed(entry, key, 2, std::string("\0\x11", 2)), entry})},
+      {"a damaged entry before a good one", EncodeFile({Changed(entry, realm, 2, "\x7F\xFF"), entry})}};
+  for (const auto& c : cases) EXPECT_EQ(ReadKeytab(c.content).status().code(), vorn::kNoKeytab) << c.what;
 }
 
 TEST(Keytab, SurvivesAnyChangedByte) {

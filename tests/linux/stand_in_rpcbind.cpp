@@ -2,9 +2,14 @@
 
 #include <rpc/rpc.h>
 #include <rpc/rpcb_prot.h>
+#include <sys/socket.h>
+#include <sys/un.h>
 #include <unistd.h>
 
+#include <cstring>
 #include <stdexcept>
+
+#include "file_descriptor.h"
 
 namespace {
 
@@ -31,20 +36,27 @@ std::vector<rpcblist> Link(const std::vector<Registration>& registrations) {
   return list;
 }
 
+bool IsThere() {
+  const vorn::FileDescriptor client(socket(AF_UNIX, SOCK_STREAM, 0));
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  std::strcpy(address.sun_path, kSocket);
+  return connect(client.get(), reinterpret_cast<sockaddr*>(&address), sizeof address) == 0;
+}
+
 }  // namespace
 
 StandInRpcbind::StandInRpcbind(const std::vector<Registration>& registrations) {
-  // It listens before the child is made, so nobody comes too early.
-  SVCXPRT* transport = svcunix_create(RPC_ANYSOCK, 0, 0, const_cast<char*>(kSocket));
-  if (transport == nullptr) throw std::runtime_error("no stand-in for rpcbind");
-  for (const rpcvers_t version : {RPCBVERS, RPCBVERS4}) svc_reg(transport, RPCBPROG, version, Answer, nullptr);
   server_ = std::make_unique<ChildProcess>([&] {
     std::vector<rpcblist> list = Link(registrations);
     head = list.data();
+    SVCXPRT* transport = svcunix_create(RPC_ANYSOCK, 0, 0, const_cast<char*>(kSocket));
+    if (transport == nullptr) return 1;
+    for (const rpcvers_t version : {RPCBVERS, RPCBVERS4}) svc_reg(transport, RPCBPROG, version, Answer, nullptr);
     svc_run();
     return 0;
   });
-  svc_destroy(transport);
+  if (!Eventually(IsThere)) throw std::runtime_error("no stand-in for rpcbind");
 }
 
 StandInRpcbind::~StandInRpcbind() {

@@ -11,6 +11,7 @@
 #include "entry_functions.h"
 #include "expect_failure.h"
 #include "fake_platform.h"
+#include "furnished_box.h"
 
 namespace {
 
@@ -21,22 +22,9 @@ using testing::IsEmpty;
 using testing::Not;
 using testing::StartsWith;
 
-// A box as a test finds it; kUnchanged asks for exactly what it holds.
-void Furnish(FakePlatform* platform, int enabled) {
-  platform->record.read_size = 8192;
-  platform->record.write_size = 16384;
-  std::strcpy(platform->record.kerberos_principal, "nfs/box.example@EXAMPLE");
-  platform->record.kerberos_principal[515] = '!';
-  platform->record.enable_nfs_v4 = 1;
-  platform->record.unix_pri_enable = 0;
-  platform->record.statd_port = 4000;
-  platform->record.nlm_port = 4001;
-  platform->record.custom_port_enable = 1;
-  platform->enabled = enabled;
-}
-
 void FurnishRunning(FakePlatform* platform) { Furnish(platform, 1); }
 
+// What a furnished box holds already.
 constexpr char kUnchanged[] = R"({"enable_nfs": true, "read_size": 8192, "write_size": 16384, "unix_pri_enable": false,
                                   "custom_port_enable": true, "statd_port": 4000, "nlm_port": 4001})";
 
@@ -53,8 +41,6 @@ std::string With(const char* params, const char* members) {
   }
   return all.toStyledString();
 }
-
-bool SameRecord(const NFSConfRecord& a, const NFSConfRecord& b) { return std::memcmp(&a, &b, sizeof a) == 0; }
 
 // ------------------------------------------------------------------------------------------- get
 

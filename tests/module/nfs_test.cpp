@@ -8,6 +8,7 @@
 
 #include "entry_functions.h"
 #include "fake_platform.h"
+#include "furnished_box.h"
 #include "nfsconf.h"
 
 namespace {
@@ -16,22 +17,6 @@ using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::SizeIs;
-
-// A box as a test finds it.
-void Furnish(FakePlatform* platform, int enabled = 0) {
-  platform->record.read_size = 8192;
-  platform->record.write_size = 16384;
-  std::strcpy(platform->record.kerberos_principal, "nfs/box.example@EXAMPLE");
-  platform->record.kerberos_principal[515] = '!';
-  platform->record.enable_nfs_v4 = 1;
-  platform->record.unix_pri_enable = 0;
-  platform->record.statd_port = 4000;
-  platform->record.nlm_port = 4001;
-  platform->record.custom_port_enable = 1;
-  platform->enabled = enabled;
-}
-
-bool SameRecord(const NFSConfRecord& a, const NFSConfRecord& b) { return std::memcmp(&a, &b, sizeof a) == 0; }
 
 // The data functions that no method runs, called as a driver would.
 void SetDataV2(VORN::APIRequest* request, VORN::APIResponse* response) {

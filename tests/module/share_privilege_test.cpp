@@ -30,6 +30,7 @@ bool FailsAllocation(size_t size) {
 
 }  // namespace
 
+#pragma GCC visibility push(default)  // libraries see them too
 extern "C" {
 
 // NOLINTBEGIN(bugprone-reserved-identifier): the linker's names for what it wraps
@@ -44,6 +45,7 @@ void* __wrap_calloc(size_t count, size_t size) {
 }
 // NOLINTEND(bugprone-reserved-identifier)
 }
+#pragma GCC visibility pop
 
 namespace {
 

@@ -118,7 +118,8 @@ int KLIBCFileGetSectionValue(const char* path, const char* section, const char* 
 // does not fit into `size` bytes with its NUL, is a failure. Non-negative: the length in bytes.
 int KLIBCUnicodeUTF8StrUpper(const char* text, char* buffer, int size);
 
-// Non-zero when there is a file of any kind at `path`.
+// Non-zero when there is a file of any kind at `path`. A path that is below the root already, as an
+// upload's, which the web server names, is taken as it is.
 int KLIBCFileExist(const char* path);
 
 // Runs `program` with up to four arguments (the first null ends them) and waits for it: no shell,

@@ -74,8 +74,9 @@ class TemporaryFile {
 
   const Status& status() const { return status_; }
 
-  Status Fill(std::string_view text) {
-    if (Status status = WriteAll(file_.get(), text, path_); !status.ok()) return status;
+  Status Write(std::string_view text) { return WriteAll(file_.get(), text, path_); }
+
+  Status Sync() {
     if (fsync(file_.get()) != 0) return Status::System(errno, path_);
     return {};
   }
@@ -131,10 +132,10 @@ Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
 
 Status Fill(TemporaryFile* temporary, const Target& target, std::string_view text, mode_t mode) {
   if (!temporary->status().ok()) return temporary->status();
-  if (Status status = target.exists ? temporary->TakeAfter(target.file) : temporary->SetMode(mode); !status.ok()) {
-    return status;
-  }
-  return temporary->Fill(text);
+  // The mode comes last: a write takes special bits away.
+  if (Status status = temporary->Write(text); !status.ok()) return status;
+  Status status = target.exists ? temporary->TakeAfter(target.file) : temporary->SetMode(mode);
+  return status.ok() ? temporary->Sync() : status;
 }
 
 }  // namespace

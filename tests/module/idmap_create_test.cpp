@@ -381,4 +381,8 @@ TEST(NFSIDMapCreate, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapCreate, conflict, Furnish}), 8);
 }
 
+TEST(NFSIDMapCreate, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  ExpectSuccessHoweverItIsSaid({NFSIDMapCreate, kTwoNew, Furnish});
+}
+
 }  // namespace

@@ -197,4 +197,8 @@ TEST(NFSIDMapDelete, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapDelete, R"({"id": ["a@BOX", 5]})", Furnish}), 3);
 }
 
+TEST(NFSIDMapDelete, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  ExpectSuccessHoweverItIsSaid({NFSIDMapDelete, kTwo, Furnish});
+}
+
 }  // namespace

@@ -454,6 +454,21 @@ TEST(NFSIDMapList, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapList, R"({"offset": ""})", Furnish}), 2);
 }
 
+TEST(NFSIDMapList, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  for (const char* params : {"{}", kSuggest, R"({"suggestion": true, "filter": "o"})"}) {
+    ExpectSuccessHoweverItIsSaid({NFSIDMapList, params, Furnish});
+  }
+}
+
+TEST(NFSIDMapList, TakesEmptyTextsOfThePlatformForWhatTheyAre) {
+  FakePlatform platform;
+  platform.users = {"alice"};
+  platform.realm = "";
+  const Answer answer = Call(NFSIDMapList, R"({"suggestion": true, "filter": "\u0000"})");
+  EXPECT_EQ(answer.code, 0);
+  EXPECT_EQ(answer.data["idmap"][0]["id"], "root@");
+}
+
 // ----------------------------------------------------------------------------------- root alone
 
 TEST(AddRootToList, RefusesANullListWithoutRecordingACode) {

@@ -267,4 +267,8 @@ TEST(NFSIDMapSet, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapSet, unknown_user, Furnish}), 8);
 }
 
+TEST(NFSIDMapSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  ExpectSuccessHoweverItIsSaid({NFSIDMapSet, kReplace, Furnish});
+}
+
 }  // namespace

@@ -520,4 +520,9 @@ TEST(NFSAdvSet, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSAdvSet, "{}", FurnishRunning}), 3);
 }
 
+TEST(NFSAdvSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  ExpectSuccessHoweverItIsSaid({NFSAdvSet, kEverything, FurnishRunning});
+  ExpectSuccessHoweverItIsSaid({NFSAdvGet, "{}", FurnishRunning});
+}
+
 }  // namespace

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "each_call.h"
 #include "entry_functions.h"
 #include "fake_platform.h"
 #include "furnished_box.h"
@@ -502,6 +503,12 @@ TEST(NFSSet, ReleasesEverythingWhicheverCallThrows) {
     EXPECT_THAT(platform.live_objects, IsEmpty()) << operation;
     EXPECT_THAT(platform.calls, testing::Not(testing::Contains("SetError"))) << operation;
   }
+}
+
+TEST(NFSSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  const auto furnish = [](FakePlatform* platform) { Furnish(platform, 1); };
+  for (const char* params : {kEverything, kDomainAndSizes}) ExpectSuccessHoweverItIsSaid({NFSSet, params, furnish});
+  ExpectSuccessHoweverItIsSaid({NFSGet, "{}", furnish});
 }
 
 // ---------------------------------------------------------------------------- set, NFSv4 alone

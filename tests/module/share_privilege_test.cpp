@@ -532,4 +532,10 @@ TEST(NFSSharePrivilege, ReleasesEverythingWhicheverCallThrows) {
   EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish}), 6);
 }
 
+TEST(NFSSharePrivilege, SucceedsHoweverThePlatformSaysThatItIsDone) {
+  const std::string save = Save(kFullRule);
+  ExpectSuccessHoweverItIsSaid({NFSSharePrivilegeSet, save.c_str(), Furnish});
+  ExpectSuccessHoweverItIsSaid({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish});
+}
+
 }  // namespace

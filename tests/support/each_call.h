@@ -5,6 +5,7 @@
 
 #include <gmock/gmock.h>
 
+#include <limits>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -65,6 +66,17 @@ inline int ExpectOnlyReleasesWhicheverCallThrows(const Request& request) {
     if (!has_thrown) return n - 1;
     EXPECT_THAT(platform.CallsAfterFailure(), testing::Each(IsRelease())) << "call " << n;
     EXPECT_THAT(platform.live_objects, testing::IsEmpty()) << "call " << n;
+  }
+}
+
+// Succeeds, and logs nothing, with whichever non-negative number its calls say that they are done.
+inline void ExpectSuccessHoweverItIsSaid(const Request& request) {
+  for (const int done : {0, 1, std::numeric_limits<int>::max()}) {
+    FakePlatform platform;
+    request.furnish(&platform);
+    platform.done = done;
+    EXPECT_EQ(Call(request.entry, request.params).code, 0) << request.params << done;
+    EXPECT_THAT(platform.log, testing::IsEmpty()) << request.params << done;
   }
 }
 

@@ -84,7 +84,7 @@ int KLIBCSzListPush(KLIBSZLIST** list, const char* text) {
   if (FakePlatform::Current().Fails("KLIBCSzListPush", text)) return -1;
   Move(list);
   Append(Real(*list), text);
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 int KLIBCSzListInsert(KLIBSZLIST** list, int index, const char* text) {
@@ -94,7 +94,7 @@ int KLIBCSzListInsert(KLIBSZLIST** list, int index, const char* text) {
   FakeList* const moved = Real(*list);
   moved->items.insert(moved->items.begin() + index, text);
   moved->count = static_cast<int32_t>(moved->items.size());
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 int KLIBCSzListFind(const KLIBSZLIST* list, const char* text) {
@@ -107,7 +107,7 @@ int KLIBCSzListFind(const KLIBSZLIST* list, const char* text) {
 int KLIBCSzListSortItems(KLIBSZLIST* list, int option) {
   FakePlatform::Current().Record("KLIBCSzListSortItems", std::to_string(option));
   std::sort(Real(list)->items.begin(), Real(list)->items.end());
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 KLIBSZHASH* KLIBCSzHashAlloc(int capacity) {
@@ -126,7 +126,7 @@ int KLIBCSzHashEnumKey(const KLIBSZHASH* hash, KLIBSZLIST** keys) {
   if (FakePlatform::Current().Fails("KLIBCSzHashEnumKey")) return -1;
   Move(keys);
   for (const auto& pair : Real(hash)->pairs) Append(Real(*keys), pair.first);
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 const char* KLIBCSzHashGetValue(const KLIBSZHASH* hash, const char* key) {
@@ -140,7 +140,7 @@ int KLIBCSzHashSetValue(KLIBSZHASH** hash, const char* key, const char* value) {
   if (FakePlatform::Current().Fails("KLIBCSzHashSetValue", arguments)) return -1;
   Move(hash);
   SetPair(Real(*hash), key, value);
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 int KLIBCSzHashRemoveKey(KLIBSZHASH* hash, const char* key) {
@@ -159,24 +159,24 @@ int VORNNFSStaticMapGet(KLIBSZHASH** hash, const char* filter) {
     if (filter == nullptr || Contains(principal, filter) || Contains(name, filter))
       SetPair(Real(*hash), principal, name);
   }
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 int VORNNFSStaticMapAppend(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
   if (FakePlatform::Current().Fails("VORNNFSStaticMapAppend")) return -1;
   Move(table);
   for (const auto& [principal, name] : Real(pairs)->pairs) SetPair(Real(*table), principal, name);
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 int VORNNFSStaticMapRemove(KLIBSZHASH* table, const KLIBSZLIST* principals) {
   if (FakePlatform::Current().Fails("VORNNFSStaticMapRemove")) return -1;
-  if (table == nullptr) return FakePlatform::kDone;
+  if (table == nullptr) return FakePlatform::Current().done;
   for (const std::string& principal : Real(principals)->items) {
     const auto found = FindKey(Real(table)->pairs, principal);
     if (found != Real(table)->pairs.end()) Real(table)->pairs.erase(found);
   }
-  return FakePlatform::kDone;
+  return FakePlatform::Current().done;
 }
 
 int VORNUserEnum(KLIBSZLIST** list, int type) {
@@ -184,7 +184,7 @@ int VORNUserEnum(KLIBSZLIST** list, int type) {
   if (platform.Fails("VORNUserEnum", std::to_string(type))) return -1;
   Move(list);
   for (const std::string& user : platform.users) Append(Real(*list), user);
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int flags) {
@@ -195,6 +195,6 @@ int VORNUserEnumBySubstr(KLIBSZLIST** list, int type, const char* substring, int
   for (const std::string& user : platform.users) {
     if (Contains(user, substring)) Append(Real(*list), user);
   }
-  return FakePlatform::kDone;
+  return platform.done;
 }
 }

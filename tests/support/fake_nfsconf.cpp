@@ -34,7 +34,7 @@ ExportRuleList* CopyRules(const std::string& path, const std::vector<ExportRule>
 
 int Answered(const char* operation, const std::string& arguments) {
   FakePlatform& platform = FakePlatform::Current();
-  return platform.Fails(operation, arguments) ? platform.FailureResult(operation) : FakePlatform::kDone;
+  return platform.Fails(operation, arguments) ? platform.FailureResult(operation) : platform.done;
 }
 
 }  // namespace
@@ -45,14 +45,14 @@ int VORNNFSConfGet(NFSConfRecord* record) {
   FakePlatform& platform = FakePlatform::Current();
   if (platform.Fails("VORNNFSConfGet")) return -1;
   *record = platform.record;
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 int VORNNFSConfSet(const NFSConfRecord* record) {
   FakePlatform& platform = FakePlatform::Current();
   if (platform.Fails("VORNNFSConfSet")) return -1;
   platform.record = *record;
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 int VORNNFSUDPPrefSizeSet(int read_size, int write_size) {
@@ -79,7 +79,7 @@ int VORNNFSIDMapSet(const char* path, const _tag_nfs_id_map_* record) {
   if (platform.Fails("VORNNFSIDMapSet", path)) return -1;
   platform.domain = record->domain == nullptr ? "" : record->domain;
   platform.mappings = PairsOf(record->table);
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
@@ -114,7 +114,7 @@ int VORNNFSKeytabInfoGet(const char* path, KeytabEntry** list) {
     end = &(*end)->next;
   }
   if (*list != nullptr) platform.Born("KeytabEntry");
-  return fails ? -1 : 0;
+  return fails ? -1 : platform.done;
 }
 
 void VORNNFSKeytabInfoFree(KeytabEntry* list) {
@@ -143,7 +143,7 @@ int VORNNFSRuleExtSetAll(const char* path, const ExportRuleList* list) {
   for (const ExportRule* rule = list == nullptr ? nullptr : list->first; rule != nullptr; rule = rule->next) {
     platform.rules.push_back(*rule);
   }
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 void VORNNFSRuleExtFree(ExportRuleList* list) {
@@ -168,7 +168,7 @@ int VORNShareGet(const char* name, VORNSHARE** share) {
   if (found == platform.shares.end()) return -1;
   *share = new VORNSHARE{found->second};
   platform.Born("VORNSHARE");
-  return FakePlatform::kDone;
+  return platform.done;
 }
 
 void VORNShareFree(VORNSHARE* share) {

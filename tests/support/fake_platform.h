@@ -56,6 +56,7 @@ class FakePlatform {
   int keytab_import_result = 0;
   std::vector<std::string> files;           // that KLIBCFileExist finds, besides those of the system
   std::vector<std::string> port_conflicts;  // "nfs_statd 4000"
+  int done = 3;  // what an operation answers on success where every non-negative number says so
 
   // ---- what happened
   std::vector<std::string> calls;  // "KLIBServiceStop nfsd 0"; VornConf's end is "~VornConf"
@@ -109,9 +110,6 @@ class FakePlatform {
   // reason too late prints the wrong one.
   static constexpr int kReason = 0x0AB;
   static constexpr int kNoFailure = 0xDEAD;
-
-  // What an operation answers on success where every non-negative number says so.
-  static constexpr int kDone = 3;
 };
 
 // One answer of the module to one request.

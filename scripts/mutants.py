@@ -31,7 +31,7 @@ ENDS = {";", ",", "?", ":", "=", "return", "{", "}"}  # of an operand, besides t
 class Mutant:
     path: str
     line: int
-    line_text: str
+    place: str  # the same in words that stay true when lines move
     old: str
     new: str
     text: str  # of the whole file, changed
@@ -115,8 +115,17 @@ class Source:
 
     def mutant(self, text, begin, end, new):
         line = self.text.count("\n", 0, begin) + 1
-        line_text = self.text.splitlines()[line - 1].strip().rstrip("\\").strip()
-        return Mutant(self.path, line, line_text, self.text[begin:end], new, text)
+        line_text = self.text.splitlines()[line - 1].rstrip("\\").strip()
+        place = f"{self.path}, {self.function_at(begin)}: {line_text}"
+        return Mutant(self.path, line, place, self.text[begin:end], new, text)
+
+    def function_at(self, begin):
+        for i, token in enumerate(self.tokens):
+            is_body = token.text == "{" and not token.in_code and self.tokens[i - 1].text in (")", "const")
+            if is_body and token.begin < begin < self.tokens[token.match].begin:
+                closing = i - 1 if self.tokens[i - 1].text == ")" else i - 2
+                return self.tokens[self.tokens[closing].match - 1].text
+        return "outside of functions"
 
     def changes(self, i, token):
         """(begin, end, new text) of each change that begins at this token."""
@@ -233,7 +242,8 @@ class Source:
             begin, end = self.tokens[before + 1].begin, self.tokens[after - 1].end
             a = self.text[begin : self.tokens[comma - 1].end]
             b = self.text[self.tokens[comma + 1].begin : end]
-            yield begin, end, f"{b}, {a}"
+            if a != b:
+                yield begin, end, f"{b}, {a}"
 
     def begin_of_operand(self, i, ends):
         inside = self.tokens[i].match if self.tokens[i].text in CLOSING else i

@@ -1,16 +1,39 @@
 #include "nfs.h"
 
 #include <gmock/gmock.h>
+#include <malloc.h>
 
+#include <cerrno>
 #include <cstring>
 #include <string>
 #include <vector>
 
 #include "each_call.h"
 #include "entry_functions.h"
+#include "expect_failure.h"
 #include "fake_platform.h"
 #include "furnished_box.h"
 #include "nfsconf.h"
+
+namespace {
+
+bool g_strdup_fails = false;
+
+}  // namespace
+
+extern "C" {
+
+// strdup(3) of this program, the module included.
+// NOLINTBEGIN(bugprone-reserved-identifier): the linker's names for what it wraps
+char* __real_strdup(const char* text);
+
+char* __wrap_strdup(const char* text) {
+  if (!g_strdup_fails) return __real_strdup(text);
+  errno = ENOMEM;
+  return nullptr;
+}
+// NOLINTEND(bugprone-reserved-identifier)
+}
 
 namespace {
 
@@ -18,6 +41,15 @@ using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::SizeIs;
+
+// Fails every strdup(3) while it lives.
+class FailingStrdup {
+ public:
+  FailingStrdup() { g_strdup_fails = true; }
+  ~FailingStrdup() { g_strdup_fails = false; }
+  FailingStrdup(const FailingStrdup&) = delete;
+  FailingStrdup& operator=(const FailingStrdup&) = delete;
+};
 
 // The data functions that no method runs, called as a driver would.
 void SetDataV2(VORN::APIRequest* request, VORN::APIResponse* response) {
@@ -120,6 +152,13 @@ TEST(NFSGet, FailsWithItsTextAndReleasesEverything) {
       EXPECT_THAT(platform.live_objects, IsEmpty()) << failure.operation;
     }
   }
+}
+
+TEST(GetDataV2, ReadsInsideTheConfigurationContext) {
+  FakePlatform platform;
+  Call(GetDataV2, "{}");
+  EXPECT_THAT(platform.calls, ElementsAre("VornConf", "VORNNFSConfGet", "VORNNFSIDMapGet", "KLIBServiceIsEnabled nfsd",
+                                          "VORNNFSIDMapFree", "~VornConf", "SetSuccess"));
 }
 
 TEST(GetDataV2, FailsAsGetDataDoes) {
@@ -473,6 +512,29 @@ TEST(NFSSet, RefusesAnIDMapWithoutDomain) {
   EXPECT_EQ(platform.log[0].text, "szDomain should not be NULL");
   EXPECT_THAT(platform.live_objects, IsEmpty());
   EXPECT_THAT(platform.calls, testing::Not(testing::Contains("VORNNFSConfSet")));
+}
+
+TEST(NFSSet, FailsWithoutMemoryForTheDomainAndKeepsTheOldOne) {
+  FakePlatform platform;
+  Furnish(&platform, 1);
+  const FailingStrdup failing;
+  ExpectFailure(platform, Call(NFSSet, kDomainAndSizes), kDomainAndSizes, 2302, "nfs",
+                {"Failed to strdup: Cannot allocate memory"});
+  EXPECT_THAT(platform.CallsAfterFailure(), testing::Not(testing::Contains(testing::StartsWith("VORNNFSIDMapSet"))));
+  EXPECT_EQ(platform.domain, "box.example");
+}
+
+TEST(NFSSet, GivesBackTheDomainThatItReplaces) {
+  constexpr size_t kLength = 64 << 10;
+  constexpr size_t kTimes = 100;
+  const size_t before = mallinfo2().uordblks;
+  for (size_t n = 0; n < kTimes; ++n) {
+    FakePlatform platform;
+    Furnish(&platform, 1);
+    platform.domain = std::string(kLength, 'd');
+    EXPECT_EQ(Call(NFSSet, kDomainAndSizes).code, 0);
+  }
+  EXPECT_LT(mallinfo2().uordblks, before + kTimes * kLength / 2);
 }
 
 TEST(NFSSet, ReleasesEverythingWhicheverCallFails) {

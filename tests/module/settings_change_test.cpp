@@ -2,9 +2,20 @@
 
 #include <gtest/gtest.h>
 
+#include <cstring>
+
 #include "fake_platform.h"
 
 namespace {
+
+TEST(SettingsChange, BeginsAsNone) {
+  const SettingsChange change;
+  EXPECT_FALSE(change.enabled || change.wanted);
+  EXPECT_FALSE(change.sizes_changed || change.permissions_changed || change.service_affected);
+  const NFSConfRecord zeros{};
+  EXPECT_EQ(std::memcmp(&change.stored, &zeros, sizeof zeros), 0);
+  EXPECT_EQ(std::memcmp(&change.working, &zeros, sizeof zeros), 0);
+}
 
 struct ActionCase {
   bool enabled;

@@ -147,6 +147,16 @@ TEST(NFSSharePrivilegeLoad, AnswersWithAnEmptyArrayForAShareWithoutRules) {
   }
 }
 
+TEST(NFSSharePrivilegeLoad, ShowsNoRulesUnlessTheyAreFoundAndThere) {
+  FakePlatform platform;
+  platform.rules_found = 1;  // without a list
+  EXPECT_EQ(Call(NFSSharePrivilegeGet, R"({"share_name": "data"})").data, Parse(R"({"rule": []})"));
+  Furnish(&platform);
+  platform.rules_found = 0;  // with one
+  EXPECT_EQ(Call(NFSSharePrivilegeGet, R"({"share_name": "data"})").data, Parse(R"({"rule": []})"));
+  EXPECT_THAT(platform.live_objects, IsEmpty());
+}
+
 struct CodeCase {
   const char* name;
   int32_t ExportRule::*field;

@@ -132,6 +132,7 @@ int VORNNFSRuleExtGet(const char* file, const char* path, ExportRuleList** list)
   const bool fails = platform.Fails("VORNNFSRuleExtGet", std::string(file) + " " + path);
   if (!platform.rules.empty() || platform.rules_listed_empty) *list = CopyRules(path, platform.rules);
   if (fails) return -1;
+  if (platform.rules_found >= 0) return platform.rules_found;
   return *list == nullptr ? 0 : 1;
 }
 

@@ -48,6 +48,7 @@ class FakePlatform {
   std::map<std::string, std::string> shares{{"data", "/volume1/data"}};  // name to path
   std::vector<ExportRule> rules;                                         // of every share
   bool rules_listed_empty = false;  // a share without rules yields a list instead of none
+  int rules_found = -1;             // what reading them answers, whatever is there; -1: what is
   int mount_point_result = 0;
   std::vector<std::string> users{"alice", "bob", "carol"};
   bool has_realm = true;

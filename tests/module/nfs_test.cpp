@@ -21,6 +21,7 @@ bool g_strdup_fails = false;
 
 }  // namespace
 
+#pragma GCC visibility push(default)  // libraries see it too
 extern "C" {
 
 // strdup(3) of this program, the module included.
@@ -34,6 +35,7 @@ char* __wrap_strdup(const char* text) {
 }
 // NOLINTEND(bugprone-reserved-identifier)
 }
+#pragma GCC visibility pop
 
 namespace {
 

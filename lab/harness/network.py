@@ -1,0 +1,101 @@
+"""Client machines: network namespaces on a bridge, each with its own address and host name."""
+
+import contextlib
+import ctypes
+import os
+import pathlib
+
+from harness.programs import ProgramFailed, run
+
+BOX_ADDRESS = "10.9.0.1"
+
+_libc = ctypes.CDLL(None, use_errno=True)
+_CLONE_NEWUTS = 0x04000000
+_CLONE_NEWNET = 0x40000000
+
+
+def _check(result):
+    if result != 0:
+        raise OSError(ctypes.get_errno(), os.strerror(ctypes.get_errno()))
+
+
+def build():
+    """The box's own side of the network."""
+    run("modprobe", "-q", "bridge")
+    for command in ("link set lo up", "link add br0 type bridge", f"addr add {BOX_ADDRESS}/16 dev br0",
+                    "link set br0 up"):
+        run("ip", *command.split())
+
+
+class MountFailed(Exception):
+    """A mount that the server or the client did not do."""
+
+
+class Client:
+    """A machine with an address of its own. It has no files but those that it mounts."""
+
+    def __init__(self, name, address):
+        self.name = name
+        self.address = address
+        self._mounts = []
+        self._namespace = f"/run/netns/{name}"
+        run("ip", "netns", "add", name)
+        run("ip", "link", "add", f"v{name}", "type", "veth", "peer", "name", "eth0", "netns", name)
+        run("ip", "link", "set", f"v{name}", "master", "br0", "up")
+        run("ip", "-n", name, "addr", "add", f"{address}/16", "dev", "eth0")
+        run("ip", "-n", name, "link", "set", "eth0", "up")
+        run("ip", "-n", name, "link", "set", "lo", "up")
+
+    def run(self, *command, **options):
+        """What a program prints that runs on this machine. The files are the box's, the network is not."""
+        return run(*command, before=self._enter, **options)
+
+    def mount(self, path, version="4.2", options="", timeout=30):
+        """Where the exported folder is now mounted. Raises MountFailed.
+
+        Soft, so that a story that goes wrong ends."""
+        target = pathlib.Path(f"/mnt/{self.name}-{len(self._mounts)}")
+        target.mkdir(exist_ok=True)
+        words = [f"vers={version}", "soft", "timeo=50", "retrans=1", "retry=0", "noac"] + [options] * bool(options)
+        try:
+            self.run("mount", "-t", "nfs", "-o", ",".join(words), f"{BOX_ADDRESS}:{path}", str(target), timeout=timeout)
+        except ProgramFailed as failure:
+            raise MountFailed(str(failure)) from None
+        self._mounts.append(target)
+        return target
+
+    @contextlib.contextmanager
+    def mounted(self, path, **how):
+        """mount(), for as long as the block lasts."""
+        target = self.mount(path, **how)
+        try:
+            yield target
+        finally:
+            self.unmount(target)
+
+    def mounts(self, path, **how):
+        """Whether this machine can mount the exported folder and look into it."""
+        try:
+            with self.mounted(path, **how) as target:
+                os.listdir(target)
+        except (MountFailed, OSError) as failure:
+            print(f"{self.name}: {failure}")
+            return False
+        return True
+
+    def unmount(self, target):
+        run("umount", str(target))
+        self._mounts.remove(target)
+
+    def unmount_all(self):
+        """At the end of a story, whatever happened in it."""
+        for target in list(self._mounts):
+            with contextlib.suppress(ProgramFailed):
+                run("umount", "-f", "-l", str(target))
+        self._mounts.clear()
+
+    def _enter(self):
+        with open(self._namespace, "rb") as namespace:
+            _check(_libc.setns(namespace.fileno(), _CLONE_NEWNET))
+        _check(_libc.unshare(_CLONE_NEWUTS))
+        _check(_libc.sethostname(self.name.encode(), len(self.name)))

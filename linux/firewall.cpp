@@ -1,6 +1,9 @@
 // The firewall table of the NFS service: "inet vorn", which nobody else writes and which is all that is
-// written here. It accepts the service's configured ports and has no say in others; what the box's
-// own tables drop stays dropped.
+// written here. No table can lift what another one drops, so this one drops and accepts nothing: it marks
+// what comes for the service's configured ports, before the box's own tables see it. A box that lets
+// nothing in but what it knows accepts these packets with "meta mark & 0x01000000 != 0 accept".
+//
+// A unit of the package loads the file with the table when the box boots.
 #include "firewall.h"
 
 #include <nftables/libnftables.h>
@@ -9,7 +12,10 @@
 #include <string>
 
 #include "error.h"
+#include "files.h"
+#include "lock.h"
 #include "nfs_ports.h"
+#include "root.h"
 #include "settings.h"
 
 namespace vorn {
@@ -26,10 +32,11 @@ std::string Ruleset(const std::vector<ConfiguredPort>& ports) {
       "delete table inet vorn\n"
       "table inet vorn {\n"
       "  chain nfs {\n"
-      "    type filter hook input priority filter; policy accept;\n";
+      "    type filter hook input priority filter - 1; policy accept;\n";
   for (const ConfiguredPort& port : ports) {
     const std::string number = std::to_string(port.port);
-    rules += "    meta l4proto { tcp, udp } th dport " + number + " accept comment \"" + port.service + "\"\n";
+    rules += "    meta l4proto { tcp, udp } th dport " + number + " meta mark set meta mark | 0x01000000 comment \"" +
+             port.service + "\"\n";
   }
   return rules + "  }\n}\n";
 }
@@ -43,12 +50,24 @@ Status Load(const std::string& ruleset) {
   return Status::Failure(kServiceFailed, std::string("nftables: ") + nft_ctx_get_error_buffer(context.get()));
 }
 
+Status Keep(const std::string& ruleset) {
+  const ConfigurationLock lock;
+  if (!lock.status().ok()) return lock.status();
+  const Result<std::string> path = Root::Current().Locate("/var/lib/vorn/firewall.nft");
+  if (!path.ok()) return path.status();
+  const Result<FileText> before = ReadFileOrNothing(*path);
+  return before.ok() ? ReplaceFile(*path, ruleset, before->stamp) : before.status();
+}
+
 Status FollowPorts() {
   const Result<Settings> settings = Settings::Load();
   if (!settings.ok()) return settings.status();
   if (!settings->firewall) return {};
   const auto ports = ConfiguredPorts();
-  return ports.ok() ? Load(Ruleset(*ports)) : ports.status();
+  if (!ports.ok()) return ports.status();
+  const std::string ruleset = Ruleset(*ports);
+  const Status kept = Keep(ruleset);
+  return kept.ok() ? Load(ruleset) : kept;
 }
 
 }  // namespace

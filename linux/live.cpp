@@ -20,8 +20,9 @@ constexpr char kDropIn[] = "/etc/systemd/system/nfs-server.service.d/vorn.conf";
 
 // A size that the kernel refuses must not keep NFS from starting, hence "-".
 constexpr char kDropInText[] =
-    "# Kept by the NFS settings: gives the kernel the transfer sizes of nfs.conf.d/vorn.conf.\n"
+    "# Kept by the NFS settings: gives the kernel what nfs.conf.d/vorn.conf says and rpc.nfsd(8) does not read.\n"
     "[Service]\n"
+    "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh groups\n"
     "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n";
 
 // The kernel takes a new size only while its server has no threads. A restart for its sake would have every

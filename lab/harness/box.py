@@ -2,20 +2,19 @@
 
 import contextlib
 import pathlib
+import shutil
 import time
 
 from harness import api
 from harness.journal import Journal
 from harness.programs import run, succeeds
 
-# All that the product writes, or has others read.
-FILES = [pathlib.Path(path) for path in (
-    "/etc/exports", "/etc/idmapd.conf", "/etc/netgroup", "/etc/nfs.conf.d/vorn.conf", "/etc/nfs/krb5.conf",
-    "/etc/nfs/krb5.keytab", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/vorn/shares.conf",
-    "/etc/vorn/platform.conf", "/var/lib/vorn/firewall.nft")]
-
-# What a running service has read from these is not taken back by a reload.
-SERVICE_FILES = FILES[1:-2]
+# What the product writes, or has others read. The first are read when the service starts, and not again.
+SERVICE_FILES = [pathlib.Path(path) for path in (
+    "/etc/idmapd.conf", "/etc/nfs.conf.d/vorn.conf", "/etc/nfs/krb5.conf", "/etc/nfs/krb5.keytab",
+    "/etc/systemd/system/nfs-server.service.d/vorn.conf")]
+FILES = SERVICE_FILES + [pathlib.Path(path) for path in (
+    "/etc/exports", "/etc/netgroup", "/etc/vorn/shares.conf", "/var/lib/vorn/firewall.nft")]
 
 RULE = {"privilege": "rw", "root_squash": "root", "async": False, "insecure": False, "crossmnt": False,
         "security_flavor": {"sys": True}}
@@ -121,6 +120,8 @@ class Box:
         elif changed:
             run("exportfs", "-ra")
         run("exportfs", "-f")
+        for share in pathlib.Path("/srv").iterdir():
+            shutil.rmtree(share)
 
     @staticmethod
     def _content(path):

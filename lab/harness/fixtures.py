@@ -1,16 +1,36 @@
 """What a story can ask for by naming it as an argument."""
 
 import pathlib
+import re
 
 import pytest
 
-from harness import network, users
+from harness import kerberos, network, users
 from harness.box import Box, wait_for
 from harness.programs import run
 
 ADDRESSES = {"client": "10.9.0.11", "other": "10.9.0.12", "third": "10.9.7.13"}
+NAMES = {"client": "client.lab.test", "other": "other.lab.test", "third": "third.elsewhere.test"}
 
 _machines = {}
+
+
+@pytest.fixture(scope="session")
+def realm():
+    """A Kerberos realm."""
+    kerberos.found_realm()
+
+
+@pytest.fixture
+def kerberos_client(realm, client):
+    """A client machine in the realm."""
+    del realm
+    gssd = kerberos.Gssd(client)
+    yield client
+    client.unmount_all()
+    gssd.stop()
+    for user in (users.ALICE, users.BOB, users.CAROL):
+        kerberos.sign_out(user)
 
 
 @pytest.fixture(scope="session", autouse=True)
@@ -22,6 +42,10 @@ def furnished():
     pathlib.Path("/etc/nfs.conf.d/administrator.conf").write_text(
         "[nfsd]\nthreads=4\ngrace-time=10\nlease-time=10\n", encoding="ascii")
     pathlib.Path("/proc/sys/fs/nfs/nlm_grace_period").write_text("1", encoding="ascii")
+    with open("/etc/hosts", "a", encoding="ascii") as hosts:
+        hosts.writelines(f"{address} {NAMES[name]}\n" for name, address in ADDRESSES.items())
+    nsswitch = pathlib.Path("/etc/nsswitch.conf")
+    nsswitch.write_text(re.sub("netgroup:.*", "netgroup: files", nsswitch.read_text(encoding="ascii")), encoding="ascii")
     wait_for(lambda: pathlib.Path("/run/vorn/vornd.sock").exists(), "vornd does not listen")
     run("systemctl", "enable", "--now", "nfs-server", timeout=60)
 
@@ -41,7 +65,7 @@ def box():
 
 def _machine(name):
     if name not in _machines:
-        _machines[name] = network.Client(name, ADDRESSES[name])
+        _machines[name] = network.Client(NAMES[name], ADDRESSES[name])
     return _machines[name]
 
 

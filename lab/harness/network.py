@@ -4,8 +4,9 @@ import contextlib
 import ctypes
 import os
 import pathlib
+import subprocess
 
-from harness.programs import ProgramFailed, run
+from harness.programs import ProgramFailed, run, succeeds
 
 BOX_ADDRESS = "10.9.0.1"
 
@@ -38,27 +39,32 @@ class Client:
         self.name = name
         self.address = address
         self._mounts = []
-        self._namespace = f"/run/netns/{name}"
-        run("ip", "netns", "add", name)
-        run("ip", "link", "add", f"v{name}", "type", "veth", "peer", "name", "eth0", "netns", name)
-        run("ip", "link", "set", f"v{name}", "master", "br0", "up")
-        run("ip", "-n", name, "addr", "add", f"{address}/16", "dev", "eth0")
-        run("ip", "-n", name, "link", "set", "eth0", "up")
-        run("ip", "-n", name, "link", "set", "lo", "up")
+        short = name.split(".", maxsplit=1)[0]
+        self._namespace = f"/run/netns/{short}"
+        self._folder = f"/mnt/{short}"
+        self._build(short)
 
     def run(self, *command, **options):
         """What a program prints that runs on this machine. The files are the box's, the network is not."""
         return run(*command, before=self._enter, **options)
 
-    def mount(self, path, version="4.2", options="", timeout=30):
+    def succeeds(self, *command):
+        """Whether a program on this machine does what it is asked to."""
+        return succeeds(*command, before=self._enter)
+
+    def start(self, *command):
+        """A program that goes on running on this machine."""
+        return subprocess.Popen(command, stdin=subprocess.DEVNULL, preexec_fn=self._enter)
+
+    def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=30):
         """Where the exported folder is now mounted. Raises MountFailed.
 
         Soft, so that a story that goes wrong ends."""
-        target = pathlib.Path(f"/mnt/{self.name}-{len(self._mounts)}")
+        target = pathlib.Path(f"{self._folder}-{len(self._mounts)}")
         target.mkdir(exist_ok=True)
         words = [f"vers={version}", "soft", "timeo=50", "retrans=1", "retry=0", "noac"] + [options] * bool(options)
         try:
-            self.run("mount", "-t", "nfs", "-o", ",".join(words), f"{BOX_ADDRESS}:{path}", str(target), timeout=timeout)
+            self.run("mount", "-t", "nfs", "-o", ",".join(words), f"{server}:{path}", str(target), timeout=timeout)
         except ProgramFailed as failure:
             raise MountFailed(str(failure)) from None
         self._mounts.append(target)
@@ -99,3 +105,11 @@ class Client:
             _check(_libc.setns(namespace.fileno(), _CLONE_NEWNET))
         _check(_libc.unshare(_CLONE_NEWUTS))
         _check(_libc.sethostname(self.name.encode(), len(self.name)))
+
+    def _build(self, name):
+        run("ip", "netns", "add", name)
+        run("ip", "link", "add", f"v{name}", "type", "veth", "peer", "name", "eth0", "netns", name)
+        run("ip", "link", "set", f"v{name}", "master", "br0", "up")
+        run("ip", "-n", name, "addr", "add", f"{self.address}/16", "dev", "eth0")
+        run("ip", "-n", name, "link", "set", "eth0", "up")
+        run("ip", "-n", name, "link", "set", "lo", "up")

@@ -17,8 +17,11 @@ def run(*command, user=None, timeout=60, before=None):
         if user:
             become(user)
 
-    done = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, timeout=timeout,
-                          stdin=subprocess.DEVNULL, preexec_fn=prepare, check=False)
+    try:
+        done = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, timeout=timeout,
+                              stdin=subprocess.DEVNULL, preexec_fn=prepare, check=False)
+    except subprocess.TimeoutExpired:
+        raise ProgramFailed(f"{' '.join(command)}: not done after {timeout} s") from None
     if done.returncode != 0:
         raise ProgramFailed(f"{' '.join(command)}: status {done.returncode}: {done.stdout.strip()}")
     return done.stdout

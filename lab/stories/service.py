@@ -1,10 +1,12 @@
-"""On, off, versions, sizes: what the service's settings do to those who mount."""
+"""On, off, versions, domain, sizes: what the service's settings do to those who mount."""
 
+import contextlib
 import os
+import pathlib
+import socket
 
-import pytest
-
-from harness import api
+from harness import api, users
+from harness.programs import as_user, run
 
 
 def test_an_export_is_mounted_while_the_service_is_on_and_not_while_it_is_off(box, client):
@@ -19,3 +21,119 @@ def test_an_export_is_mounted_while_the_service_is_on_and_not_while_it_is_off(bo
     assert box.threads() > 0
     assert api.call("NFS", "get")["enable_nfs"]
     assert client.mounts("/srv/data")
+
+
+def test_nfsv4_is_gone_when_it_is_switched_off_and_nfsv3_stays(box, client):
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    box.nfs(enable_nfs_v4=False)
+    assert not client.mounts("/srv/data", version="4.2")
+    assert client.mounts("/srv/data", version="3")
+    box.nfs(enable_nfs_v4=True)
+    assert client.mounts("/srv/data", version="4.2")
+    assert client.mounts("/srv/data", version="3")
+
+
+def test_a_mounted_client_goes_on_after_a_restart(box, client):
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    with client.mounted("/srv/data", version="3") as data:
+        (data / "before").touch()
+        box.nfs(enable_nfs_v4=False)  # versions are fixed when the service starts: this restarts it
+        (data / "after").touch()
+        assert sorted(os.listdir(data)) == ["after", "before"]
+
+
+def test_what_an_administrator_wrote_is_taken_up_by_the_next_reload(box, client, other):
+    box.share("data")
+    theirs = box.share("theirs")
+    with open("/etc/exports", "a", encoding="utf-8") as exports:
+        exports.write(f"{theirs} {client.address}(rw,no_subtree_check)\n")
+    assert not client.mounts("/srv/theirs")
+    box.allow("data", {"client": other.address})
+    assert client.mounts("/srv/theirs")
+
+
+@contextlib.contextmanager
+def names_on_the_wire():
+    """Has the kernel's server send owners by name: it sends numbers to clients without Kerberos."""
+    switch = pathlib.Path("/sys/module/nfsd/parameters/nfs4_disable_idmapping")
+    before = switch.read_text(encoding="ascii")
+    switch.write_text("N", encoding="ascii")
+    yield
+    switch.write_text(before, encoding="ascii")
+
+
+def sent_while(action):
+    """The bytes that crossed the box's network meanwhile."""
+    every_protocol = 0x0003
+    with socket.socket(socket.AF_PACKET, socket.SOCK_RAW, socket.htons(every_protocol)) as wire:
+        wire.bind(("br0", 0))
+        wire.settimeout(1)
+        action()
+        packets = []
+        with contextlib.suppress(TimeoutError):
+            while True:
+                packets.append(wire.recv(65536))
+        return b"".join(packets)
+
+
+def test_the_domain_reaches_the_daemon_that_names_owners(box, client):
+    data = box.share("data")
+    box.allow("data", {"client": client.address})
+    (data / "file").touch()
+    with names_on_the_wire():
+        for domain in ("first.example", "second.example"):
+            box.nfs(nfs_v4_domain=domain)
+            box.restart()
+            assert f"root@{domain}".encode() in sent_while(lambda: client.mounts("/srv/data"))
+
+
+def negotiated(client, path, version):
+    """What the client got: its largest read and its largest write."""
+    with client.mounted(path, version=version) as target:
+        for line in pathlib.Path("/proc/mounts").read_text(encoding="ascii").splitlines():
+            words = line.split()
+            if words[1] == str(target):
+                options = dict(option.partition("=")[::2] for option in words[3].split(","))
+                return int(options["rsize"]), int(options["wsize"])
+    raise AssertionError(f"{target} is not mounted")
+
+
+def test_clients_get_the_configured_transfer_sizes_once_nfs_has_started_anew(box, client):
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    before = negotiated(client, "/srv/data", "4.2")
+    box.nfs(read_size=32768, write_size=16384)
+    assert "32768 bytes when it starts the next time" in box.journal.text()
+    assert negotiated(client, "/srv/data", "4.2") == before
+    box.restart()
+    # The kernel has one limit for both directions: the larger of the two.
+    assert negotiated(client, "/srv/data", "4.2") == (32768, 32768)
+    assert negotiated(client, "/srv/data", "3") == (32768, 32768)
+
+
+def may_enter(folder, user):
+    try:
+        as_user(user, lambda: os.listdir(folder))
+    except PermissionError:
+        return False
+    return True
+
+
+def test_the_unix_permission_switch_has_the_box_decide_who_is_in_a_group(box, client):
+    team = 3000
+    run("groupadd", "-g", str(team), "team")
+    run("usermod", "-a", "-G", "team", "alice")
+    data = box.share("data")
+    box.allow("data", {"client": client.address})
+    (data / "team").mkdir(mode=0o770)
+    os.chown(data / "team", 0, team)
+    alice = users.ALICE  # the box knows that she is in the team, her machine does not
+    bob = users.User("bob", users.BOB.uid, users.BOB.gid, (team,))  # his machine says so, the box does not
+    for box_decides in (True, False):
+        box.nfs(unix_pri_enable=box_decides)
+        box.restart()
+        with client.mounted("/srv/data") as mounted:
+            assert may_enter(mounted / "team", alice) == box_decides
+            assert may_enter(mounted / "team", bob) != box_decides

@@ -1,8 +1,9 @@
 #!/bin/sh
 # S83nfsd.sh reloadidmap: has the running NFS service forget what it knew of ID mappings and keytabs
 # and use the files as they are now.
-# S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured; the service's
-# unit calls it before each start.
+# S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured.
+# S83nfsd.sh groups: waits where a service that has just stopped asking for groups must not begin yet.
+# The service's unit calls these two before each start.
 # On a trial root (VORN_ROOT) it only says what it would do.
 set -u
 
@@ -65,6 +66,36 @@ transfer_sizes() {
 	[ "$largest" = 0 ] || tell /proc/fs/nfsd/max_block_size "$largest"
 }
 
+manages_groups() {
+	case $(nfsconf --file "$root/etc/nfs.conf" --get mountd manage-gids | tr '[:upper:]' '[:lower:]') in
+	1 | t | true | y | yes | on) return 0 ;;
+	esac
+	return 1
+}
+
+# Since the box booted: the kernel chooses its limit when it serves for the first time.
+has_served() {
+	limit=$(cat "$root/proc/fs/nfsd/max_block_size" 2>/dev/null)
+	[ "${limit:-0}" != 0 ]
+}
+
+# While rpc.mountd(8) manages groups the kernel asks it who is in which. For 30 s after it has stopped doing so the
+# kernel still expects answers, and whoever asks for a file in that time waits for ever. So the first service
+# that leaves groups alone begins when that time is over.
+settle_groups() {
+	mark=$root/run/nfs-leaves-groups-alone
+	if manages_groups; then
+		rm -f "$mark"
+		return
+	fi
+	[ ! -e "$mark" ] || return 0
+	if has_served; then
+		say "NFS begins in half a minute: until then the kernel waits for groups that nobody tells it any more"
+		run sleep 31
+	fi
+	[ -n "$root" ] || : >"$mark"
+}
+
 case "${1-}" in
 reloadidmap)
 	reload_idmap
@@ -72,8 +103,11 @@ reloadidmap)
 transfersizes)
 	transfer_sizes
 	;;
+groups)
+	settle_groups
+	;;
 *)
-	echo "usage: $0 reloadidmap | transfersizes" >&2
+	echo "usage: $0 reloadidmap | transfersizes | groups" >&2
 	exit 2
 	;;
 esac

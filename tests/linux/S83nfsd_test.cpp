@@ -11,6 +11,7 @@ using testing::HasSubstr;
 
 constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
 constexpr char kLimit[] = "/fs/nfsd/max_block_size";
+constexpr char kMark[] = "/run/nfs-leaves-groups-alone";
 
 // A box in namespaces of its own: a systemctl that writes down what it is asked, and in place of /proc and
 // /etc/nfs.conf.d files of the test's.
@@ -20,7 +21,9 @@ class Box {
     folder_.Write("/bin/systemctl", "#!/bin/sh\necho \"$*\" >>" + folder_.At("/calls") +
                                         "\ncase \"$*\" in *is-active*) [ -e " + folder_.At("/gssproxy") +
                                         " ];; *) [ ! -e " + folder_.At("/broken") + " ];; esac\n");
-    chmod(folder_.At("/bin/systemctl").c_str(), 0755);
+    folder_.Write("/bin/sleep", "#!/bin/sh\necho \"sleep $*\" >>" + folder_.At("/calls") + "\n");
+    for (const char* program : {"/bin/systemctl", "/bin/sleep"}) chmod(folder_.At(program).c_str(), 0755);
+    folder_.Write("/run/empty", "");
     folder_.Write("/conf.d/vorn.conf", "");
     folder_.Write("/nfs.conf", "");
     folder_.Write("/proc" + std::string(kFlush), "");
@@ -30,7 +33,11 @@ class Box {
   void RunsGssProxy() const { folder_.Write("/gssproxy", ""); }
   void HasBrokenServices() const { folder_.Write("/broken", ""); }
   void HasNoKernelServer() const { RunProgram({"rm", "-r", folder_.At("/proc/fs"), folder_.At("/proc/net")}); }
+  void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
+  void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
   void IsConfigured(const std::string& text) const { folder_.Write("/conf.d/vorn.conf", text); }
+
+  bool LeavesGroupsAlone() const { return folder_.Read(kMark).has_value(); }
 
   ProgramResult Run(const std::string& word) const {
     const std::string place = folder_.directory();
@@ -43,6 +50,9 @@ class Box {
                            "mount --bind " +
                            place +
                            "/proc /proc\n"
+                           "mount --bind " +
+                           place +
+                           "/run /run\n"
                            "PATH=" +
                            place + "/bin:$PATH VORN_ROOT=/ exec " BOX_SCRIPT " " + word});
   }
@@ -126,6 +136,43 @@ TEST(TransferSizes, AreReadBelowATrialRoot) {
   root.Write("/etc/nfs.conf.d/vorn.conf", "[vorn]\nread-size = 65536\nwrite-size = 8192\n");
   EXPECT_EQ(RunProgram({BOX_SCRIPT, "transfersizes"}).output,
             "S83nfsd: would write 65536 to /proc/fs/nfsd/max_block_size\n");
+}
+
+TEST(Groups, DelayOnlyTheFirstServiceThatStoppedManagingThem) {
+  const struct {
+    const char* name;
+    const char* configuration;
+    bool has_served;
+    bool left_alone;
+    const char* calls;
+    bool leaves_alone;
+  } cases[] = {
+      {"they are no more managed", "[mountd]\nmanage-gids = n\n", true, false, "sleep 31\n", true},
+      {"they are unset", "", true, false, "sleep 31\n", true},
+      {"they were not managed before", "[mountd]\nmanage-gids = n\n", true, true, "", true},
+      {"the box has just booted", "[mountd]\nmanage-gids = n\n", false, false, "", true},
+      {"they are managed", "[mountd]\nmanage-gids = Yes\n", true, false, "", false},
+      {"they are managed again", "[mountd]\nmanage-gids = 1\n", true, true, "", false},
+  };
+  for (const auto& c : cases) {
+    const Box box;
+    box.IsConfigured(c.configuration);
+    if (c.has_served) box.HasServed();
+    if (c.left_alone) box.LeftGroupsAlone();
+    const ProgramResult result = box.Run("groups");
+    EXPECT_EQ(result.status, 0) << c.name << result.errors;
+    EXPECT_EQ(box.Calls(), c.calls) << c.name;
+    EXPECT_EQ(box.LeavesGroupsAlone(), c.leaves_alone) << c.name;
+  }
+}
+
+TEST(Groups, AreNotWaitedForOnATrialRoot) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "");
+  root.Write("/proc/fs/nfsd/max_block_size", "65536\n");
+  const ProgramResult result = RunProgram({BOX_SCRIPT, "groups"});
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("would run: sleep 31"));
 }
 
 TEST(ServiceScript, RefusesOtherWords) {

@@ -46,17 +46,30 @@ class Firewall : public testing::Test {
   const TemporaryRoot root_;
 };
 
-TEST_F(Firewall, AcceptsTheConfiguredPortsInATableOfItsOwn) {
+TEST_F(Firewall, MarksWhatComesForTheConfiguredPortsInATableOfItsOwn) {
   SetPorts(4000, 4001);
   root_.Write("/etc/nfs.conf", "[mountd]\nport = 20048\n");
   ASSERT_EQ(VORNFwRuleHup(), 0);
-  const std::string accept = "\t\tmeta l4proto { tcp, udp } th dport ";
+  const auto mark = [](const std::string& port, const std::string& service) {
+    return "\t\tmeta l4proto { tcp, udp } th dport " + port + " meta mark set meta mark | 0x01000000 comment \"" +
+           service + "\"\n";
+  };
   EXPECT_EQ(Ruleset(),
             "table inet vorn {\n\tchain nfs {\n"
-            "\t\ttype filter hook input priority filter; policy accept;\n" +
-                accept + "111 accept comment \"rpcbind\"\n" + accept + "2049 accept comment \"nfs\"\n" + accept +
-                "20048 accept comment \"nfs_mountd\"\n" + accept + "4000 accept comment \"nfs_statd\"\n" + accept +
-                "4001 accept comment \"nfs_nlm\"\n\t}\n}\n");
+            "\t\ttype filter hook input priority filter - 1; policy accept;\n" +
+                mark("111", "rpcbind") + mark("2049", "nfs") + mark("20048", "nfs_mountd") + mark("4000", "nfs_statd") +
+                mark("4001", "nfs_nlm") + "\t}\n}\n");
+}
+
+TEST_F(Firewall, IsKeptInAFileThatBringsItBack) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const std::string before = Ruleset();
+  ASSERT_EQ(RunProgram({"nft", "flush", "ruleset"}).status, 0);
+  for (const char* time : {"the first time", "over itself"}) {
+    EXPECT_EQ(RunProgram({"nft", "-f", root_.At("/var/lib/vorn/firewall.nft")}).status, 0) << time;
+    EXPECT_EQ(Ruleset(), before) << time;
+  }
 }
 
 TEST_F(Firewall, FollowsAChangeWithoutATraceOfTheOldPorts) {

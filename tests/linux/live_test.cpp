@@ -23,7 +23,8 @@ TEST(TransferSizes, AreHandedOverByADropInOfTheUnit) {
   const TemporaryRoot root;
   ASSERT_EQ(VORNNFSUDPPrefSizeSet(65536, 131072), 0);
   EXPECT_THAT(root.Read(kDropIn).value_or(""),
-              HasSubstr("\n[Service]\nExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"));
+              HasSubstr("\n[Service]\nExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh groups\n"
+                        "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"));
 }
 
 // The judge of the drop-in; it looks for the programs of a unit, so the root has those.

@@ -1,0 +1,77 @@
+"""A Kerberos realm, its centre on the box, and what makes a machine its client."""
+
+import contextlib
+import os
+import pathlib
+import subprocess
+
+from harness.network import BOX_ADDRESS
+from harness.programs import run
+
+REALM = "LAB.TEST"
+SERVER = "box.lab.test"  # as whom the box serves: nfs/box.lab.test
+
+_CONFIGURATION = f"""[libdefaults]
+ default_realm = {REALM}
+ dns_lookup_kdc = false
+ dns_canonicalize_hostname = false
+ rdns = false
+ default_ccache_name = FILE:/tmp/krb5cc_%{{uid}}
+[realms]
+ {REALM} = {{
+  kdc = {BOX_ADDRESS}
+ }}
+[domain_realm]
+ .lab.test = {REALM}
+"""
+
+
+def _kadmin(command):
+    run("kadmin.local", "-q", command)
+
+
+def found_realm():
+    """The realm with its users, each with the password "secret"."""
+    pathlib.Path("/etc/krb5.conf").write_text(_CONFIGURATION, encoding="ascii")
+    pathlib.Path("/etc/krb5kdc/kdc.conf").write_text(
+        f"[realms]\n {REALM} = {{\n  supported_enctypes = aes256-cts-hmac-sha1-96:normal\n }}\n", encoding="ascii")
+    run("kdb5_util", "create", "-r", REALM, "-s", "-P", "master")
+    for user in ("alice", "bob"):
+        _kadmin(f"addprinc -pw secret {user}")
+    run("systemctl", "start", "krb5-kdc")
+
+
+def keytab(principal):
+    """The content of a keytab with new keys of the principal, which is made for it."""
+    path = pathlib.Path("/tmp/new.keytab")
+    path.unlink(missing_ok=True)
+    _kadmin(f"addprinc -randkey {principal}")
+    _kadmin(f"ktadd -k {path} {principal}")
+    return path.read_bytes()
+
+
+def sign_in(user, principal):
+    """The user's processes are the principal from now on."""
+    run("sh", "-c", f"echo secret | kinit {principal}", user=user)
+
+
+def sign_out(user):
+    pathlib.Path(f"/tmp/krb5cc_{user.uid}").unlink(missing_ok=True)
+
+
+class Gssd:
+    """rpc.gssd(8) on a client machine, with its files in a place of its own."""
+
+    def __init__(self, client):
+        path = pathlib.Path(f"/tmp/{client.name}.keytab")
+        path.write_bytes(keytab(f"host/{client.name}"))
+        self._pipes = f"/run/pipes-{client.name}"
+        os.makedirs(self._pipes, exist_ok=True)
+        client.run("mount", "-t", "rpc_pipefs", "sunrpc", self._pipes)
+        self._process = client.start("rpc.gssd", "-f", "-p", self._pipes, "-k", str(path))
+
+    def stop(self):
+        self._process.terminate()
+        with contextlib.suppress(subprocess.TimeoutExpired):
+            self._process.wait(10)
+        run("umount", self._pipes)

@@ -1,0 +1,92 @@
+"""A keytab, and what it opens: mounts with each flavour, and files that belong to whom the ID map says."""
+
+import itertools
+import os
+import pathlib
+
+import pytest
+
+from harness import api, kerberos, users
+from harness.programs import as_user
+
+FLAVOURS = {"sys": "sys", "krb5": "kerberos", "krb5i": "kerberos_integrity", "krb5p": "kerberos_privacy"}
+
+CHOICES = [set(choice) for size in (1, 2) for choice in itertools.combinations(FLAVOURS, size)]
+
+
+@pytest.fixture(scope="module")
+def keytab(realm):
+    """The box's keytab; new keys would take away the tickets of earlier stories."""
+    del realm
+    return kerberos.keytab(f"nfs/{kerberos.SERVER}")
+
+
+def rule(client, *flavours):
+    return {"client": client.address, "security_flavor": {FLAVOURS[flavour]: True for flavour in flavours}}
+
+
+def mounts(client, flavour):
+    return client.mounts("/srv/data", server=kerberos.SERVER, options=f"sec={flavour}")
+
+
+def import_keytab(keytab):
+    api.upload("NFS.Kerberos", "upload_key", "keytab_file", keytab)
+
+
+def test_an_imported_keytab_opens_kerberos_mounts_at_once(box, kerberos_client, keytab):
+    box.share("data")
+    import_keytab(keytab)
+    box.allow("data", rule(kerberos_client, "krb5"))
+    assert mounts(kerberos_client, "krb5")
+    settings = api.call("NFS.Kerberos", "get")
+    assert settings["kerberos_principal"] == f"nfs/{kerberos.SERVER}@{kerberos.REALM}"
+    entries = api.call("NFS.Kerberos", "list")["keytab"]
+    assert {entry["kerberos_principal"] for entry in entries} == {settings["kerberos_principal"]}
+
+
+@pytest.mark.parametrize("flavours", CHOICES, ids="+".join)
+def test_a_rule_opens_the_flavours_that_it_names_and_no_others(box, kerberos_client, keytab, flavours):
+    box.share("data")
+    import_keytab(keytab)
+    box.allow("data", rule(kerberos_client, *flavours))
+    assert {flavour for flavour in FLAVOURS if mounts(kerberos_client, flavour)} == flavours
+
+
+def owner_of_a_new_file(mounted, name, user):
+    as_user(user, lambda: (mounted / name).touch())
+    return os.stat(pathlib.Path("/srv/data") / name).st_uid
+
+
+def may_look(mounted, user):
+    try:
+        as_user(user, lambda: os.listdir(mounted))
+    except OSError:
+        return False
+    return True
+
+
+@pytest.mark.parametrize("flavour", ["krb5", "krb5i", "krb5p"])
+def test_only_a_user_with_a_ticket_gets_in(box, kerberos_client, keytab, flavour):
+    box.share("data")
+    import_keytab(keytab)
+    box.allow("data", rule(kerberos_client, flavour))
+    kerberos.sign_in(users.ALICE, "alice")
+    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options=f"sec={flavour}") as mounted:
+        assert owner_of_a_new_file(mounted, "file", users.ALICE) == users.ALICE.uid
+        assert not may_look(mounted, users.BOB)
+
+
+def test_the_id_map_decides_who_owns_a_file_and_changes_without_a_restart(box, kerberos_client, keytab):
+    principal = f"alice@{kerberos.REALM}"
+    box.share("data")
+    import_keytab(keytab)
+    box.nfs(nfs_v4_domain="lab.test")
+    box.allow("data", rule(kerberos_client, "krb5"))
+    kerberos.sign_in(users.CAROL, "alice")
+    api.call("NFS.IDMap", "create", idmap=[{"kerberos_principal": principal, "local_name": "bob"}])
+    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options="sec=krb5") as mounted:
+        assert owner_of_a_new_file(mounted, "created", users.CAROL) == users.BOB.uid
+        api.call("NFS.IDMap", "set", id=principal, kerberos_principal=principal, local_name="admin")
+        assert owner_of_a_new_file(mounted, "changed", users.CAROL) == users.ADMIN.uid
+        api.call("NFS.IDMap", "delete", id=principal)
+        assert owner_of_a_new_file(mounted, "deleted", users.CAROL) == users.ALICE.uid

@@ -25,10 +25,9 @@ def realm():
 def kerberos_client(realm, client):
     """A client machine in the realm."""
     del realm
-    gssd = kerberos.Gssd(client)
-    yield client
-    client.unmount_all()
-    gssd.stop()
+    with kerberos.joined(client):
+        yield client
+        client.unmount_all()
     for user in (users.ALICE, users.BOB, users.CAROL):
         kerberos.sign_out(user)
 
@@ -38,9 +37,9 @@ def furnished():
     """The box as it stands in the rack: on its network, with its users, serving."""
     users.create()
     network.build()
-    # Short, so that no story waits a minute and a half after a restart.
+    # Short times, so that no story waits a minute and a half after a restart.
     pathlib.Path("/etc/nfs.conf.d/administrator.conf").write_text(
-        "[nfsd]\nthreads=4\ngrace-time=10\nlease-time=10\n", encoding="ascii")
+        "[nfsd]\nthreads=4\ngrace-time=10\nlease-time=10\n[mountd]\nport=20048\n", encoding="ascii")
     pathlib.Path("/proc/sys/fs/nfs/nlm_grace_period").write_text("1", encoding="ascii")
     with open("/etc/hosts", "a", encoding="ascii") as hosts:
         hosts.writelines(f"{address} {NAMES[name]}\n" for name, address in ADDRESSES.items())

@@ -3,7 +3,6 @@
 import contextlib
 import os
 import pathlib
-import subprocess
 
 from harness.network import BOX_ADDRESS
 from harness.programs import run
@@ -59,19 +58,14 @@ def sign_out(user):
     pathlib.Path(f"/tmp/krb5cc_{user.uid}").unlink(missing_ok=True)
 
 
-class Gssd:
-    """rpc.gssd(8) on a client machine, with its files in a place of its own."""
-
-    def __init__(self, client):
-        path = pathlib.Path(f"/tmp/{client.name}.keytab")
-        path.write_bytes(keytab(f"host/{client.name}"))
-        self._pipes = f"/run/pipes-{client.name}"
-        os.makedirs(self._pipes, exist_ok=True)
-        client.run("mount", "-t", "rpc_pipefs", "sunrpc", self._pipes)
-        self._process = client.start("rpc.gssd", "-f", "-p", self._pipes, "-k", str(path))
-
-    def stop(self):
-        self._process.terminate()
-        with contextlib.suppress(subprocess.TimeoutExpired):
-            self._process.wait(10)
-        run("umount", self._pipes)
+@contextlib.contextmanager
+def joined(client):
+    """The machine is in the realm: its rpc.gssd(8) runs, with files in a place of their own."""
+    path = pathlib.Path(f"/tmp/{client.name}.keytab")
+    path.write_bytes(keytab(f"host/{client.name}"))
+    pipes = f"/run/pipes-{client.name}"
+    os.makedirs(pipes, exist_ok=True)
+    client.run("mount", "-t", "rpc_pipefs", "sunrpc", pipes)
+    with client.running("rpc.gssd", "-f", "-p", pipes, "-k", str(path)):
+        yield
+    run("umount", pipes)

@@ -4,7 +4,9 @@ import contextlib
 import ctypes
 import os
 import pathlib
+import signal
 import subprocess
+import time
 
 from harness.programs import ProgramFailed, run, succeeds
 
@@ -52,17 +54,38 @@ class Client:
         """Whether a program on this machine does what it is asked to."""
         return succeeds(*command, before=self._enter)
 
-    def start(self, *command):
-        """A program that goes on running on this machine."""
-        return subprocess.Popen(command, stdin=subprocess.DEVNULL, preexec_fn=self._enter)
+    @contextlib.contextmanager
+    def running(self, *command):
+        """A program that runs on this machine for as long as the block lasts, and all that it started."""
+        with subprocess.Popen(command, stdin=subprocess.DEVNULL, start_new_session=True,
+                              preexec_fn=self._enter) as process:
+            try:
+                yield
+            finally:
+                os.killpg(process.pid, signal.SIGTERM)
+
+    @contextlib.contextmanager
+    def locking(self):
+        """rpcbind(8) and rpc.statd(8) of this machine, without which it cannot lock over NFSv3."""
+        daemons = ("mount -t tmpfs none /run && mkdir -p /run/rpcbind /run/state/sm /run/state/sm.bak && "
+                   "rpcbind -f & sleep 1; exec rpc.statd -F --no-notify -P /run/state")
+        with self.running("unshare", "--mount", "sh", "-c", daemons):
+            for _ in range(100):
+                if self.succeeds("rpcinfo", "-T", "tcp", "127.0.0.1", "status"):
+                    break
+                time.sleep(0.1)
+            yield
 
     def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=30):
         """Where the exported folder is now mounted. Raises MountFailed.
 
-        Soft, so that a story that goes wrong ends."""
+        Soft, so that a story that goes wrong ends. An NFSv3 mount does not lock unless it is told to: the lock
+        managers of all machines are the one of this kernel, and a client's takes the box's out of rpcbind."""
         target = pathlib.Path(f"{self._folder}-{len(self._mounts)}")
         target.mkdir(exist_ok=True)
         words = [f"vers={version}", "soft", "timeo=50", "retrans=1", "retry=0", "noac"] + [options] * bool(options)
+        if version == "3" and options != "lock":
+            words.append("nolock")
         try:
             self.run("mount", "-t", "nfs", "-o", ",".join(words), f"{server}:{path}", str(target), timeout=timeout)
         except ProgramFailed as failure:

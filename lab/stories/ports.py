@@ -78,11 +78,12 @@ def test_locks_of_nfsv3_work_through_a_strict_firewall(box, client, other, stric
     box.share("data")
     box.allow("data", {"client": "10.9.0.0/24"})
     box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
-    with client.mounted("/srv/data", version="3", options="mountport=20048") as one:
-        with other.mounted("/srv/data", version="3", options="mountport=20048") as two:
-            with lock(one / "file"):
-                assert is_locked(two / "file")
-            assert not is_locked(two / "file")
+    with client.locking(), other.locking():
+        with client.mounted("/srv/data", version="3", options="lock") as one:
+            with other.mounted("/srv/data", version="3", options="lock") as two:
+                with lock(one / "file"):
+                    assert is_locked(two / "file")
+                assert not is_locked(two / "file")
 
 
 def reaches(client, port):

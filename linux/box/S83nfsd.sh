@@ -37,14 +37,15 @@ is_active() {
 
 # The daemon keeps the map it read when it started, and the kernel keeps its answers in the security
 # contexts of the clients: only both together make a change seen. nfsidmap(8), exportfs -f and a
-# restart of nfs-server leave established clients with the old map.
+# restart of nfs-server leave established clients with the old map. A service that began without a
+# keytab began without the daemon, which is started now that there may be one.
 reload_idmap() {
 	status=0
 	if is_active gssproxy.service; then
 		say "gssproxy serves Kerberos here: it ignores the static mappings of idmapd.conf"
 		say "use auth_to_local_names in krb5.conf, or rpc.svcgssd instead"
-	else
-		run systemctl try-restart rpc-svcgssd.service || status=1
+	elif is_active nfs-server.service; then
+		run systemctl restart rpc-svcgssd.service || status=1
 	fi
 	run systemctl try-restart nfs-idmapd.service || status=1
 	tell /proc/net/rpc/auth.rpcsec.context/flush 1 || status=1

@@ -19,8 +19,8 @@ class Box {
  public:
   Box() {
     folder_.Write("/bin/systemctl", "#!/bin/sh\necho \"$*\" >>" + folder_.At("/calls") +
-                                        "\ncase \"$*\" in *is-active*) [ -e " + folder_.At("/gssproxy") +
-                                        " ];; *) [ ! -e " + folder_.At("/broken") + " ];; esac\n");
+                                        "\ncase \"$*\" in *is-active*) [ -e " + folder_.directory() +
+                                        "/active/$3 ];; *) [ ! -e " + folder_.At("/broken") + " ];; esac\n");
     folder_.Write("/bin/sleep", "#!/bin/sh\necho \"sleep $*\" >>" + folder_.At("/calls") + "\n");
     for (const char* program : {"/bin/systemctl", "/bin/sleep"}) chmod(folder_.At(program).c_str(), 0755);
     folder_.Write("/run/empty", "");
@@ -30,7 +30,7 @@ class Box {
     folder_.Write("/proc" + std::string(kLimit), "");
   }
 
-  void RunsGssProxy() const { folder_.Write("/gssproxy", ""); }
+  void Runs(const std::string& unit) const { folder_.Write("/active/" + unit, ""); }
   void HasBrokenServices() const { folder_.Write("/broken", ""); }
   void HasNoKernelServer() const { RunProgram({"rm", "-r", folder_.At("/proc/fs"), folder_.At("/proc/net")}); }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
@@ -66,16 +66,26 @@ class Box {
 
 TEST(ReloadIDMap, RestartsBothDaemonsAndThenHasTheKernelForgetItsAnswers) {
   const Box box;
+  box.Runs("nfs-server.service");
   const ProgramResult result = box.Run("reloadidmap");
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_EQ(box.Calls(),
-            "-q is-active gssproxy.service\ntry-restart rpc-svcgssd.service\ntry-restart nfs-idmapd.service\n");
+            "-q is-active gssproxy.service\n-q is-active nfs-server.service\n"
+            "restart rpc-svcgssd.service\ntry-restart nfs-idmapd.service\n");
   EXPECT_EQ(box.Kernel(kFlush), "1\n");
+}
+
+TEST(ReloadIDMap, StartsNoDaemonForAServiceThatIsOff) {
+  const Box box;
+  EXPECT_EQ(box.Run("reloadidmap").status, 0);
+  EXPECT_EQ(box.Calls(),
+            "-q is-active gssproxy.service\n-q is-active nfs-server.service\ntry-restart nfs-idmapd.service\n");
 }
 
 TEST(ReloadIDMap, SaysThatGssproxyIgnoresTheMap) {
   const Box box;
-  box.RunsGssProxy();
+  box.Runs("nfs-server.service");
+  box.Runs("gssproxy.service");
   const ProgramResult result = box.Run("reloadidmap");
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_THAT(result.output, HasSubstr("gssproxy serves Kerberos here"));
@@ -104,7 +114,6 @@ TEST(ReloadIDMap, OnlySaysOnATrialRootWhatItWouldDo) {
   const ProgramResult result = RunProgram({BOX_SCRIPT, "reloadidmap"});
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_EQ(result.output,
-            "S83nfsd: would run: systemctl try-restart rpc-svcgssd.service\n"
             "S83nfsd: would run: systemctl try-restart nfs-idmapd.service\n"
             "S83nfsd: would write 1 to /proc/net/rpc/auth.rpcsec.context/flush\n");
   EXPECT_THAT(root.Names(""), testing::IsEmpty());

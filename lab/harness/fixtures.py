@@ -55,10 +55,10 @@ def box():
     the_box = Box()
     the_box.set_up()
     yield the_box
-    complaints = the_box.journal.complaints()
     for machine in _machines.values():
         machine.unmount_all()
     the_box.put_back()
+    complaints = the_box.journal.complaints()
     assert not complaints, "\n".join(complaints)
 
 

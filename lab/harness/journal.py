@@ -38,7 +38,7 @@ class Journal:
     @staticmethod
     def _read(*arguments):
         output = run("journalctl", "--sync", "--quiet") + run("journalctl", "--quiet", "--output=json", *arguments)
-        return [json.loads(line) for line in output.splitlines() if line.startswith("{")]
+        return [json.loads(line) for line in output.split("\n") if line.startswith("{")]
 
     @staticmethod
     def _message(entry):

@@ -21,6 +21,7 @@ CLIENTS = [
 
 def test_no_rule_keeps_the_good_ones_from_being_served(box, client):
     assert len(CLIENTS) >= 100
+    box.foresees("vornd: ")  # each refusal has its lines
     box.share("good")
     box.share("odd")
     box.share("also good")
@@ -41,4 +42,3 @@ def test_no_rule_keeps_the_good_ones_from_being_served(box, client):
     assert pathlib.Path("/etc/exports").read_text(encoding="utf-8").count("\n/") == 3  # a line for each share
     assert client.mounts("/srv/good")
     assert client.mounts("/srv/also good")
-    box.foresees("Request|rule|client|[Ee]xport|host|refused")

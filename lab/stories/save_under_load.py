@@ -14,14 +14,14 @@ class Writer(threading.Thread):
     def __init__(self, path):
         super().__init__()
         self._path = path
-        self._stop = threading.Event()
+        self._finished = threading.Event()
         self.written = 0
         self.failure = None
 
     def run(self):
         try:
             with open(self._path, "wb", buffering=0) as file:
-                while not self._stop.is_set():
+                while not self._finished.is_set():
                     file.write(b"x" * 1024)
                     os.fsync(file.fileno())
                     self.written += 1
@@ -29,7 +29,7 @@ class Writer(threading.Thread):
             self.failure = failure
 
     def finish(self):
-        self._stop.set()
+        self._finished.set()
         self.join()
 
 

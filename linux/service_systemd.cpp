@@ -182,10 +182,11 @@ class SystemdEngine : public ServiceEngine {
     return *state == "enabled" || *state == "enabled-runtime";
   }
 
+  // Enabled last: one that does not start must not count as switched on, or nobody could switch it on again.
   Status Start() override {
     return With([this](Manager& manager) {
-      const Status enabled = manager.Enable(kUnit);
-      return enabled.ok() ? BringUp(manager, "StartUnit") : enabled;
+      const Status started = BringUp(manager, "StartUnit");
+      return started.ok() ? manager.Enable(kUnit) : started;
     });
   }
 

@@ -1,52 +1,17 @@
 """What a story can ask for by naming it as an argument."""
 
-import pathlib
-import re
-
 import pytest
 
-from harness import kerberos, network, users
-from harness.box import Box, wait_for
-from harness.programs import run
-
-ADDRESSES = {"client": "10.9.0.11", "other": "10.9.0.12", "third": "10.9.7.13"}
-NAMES = {"client": "client.lab.test", "other": "other.lab.test", "third": "third.elsewhere.test"}
+from harness import furniture, kerberos, users
+from harness.box import Box
 
 _machines = {}
 
 
-@pytest.fixture(scope="session")
-def realm():
-    """A Kerberos realm."""
-    kerberos.found_realm()
-
-
-@pytest.fixture
-def kerberos_client(realm, client):
-    """A client machine in the realm."""
-    del realm
-    with kerberos.joined(client):
-        yield client
-        client.unmount_all()
-    for user in (users.ALICE, users.BOB, users.CAROL):
-        kerberos.sign_out(user)
-
-
 @pytest.fixture(scope="session", autouse=True)
 def furnished():
-    """The box as it stands in the rack: on its network, with its users, serving."""
-    users.create()
-    network.build()
-    # Short times, so that no story waits a minute and a half after a restart.
-    pathlib.Path("/etc/nfs.conf.d/administrator.conf").write_text(
-        "[nfsd]\nthreads=4\ngrace-time=10\nlease-time=10\n[mountd]\nport=20048\n", encoding="ascii")
-    pathlib.Path("/proc/sys/fs/nfs/nlm_grace_period").write_text("1", encoding="ascii")
-    with open("/etc/hosts", "a", encoding="ascii") as hosts:
-        hosts.writelines(f"{address} {NAMES[name]}\n" for name, address in ADDRESSES.items())
-    nsswitch = pathlib.Path("/etc/nsswitch.conf")
-    nsswitch.write_text(re.sub("netgroup:.*", "netgroup: files", nsswitch.read_text(encoding="ascii")), encoding="ascii")
-    wait_for(lambda: pathlib.Path("/run/vorn/vornd.sock").exists(), "vornd does not listen")
-    run("systemctl", "enable", "--now", "nfs-server", timeout=60)
+    """The box as it stands in the rack."""
+    furniture.furnish()
 
 
 @pytest.fixture
@@ -64,7 +29,7 @@ def box():
 
 def _machine(name):
     if name not in _machines:
-        _machines[name] = network.Client(NAMES[name], ADDRESSES[name])
+        _machines[name] = furniture.machine(name)
     return _machines[name]
 
 
@@ -84,3 +49,20 @@ def other():
 def third():
     """One in another part of the network."""
     return _machine("third")
+
+
+@pytest.fixture(scope="session")
+def realm():
+    """A Kerberos realm."""
+    kerberos.found_realm()
+
+
+@pytest.fixture
+def kerberos_client(realm, client):
+    """A client machine in the realm."""
+    del realm
+    with kerberos.joined(client):
+        yield client
+        client.unmount_all()
+    for user in (users.ALICE, users.BOB, users.CAROL):
+        kerberos.sign_out(user)

@@ -56,11 +56,17 @@ TEST_F(SystemdEngine, CountsAnEnabledUnitAsEnabled) {
   }
 }
 
-TEST_F(SystemdEngine, EnablesAndStarts) {
+TEST_F(SystemdEngine, StartsAndThenEnables) {
   const Status status = Engine()->Start();
   EXPECT_TRUE(status.ok()) << status.reason();
-  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(Joined({"EnableUnitFiles nfs-server.service"}, kBringUp),
-                                                            {"StartUnit nfs-server.service replace"})));
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"StartUnit nfs-server.service replace",
+                                                                       "EnableUnitFiles nfs-server.service"})));
+}
+
+TEST_F(SystemdEngine, DoesNotEnableWhatDoesNotStart) {
+  manager_.End("StartUnit nfs-server.service", "failed");
+  EXPECT_FALSE(Engine()->Start().ok());
+  EXPECT_THAT(manager_.TakeCalls(), testing::Not(testing::Contains("EnableUnitFiles nfs-server.service")));
 }
 
 TEST_F(SystemdEngine, StopsAndDisables) {

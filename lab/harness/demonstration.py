@@ -1,0 +1,20 @@
+"""A box to look at: serving, with a share and a client that has it mounted."""
+
+from harness import furniture
+from harness.box import Box
+
+furniture.furnish()
+box = Box()
+client = furniture.machine("client")
+box.share("data")
+box.allow("data", {"client": "10.9.0.0/24"})
+mounted = client.mount("/srv/data")
+(mounted / "hello").write_text("Hello from a client.\n", encoding="ascii")
+
+print(f"""
+A running box. It shares /srv/data, which {client.name} ({client.address}) has mounted at {mounted}.
+
+  curl -s --unix-socket /run/vorn/vornd.sock http://localhost/api
+  cat /etc/exports; exportfs -v; nfsstat -s; ls -l /srv/data
+  ip netns exec client ss -tn            what the client's own network sees
+""")

@@ -151,9 +151,16 @@ std::string Resolved(const std::string& path) {
 
 }  // namespace
 
-Status CheckExportTable() {
+Result<FileStamp> ExportsFileStamp() {
+  const auto file = ReadBelowRoot(kExportsFile);
+  if (!file.ok()) return file.status();
+  return file->content.stamp;
+}
+
+Status CheckExportTable(const FileStamp& reloaded) {
   auto file = ReadBelowRoot(kExportsFile);
   if (!file.ok()) return file.status();
+  if (!IsSameFile(file->content.stamp, reloaded)) return {};
   auto table = ReadBelowRoot(kExportTable);
   if (!table.ok()) return table.status();
   return CompareExportTable(ExportsDocument(std::move(file->content.text)),

@@ -204,8 +204,10 @@ class SystemdEngine : public ServiceEngine {
 
   Status Reload() override {
     if (!HasThreads()) return {};
+    const Result<FileStamp> reloaded = ExportsFileStamp();
+    if (!reloaded.ok()) return reloaded.status();
     const Status status = With([](Manager& manager) { return manager.RunJob("ReloadUnit", kUnit); });
-    return status.ok() ? CheckExportTable() : status;
+    return status.ok() ? CheckExportTable(*reloaded) : status;
   }
 
  private:

@@ -4,7 +4,7 @@ import http.client
 import json
 import socket
 
-SOCKET = "/run/vorn/vornd.sock"
+_SOCKET = "/run/vorn/vornd.sock"
 
 
 class Refused(Exception):
@@ -20,7 +20,7 @@ class _Connection(http.client.HTTPConnection):
     def connect(self):
         self.sock = socket.socket(socket.AF_UNIX)
         self.sock.settimeout(60)
-        self.sock.connect(SOCKET)
+        self.sock.connect(_SOCKET)
 
 
 def request(method, path, body=None, content_type="application/json"):
@@ -32,6 +32,14 @@ def request(method, path, body=None, content_type="application/json"):
         return response.status, json.loads(response.read())
     finally:
         connection.close()
+
+
+def answers():
+    """Whether vornd is there."""
+    try:
+        return request("GET", "/api")[0] == 200
+    except OSError:
+        return False
 
 
 def _data(answer):

@@ -20,7 +20,7 @@ def furnish():
     if not pathlib.Path("/etc/nfs.conf.d/administrator.conf").exists():
         _write_files()
     pathlib.Path("/proc/sys/fs/nfs/nlm_grace_period").write_text("1", encoding="ascii")
-    wait_for(lambda: pathlib.Path(api.SOCKET).exists(), "vornd does not listen")
+    wait_for(api.answers, "vornd does not listen")
     run("systemctl", "enable", "--now", "nfs-server")
 
 

@@ -120,10 +120,10 @@ def test_a_server_killed_while_it_saves_loses_nothing_that_it_acknowledged(box, 
     for administrator in administrators:
         administrator.start()
     for _ in range(8):
-        wait_for(lambda: succeeds("systemctl", "-q", "is-active", "vornd"), "vornd does not come back")
+        wait_for(api.answers, "vornd does not come back")
         time.sleep(chance.uniform(0.2, 1.0))
         run("systemctl", "kill", "--kill-whom=main", "--signal=KILL", "vornd")
-    wait_for(lambda: pathlib.Path(api.SOCKET).exists(), "vornd does not come back")
+    wait_for(api.answers, "vornd does not come back")
     for administrator in administrators:
         administrator.finish()
     box.allow("good", {"client": client.address})

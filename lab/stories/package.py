@@ -15,7 +15,7 @@ OURS = [pathlib.Path(path) for path in (
 
 def install(package):
     run("dpkg", "--install", package)
-    wait_for(lambda: pathlib.Path(api.SOCKET).exists(), "vornd does not listen")
+    wait_for(api.answers, "vornd does not listen")
 
 
 @pytest.fixture

@@ -207,6 +207,12 @@ TEST_F(Exports, AreWrittenWhateverIsWrongWithOtherLines) {
   EXPECT_THAT(File(), HasSubstr("/x y(foo)\n/volume1/data a("));
 }
 
+// As after a reload of the file as it is.
+vorn::Status CheckTable() {
+  const auto reloaded = vorn::ExportsFileStamp();
+  return reloaded.ok() ? vorn::CheckExportTable(*reloaded) : reloaded.status();
+}
+
 TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   const vorn::ExportfsJudge judge;
   if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
@@ -220,7 +226,7 @@ TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   EXPECT_EQ(verdict.status, 0);
   EXPECT_EQ(verdict.messages, "");
   root.Write("/var/lib/nfs/etab", verdict.table);
-  EXPECT_TRUE(vorn::CheckExportTable().ok());
+  EXPECT_TRUE(CheckTable().ok());
   EXPECT_THAT(verdict.table, HasSubstr("10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,all_squash,"));
   EXPECT_THAT(verdict.table, HasSubstr("anonuid=1024,anongid=100"));
   EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,no_root_squash"));
@@ -231,9 +237,19 @@ TEST_F(Exports, AreComparedWithTheExportTable) {
   root.Write("/volume1/data/file", "");
   ASSERT_EQ(symlink("/volume1/data/..", root.At("/volume1/link").c_str()), 0);
   root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n/volume1\t*(ro)\n");
-  EXPECT_TRUE(vorn::CheckExportTable().ok()) << vorn::CheckExportTable().reason();
+  EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
   root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n");
-  EXPECT_THAT(vorn::CheckExportTable().reason(), HasSubstr("line 2 (/volume1/link)"));
+  EXPECT_THAT(CheckTable().reason(), HasSubstr("line 2 (/volume1/link)"));
+}
+
+TEST_F(Exports, AreNotComparedWithATableThatIsOlderThanTheirNextSave) {
+  root.Write(kFile, "/volume1/data *(rw)\n");
+  root.Write("/var/lib/nfs/etab", "");
+  const auto reloaded = vorn::ExportsFileStamp();
+  ASSERT_TRUE(reloaded.ok());
+  EXPECT_FALSE(vorn::CheckExportTable(*reloaded).ok());
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"10.0.0.1"}).get()), 0);
+  EXPECT_TRUE(vorn::CheckExportTable(*reloaded).ok());
 }
 
 TEST(VORNNFSRuleExtFree, TakesNull) { VORNNFSRuleExtFree(nullptr); }

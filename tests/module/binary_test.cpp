@@ -4,10 +4,8 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
-#include <array>
-#include <cstdio>
+#include <fstream>
 #include <memory>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -18,21 +16,10 @@ namespace {
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 
-struct ClosePipe {
-  void operator()(FILE* pipe) const { pclose(pipe); }
-};
-
-std::string OutputOf(const std::string& command) {
-  const std::unique_ptr<FILE, ClosePipe> pipe(popen(command.c_str(), "r"));
-  std::string output;
-  std::array<char, 4096> buffer{};
-  while (fgets(buffer.data(), buffer.size(), pipe.get()) != nullptr) output += buffer.data();
-  return output;
-}
-
-// The names in nm(1)'s table, without addresses.
-std::vector<std::string> SymbolNames(const std::string& options) {
-  std::istringstream lines(OutputOf("nm " + options + " --format=posix " MODULE_PATH));
+// The names in a list that nm(1) wrote when the module was built, without addresses. Not asked for here: where the
+// tests run under an emulator, no program can be started.
+std::vector<std::string> SymbolNames(const char* list) {
+  std::ifstream lines(list);
   std::vector<std::string> names;
   for (std::string line; std::getline(lines, line);) names.push_back(line.substr(0, line.find(' ')));
   std::sort(names.begin(), names.end());
@@ -48,7 +35,7 @@ std::unique_ptr<void, Unload> LoadModule() {
 }
 
 TEST(Binary, ExportsTheTableAndTheEntryFunctionsAndNothingElse) {
-  EXPECT_THAT(SymbolNames("--dynamic --defined-only"),
+  EXPECT_THAT(SymbolNames(VISIBLE_SYMBOLS),
               ElementsAreArray({"GetAPITable", "NFSAdvGet", "NFSAdvSet", "NFSGet", "NFSGetV2", "NFSIDMapCreate",
                                 "NFSIDMapDelete", "NFSIDMapList", "NFSIDMapSet", "NFSKerberosGet", "NFSKerberosList",
                                 "NFSKerberosUploadKey", "NFSSet", "NFSSetV2", "NFSSharePrivilegeGet",
@@ -56,7 +43,7 @@ TEST(Binary, ExportsTheTableAndTheEntryFunctionsAndNothingElse) {
 }
 
 TEST(Binary, RunsNothingWhenItIsLoaded) {
-  const std::vector<std::string> names = SymbolNames("");
+  const std::vector<std::string> names = SymbolNames(ALL_SYMBOLS);
   ASSERT_THAT(names, testing::Contains("gTable")) << "the symbol table must be there to be looked at";
   std::vector<std::string> constructors;
   std::copy_if(names.begin(), names.end(), std::back_inserter(constructors),

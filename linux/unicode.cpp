@@ -26,6 +26,37 @@ bool IsHidden(ucs4_t character) {
   return uc_is_general_category_withtable(character, kHidden) || uc_is_property_default_ignorable_code_point(character);
 }
 
+// Null for what belongs to no alphabet, or to many.
+const uc_script_t* AlphabetOf(ucs4_t letter) {
+  constexpr std::string_view kNone[] = {"Common", "Inherited", "Han", "Hiragana", "Katakana", "Hangul", "Bopomofo"};
+  const uc_script_t* script = uc_script(letter);
+  const bool none = script == nullptr || std::find(std::begin(kNone), std::end(kNone), script->name) != std::end(kNone);
+  return none ? nullptr : script;
+}
+
+bool MixesAlphabets(const std::u32string& text) {
+  const uc_script_t* alphabet = nullptr;  // of the word so far
+  for (const ucs4_t character : text) {
+    if (!uc_is_property_alphabetic(character)) alphabet = nullptr;
+    const uc_script_t* own = AlphabetOf(character);
+    if (own == nullptr) continue;
+    if (alphabet != nullptr && alphabet != own) return true;
+    alphabet = own;
+  }
+  return false;
+}
+
+// Of valid UTF-8.
+std::u32string Characters(std::string_view text) {
+  std::u32string characters;
+  for (std::size_t at = 0; at < text.size();) {
+    ucs4_t character = 0;
+    at += static_cast<std::size_t>(u8_mbtouc(&character, Bytes(text) + at, text.size() - at));
+    characters.push_back(character);
+  }
+  return characters;
+}
+
 // NFKC: letters with their accents, and nothing that stands for another character.
 bool IsNormal(std::string_view text) {
   std::size_t size = 0;
@@ -70,12 +101,8 @@ bool IsPlainText(std::string_view text) {
   // Most texts are of these alone.
   if (std::all_of(text.begin(), text.end(), [](char c) { return c >= ' ' && c <= '~'; })) return true;
   if (u8_check(Bytes(text), text.size()) != nullptr) return false;
-  for (std::size_t at = 0; at < text.size();) {
-    ucs4_t character = 0;
-    at += static_cast<std::size_t>(u8_mbtouc(&character, Bytes(text) + at, text.size() - at));
-    if (IsHidden(character)) return false;
-  }
-  return IsNormal(text);
+  const std::u32string characters = Characters(text);
+  return std::none_of(characters.begin(), characters.end(), IsHidden) && !MixesAlphabets(characters) && IsNormal(text);
 }
 
 }  // namespace vorn

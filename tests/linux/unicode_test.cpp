@@ -54,8 +54,9 @@ TEST(CaselessSubstring, IsFoundInAnyCase) {
 }
 
 TEST(PlainText, IsWhatIsSeenAndLooksLikeNothingElse) {
-  for (const char* text : {"", "alice@EXAMPLE.COM", "a b#c;d", "j\xc3\xb6rg", "\xd0\xb8\xd0\xb2\xd0\xb0\xd0\xbd",
-                           "\xe5\xb1\xb1\xe7\x94\xb0"}) {
+  for (const char* text :
+       {"", "alice@EXAMPLE.COM", "a b#c;d", "j\xc3\xb6rg", "\xd0\xb8\xd0\xb2\xd0\xb0\xd0\xbd",
+        "\xe5\xb1\xb1\xe7\x94\xb0", "\xe5\xb1\xb1\xe3\x81\xae\xe3\x83\x8e@LAB", "\xd0\xb8\xd0\xb2@LAB-\xce\xbb"}) {
     EXPECT_TRUE(IsPlainText(text)) << text;
   }
   const struct {
@@ -77,6 +78,9 @@ TEST(PlainText, IsWhatIsSeenAndLooksLikeNothingElse) {
                {"full-width equals sign", "a\xef\xbc\x9d"},
                {"ligature", "\xef\xac\x81"},
                {"letter and accent apart", "o\xcc\x88"},
+               {"a Cyrillic letter in a Latin word", "\xd0\xb0lice"},
+               {"a Greek letter in a Latin word", "r\xce\xbf\xce\xbft"},
+               {"a Cyrillic letter in a Greek word", "\xce\xbb\xd0\xb0"},
                {"private use", "\xee\x80\x80"},
                {"not assigned", "\xcd\xb8"},
                {"noncharacter", "\xef\xbf\xbf"},

@@ -22,6 +22,9 @@ using Utf8 = std::unique_ptr<std::uint8_t, void (*)(void*)>;
 const std::uint8_t* Bytes(std::string_view text) { return reinterpret_cast<const std::uint8_t*>(text.data()); }
 
 bool IsHidden(ucs4_t character) {
+  constexpr ucs4_t kObjectReplacement = 0xFFFC;
+  constexpr ucs4_t kReplacement = 0xFFFD;  // of what could not be converted
+  if (character == kObjectReplacement || character == kReplacement) return true;
   constexpr std::uint32_t kHidden = UC_CATEGORY_MASK_C | UC_CATEGORY_MASK_Zl | UC_CATEGORY_MASK_Zp;
   return uc_is_general_category_withtable(character, kHidden) || uc_is_property_default_ignorable_code_point(character);
 }

@@ -82,6 +82,7 @@ TEST(PlainText, IsWhatIsSeenAndLooksLikeNothingElse) {
                {"a Greek letter in a Latin word", "r\xce\xbf\xce\xbft"},
                {"a Cyrillic letter in a Greek word", "\xce\xbb\xd0\xb0"},
                {"private use", "\xee\x80\x80"},
+               {"replacement character", "a\xef\xbf\xbd"},
                {"not assigned", "\xcd\xb8"},
                {"noncharacter", "\xef\xbf\xbf"},
                {"tag", "\xf3\xa0\x81\x81"},

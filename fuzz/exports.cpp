@@ -2,19 +2,15 @@
 // else.
 #include <cstddef>
 #include <cstdint>
-#include <cstdlib>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "exports_client.h"
 #include "exports_document.h"
+#include "require.h"
 
 namespace {
-
-void Require(bool property) {
-  if (!property) std::abort();
-}
 
 std::size_t Faults(const vorn::ExportsDocument& document) {
   std::size_t faults = 0;

@@ -1,16 +1,12 @@
 // The INI document: what no edit concerns comes back, and an edit does what it says.
 #include <cstdint>
-#include <cstdlib>
 
 #include "ini_document.h"
+#include "require.h"
 
 namespace {
 
 using vorn::IniDocument;
-
-void Require(bool condition) {
-  if (!condition) std::abort();
-}
 
 std::string EntriesOf(const IniDocument& document, std::string_view section) {
   std::string text;

@@ -20,6 +20,9 @@ namespace {
 
 constexpr char kFile[] = "/etc/idmapd.conf";
 
+// Of a domain: what the ID mapper has room for, NFS4_MAX_DOMAIN_LEN of nfsidmap.h with its NUL.
+constexpr std::size_t kLongestDomain = 511;
+
 // What a record holds besides its mappings, in the first of its own words.
 struct Holding {
   ConfigurationLock lock;
@@ -105,7 +108,8 @@ Status StoreDomain(const std::string& domain, IniDocument* document) {
     return {};
   }
   const std::optional<IniValue> value = IniValue::From(domain);
-  if (!value) return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry the domain");
+  if (!value || domain.size() > kLongestDomain || !IsPlainText(domain))
+    return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry the domain");
   document->Set(*IniSection::From("General"), *IniKey::From("Domain"), *value);
   return {};
 }

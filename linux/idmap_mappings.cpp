@@ -5,6 +5,9 @@
 #include <string>
 #include <vector>
 
+#include "nfsconf.h"
+#include "unicode.h"
+
 namespace vorn {
 namespace {
 
@@ -14,14 +17,27 @@ struct Mapping {
 };
 using Mappings = std::map<std::string, Mapping>;  // by the principal as the reader compares it
 
-// The wanted mappings. The reader takes two principals that differ in case for one: a table with both
-// cannot be stored.
-Result<Mappings> Check(const KLIBSZHASH& table) {
+// As long as a principal of a keytab may be.
+constexpr std::size_t kLongestPrincipal = sizeof(KeytabEntry::principal) - 1;
+
+bool IsStored(const IniDocument& document, const KLIBSZHASH::Pair& mapping) {
+  return document.Get("Static", mapping.first) == mapping.second;
+}
+
+// Who looks at the file later must see whom it maps. A local name is that of an account, as it is.
+bool MayBeStored(const std::string& principal) {
+  return principal.size() <= kLongestPrincipal && IsPlainText(principal);
+}
+
+// The wanted mappings. What the file has already is not judged again. The reader takes two principals that differ in
+// case for one: a table with both cannot be stored.
+Result<Mappings> Check(const KLIBSZHASH& table, const IniDocument& document) {
   Mappings mappings;
-  for (const auto& [principal, local_name] : table.pairs) {
+  for (const KLIBSZHASH::Pair& pair : table.pairs) {
+    const auto& [principal, local_name] = pair;
     const std::optional<IniKey> key = IniKey::From(principal);
     const std::optional<IniValue> value = IniValue::From(local_name);
-    if (!key || !value)
+    if (!key || !value || !(IsStored(document, pair) || MayBeStored(principal)))
       return Status::Failure(kRefusedText, "idmapd.conf(5) cannot carry a principal or its local name");
     if (!mappings.emplace(FoldIniName(principal), Mapping{*key, *value}).second) {
       return Status::Failure(kRefusedText, "idmapd.conf(5) cannot tell two principals that differ in case only");
@@ -85,7 +101,7 @@ Status HonourStaticMappings(IniDocument* document) {
 }  // namespace
 
 Status StoreMappings(const KLIBSZHASH& table, IniDocument* document) {
-  const Result<Mappings> mappings = Check(table);
+  const Result<Mappings> mappings = Check(table, *document);
   if (!mappings.ok()) return mappings.status();
   if (!IsStored(*document, *mappings)) WriteMappings(table, *mappings, document);
   return mappings->empty() ? Status() : HonourStaticMappings(document);

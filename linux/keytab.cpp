@@ -17,6 +17,7 @@
 #include "lock.h"
 #include "nfsconf.h"
 #include "root.h"
+#include "unicode.h"
 
 namespace vorn {
 namespace {
@@ -43,7 +44,8 @@ const std::string& OwnPrincipal(const std::vector<KeytabKey>& keys) {
 
 // Whether the configuration record can carry it: once the keytab is installed it has to.
 Status CheckPrincipal(const std::string& principal) {
-  if (principal.size() < sizeof(KeytabEntry::principal) && IniValue::From(principal)) return {};
+  if (principal.size() < sizeof(KeytabEntry::principal) && IsPlainText(principal) && IniValue::From(principal))
+    return {};
   return Status::Failure(kRefusedText, "nfs.conf(5) cannot carry the principal " + principal);
 }
 

@@ -1,4 +1,4 @@
-// Upper and lower case, as Unicode has them.
+// Texts as Unicode has them: upper and lower case, and what of a text is seen.
 #ifndef VORN_LINUX_UNICODE_H
 #define VORN_LINUX_UNICODE_H
 
@@ -22,6 +22,12 @@ class CaselessSubstring {
  private:
   std::string substring_;
 };
+
+// Whether who reads `text` sees what it is: UTF-8, and none of what RFC 8264 keeps out of every
+// identifier: control and format characters, line separators, what has no width, what is not
+// assigned, and compatibility forms such as full-width letters, which look like others. Nor are there
+// letters of two alphabets in one word: "a" is in the Latin and in the Cyrillic one.
+bool IsPlainText(std::string_view text);
 
 }  // namespace vorn
 

@@ -76,7 +76,8 @@ _tag_nfs_id_map_* VORNNFSIDMapGet(void);
 
 // Stores domain and table in the file at `path`, "/etc/idmapd.conf", and makes sure that static
 // mappings are honoured as soon as there is one. Comments and foreign settings stay. A domain, a
-// principal or a name that the file's syntax cannot carry is refused before anything is written.
+// principal or a name that the file's syntax cannot carry is refused before anything is written; so
+// is a new domain or principal that its readers have no room for, or that looks like something else.
 int VORNNFSIDMapSet(const char* path, const _tag_nfs_id_map_* record);
 
 // Releases a record and lets the next writer in. Null is allowed.

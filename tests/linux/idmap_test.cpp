@@ -207,6 +207,33 @@ TEST(IDMap, RefusesWhatTheFileCannotCarry) {
   }
 }
 
+TEST(IDMap, RefusesWhatNobodySeesOrReadsToItsEnd) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[Static]\nb@X = daemon\n");
+  const auto before = root.Read(kFile);
+  const std::string longest(513, 'a');
+  for (const std::string& principal : {std::string("alice\xe2\x80\xae@X"), std::string("a\xff@X"), longest + "a"}) {
+    EXPECT_LT(Store({{principal, "nobody"}}), 0) << principal;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kRefusedText) << principal;
+  }
+  for (const std::string& domain : {std::string("a\xe2\x80\x8b.example"), std::string(512, 'a')}) {
+    EXPECT_LT(StoreDomain(domain.c_str()), 0) << domain;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kRefusedText) << domain;
+  }
+  EXPECT_EQ(root.Read(kFile), before);
+  EXPECT_EQ(Store({{longest, "nobody"}}), 0);
+  EXPECT_EQ(StoreDomain(std::string(511, 'a').c_str()), 0);
+  EXPECT_EQ(DomainByLibrary(root.At(kFile)), std::string(511, 'a'));
+}
+
+TEST(IDMap, KeepsAMappingThatItWouldNotTake) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[Static]\nj\xf6rg@X = daemon\n");  // ISO 8859-1
+  ASSERT_EQ(Store({{"alice@X", "nobody"}}), 0);
+  EXPECT_EQ(Stored(), (Pairs{{"j\xf6rg@X", "daemon"}, {"alice@X", "nobody"}}));
+  EXPECT_LT(Store({{"j\xf6rg@X", "nobody"}}), 0) << "another mapping of that principal is a new one";
+}
+
 TEST(IDMap, RefusesToOverwriteAHandEdit) {
   const TemporaryRoot root;
   root.Write(kFile, "[Static]\na@X = nobody\n");

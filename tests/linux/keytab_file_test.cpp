@@ -101,6 +101,7 @@ TEST(Keytab, IsNoneWhenItIsDamaged) {
       {"no component", EncodeFile({Changed(entry, 0, 2, zero)})},
       {"more components than there are", EncodeFile({Changed(entry, 0, 2, "\x7F\xFF")})},
       {"no realm", EncodeFile({Changed(entry, realm, 10, zero)})},
+      {"no name", EncodeFile({Changed(entry, name, 7, zero)})},
       {"a realm that is longer than the entry", EncodeFile({Changed(entry, realm, 2, "\x7F\xFF")})},
       {"a name that reaches into the next entry",
        EncodeFile({Changed(entry, name, 2, std::string("\0\x2C", 2)), entry})},

@@ -109,7 +109,8 @@ TEST_F(KeytabImport, FailsOtherwiseWhereTheFileCannotBeTaken) {
 }
 
 TEST_F(KeytabImport, InstallsNothingWhosePrincipalTheSettingsCannotCarry) {
-  for (const std::string& name : {std::string("$HOME"), std::string(514, 'a'), std::string("a'b\"c#d")}) {
+  for (const std::string& name :
+       {std::string("$HOME"), std::string(514, 'a'), std::string("a'b\"c#d"), std::string("a\xe2\x80\xae")}) {
     EXPECT_EQ(Import(EncodeFile({EncodeEntry(name, "LAB.TEST", 17)})), VORNNFS_KEYTAB_FAILED) << name;
     EXPECT_EQ(KLIBCErrGet(), vorn::kRefusedText) << name;
     EXPECT_FALSE(root_.Read(kInstalled).has_value()) << name;

@@ -1,0 +1,122 @@
+// A world in which something is wrong: whatever it is, a change fails with a reason in the log, loses nothing, leaves
+// nothing behind, and can be made when the world is well again.
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+
+#include <cerrno>
+#include <csignal>
+#include <filesystem>
+#include <iostream>
+
+#include "captured_log.h"
+#include "injected_failures.h"
+#include "processes.h"
+#include "writes.h"
+
+namespace {
+
+using testing::IsEmpty;
+
+void Limit(int resource, rlim_t value) {
+  const rlimit limit{value, value};
+  setrlimit(static_cast<__rlimit_resource>(resource), &limit);
+}
+
+struct Fault {
+  const char* name;
+  void (*strike)();  // in the process that makes the change
+};
+
+const Fault kFaults[] = {
+    {"a full disk", [] { FailSystemCall(SYS_write, ENOSPC); }},
+    {"a disk quota",
+     [] {
+       signal(SIGXFSZ, SIG_IGN);
+       Limit(RLIMIT_FSIZE, 0);
+     }},
+    {"a disk that does not take what it was given", [] { FailSystemCall(SYS_fsync, EIO); }},
+    {"a read-only file system", [] { FailSystemCall(SYS_rename, EROFS); }},
+    {"no permission to make files", [] { FailSystemCall(SYS_openat, EACCES); }},
+    {"no permission to replace files", [] { FailSystemCall(SYS_rename, EACCES); }},
+    {"no file descriptors", [] { Limit(RLIMIT_NOFILE, 3); }},
+    {"no locks", [] { FailSystemCall(SYS_flock, ENOLCK); }},
+};
+
+// In a process of its own: the change, and whether it failed and said why.
+int MakeUnder(const Fault& fault, const Change& change) {
+  constexpr int kFailedWithReason = 1;
+  ChildProcess process([&] {
+    TakeLog();
+    fault.strike();
+    const bool failed = change.make() < 0;
+    return failed && !TakeLog().empty() ? kFailedWithReason : 0;
+  });
+  return process.Wait() == kFailedWithReason;
+}
+
+TEST(World, MayBeIllWithoutLosingAnything) {
+  int cases = 0;
+  const size_t kinds = AllChanges(TemporaryRoot()).size();
+  for (const Fault& fault : kFaults) {
+    for (size_t index = 0; index < kinds; ++index, ++cases) {
+      const TemporaryRoot root;
+      FurnishFiles(root);
+      const Change change = AllChanges(root)[index];
+      const Contents before = ContentsOf(root, change);
+      EXPECT_TRUE(MakeUnder(fault, change)) << fault.name << ": " << change.name;
+      EXPECT_EQ(ContentsOf(root, change), before) << fault.name << ": " << change.name;
+      EXPECT_THAT(Leftovers(root, change), IsEmpty()) << fault.name << ": " << change.name;
+      EXPECT_GE(change.make(), 0) << fault.name << ": " << change.name << ": it is over";
+      EXPECT_NE(ContentsOf(root, change), before) << fault.name << ": " << change.name;
+    }
+  }
+  std::cout << "  " << cases << " cases\n";
+}
+
+struct Obstacle {
+  const char* name;
+  void (*place)(const std::string& path);
+};
+
+const Obstacle kObstacles[] = {
+    {"a folder", [](const std::string& path) { std::filesystem::create_directory(path); }},
+    {"a link to itself",
+     [](const std::string& path) { std::filesystem::create_symlink(std::filesystem::path(path).filename(), path); }},
+    {"a pipe", [](const std::string& path) { mkfifo(path.c_str(), 0600); }},
+};
+
+TEST(World, MayHaveSomethingElseWhereAFileIsExpected) {
+  const size_t kinds = AllChanges(TemporaryRoot()).size();
+  for (const Obstacle& obstacle : kObstacles) {
+    for (size_t index = 0; index < kinds; ++index) {
+      const TemporaryRoot root;
+      FurnishFiles(root);
+      const Change change = AllChanges(root)[index];
+      const std::string path = root.At(change.files.front());
+      std::filesystem::remove(path);
+      obstacle.place(path);
+      TakeLog();
+      EXPECT_LT(change.make(), 0) << obstacle.name << ": " << change.name;
+      EXPECT_FALSE(TakeLog().empty()) << obstacle.name << ": " << change.name;
+      EXPECT_FALSE(std::filesystem::is_regular_file(std::filesystem::symlink_status(path))) << obstacle.name;
+      EXPECT_THAT(Leftovers(root, change), IsEmpty()) << obstacle.name << ": " << change.name;
+    }
+  }
+}
+
+TEST(World, MayLackTheFoldersOfAFile) {
+  for (size_t index = 0; index < AllChanges(TemporaryRoot()).size(); ++index) {
+    const TemporaryRoot root;
+    FurnishFiles(root);
+    const Change change = AllChanges(root)[index];
+    for (const char* folder : {"/etc/nfs", "/etc/nfs.conf.d"}) std::filesystem::remove_all(root.At(folder));
+    for (const char* file : {"/etc/exports", "/etc/idmapd.conf"}) std::filesystem::remove(root.At(file));
+    EXPECT_GE(change.make(), 0) << change.name;
+    EXPECT_EQ(ContentsOf(root, change).size(), change.files.size()) << change.name;
+  }
+}
+
+}  // namespace

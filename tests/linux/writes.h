@@ -1,0 +1,32 @@
+// Every kind of change that the contract writes to the box's files, for the tests that hurt them all.
+#ifndef VORN_TESTS_LINUX_WRITES_H
+#define VORN_TESTS_LINUX_WRITES_H
+
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "temporary_root.h"
+
+struct Change {
+  const char* name;
+  std::function<int()> make;       // what the operation answers: negative on failure
+  std::vector<const char*> files;  // that it writes, below the root
+};
+
+// The changes; on the box of FurnishFiles() each of them alters each of its files.
+std::vector<Change> AllChanges(const TemporaryRoot& root);
+
+// A box whose files all exist, an administrator's lines in them.
+void FurnishFiles(const TemporaryRoot& root);
+
+using Contents = std::map<std::string, std::string>;  // by path
+
+// What is in the files of a change; a file that is missing is not there.
+Contents ContentsOf(const TemporaryRoot& root, const Change& change);
+
+// The temporary files that lie beside the files of a change.
+std::vector<std::string> Leftovers(const TemporaryRoot& root, const Change& change);
+
+#endif  // VORN_TESTS_LINUX_WRITES_H

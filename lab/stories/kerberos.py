@@ -44,12 +44,13 @@ def test_an_imported_keytab_opens_kerberos_mounts_at_once(box, kerberos_client, 
     assert {entry["kerberos_principal"] for entry in entries} == {settings["kerberos_principal"]}
 
 
-@pytest.mark.parametrize("flavours", CHOICES, ids="+".join)
-def test_a_rule_opens_the_flavours_that_it_names_and_no_others(box, kerberos_client, keytab, flavours):
+@pytest.mark.timeout(300)
+def test_a_rule_opens_the_flavours_that_it_names_and_no_others(box, kerberos_client, keytab):
     box.share("data")
     import_keytab(keytab)
-    box.allow("data", rule(kerberos_client, *flavours))
-    assert {flavour for flavour in FLAVOURS if mounts(kerberos_client, flavour)} == flavours
+    for flavours in CHOICES:
+        box.allow("data", rule(kerberos_client, *flavours))
+        assert {flavour for flavour in FLAVOURS if mounts(kerberos_client, flavour)} == flavours
 
 
 def owner_of_a_new_file(mounted, name, user):
@@ -65,15 +66,15 @@ def may_look(mounted, user):
     return True
 
 
-@pytest.mark.parametrize("flavour", ["krb5", "krb5i", "krb5p"])
-def test_only_a_user_with_a_ticket_gets_in(box, kerberos_client, keytab, flavour):
+def test_only_a_user_with_a_ticket_gets_in(box, kerberos_client, keytab):
     box.share("data")
     import_keytab(keytab)
-    box.allow("data", rule(kerberos_client, flavour))
     kerberos.sign_in(users.ALICE, "alice")
-    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options=f"sec={flavour}") as mounted:
-        assert owner_of_a_new_file(mounted, "file", users.ALICE) == users.ALICE.uid
-        assert not may_look(mounted, users.BOB)
+    for flavour in ("krb5", "krb5i", "krb5p"):
+        box.allow("data", rule(kerberos_client, flavour))
+        with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options=f"sec={flavour}") as mounted:
+            assert owner_of_a_new_file(mounted, f"by-{flavour}", users.ALICE) == users.ALICE.uid
+            assert not may_look(mounted, users.BOB)
 
 
 def test_the_id_map_decides_who_owns_a_file_and_changes_without_a_restart(box, kerberos_client, keytab):

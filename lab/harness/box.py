@@ -39,7 +39,7 @@ class Box:
 
     def nfs(self, **settings):
         """Sets these settings of the service; it is to be on if nothing else is said."""
-        api.call("NFS", "set", version=2 if "minor" in settings else 1, **{"enable_nfs": True, **settings})
+        api.call("NFS", "set", **{"enable_nfs": True, **settings})
 
     def advanced(self, **settings):
         """Sets these advanced settings, beside those that are."""
@@ -64,11 +64,11 @@ class Box:
 
     # Shares.
 
-    def share(self, name, mode=0o777):
+    def share(self, name):
         """A shared folder that everybody may write into; its path."""
         path = pathlib.Path("/srv") / name
         path.mkdir(exist_ok=True)
-        path.chmod(mode)
+        path.chmod(0o777)
         shares = pathlib.Path("/etc/vorn/shares.conf")
         shares.parent.mkdir(exist_ok=True)
         text = shares.read_text(encoding="utf-8") if shares.exists() else "[shares]\n"

@@ -2,12 +2,22 @@
 #ifndef VORN_TESTS_LINUX_WRITES_H
 #define VORN_TESTS_LINUX_WRITES_H
 
+#include <gtest/gtest.h>
+
+#include <cstdlib>
 #include <functional>
 #include <map>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "temporary_root.h"
+
+// Their roots are in memory: nothing here depends on a disk but the time it takes.
+class Writes : public testing::Test {
+ protected:
+  static void SetUpTestSuite() { setenv("TMPDIR", "/dev/shm", 1); }
+};
 
 struct Change {
   const char* name;
@@ -21,9 +31,12 @@ std::vector<Change> AllChanges(const TemporaryRoot& root);
 // A box whose files all exist, an administrator's lines in them.
 void FurnishFiles(const TemporaryRoot& root);
 
-using Contents = std::map<std::string, std::string>;  // by path
+// A box where nothing of ours was ever written; the changes that take something away have nothing to do there.
+void LeaveFilesToBeMade(const TemporaryRoot& root);
 
-// What is in the files of a change; a file that is missing is not there.
+using Contents = std::map<std::string, std::optional<std::string>>;  // by path; none where there is no file
+
+// What is in the files of a change.
 Contents ContentsOf(const TemporaryRoot& root, const Change& change);
 
 // The temporary files that lie beside the files of a change.

@@ -1,5 +1,6 @@
-// main() of tests that change the network's state: runs them as root of a user, mount and network namespace of
-// their own (unshare(1)), with a loopback interface and an empty /run, so that they disturb nobody and need no rights.
+// main() of tests that change the network's state, or mount: runs them as root of a user, mount and network namespace
+// of their own (unshare(1)), with a loopback interface and an empty /run, so that they disturb nobody and need no
+// rights.
 #include <gmock/gmock.h>
 #include <unistd.h>
 

@@ -84,9 +84,7 @@ std::vector<Change> AllChanges(const TemporaryRoot& root) {
           {"a change of a mapping", ChangeMapping, {kIDMap}},
           {"a removal of a mapping", RemoveMapping, {kIDMap}},
           {"a change of the domain", ChangeDomain, {kIDMap}},
-          {"an import of a keytab",
-           [upload] { return VORNNFSKeytabImport(upload.c_str()); },
-           {kKeytab, kSettings}},
+          {"an import of a keytab", [upload] { return VORNNFSKeytabImport(upload.c_str()); }, {kKeytab, kSettings}},
           {"a change of the settings", SaveSettings, {kSettings}},
           {"a change of the transfer sizes", AnnounceSizes, {kDropIn}},
           {"a start of the service", StartService, {kState, kDropIn}}};

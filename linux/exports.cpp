@@ -138,7 +138,7 @@ Status WriteRules(const char* path, const ExportRuleList* list) {
     Status status = writer.Add(*rule);
     if (!status.ok()) return status;
   }
-  if (present == writer.entries()) return {};
+  if (present == writer.entries()) return ConfirmFile(file->path);
   Status status = exports.Replace(path, writer.entries());
   return status.ok() ? ReplaceFile(file->path, exports.text(), file->content.stamp) : status;
 }

@@ -138,9 +138,7 @@ Status WriteIDMap(const char* path, const _tag_nfs_id_map_* record) {
   Result<IniFile> file = IniFile::Open(path);
   if (!file.ok()) return file.status();
   Holding* holding = HoldingOf(*record, *file);
-  if (holding != nullptr && !IsSameFile(holding->stamp, file->stamp())) {
-    return Status::Failure(kChangedBehind, file->path() + " was changed by somebody else meanwhile");
-  }
+  if (holding != nullptr && !IsSameFile(holding->stamp, file->stamp())) return ChangedBehind(file->path());
   IniDocument* document = &file->document();
   if (IsNewDomain(record->domain, holding)) {
     if (Status status = StoreDomain(record->domain, document); !status.ok()) return status;

@@ -67,7 +67,10 @@ Status IniFile::Refuse(std::string_view section, std::string_view key, const std
 
 Result<FileStamp> IniFile::Save() const {
   const std::string text = document_.Text();
-  if (text == text_) return stamp_;
+  if (text == text_) {
+    const Status confirmed = ConfirmFile(path_);
+    return confirmed.ok() ? Result<FileStamp>(stamp_) : confirmed;
+  }
   if (Status status = ReplaceFile(path_, text, stamp_); !status.ok()) return status;
   const Result<FileText> written = ReadFile(path_);
   if (!written.ok()) return written.status();

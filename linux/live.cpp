@@ -52,7 +52,7 @@ Status PrepareTransferSizes() {
   if (!path.ok()) return path.status();
   const Result<FileText> before = ReadFileOrNothing(*path);
   if (!before.ok()) return before.status();
-  return before->text == kDropInText ? Status() : ReplaceFile(*path, kDropInText, before->stamp);
+  return before->text == kDropInText ? ConfirmFile(*path) : ReplaceFile(*path, kDropInText, before->stamp);
 }
 
 }  // namespace vorn

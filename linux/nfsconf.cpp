@@ -20,6 +20,14 @@ constexpr char kHeading[] =
 // What nfs-utils has no key for, and what it must not see while it is switched off.
 constexpr char kOurs[] = "vorn";
 
+// Our own file as this thread's record was read of it. The record has no room for that, and an edit by hand between
+// the reading and the writing of a record must not be lost.
+struct Origin {
+  std::string path;  // empty: nothing was read
+  FileStamp stamp;
+};
+thread_local Origin origin;
+
 // ---------------------------------------------------------------------------------------------
 // Reading.
 
@@ -41,6 +49,9 @@ Status ReadPorts(const NFSConfiguration& configuration, NFSConfRecord* record) {
 
 Status ReadRecord(NFSConfRecord* result) {
   if (result == nullptr) return Status::Failure(EINVAL, "no record");
+  // Before the values, so that an edit in between is noticed, too.
+  const Result<IniFile> own = IniFile::Open(kFile);
+  if (!own.ok()) return own.status();
   const Result<NFSConfiguration> configuration = NFSConfiguration::Open();
   if (!configuration.ok()) return configuration.status();
   NFSConfRecord record{};
@@ -57,6 +68,7 @@ Status ReadRecord(NFSConfRecord* result) {
     return s;
   }
   *result = record;
+  origin = {own->path(), own->stamp()};
   return {};
 }
 
@@ -133,6 +145,7 @@ Status WriteRecord(const NFSConfRecord* record) {
   if (!lock.status().ok()) return lock.status();
   Result<IniFile> file = IniFile::Open(kFile, kHeading);
   if (!file.ok()) return file.status();
+  if (origin.path == file->path() && !IsSameFile(origin.stamp, file->stamp())) return ChangedBehind(file->path());
   IniDocument* document = &file->document();
   PutVersion4(document, record->enable_nfs_v4 != 0);
   PutSwitch(document, "mountd", "manage-gids", record->unix_pri_enable != 0);
@@ -140,7 +153,9 @@ Status WriteRecord(const NFSConfRecord* record) {
   Put(document, kOurs, "write-size", IniValue::From(record->write_size));
   if (Status status = PutPrincipal(document, *record); !status.ok()) return status;
   PutPorts(document, *record);
-  return file->Save().status();
+  const Result<FileStamp> saved = file->Save();
+  if (saved.ok()) origin = {};
+  return saved.status();
 }
 
 }  // namespace

@@ -42,7 +42,8 @@ static_assert(offsetof(NFSConfRecord, custom_port_enable) == 540, "record layout
 // Fills the whole record; what is not configured has the service's default.
 int VORNNFSConfGet(NFSConfRecord* record);
 
-// Stores the whole record. The running service takes no notice until it is restarted, or told by
+// Stores the whole record, unless the settings were edited by hand since this thread read a record: that edit is in
+// none of its fields and would be lost. The running service takes no notice until it is restarted, or told by
 // one of the two operations below.
 int VORNNFSConfSet(const NFSConfRecord* record);
 

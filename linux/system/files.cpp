@@ -95,13 +95,39 @@ class TemporaryFile {
     return {};
   }
 
-  Status MoveTo(const fs::path& target) {
+  // In one step, unless the target is no longer what was expected.
+  Status TakePlaceOf(const fs::path& target, const FileStamp& expected) {
+    if (renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, target.c_str(),
+                  expected.exists ? RENAME_EXCHANGE : RENAME_NOREPLACE) == 0) {
+      return expected.exists ? PutAway(target, expected) : Done();
+    }
+    if (errno == ENOENT || errno == EEXIST) return ChangedBehind(target.string());
+    if (errno != EINVAL) return Status::System(errno, target.string());
+    // The file system can only replace: an edit since the last look is lost.
     if (rename(path_.c_str(), target.c_str()) != 0) return Status::System(errno, target.string());
+    return Done();
+  }
+
+ private:
+  Status Done() {
     file_.Close();
     return {};
   }
 
- private:
+  // Looks at the old file once more, now that nobody finds it: an edit of the last moment goes back to its place. To
+  // be moved changes other marks of a file.
+  Status PutAway(const fs::path& target, const FileStamp& expected) {
+    struct stat old {};
+    if (lstat(path_.c_str(), &old) != 0) return Status::System(errno, path_);
+    const FileStamp stamp = StampOf(old);
+    if (stamp.size != expected.size || stamp.modified != expected.modified) {
+      if (rename(path_.c_str(), target.c_str()) == 0) file_.Close();
+      return ChangedBehind(target.string());
+    }
+    unlink(path_.c_str());
+    return Done();
+  }
+
   std::string path_;
   FileDescriptor file_;
   Status status_;
@@ -122,12 +148,12 @@ Result<Target> Examine(const fs::path& path) {
   return target;
 }
 
-// A hand edit between this look and the rename that follows it is lost: editors take no lock.
+// So that readers do not find for a moment what is not to stay.
 Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
   const Result<Target> target = Examine(path);
   if (!target.ok()) return target.status();
-  if (IsSameFile(target->exists ? StampOf(target->file) : FileStamp{}, expected)) return {};
-  return Status::Failure(kChangedBehind, path.string() + " was changed by somebody else meanwhile");
+  const bool same = IsSameFile(target->exists ? StampOf(target->file) : FileStamp{}, expected);
+  return same ? Status() : ChangedBehind(path.string());
 }
 
 Status Fill(TemporaryFile* temporary, const Target& target, std::string_view text, mode_t mode) {
@@ -144,6 +170,10 @@ bool IsSameFile(const FileStamp& a, const FileStamp& b) {
   if (a.exists != b.exists || !a.exists) return a.exists == b.exists;
   return a.device == b.device && a.inode == b.inode && a.size == b.size && a.modified == b.modified &&
          a.changed == b.changed;
+}
+
+Status ChangedBehind(const std::string& path, const char* file, int line) {
+  return Status::Failure(kChangedBehind, path + " was changed by somebody else meanwhile", file, line);
 }
 
 Result<FileText> ReadFile(const std::string& path) {
@@ -182,7 +212,14 @@ Status ReplaceFile(const std::string& path, std::string_view text, const FileSta
   TemporaryFile temporary(path);
   if (Status status = Fill(&temporary, *target, text, mode); !status.ok()) return status;
   if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
-  if (Status status = temporary.MoveTo(path); !status.ok()) return status;
+  if (Status status = temporary.TakePlaceOf(path, expected); !status.ok()) return status;
+  return SyncFolder(folder);
+}
+
+Status ConfirmFile(const std::string& path) {
+  const fs::path folder = fs::path(path).parent_path();
+  if (access(folder.c_str(), F_OK) != 0) return {};  // nobody began anything
+  RemoveLeftovers(path);
   return SyncFolder(folder);
 }
 

@@ -25,6 +25,9 @@ struct FileStamp {
 // Whether both are of one file in one state.
 bool IsSameFile(const FileStamp& a, const FileStamp& b);
 
+// The failure of a write that would lose somebody's edit of the file at `path`.
+Status ChangedBehind(const std::string& path, const char* file = __builtin_FILE(), int line = __builtin_LINE());
+
 struct FileText {
   std::string text;
   FileStamp stamp;
@@ -44,12 +47,18 @@ Status MakeFolders(const std::string& path);
 // Makes the file at `path` hold `text`, durably (fsync(2) of file and folder), in one step: a reader
 // sees the old file or the new one, whatever happens on the way. An existing file keeps its owner
 // and mode, a new one gets `mode`; neither depends on umask(2). Missing folders are made. Fails with
-// kChangedBehind, and writes nothing, when the file is no longer the one that `expected` was taken
-// of. The caller holds the configuration lock: two writers of one file would disturb each other.
+// kChangedBehind, and leaves the file alone, when it is no longer the one that `expected` was taken
+// of: an edit by hand at any moment is noticed if it is over when the files change places
+// (renameat2(2)); a file system that cannot exchange files notices all but those of the last instant.
+// The caller holds the configuration lock: two writers of one file would disturb each other.
 Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);
 
-// Removes the temporary files that killed writers of the file at `path` left beside it.
-// ReplaceFile does so itself; the caller holds the configuration lock.
+// For a file that holds already what it should: ends what a killed writer of it began. Its temporary
+// file goes, and what it put in place is made durable. The caller holds the configuration lock.
+Status ConfirmFile(const std::string& path);
+
+// Removes the temporary files that killed writers of the file at `path` left beside it. The two
+// above do so themselves; the caller holds the configuration lock.
 void RemoveLeftovers(const std::string& path);
 
 }  // namespace vorn

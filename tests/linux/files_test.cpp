@@ -173,8 +173,8 @@ TEST(ReplaceFile, LeavesAWholeFileAndNothingElseWhicheverSystemCallFails) {
     long number;
     const char* left;  // in the file
   } cases[] = {
-      {"openat", SYS_openat, "old"}, {"write", SYS_write, "old"},   {"fsync", SYS_fsync, "old"},
-      {"fchmod", SYS_fchmod, "old"}, {"rename", SYS_rename, "old"},
+      {"openat", SYS_openat, "old"}, {"write", SYS_write, "old"},         {"fsync", SYS_fsync, "old"},
+      {"fchmod", SYS_fchmod, "old"}, {"renameat2", SYS_renameat2, "old"},
   };
   for (const auto& c : cases) {
     const TemporaryRoot root;
@@ -204,6 +204,73 @@ TEST(ReplaceFile, LeavesAWholeFileWhereverItsProcessIsKilled) {
   }
   EXPECT_EQ(root.Read(kFile), "next");
   EXPECT_GT(kills, 10);
+}
+
+// An edit by hand, in both ways in which editors write.
+void EditInPlace(const TemporaryRoot& root) { root.Write(kFile, "somebody's own"); }
+
+void EditByReplacing(const TemporaryRoot& root) {
+  root.Write("/etc/other", "somebody's own");
+  fs::rename(root.At("/etc/other"), root.At(kFile));
+}
+
+using Edit = void (*)(const TemporaryRoot& root);
+
+// A whole edit at system call number `call` of a write. Whether the write made that many.
+bool KeepsTheEditAt(int call, const char* before, Edit edit) {
+  const TemporaryRoot root;
+  fs::create_directory(root.At("/etc"));
+  if (before != nullptr) root.Write(kFile, before);
+  const FileStamp read = ReadFileOrNothing(root.At(kFile))->stamp;
+  bool edit_is_later = false;
+  const std::optional<int> noticed = InterruptAtSystemCall(
+      call, [&] { return ReplaceFile(root.At(kFile), "new", read).code() == kChangedBehind ? 1 : 0; },
+      [&] {
+        edit_is_later = root.Read(kFile) == "new";
+        edit(root);
+      });
+  if (!noticed) return false;
+  EXPECT_EQ(root.Read(kFile), "somebody's own") << call;
+  EXPECT_EQ(*noticed == 0, edit_is_later) << call;
+  EXPECT_EQ(root.Names("/etc"), Names{"file"}) << call;
+  return true;
+}
+
+TEST(ReplaceFile, LosesNoEditWheneverItIsMade) {
+  const struct {
+    const char* before;  // null: no file
+    Edit edit;
+  } cases[] = {{"old", EditInPlace}, {"old", EditByReplacing}, {nullptr, EditInPlace}};
+  for (const auto& c : cases) {
+    int call = 0;
+    while (KeepsTheEditAt(call, c.before, c.edit) && !HasFailure()) ++call;
+    EXPECT_GT(call, 10);
+  }
+}
+
+TEST(ReplaceFile, ReplacesOnAFileSystemThatCannotExchange) {
+  for (const char* before : {"old", static_cast<const char*>(nullptr)}) {
+    const TemporaryRoot root;
+    if (before != nullptr) root.Write(kFile, before);
+    ChildProcess writer([&] {
+      if (!FailSystemCall(SYS_renameat2, EINVAL)) return 99;
+      return Replace(root, "new").code();
+    });
+    EXPECT_EQ(writer.Wait(), 0);
+    EXPECT_EQ(root.Read(kFile), "new");
+    EXPECT_EQ(root.Names("/etc"), Names{"file"});
+  }
+}
+
+TEST(ConfirmFile, EndsWhatAKilledWriterBegan) {
+  const TemporaryRoot root;
+  EXPECT_TRUE(ConfirmFile(root.At("/no/such/file")).ok());
+  root.Write(kFile, "new");
+  root.Write("/etc/.file.vorn-Ab12Cd", "old");
+  EXPECT_TRUE(ConfirmFile(root.At(kFile)).ok());
+  EXPECT_EQ(root.Names("/etc"), Names{"file"});
+  ChildProcess other([&] { return FailSystemCall(SYS_fsync, EIO) ? ConfirmFile(root.At(kFile)).code() : 99; });
+  EXPECT_EQ(other.Wait(), EIO) << "what is not durable must not be acknowledged";
 }
 
 TEST(RemoveLeftovers, TakesTheTemporaryFilesOfThatFileOnly) {

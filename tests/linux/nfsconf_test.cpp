@@ -153,6 +153,26 @@ TEST(NFSConf, WritesNothingThatIsThereAlready) {
   EXPECT_EQ(before.st_ino, after.st_ino);
 }
 
+TEST(NFSConf, RefusesToOverwriteAHandEdit) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[nfsd]\nvers4 = y\n");
+  NFSConfRecord record = Get();
+  record.read_size = 4096;
+  const std::string edited = "# switched off for the audit\n[nfsd]\nvers4 = n\n";
+  root.Write(kFile, edited);
+  for (int attempt = 0; attempt < 2; ++attempt) {
+    EXPECT_LT(VORNNFSConfSet(&record), 0) << attempt;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kChangedBehind);
+    EXPECT_EQ(root.Read(kFile), edited);
+  }
+  record = Get();
+  EXPECT_EQ(record.enable_nfs_v4, 0);
+  record.read_size = 4096;
+  EXPECT_EQ(VORNNFSConfSet(&record), 0);
+  root.Write(kFile, edited);
+  EXPECT_EQ(VORNNFSConfSet(&record), 0) << "a record that was not read is a record to store";
+}
+
 TEST(NFSConf, NamesTheLineThatIsNoValue) {
   const struct {
     const char* text;

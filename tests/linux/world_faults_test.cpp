@@ -38,9 +38,9 @@ const Fault kFaults[] = {
        Limit(RLIMIT_FSIZE, 0);
      }},
     {"a disk that does not take what it was given", [] { FailSystemCall(SYS_fsync, EIO); }},
-    {"a read-only file system", [] { FailSystemCall(SYS_rename, EROFS); }},
+    {"a read-only file system", [] { FailSystemCall(SYS_renameat2, EROFS); }},
     {"no permission to make files", [] { FailSystemCall(SYS_openat, EACCES); }},
-    {"no permission to replace files", [] { FailSystemCall(SYS_rename, EACCES); }},
+    {"no permission to replace files", [] { FailSystemCall(SYS_renameat2, EACCES); }},
     {"no file descriptors", [] { Limit(RLIMIT_NOFILE, 3); }},
     {"no locks", [] { FailSystemCall(SYS_flock, ENOLCK); }},
 };

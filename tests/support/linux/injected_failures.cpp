@@ -21,6 +21,29 @@ bool Continue(pid_t child) {
   return WIFSTOPPED(status);
 }
 
+// A child that stops before it runs `body`, and ends with its result.
+pid_t Trace(const std::function<int()>& body) {
+  const pid_t child = fork();
+  if (child < 0) throw std::runtime_error("cannot fork");
+  if (child == 0) {
+    if (ptrace(PTRACE_TRACEME, 0, 0, 0) != 0 || raise(SIGSTOP) != 0) _exit(1);
+    _exit(body());
+  }
+  int status = 0;
+  if (waitpid(child, &status, 0) != child || !WIFSTOPPED(status)) throw std::runtime_error("ptrace is not allowed");
+  return child;
+}
+
+// Lets the child run to its system call number `count`, from 0. False when it ended before.
+bool ReachSystemCall(int count, pid_t child) {
+  // Each call stops twice, at its entry and its exit; the first stop here is an exit or an entry of
+  // raise(3), which costs a few calls at the beginning and changes nothing.
+  for (int stop = 0; stop <= 2 * count; ++stop) {
+    if (!Continue(child)) return false;
+  }
+  return true;
+}
+
 }  // namespace
 
 bool FailSystemCall(long number, int error_number) {
@@ -35,21 +58,25 @@ bool FailSystemCall(long number, int error_number) {
 }
 
 bool RunUntilSystemCall(int count, const std::function<void()>& body) {
-  const pid_t child = fork();
-  if (child < 0) throw std::runtime_error("cannot fork");
-  if (child == 0) {
-    if (ptrace(PTRACE_TRACEME, 0, 0, 0) != 0 || raise(SIGSTOP) != 0) _exit(1);
+  const pid_t child = Trace([&] {
     body();
-    _exit(0);
-  }
+    return 0;
+  });
+  if (!ReachSystemCall(count, child)) return true;
   int status = 0;
-  if (waitpid(child, &status, 0) != child || !WIFSTOPPED(status)) throw std::runtime_error("ptrace is not allowed");
-  // Each call stops twice, at its entry and its exit; the first stop here is an exit or an entry of
-  // raise(3), which costs a few calls at the beginning and changes nothing.
-  for (int stop = 0; stop <= 2 * count; ++stop) {
-    if (!Continue(child)) return true;
-  }
   kill(child, SIGKILL);
   waitpid(child, &status, 0);
   return false;
+}
+
+std::optional<int> InterruptAtSystemCall(int count, const std::function<int()>& body,
+                                         const std::function<void()>& meanwhile) {
+  const pid_t child = Trace(body);
+  if (!ReachSystemCall(count, child)) return std::nullopt;
+  meanwhile();
+  int status = 0;
+  if (ptrace(PTRACE_DETACH, child, 0, 0) != 0 || waitpid(child, &status, 0) != child || !WIFEXITED(status)) {
+    throw std::runtime_error("the child is lost");
+  }
+  return WEXITSTATUS(status);
 }

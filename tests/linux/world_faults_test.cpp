@@ -31,7 +31,6 @@ struct Fault {
 };
 
 const Fault kFaults[] = {
-    {"a full disk", [] { FailSystemCall(SYS_write, ENOSPC); }},
     {"a disk quota",
      [] {
        signal(SIGXFSZ, SIG_IGN);

@@ -114,8 +114,8 @@ class TemporaryFile {
     return {};
   }
 
-  // Looks at the old file once more, now that nobody finds it: an edit of the last moment goes back to its place. To
-  // be moved changes other marks of a file.
+  // Looks at the old file once more, now that nobody finds it: an edit of the last moment goes back to its place. Its
+  // time of change is new by the move, and on some file systems its inode.
   Status PutAway(const fs::path& target, const FileStamp& expected) {
     struct stat old {};
     if (lstat(path_.c_str(), &old) != 0) return Status::System(errno, path_);

@@ -1,0 +1,45 @@
+#include "call.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace VORN {
+namespace {
+
+constexpr std::size_t kMostSentences = 32;
+constexpr std::size_t kLongestSentence = 1024;
+
+thread_local CallContext* current = nullptr;
+
+// Cuts at the start of a UTF-8 character.
+void Shorten(std::string* sentence) {
+  if (sentence->size() <= kLongestSentence) return;
+  std::size_t end = kLongestSentence;
+  while (end > 0 && (static_cast<unsigned char>((*sentence)[end]) & 0xC0U) == 0x80U) --end;
+  sentence->resize(end);
+}
+
+void Add(std::string sentence, std::vector<std::string>* sentences) {
+  Shorten(&sentence);
+  if (sentences->size() >= kMostSentences) return;
+  if (std::find(sentences->begin(), sentences->end(), sentence) != sentences->end()) return;
+  sentences->push_back(std::move(sentence));
+}
+
+}  // namespace
+
+CallContext::CallContext(CallDescription description)
+    : description_(std::move(description)), outer_(std::exchange(current, this)) {}
+
+CallContext::~CallContext() { current = outer_; }
+
+CallContext* CallContext::Current() { return current; }
+
+const CallDescription& CallContext::description() const { return description_; }
+const std::vector<std::string>& CallContext::reasons() const { return reasons_; }
+const std::vector<std::string>& CallContext::warnings() const { return warnings_; }
+
+void CallContext::AddReason(std::string sentence) { Add(std::move(sentence), &reasons_); }
+void CallContext::AddWarning(std::string sentence) { Add(std::move(sentence), &warnings_); }
+
+}  // namespace VORN

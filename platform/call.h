@@ -1,0 +1,61 @@
+// The call context: what the server knows of the call that a thread is running, and what the platform
+// has to say about it besides the operations' results. Our own addition to the contract: a platform
+// works without it, and a module never sees it.
+#ifndef VORN_PLATFORM_CALL_H
+#define VORN_PLATFORM_CALL_H
+
+#include <string>
+#include <vector>
+
+namespace VORN {
+
+// One call, as the server sees it.
+struct CallDescription {
+  std::string caller;  // the authenticated account or token, for logs; empty when it is unknown
+  std::string origin;  // the peer's address without a port, or "unix"
+  std::string method;  // "VORN.Core.FileServ.NFS/v1/set"
+
+  // Whether the call may change anything. In a call that may not, VornConf takes no lock, and each
+  // operation that would write a file, drive a service, apply a live setting, reload the firewall or
+  // run a program fails with EROFS in the error facility and changes nothing.
+  bool may_write = true;
+
+  // Absolute paths, on this system, of the files that were uploaded with the call. KLIBCFileExist and
+  // VORNNFSKeytabImport open these where they are; they look for every other path below the root.
+  std::vector<std::string> uploads;
+};
+
+// The context of the calling thread, from construction to destruction. Contexts of one thread nest:
+// the innermost one counts. Construct and destroy an object in the same thread, around the entry
+// function. Without a context a thread may write and has no uploads, and reasons and warnings are
+// only logged.
+class CallContext {
+ public:
+  explicit CallContext(CallDescription description);
+  ~CallContext();
+  CallContext(const CallContext&) = delete;
+  CallContext& operator=(const CallContext&) = delete;
+
+  // The context of this thread, or null.
+  static CallContext* Current();
+
+  const CallDescription& description() const;
+
+  // Sentences for the caller, in the order in which the platform found them, each once.
+  const std::vector<std::string>& reasons() const;   // why operations of the call failed
+  const std::vector<std::string>& warnings() const;  // what a caller should know of a call that succeeded
+
+  // For the platform. A context keeps at most 32 sentences of a kind, of at most 1024 bytes each.
+  void AddReason(std::string sentence);
+  void AddWarning(std::string sentence);
+
+ private:
+  CallDescription description_;
+  std::vector<std::string> reasons_;
+  std::vector<std::string> warnings_;
+  CallContext* outer_;
+};
+
+}  // namespace VORN
+
+#endif  // VORN_PLATFORM_CALL_H

@@ -37,6 +37,7 @@ class SizeService : public Service {
     if (head.target.substr(0, 2) == "/e") return std::make_shared<Size>();
     return Response{404, "nothing", {}};
   }
+  Response Refuse(int status, std::string_view text) const override { return {status, std::string(text), {}}; }
 };
 
 class FuzzedServer {

@@ -43,6 +43,7 @@ class EchoService : public Service {
     if (head.target == "/no") return Response{404, "refused", {}};
     return std::make_shared<Echo>(threads_);
   }
+  Response Refuse(int status, std::string_view text) const override { return {status, std::string(text), {}}; }
   int heads() {
     const std::lock_guard<std::mutex> lock(mutex_);
     return heads_;

@@ -59,6 +59,10 @@ class Service {
 
   // Called for each head, on the network thread: how to go on, or the answer.
   virtual std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) = 0;
+
+  // The answer to a request that the transport itself refuses, in the service's own format. `text`
+  // is a sentence for the client. Called on the network thread.
+  virtual Response Refuse(int status, std::string_view text) const = 0;
 };
 
 struct HttpLimits {

@@ -72,6 +72,8 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
   return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), pool_);
 }
 
+Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }
+
 std::optional<Response> WebApi::AnswerPage(const Head& head) const {
   if (head.target != "/api" && head.target != "/healthz") return std::nullopt;
   if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");

@@ -20,6 +20,7 @@ class WebApi : public Service {
   WebApi(const Routes& routes, const UploadFolder& uploads, WorkerPool& pool);
 
   std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
+  Response Refuse(int status, std::string_view text) const override;
 
  private:
   std::optional<Response> AnswerPage(const Head& head) const;

@@ -18,8 +18,6 @@
 #include <thread>
 #include <unordered_set>
 
-#include "answer.h"
-
 namespace vorn::server {
 namespace {
 
@@ -91,9 +89,9 @@ const char* FramingFault(const Request& request) {
   return encodings == 1 && chunked ? nullptr : "The only Transfer-Encoding possible is chunked.";
 }
 
-Response Malformed(const Error& error) {
-  if (error == http::error::header_limit) return Refusal(431, "The headers are larger than 16 KiB.");
-  return Refusal(400, "This is not HTTP: " + error.message() + ".");
+Response Malformed(const Service& service, const Error& error) {
+  if (error == http::error::header_limit) return service.Refuse(431, "The headers are larger than 16 KiB.");
+  return service.Refuse(400, "This is not HTTP: " + error.message() + ".");
 }
 
 std::string HttpDate() {
@@ -258,7 +256,7 @@ void HttpServer::Session::Advance() {
     if (in_head && (head_bytes_ += taken) > engine_.limits().head_bytes) error = http::error::header_limit;
     if (auto& refusal = parser_->get().body().refusal) return Send(*std::move(refusal));
     if (error == http::error::need_more) break;
-    if (error) return Send(Malformed(error));
+    if (error) return Send(Malformed(engine_.service(), error));
     if (!begun_ && parser_->is_header_done()) {
       if (auto answer = BeginExchange()) return Send(*std::move(answer));
     }
@@ -271,11 +269,11 @@ void HttpServer::Session::Advance() {
 // Shows the head to the service. A response is the answer already.
 std::optional<Response> HttpServer::Session::BeginExchange() {
   const Request& request = parser_->get();
-  if (const char* fault = FramingFault(request)) return Refusal(400, fault);
+  if (const char* fault = FramingFault(request)) return engine_.service().Refuse(400, fault);
   begun_ = true;
   const auto expected = request[http::field::expect];
   if (!expected.empty() && !beast::iequals(expected, "100-continue")) {
-    return Refusal(417, "Only 100-continue can be expected.");
+    return engine_.service().Refuse(417, "Only 100-continue can be expected.");
   }
   auto begun = engine_.service().Begin(MakeHead());
   if (auto* answer = std::get_if<Response>(&begun)) return std::move(*answer);
@@ -301,7 +299,7 @@ Head HttpServer::Session::MakeHead() const {
 
 void HttpServer::Session::Read() {
   const std::size_t room = engine_.limits().head_bytes + kReadBytes - buffer_.size();
-  if (room == 0) return Send(Refusal(400, "A line between the chunks is too long."));
+  if (room == 0) return Send(engine_.service().Refuse(400, "A line between the chunks is too long."));
   socket_.async_read_some(
       buffer_.prepare(std::min(room, kReadBytes)),
       [self = shared_from_this()](const Error& error, std::size_t bytes) { self->OnRead(error, bytes); });

@@ -6,7 +6,7 @@
 #include "nfsAdv.h"
 #include "share_privilege.h"
 
-// Every method: API, version, method; its entry function; the handler class and the driver that serve it.
+// One row per method: API, version and method name; the entry function; the handler class and the driver it runs.
 // clang-format off
 #define API_METHODS(METHOD)                                                                                                    \
   METHOD("VORN.Core.FileServ.NFS", 1, "get", NFSGet, NFSServiceHandler, Get)                                                   \
@@ -26,19 +26,16 @@
   METHOD("VORN.Core.FileServ.NFS.SharePrivilege", 1, "save", NFSSharePrivilegeSet, NFSSharePrivilegeHandler, Set)
 // clang-format on
 
-// An entry function builds the handler, runs one driver and lets what it throws pass.
-#define ENTRY_FUNCTION(api, version, method, entry, handler, driver)                          \
-  extern "C" VORN_EXPORT void entry(VORN::APIRequest* request, VORN::APIResponse* response) { \
-    handler(request, response).driver();                                                      \
+// An entry function constructs the handler, runs one driver and propagates every exception.
+#define ENTRY_FUNCTION(api, version, method, entry, handler, driver)               \
+  VORN_EXPORT void entry(VORN::APIRequest* request, VORN::APIResponse* response) { \
+    handler(request, response).driver();                                           \
   }
 
 #define TABLE_ROW(api, version, method, entry, handler, driver) {api, version, method, entry},
 
 API_METHODS(ENTRY_FUNCTION)
 
-extern "C" {
-
 const APIRow gTable[] = {API_METHODS(TABLE_ROW){nullptr, 0, nullptr, nullptr}};
 
 const void* GetAPITable() { return gTable; }
-}

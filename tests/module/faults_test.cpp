@@ -1,8 +1,8 @@
-// Memory that runs out, at every place where the module asks for some: the exception leaves the entry function, and
-// nothing of the request stays behind. The module is the binary, on the fake platform; what others allocate in between
-// does not fail, so that the fake can go on recording.
+// Memory exhaustion: every allocation that the module makes fails once. The exception leaves the entry function, and no
+// object of the request is leaked. The test loads the module's binary on the fake platform. Allocations of the fake
+// platform do not fail, so that it can continue to record calls.
 //
-// Failing and throwing calls are tried in each method's own tests, malloc(3) and strdup(3) where they are used.
+// The tests of each method cover failing and throwing platform calls, and failures of malloc(3) and strdup(3).
 #include <dlfcn.h>
 #include <execinfo.h>
 #include <gmock/gmock.h>
@@ -20,17 +20,18 @@
 
 namespace {
 
-const void* g_module_base = nullptr;    // where the module is loaded
-const void* g_platform_base = nullptr;  // and the fake platform
-int g_fail_at = 0;                      // the module's n-th allocation fails; 0: none does
-int g_allocations = 0;                  // that the module has made since
+const void* g_module_base = nullptr;    // load address of the module
+const void* g_platform_base = nullptr;  // load address of the fake platform
+int g_fail_at = 0;                      // the number of the allocation that fails, from 1; 0: no allocation fails
+int g_allocations = 0;                  // allocations of the module since g_fail_at was set
 
 const void* BaseOf(const void* address) {
   Dl_info info{};
   return dladdr(address, &info) != 0 ? info.dli_fbase : nullptr;
 }
 
-// Whether the module, and not the platform below it, asked the library that asked for memory.
+// Returns whether the nearest caller that is either the module or the fake platform is the module. Libraries such as
+// JsonCpp may be in between.
 bool IsAskedByModule() {
   std::array<void*, 32> frames{};
   const int count = backtrace(frames.data(), static_cast<int>(frames.size()));
@@ -53,7 +54,7 @@ bool FailsNow() {
 
 }  // namespace
 
-// Not inlined: where g++ sees both bodies at once it takes them for a mismatch.
+// Not inlined: g++ reports a mismatched new and delete when it sees both bodies in one function.
 [[gnu::noinline]] void* operator new(size_t size) {
   void* const memory = FailsNow() ? nullptr : std::malloc(size == 0 ? 1 : size);
   if (memory == nullptr) throw std::bad_alloc();
@@ -67,31 +68,43 @@ namespace {
 using testing::IsEmpty;
 
 struct Method {
+  const char* api;  // behind "VORN.Core.FileServ.NFS"
+  int version;
   const char* name;
-  const char* params;  // with which the request goes furthest
+  int allocations;     // the smallest number of allocations that the request makes
+  int code;            // the error code of its answer while memory lasts
+  const char* params;  // parameters with which the request reaches its last step
 };
 
-// As gTable has them.
+// The methods in the order of gTable.
 const Method kMethods[] = {
-    {"NFSGet", "{}"},
-    {"NFSSet", R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "a.domain.long.enough.for.the.heap",
-                   "read_size": 4096, "write_size": 4096, "unix_pri_enable": true})"},
-    {"NFSGetV2", "{}"},
-    {"NFSSetV2",
+    {"", 1, "get", 7, 0, "{}"},
+    {"", 1, "set", 2, 0,
+     R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "a.domain.long.enough.for.the.heap",
+         "read_size": 4096, "write_size": 4096, "unix_pri_enable": true})"},
+    {"", 2, "get", 7, 0, "{}"},
+    {"", 2, "set", 2, 0,
      R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "a.domain.long.enough.for.the.heap"})"},
-    {"NFSAdvGet", "{}"},
-    {"NFSAdvSet", R"({"enable_nfs": true, "read_size": 4096, "write_size": 4096, "unix_pri_enable": true,
-                      "custom_port_enable": true, "statd_port": 5000, "nlm_port": 5001})"},
-    {"NFSKerberosGet", "{}"},
-    {"NFSKerberosUploadKey", R"({"keytab_file_tmp": "/nowhere/a-name-that-does-not-fit-into-the-text-itself"})"},
-    {"NFSKerberosList", "{}"},
-    {"NFSIDMapList", R"({"suggestion": true, "filter": "o"})"},
-    {"NFSIDMapCreate", R"({"idmap": [{"kerberos_principal": "somebody.with.a.long.name@BOX", "local_name": "alice"},
-                                     {"kerberos_principal": "somebody.else.at.length@BOX", "local_name": "bob"}]})"},
-    {"NFSIDMapSet", R"({"id": "one.principal.of.length@BOX", "kerberos_principal": "two@BOX", "local_name": "bob"})"},
-    {"NFSIDMapDelete", R"({"id": ["one.principal.of.length@BOX"]})"},
-    {"NFSSharePrivilegeGet", R"({"share_name": "data"})"},
-    {"NFSSharePrivilegeSet", R"({"share_name": "data", "rule": [{"client": "a.client.with.a.long.name.example",
+    {".AdvancedSetting", 1, "get", 7, 0, "{}"},
+    // The port is in use: a request that succeeds allocates nothing, one that fails is logged.
+    {".AdvancedSetting", 1, "set", 9, 2303,
+     R"({"enable_nfs": true, "read_size": 4096, "write_size": 4096, "unix_pri_enable": true,
+         "custom_port_enable": true, "statd_port": 5000, "nlm_port": 5001})"},
+    {".Kerberos", 1, "get", 3, 0, "{}"},
+    {".Kerberos", 1, "upload_key", 1, 0,
+     R"({"keytab_file_tmp": "/nowhere/a-name-that-does-not-fit-into-the-text-itself"})"},
+    {".Kerberos", 1, "list", 14, 0, "{}"},
+    {".IDMap", 1, "list", 19, 0, R"({"suggestion": true, "filter": "o"})"},
+    {".IDMap", 1, "create", 13, 0,
+     R"({"idmap": [{"kerberos_principal": "somebody.with.a.long.name@BOX", "local_name": "alice"},
+                   {"kerberos_principal": "somebody.else.at.length@BOX", "local_name": "bob"}]})"},
+    {".IDMap", 1, "set", 4, 0,
+     R"({"id": "one.principal.of.length@BOX", "kerberos_principal": "two.principals.of.length@BOX",
+         "local_name": "somebody-with-a-name-that-needs-the-heap"})"},
+    {".IDMap", 1, "delete", 2, 0, R"({"id": ["one.principal.of.length@BOX"]})"},
+    {".SharePrivilege", 1, "load", 17, 0, R"({"share_name": "data"})"},
+    {".SharePrivilege", 1, "save", 1, 0,
+     R"({"share_name": "data", "rule": [{"client": "a.client.with.a.long.name.example",
         "privilege": "rw", "root_squash": "admin", "async": true, "insecure": true, "crossmnt": true,
         "security_flavor": {"sys": true, "kerberos": true}}]})"},
 };
@@ -105,7 +118,10 @@ class Memory : public testing::Test {
   void SetUp() override {
     module_.reset(dlopen(MODULE_PATH, RTLD_NOW | RTLD_LOCAL));
     ASSERT_NE(module_, nullptr) << dlerror();
-    g_module_base = BaseOf(dlsym(module_.get(), "gTable"));
+    const auto get_table = reinterpret_cast<GetAPITableFunction>(dlsym(module_.get(), "GetAPITable"));
+    ASSERT_NE(get_table, nullptr);
+    table_ = static_cast<const APIRow*>(get_table());
+    g_module_base = BaseOf(table_);
     g_platform_base = BaseOf(reinterpret_cast<const void*>(&KLIBCErrGet));
     ASSERT_NE(g_module_base, g_platform_base);
     std::array<void*, 1> warm_up{};
@@ -117,6 +133,7 @@ class Memory : public testing::Test {
     platform->mappings = {{"one.principal.of.length@BOX", "alice"}};
     platform->users = {"alice", "bob", "somebody-with-a-name-that-needs-the-heap"};
     platform->files = {"/etc/nfs/krb5.keytab"};
+    platform->port_conflicts = {"nfs_nlm 5001"};
     ExportRule rule{};
     std::strcpy(rule.client, "a.client.with.a.long.name.example");
     platform->rules = {rule};
@@ -125,12 +142,10 @@ class Memory : public testing::Test {
     platform->keytab = {key};
   }
 
-  // Whether the request met the end of the memory at its n-th allocation.
-  bool RunsOutAt(int n, const Method& method) {
+  // Returns whether the request made `n` allocations, the last of which failed.
+  static bool RunsOutAt(int n, const APIRow& row, const Method& method) {
     FakePlatform platform;
     FurnishBox(&platform);
-    const auto entry =
-        reinterpret_cast<void (*)(VORN::APIRequest*, VORN::APIResponse*)>(dlsym(module_.get(), method.name));
     bool has_run_out = false;
     {
       VORN::APIRequest request(Parse(method.params));
@@ -138,31 +153,39 @@ class Memory : public testing::Test {
       g_allocations = 0;
       g_fail_at = n;
       try {
-        entry(&request, &response);
+        row.handler(&request, &response);
       } catch (const std::bad_alloc&) {
         has_run_out = true;
       }
+      EXPECT_EQ(has_run_out, g_fail_at == 0) << "an allocation failed, and no exception left " << method.name;
       has_run_out = has_run_out || (g_fail_at == 0);
       g_fail_at = 0;
+      EXPECT_TRUE(has_run_out || response.error() == method.code) << method.name << ": " << response.error();
     }
     EXPECT_THAT(platform.live_objects, IsEmpty()) << method.name << ", allocation " << n;
     return has_run_out;
   }
+
+  const APIRow* table_ = nullptr;
 
  private:
   std::unique_ptr<void, Unload> module_;
 };
 
 TEST_F(Memory, MayRunOutAtEveryAllocationOfEveryMethod) {
-  int total = 0;
+  const APIRow* row = table_;
   for (const Method& method : kMethods) {
+    const std::string name = std::string("VORN.Core.FileServ.NFS") + method.api + " " + method.name;
+    ASSERT_NE(row->api, nullptr) << name;
+    ASSERT_EQ(std::string(row->api) + " " + row->method, name);
+    ASSERT_EQ(row->version, method.version) << name;
     int count = 0;
-    while (RunsOutAt(count + 1, method)) ++count;
-    std::cout << "  " << method.name << ": " << count << " allocations failed\n";
-    total += count;
+    while (RunsOutAt(count + 1, *row, method)) ++count;
+    std::cout << "  " << name << ": " << count << " allocations failed\n";
+    EXPECT_GE(count, method.allocations) << name;
+    ++row;
   }
-  std::cout << "  " << total << " in all " << std::size(kMethods) << " methods\n";
-  EXPECT_GT(total, 50) << "the module is not seen to allocate";
+  EXPECT_EQ(row->api, nullptr) << "a method without parameters";
 }
 
 }  // namespace

@@ -1,10 +1,9 @@
-// The module's entry functions, which a server only knows through the API table.
+// The module's entry functions. Servers call them through the API table; tests call them directly.
 #ifndef VORN_TESTS_SUPPORT_ENTRY_FUNCTIONS_H
 #define VORN_TESTS_SUPPORT_ENTRY_FUNCTIONS_H
 
 #include "webapi.h"
 
-extern "C" {
 void NFSGet(VORN::APIRequest* request, VORN::APIResponse* response);
 void NFSSet(VORN::APIRequest* request, VORN::APIResponse* response);
 void NFSGetV2(VORN::APIRequest* request, VORN::APIResponse* response);
@@ -20,7 +19,6 @@ void NFSIDMapSet(VORN::APIRequest* request, VORN::APIResponse* response);
 void NFSIDMapDelete(VORN::APIRequest* request, VORN::APIResponse* response);
 void NFSSharePrivilegeGet(VORN::APIRequest* request, VORN::APIResponse* response);
 void NFSSharePrivilegeSet(VORN::APIRequest* request, VORN::APIResponse* response);
-}
 
 using Entry = void (*)(VORN::APIRequest*, VORN::APIResponse*);
 

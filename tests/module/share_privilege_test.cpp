@@ -254,6 +254,75 @@ constexpr char kSquash[] = "string variable 'root_squash' is missing in rule, or
 constexpr char kFlavour[] = "array variable 'security_flavor' is missing.";
 constexpr char kNoFlavour[] = "should specify at least one variable as true in security_flavor.";
 
+// A key of a rule: the log text for every refused value, and values that are refused or accepted. An empty value leaves
+// the key out.
+struct KeyCase {
+  const char* key;
+  const char* text;
+  std::vector<const char*> bad;
+  std::vector<const char*> good;
+};
+
+const KeyCase kRuleKeys[] = {
+    {"client",
+     kClient,
+     {"", "null", "5", "1.5", "true", "[]", "{}", R"-("host(rw)")-", R"-("a)")-", R"("a|b")", R"("a=b")", R"("a b")",
+      R"("a'b")", R"("a\"b")", R"("end(")"},
+     {R"("")", R"("*")", R"("10.0.0.0/24")", R"("host.example")", R"("a\tb")"}},
+    {"privilege",
+     kPrivilege,
+     {"", "null", "5", "1.5", "true", "[]", "{}", R"("RW")", R"("r")", R"("rwx")", R"("")"},
+     {R"("rw")", R"("ro")"}},
+    {"root_squash",
+     kSquash,
+     {"", "null", "5", "1.5", "true", "[]", "{}", R"("Root")", R"("all")", R"("")"},
+     {R"("root")", R"("admin")", R"("guest")", R"("all_admin")"}},
+    {"async",
+     "bool variable 'async' is missing in rule.",
+     {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
+     {"true", "false"}},
+    {"insecure",
+     "bool variable 'insecure' is missing in rule.",
+     {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
+     {"true", "false"}},
+    {"crossmnt",
+     "bool variable 'crossmnt' is missing in rule.",
+     {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
+     {"true", "false"}},
+    {"security_flavor", kFlavour, {"", "null", "1", "1.5", R"("sys")", "true", "[]"}, {R"({"sys": true})"}},
+};
+
+constexpr struct {
+  const char* key;
+  const char* text;
+} kFlavourKeys[] = {
+    {"sys", "variable 'sys' is not bool type in security_flavor."},
+    {"kerberos", "variable 'kerberos' is not bool type in security_flavor."},
+    {"kerberos_integrity", "variable 'kerberos_integrity' is not bool type in security_flavor."},
+    {"kerberos_privacy", "variable 'kerberos_privacy' is not bool type in security_flavor."},
+};
+
+void AddRuleKeyCases(std::vector<CheckCase>* cases) {
+  for (const KeyCase& key : kRuleKeys) {
+    for (const char* bad : key.bad) cases->push_back({SaveWith(key.key, bad), key.text});
+    for (const char* good : key.good) cases->push_back({SaveWith(key.key, good), nullptr});
+  }
+}
+
+void AddFlavourCases(std::vector<CheckCase>* cases) {
+  for (const auto& flavour : kFlavourKeys) {
+    const std::string key = std::string("{\"") + flavour.key + "\": ";
+    for (const char* bad : {"1", "1.5", "\"true\"", "[]", "{}"}) {
+      cases->push_back({SaveWith("security_flavor", key + bad + "}"), flavour.text});
+    }
+    cases->push_back({SaveWith("security_flavor", key + "true}"), nullptr});
+    cases->push_back({SaveWith("security_flavor", key + "false}"), kNoFlavour});
+    cases->push_back({SaveWith("security_flavor", key + "null}"), kNoFlavour});
+  }
+  cases->push_back({SaveWith("security_flavor", "{}"), kNoFlavour});
+  cases->push_back({SaveWith("security_flavor", R"({"sys": null, "kerberos_privacy": true, "foreign": 5})"), nullptr});
+}
+
 std::vector<CheckCase> CheckCases() {
   std::vector<CheckCase> cases = {
       {"null", kNoName},
@@ -273,64 +342,8 @@ std::vector<CheckCase> CheckCases() {
       {Save("[]"), kClient},
       {Save("{}"), kClient},
   };
-  // Keys of one type each: absent, null and every other type.
-  const struct {
-    const char* key;
-    const char* text;
-    std::vector<const char*> bad;
-    std::vector<const char*> good;
-  } keys[] = {
-      {"client",
-       kClient,
-       {"", "null", "5", "1.5", "true", "[]", "{}", R"-("host(rw)")-", R"-("a)")-", R"("a|b")", R"("a=b")", R"("a b")",
-        R"("a'b")", R"("a\"b")", R"("end(")"},
-       {R"("")", R"("*")", R"("10.0.0.0/24")", R"("host.example")", R"("a\tb")"}},
-      {"privilege",
-       kPrivilege,
-       {"", "null", "5", "1.5", "true", "[]", "{}", R"("RW")", R"("r")", R"("rwx")", R"("")"},
-       {R"("rw")", R"("ro")"}},
-      {"root_squash",
-       kSquash,
-       {"", "null", "5", "1.5", "true", "[]", "{}", R"("Root")", R"("all")", R"("")"},
-       {R"("root")", R"("admin")", R"("guest")", R"("all_admin")"}},
-      {"async",
-       "bool variable 'async' is missing in rule.",
-       {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
-       {"true", "false"}},
-      {"insecure",
-       "bool variable 'insecure' is missing in rule.",
-       {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
-       {"true", "false"}},
-      {"crossmnt",
-       "bool variable 'crossmnt' is missing in rule.",
-       {"", "null", "1", "1.5", R"("true")", "[]", "{}"},
-       {"true", "false"}},
-      {"security_flavor", kFlavour, {"", "null", "1", "1.5", R"("sys")", "true", "[]"}, {R"({"sys": true})"}},
-  };
-  for (const auto& key : keys) {
-    for (const char* bad : key.bad) cases.push_back({SaveWith(key.key, bad), key.text});
-    for (const char* good : key.good) cases.push_back({SaveWith(key.key, good), nullptr});
-  }
-  const struct {
-    const char* key;
-    const char* text;
-  } flavours[] = {
-      {"sys", "variable 'sys' is not bool type in security_flavor."},
-      {"kerberos", "variable 'kerberos' is not bool type in security_flavor."},
-      {"kerberos_integrity", "variable 'kerberos_integrity' is not bool type in security_flavor."},
-      {"kerberos_privacy", "variable 'kerberos_privacy' is not bool type in security_flavor."},
-  };
-  for (const auto& flavour : flavours) {
-    const std::string key = std::string("{\"") + flavour.key + "\": ";
-    for (const char* bad : {"1", "1.5", "\"true\"", "[]", "{}"}) {
-      cases.push_back({SaveWith("security_flavor", key + bad + "}"), flavour.text});
-    }
-    cases.push_back({SaveWith("security_flavor", key + "true}"), nullptr});
-    cases.push_back({SaveWith("security_flavor", key + "false}"), kNoFlavour});
-    cases.push_back({SaveWith("security_flavor", key + "null}"), kNoFlavour});
-  }
-  cases.push_back({SaveWith("security_flavor", "{}"), kNoFlavour});
-  cases.push_back({SaveWith("security_flavor", R"({"sys": null, "kerberos_privacy": true, "foreign": 5})"), nullptr});
+  AddRuleKeyCases(&cases);
+  AddFlavourCases(&cases);
   return cases;
 }
 

@@ -31,61 +31,64 @@ TEST(JsonInput, AllowsItsDepthAndNoMore) {
   EXPECT_FALSE(ParseJsonObject(nested(300000), &error));
 }
 
+struct RefusedInput {
+  const char* name;
+  std::string text;
+  const char* error;  // the beginning of the error message
+};
+
+const RefusedInput kRefusedInputs[] = {
+    {"nothing", "", "Line 1, Column 1: "},
+    {"only blanks", "  \n ", "Line 2, Column 2: "},
+    {"an array", "[]", "Line 1, Column 1: one JSON object is expected"},
+    {"a text", "\"a\"", "Line 1, Column 1"},
+    {"unclosed", "{\"a\":1", "Line 1, Column "},
+    {"unclosed text", "{\"a", "Line 1, Column "},
+    {"trailing bytes", "{} 1", "Line 1, Column 4: "},
+    {"a second value", "{}{}", "Line 1, Column 3: "},
+    {"trailing NUL", "{}\0"s, "Line 1, Column 3: unexpected character"},
+    {"duplicate key", "{\"a\":1,\n \"a\":2}", "Line 2, Column 2: Duplicate key: 'a'"},
+    {"duplicate key, one escaped", R"({"a":1,"\u0061":2})", "Line 1, Column 8: Duplicate key: 'a'"},
+    {"duplicate key inside", R"({"x":{"a":1,"a":2}})", "Line 1, Column 13: Duplicate key: 'a'"},
+    {"escaped NUL", R"({"a":"x\u0000y"})", "Line 1, Column 8: U+0000 in a text"},
+    {"escaped NUL in a key", R"({"\u0000":1})", "Line 1, Column 3: U+0000 in a text"},
+    {"raw NUL", "{\"a\":\"\0\"}"s, "Line 1, Column 7: control character in a text"},
+    {"raw line break", "{\"a\":\"\n\"}", "Line 1, Column 7: control character in a text"},
+    {"invalid UTF-8", "{\"a\":\"\xff\"}", "Line 1, Column 7: not UTF-8"},
+    {"overlong UTF-8", "{\"a\":\"\xc0\x80\"}", "Line 1, Column 7: not UTF-8"},
+    {"surrogate in UTF-8", "{\"a\":\"\xed\xa0\x80\"}", "Line 1, Column 7: not UTF-8"},
+    {"cut UTF-8", "{}\xe2\x82", "Line 1, Column 3: not UTF-8"},
+    {"byte order mark", "\xef\xbb\xbf{}", "Line 1, Column 1: "},
+    {"high surrogate alone", R"({"a":"\ud800"})", "Line 1, Column 7: half a surrogate pair in a text"},
+    {"high surrogate twice", R"({"a":"\ud800\ud800"})", "Line 1, Column 7: half a surrogate pair in a text"},
+    {"low surrogate alone", R"({"a":"\udc00"})", "Line 1, Column 7: half a surrogate pair in a text"},
+    {"short escape", R"({"a":"\u12"})", "Line 1, Column 7: \\u takes four hexadecimal digits"},
+    {"short escape at the end", R"({"a":"\u12)", "Line 1, Column 7: \\u takes four hexadecimal digits"},
+    {"unknown escape", R"({"a":"\x41"})", "Line 1, Column 7: unknown escape in a text"},
+    {"escape at the end", R"({"a":"\)", "Line 1, Column 7: unknown escape in a text"},
+    {"leading zero", R"({"a":01})", "Line 1, Column 6: a number begins with 0"},
+    {"minus alone", R"({"a":-})", "Line 1, Column 6: not a number"},
+    {"plus", R"({"a":+1})", "Line 1, Column 6: unexpected character"},
+    {"no digit after the point", R"({"a":1.})", "Line 1, Column 6: not a number"},
+    {"no digit before the point", R"({"a":.5})", "Line 1, Column "},
+    {"no exponent", R"({"a":1e})", "Line 1, Column 6: not a number"},
+    {"hexadecimal", R"({"a":0x10})", "Line 1, Column "},
+    {"beyond any number", R"({"a":1e999})", "Line 1, Column 6: "},
+    {"infinity", R"({"a":Infinity})", "Line 1, Column "},
+    {"not a number", R"({"a":NaN})", "Line 1, Column "},
+    {"comment", R"({"a":1} // x)", "Line 1, Column "},
+    {"trailing comma", R"({"a":1,})", "Line 1, Column "},
+    {"dropped value", R"({"a":})", "Line 1, Column "},
+    {"single quotes", R"({'a':1})", "Line 1, Column "},
+    {"number for a key", R"({1:1})", "Line 1, Column "},
+    {"wrong bracket", R"({"a":[1}})", "Line 1, Column "},
+    {"word", R"({"a":tru})", "Line 1, Column 6: neither true, false nor null"},
+    {"words in one", R"({"a":truefalse})", "Line 1, Column "},
+    {"vertical tab", "{\v}", "Line 1, Column "},
+};
+
 TEST(JsonInput, RefusesWhatIsNotStrictJson) {
-  const struct {
-    const char* name;
-    std::string text;
-    const char* error;  // how it begins
-  } cases[] = {
-      {"nothing", "", "Line 1, Column 1: "},
-      {"only blanks", "  \n ", "Line 2, Column 2: "},
-      {"an array", "[]", "Line 1, Column 1: one JSON object is expected"},
-      {"a text", "\"a\"", "Line 1, Column 1"},
-      {"unclosed", "{\"a\":1", "Line 1, Column "},
-      {"unclosed text", "{\"a", "Line 1, Column "},
-      {"trailing bytes", "{} 1", "Line 1, Column 4: "},
-      {"a second value", "{}{}", "Line 1, Column 3: "},
-      {"trailing NUL", "{}\0"s, "Line 1, Column 3: unexpected character"},
-      {"duplicate key", "{\"a\":1,\n \"a\":2}", "Line 2, Column 2: Duplicate key: 'a'"},
-      {"duplicate key, one escaped", R"({"a":1,"\u0061":2})", "Line 1, Column 8: Duplicate key: 'a'"},
-      {"duplicate key inside", R"({"x":{"a":1,"a":2}})", "Line 1, Column 13: Duplicate key: 'a'"},
-      {"escaped NUL", R"({"a":"x\u0000y"})", "Line 1, Column 8: U+0000 in a text"},
-      {"escaped NUL in a key", R"({"\u0000":1})", "Line 1, Column 3: U+0000 in a text"},
-      {"raw NUL", "{\"a\":\"\0\"}"s, "Line 1, Column 7: control character in a text"},
-      {"raw line break", "{\"a\":\"\n\"}", "Line 1, Column 7: control character in a text"},
-      {"invalid UTF-8", "{\"a\":\"\xff\"}", "Line 1, Column 7: not UTF-8"},
-      {"overlong UTF-8", "{\"a\":\"\xc0\x80\"}", "Line 1, Column 7: not UTF-8"},
-      {"surrogate in UTF-8", "{\"a\":\"\xed\xa0\x80\"}", "Line 1, Column 7: not UTF-8"},
-      {"cut UTF-8", "{}\xe2\x82", "Line 1, Column 3: not UTF-8"},
-      {"byte order mark", "\xef\xbb\xbf{}", "Line 1, Column 1: "},
-      {"high surrogate alone", R"({"a":"\ud800"})", "Line 1, Column 7: half a surrogate pair in a text"},
-      {"high surrogate twice", R"({"a":"\ud800\ud800"})", "Line 1, Column 7: half a surrogate pair in a text"},
-      {"low surrogate alone", R"({"a":"\udc00"})", "Line 1, Column 7: half a surrogate pair in a text"},
-      {"short escape", R"({"a":"\u12"})", "Line 1, Column 7: \\u takes four hexadecimal digits"},
-      {"short escape at the end", R"({"a":"\u12)", "Line 1, Column 7: \\u takes four hexadecimal digits"},
-      {"unknown escape", R"({"a":"\x41"})", "Line 1, Column 7: unknown escape in a text"},
-      {"escape at the end", R"({"a":"\)", "Line 1, Column 7: unknown escape in a text"},
-      {"leading zero", R"({"a":01})", "Line 1, Column 6: a number begins with 0"},
-      {"minus alone", R"({"a":-})", "Line 1, Column 6: not a number"},
-      {"plus", R"({"a":+1})", "Line 1, Column 6: unexpected character"},
-      {"no digit after the point", R"({"a":1.})", "Line 1, Column 6: not a number"},
-      {"no digit before the point", R"({"a":.5})", "Line 1, Column "},
-      {"no exponent", R"({"a":1e})", "Line 1, Column 6: not a number"},
-      {"hexadecimal", R"({"a":0x10})", "Line 1, Column "},
-      {"beyond any number", R"({"a":1e999})", "Line 1, Column 6: "},
-      {"infinity", R"({"a":Infinity})", "Line 1, Column "},
-      {"not a number", R"({"a":NaN})", "Line 1, Column "},
-      {"comment", R"({"a":1} // x)", "Line 1, Column "},
-      {"trailing comma", R"({"a":1,})", "Line 1, Column "},
-      {"dropped value", R"({"a":})", "Line 1, Column "},
-      {"single quotes", R"({'a':1})", "Line 1, Column "},
-      {"number for a key", R"({1:1})", "Line 1, Column "},
-      {"wrong bracket", R"({"a":[1}})", "Line 1, Column "},
-      {"word", R"({"a":tru})", "Line 1, Column 6: neither true, false nor null"},
-      {"words in one", R"({"a":truefalse})", "Line 1, Column "},
-      {"vertical tab", "{\v}", "Line 1, Column "},
-  };
-  for (const auto& c : cases) {
+  for (const RefusedInput& c : kRefusedInputs) {
     std::string error;
     EXPECT_FALSE(ParseJsonObject(c.text, &error)) << c.name;
     EXPECT_EQ(error.rfind(c.error, 0), 0U) << c.name << ": " << error;

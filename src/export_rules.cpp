@@ -26,6 +26,7 @@ constexpr Flavour kFlavours[] = {{"sys", &ExportRule::sys},
                                  {"kerberos_integrity", &ExportRule::krb5i},
                                  {"kerberos_privacy", &ExportRule::krb5p}};
 
+// Sets `key` to the word of `code`. A code without a word leaves the key out.
 template <size_t kCount>
 void AddWord(const Word (&words)[kCount], int32_t code, Json::Value& member_holder, const char* key) {
   for (const Word& word : words) {
@@ -33,7 +34,7 @@ void AddWord(const Word (&words)[kCount], int32_t code, Json::Value& member_hold
   }
 }
 
-// The code of the word `text`; `fallback` for any other text.
+// Returns the code of the word `text`, or `fallback` if no word equals it (docs/decisions/0023).
 template <size_t kCount>
 int32_t CodeOf(const Word (&words)[kCount], const std::string& text, int32_t fallback) {
   for (const Word& word : words) {
@@ -72,6 +73,7 @@ Json::Value RuleToJson(const ExportRule& record, bool with_kerberos) {
 
 void RuleFromJson(const Json::Value& rule, bool with_kerberos, ExportRule* record) {
   record->next = nullptr;
+  // A longer client is cut: docs/decisions/0034.
   snprintf(record->client, sizeof record->client, "%s", rule["client"].asCString());
   record->privilege = CodeOf(kPrivileges, rule["privilege"].asString(), 0);
   record->squash = CodeOf(kSquashModes, rule["root_squash"].asString(), VORNNFS_SQUASH_GUEST);

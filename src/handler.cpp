@@ -8,10 +8,10 @@ namespace {
 
 constexpr char kSource[] = "handler";
 
-// One line of JSON and a line feed.
+// Returns the value as one line of JSON with a line feed at its end.
 std::string Serialise(const Json::Value& value) {
 #pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"  // the log's form of a request is this writer's
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"  // the log format of requests is that of this writer
   return Json::FastWriter().write(value);
 #pragma GCC diagnostic pop
 }
@@ -51,7 +51,7 @@ void ServiceHandler::AnswerWith(const CallSite& site, const Gather& gather) {
   Json::Value result;
   if (gather(result)) return ReportSuccess(result);
   ReportError();
-  LogRequest(site, Parameters());
+  LogRequest(site, Parameters());  // read again: docs/decisions/0032
 }
 
 void ServiceHandler::AnswerTo(const CallSite& site, const Apply& apply) {

@@ -18,7 +18,7 @@ constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 constexpr char kKerberosFile[] = "/etc/nfs/krb5.conf";
 constexpr int kCapacity = 1024;
 
-// A member of an object; null for anything else.
+// Returns the member `key` of an object, or null if the value is not an object or has no such member.
 const Json::Value& Member(const Json::Value& value, const char* key) {
   return value.isObject() ? value[key] : Json::Value::nullSingleton();
 }
@@ -48,7 +48,7 @@ Json::Value ItemOf(const char* principal, const char* local_name) {
   return item;
 }
 
-// Null, and logged, when there is no such item.
+// Returns the item at `index`. Logs a failure and returns nullptr.
 const char* ItemAt(const KLIBSZLIST* list, int index) {
   const char* const item = KLIBCSzListGet(list, index);
   if (item == nullptr) LOG_ERROR("Failed to KLIBCSzListGet, vornerr=[0x%04X]", KLIBCErrGet());
@@ -68,7 +68,7 @@ bool ReadMappings(const Json::Value& filter, StringHash* mappings, StringList* k
   return true;
 }
 
-// The mappings of a page; one that cannot be read is left out.
+// Returns the mappings of a page. A mapping that cannot be read is logged and left out (docs/decisions/0026).
 Json::Value MappingItems(const KLIBSZHASH* mappings, const KLIBSZLIST* keys, const Page& page) {
   Json::Value items(Json::arrayValue);
   for (int i = page.begin; i < page.end; ++i) {
@@ -84,6 +84,7 @@ Json::Value MappingItems(const KLIBSZHASH* mappings, const KLIBSZLIST* keys, con
   return items;
 }
 
+// Returns one suggestion per user of the page, whether the user is mapped or not (docs/decisions/0027).
 Json::Value SuggestedItems(const KLIBSZLIST* users, const char* realm, const Page& page) {
   Json::Value items(Json::arrayValue);
   for (int i = page.begin; i < page.end; ++i) {
@@ -96,7 +97,7 @@ Json::Value SuggestedItems(const KLIBSZLIST* users, const char* realm, const Pag
   return items;
 }
 
-// Without an error code, unlike its neighbours: callers rely on the code of an unnamed failure.
+// Lists the users whose name contains the filter. Its caller records no error code: docs/decisions/0025.
 bool EnumerateSuggested(const std::string& filter, StringList* users) {
   if (filter.empty()) {
     if (VORNUserEnum(users->slot(), VORNUSER_LOCAL) >= 0) return true;
@@ -110,7 +111,7 @@ bool EnumerateSuggested(const std::string& filter, StringList* users) {
 
 // ------------------------------------------------------------------------------------ changing
 
-// Fills `users` with the local users. False, and logged, if that fails or the list itself is missing.
+// Appends the local users to the list. Logs a failure, also that of an allocation that left the list empty.
 bool EnumerateUsers(StringList* users) {
   if (!*users) {
     LOG_ERROR("Failed to KLIBCSzListAlloc.");
@@ -133,7 +134,7 @@ bool CheckPrincipalSymbols(const std::string& principal) {
   return false;
 }
 
-// The code of what is wrong with a mapping that is to be created, which is logged; 0 if nothing is.
+// Returns kNoError if the mapping may be created. Otherwise logs the reason and returns its error code.
 int CheckMapping(const Json::Value& mapping, const KLIBSZLIST* users) {
   const Json::Value& principal = Member(mapping, "kerberos_principal");
   if (!IsText(principal)) {
@@ -149,13 +150,14 @@ int CheckMapping(const Json::Value& mapping, const KLIBSZLIST* users) {
   return CheckLocalUser(users, local_name.asString()) ? kNoError : kNoLocalUser;
 }
 
+// Returns the stored ID map. Logs a failure and returns nullptr.
 IDMap GetIDMap() {
   IDMap record(VORNNFSIDMapGet());
   if (record == nullptr) LOG_ERROR("Failed to VORNNFSIDMapGet, vornerr=[0x%04X]", KLIBCErrGet());
   return record;
 }
 
-// Likewise, and one without a table counts as none.
+// Returns the stored ID map with its table. Logs a failure or a missing table and returns nullptr.
 IDMap GetIDMapWithTable() {
   IDMap record(VORNNFSIDMapGet());
   if (record != nullptr && record->table != nullptr) return record;
@@ -163,7 +165,8 @@ IDMap GetIDMapWithTable() {
   return nullptr;
 }
 
-// The new mappings as a hash, and their principals; one that cannot be stored is in neither.
+// Puts the new mappings into `pairs` and returns their principals. A mapping that cannot be stored is logged
+// and left out of both (docs/decisions/0028).
 Json::Value CollectPairs(const Json::Value& idmap, StringHash* pairs) {
   Json::Value ids(Json::arrayValue);
   for (const Json::Value& mapping : idmap) {
@@ -177,7 +180,7 @@ Json::Value CollectPairs(const Json::Value& idmap, StringHash* pairs) {
   return ids;
 }
 
-// Takes the mapping `id` out of the table; false when there is none.
+// Removes the mapping `id` from the table. Logs and returns false if there is none.
 bool RemoveOldMapping(KLIBSZHASH* table, const char* id) {
   if (KLIBCSzHashRemoveKey(table, id) != 0) return true;
   LOG_ERROR("remove old principal id failed.");
@@ -190,7 +193,7 @@ bool CheckNewPrincipal(const KLIBSZHASH* table, const char* principal) {
   return false;
 }
 
-// The texts of `id`, a text or an array; false when an element is none.
+// Collects the strings of `id`, a string or an array. Logs and returns false if an element is not a string.
 bool CollectIDs(const Json::Value& id, std::vector<std::string>* texts) {
   if (id.isString()) {
     texts->push_back(id.asString());
@@ -206,7 +209,7 @@ bool CollectIDs(const Json::Value& id, std::vector<std::string>* texts) {
   return true;
 }
 
-// An id that cannot be listed is left out: its mapping stays.
+// Appends the ids to the list. An id that cannot be appended is logged and left out: its mapping stays.
 void PushIDs(const std::vector<std::string>& ids, StringList* principals) {
   for (const std::string& id : ids) {
     if (KLIBCSzListPush(principals->slot(), id.c_str()) >= 0) continue;
@@ -303,7 +306,7 @@ bool NFSIDMapServiceHandler::AddRootToList(KLIBSZLIST** list, const std::string&
     LOG_ERROR("KLIBCUnicodeUTF8StrUpper failed, str=[%s]", filter.c_str());
     return false;
   }
-  // The empty text is in every text.
+  // The empty string is contained in every string.
   if (strstr("ROOT", upper) != nullptr) static_cast<void>(KLIBCSzListInsert(list, 0, "root"));
   return true;
 }
@@ -372,7 +375,7 @@ bool NFSIDMapServiceHandler::SetIDMap(const Json::Value& params, Json::Value& /*
   }
   if (!CheckPrincipalSymbols(principal.asString())) return Fail(kPrincipalSymbol);
   const IDMap record = GetIDMapWithTable();
-  // The old mapping goes first, so that it may keep its principal.
+  // The old mapping is removed first, so that a request may keep the principal: docs/decisions/0029.
   if (!record || !RemoveOldMapping(record->table, id.asCString())) return Fail(kPlatformFailure);
   if (!CheckNewPrincipal(record->table, principal.asCString())) return Fail(kPrincipalMapped);
   StringList users(KLIBCSzListAlloc(kCapacity));

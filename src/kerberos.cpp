@@ -24,7 +24,8 @@ Json::Value EntryToJson(const KeytabEntry& entry) {
   return object;
 }
 
-// What kerberos importing answers: no error, or the code of the failure that was logged.
+// Imports the keytab and reloads the service. Returns kNoError, or the error code of the failure that was
+// logged. Only the two results below are failures: docs/decisions/0031.
 int ImportKeytab(const std::string& path) {
   const int imported = VORNNFSKeytabImport(path.c_str());
   if (imported == VORNNFS_KEYTAB_NO_KEYTAB) {
@@ -93,6 +94,7 @@ bool NFSKerberosServiceHandler::UploadKeyInternal(const Json::Value& params) {
   }
   const std::string path = upload.asString();
   const int error = ImportKeytab(path);
+  // Every attempt consumes the upload: docs/decisions/0031.
   if (KLIBCFileExist(path.c_str()) != 0) static_cast<void>(unlink(path.c_str()));
   return error == kNoError || Fail(error);
 }

@@ -1,8 +1,9 @@
 #include "nfs.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
-#include <initializer_list>
+#include <iterator>
 #include <string>
 
 #include "core.h"
@@ -17,10 +18,8 @@ namespace {
 constexpr char kSource[] = "nfs";
 constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 
-struct OptionalKey {
-  const char* name;
-  bool (Json::Value::*is_accepted)() const;
-};
+constexpr Setting kEnableNFSv4 = {"enable_nfs_v4", Setting::Kind::kSwitch, &NFSConfRecord::enable_nfs_v4,
+                                  &SettingsChange::service_affected};
 
 bool CheckServiceSwitch(const Json::Value& params) {
   if (params["enable_nfs"].isBool()) return true;
@@ -28,22 +27,33 @@ bool CheckServiceSwitch(const Json::Value& params) {
   return false;
 }
 
-bool CheckOptionalKeys(const Json::Value& params, std::initializer_list<OptionalKey> keys) {
-  for (const OptionalKey& key : keys) {
-    const Json::Value& value = params[key.name];
-    if (value.isNull() || (value.*key.is_accepted)()) continue;
-    LOG_ERROR("Invalid type of input.");
-    return false;
-  }
-  return true;
+bool IsAcceptedOrAbsent(const Setting& setting, const Json::Value& params) {
+  const Json::Value& given = params[setting.key];
+  return given.isNull() || setting.Accepts(given);
+}
+
+bool HasNFSv4Types(const Json::Value& params) {
+  const Json::Value& domain = params["nfs_v4_domain"];
+  return IsAcceptedOrAbsent(kEnableNFSv4, params) && (domain.isNull() || domain.isString());
+}
+
+bool HasLiveTypes(const Json::Value& params) {
+  return std::all_of(std::begin(kLiveSettings), std::end(kLiveSettings),
+                     [&](const Setting& setting) { return IsAcceptedOrAbsent(setting, params); });
+}
+
+bool CheckTypes(bool accepted) {
+  if (!accepted) LOG_ERROR("Invalid type of input.");
+  return accepted;
 }
 
 void AddServiceAndNFSv4(const NFSConfRecord& record, const IDMap& id_map, Json::Value& result) {
   result["enable_nfs"] = IsServiceEnabled();
-  result["enable_nfs_v4"] = record.enable_nfs_v4 != 0;
+  result[kEnableNFSv4.key] = kEnableNFSv4.Show(record);
   result["nfs_v4_domain"] = id_map->domain == nullptr ? "" : id_map->domain;
 }
 
+// The ID map is read even if NFSv4 is disabled: docs/decisions/0017.
 bool ReadSettings(NFSConfRecord* record, IDMap* id_map) {
   if (!ReadRecord(HERE, record)) return false;
   id_map->reset(VORNNFSIDMapGet());
@@ -55,10 +65,7 @@ bool ReadSettings(NFSConfRecord* record, IDMap* id_map) {
 void PlanServiceAndNFSv4(const Json::Value& params, SettingsChange* change) {
   change->enabled = IsServiceEnabled();
   change->wanted = params["enable_nfs"].asBool();
-  const Json::Value& enable_nfs_v4 = params["enable_nfs_v4"];
-  if (!SwitchDiffers(enable_nfs_v4, change->stored.enable_nfs_v4)) return;
-  change->working.enable_nfs_v4 = enable_nfs_v4.asBool() ? 1 : 0;
-  change->service_affected = true;
+  kEnableNFSv4.Plan(params, change);
 }
 
 bool ReplaceDomain(const std::string& domain, _tag_nfs_id_map_* id_map) {
@@ -74,8 +81,8 @@ bool ReplaceDomain(const std::string& domain, _tag_nfs_id_map_* id_map) {
   return false;
 }
 
-// Writes a given domain that is new, if NFSv4 is to be on. The ID map stays the caller's, so that
-// nobody else changes it before the request is done.
+// Writes the given domain if NFSv4 will be enabled and the domain differs from the stored one. The caller keeps the
+// ID-map record until the end of the request: it holds the configuration lock.
 bool SaveDomain(const Json::Value& params, SettingsChange* change, IDMap* id_map) {
   const Json::Value& domain = params["nfs_v4_domain"];
   if (change->working.enable_nfs_v4 == 0 || domain.isNull()) return true;
@@ -103,6 +110,7 @@ void NFSServiceHandler::Set() {
   AnswerTo(HERE, [this](const Json::Value& params) { return CheckData(params) && SetData(params); });
 }
 
+// Version 2 runs the data functions of version 1: docs/decisions/0015.
 void NFSServiceHandler::GetV2() {
   AnswerWith(HERE, [this](Json::Value& result) { return GetData(result); });
 }
@@ -117,21 +125,12 @@ bool NFSServiceHandler::GetData(Json::Value& result) {
   IDMap id_map;
   if (!ReadSettings(&record, &id_map)) return Fail(kPlatformFailure);
   AddServiceAndNFSv4(record, id_map, result);
-  result["read_size"] = record.read_size;
-  result["write_size"] = record.write_size;
-  result["unix_pri_enable"] = record.unix_pri_enable != 0;
+  for (const Setting& setting : kLiveSettings) result[setting.key] = setting.Show(record);
   return true;
 }
 
 bool NFSServiceHandler::CheckData(const Json::Value& params) {
-  const bool accepted =
-      CheckServiceSwitch(params) && CheckOptionalKeys(params, {
-                                                                  {"enable_nfs_v4", &Json::Value::isBool},
-                                                                  {"nfs_v4_domain", &Json::Value::isString},
-                                                                  {"read_size", &Json::Value::isInt},
-                                                                  {"write_size", &Json::Value::isInt},
-                                                                  {"unix_pri_enable", &Json::Value::isBool},
-                                                              });
+  const bool accepted = CheckServiceSwitch(params) && CheckTypes(HasNFSv4Types(params) && HasLiveTypes(params));
   return accepted || Fail(kBadParameter);
 }
 
@@ -143,8 +142,7 @@ bool NFSServiceHandler::SetData(const Json::Value& params) {
   PlanServiceAndNFSv4(params, &change);
   IDMap id_map;
   if (!SaveDomain(params, &change, &id_map)) return Fail(kPlatformFailure);
-  PlanTransferSizes(params, &change);
-  PlanUNIXPermissions(params, &change);
+  for (const Setting& setting : kLiveSettings) setting.Plan(params, &change);
   const bool done = StoreRecord(HERE, change.working) && ApplyLive(HERE, change) && DriveService(HERE, change);
   return done || Fail(kPlatformFailure);
 }
@@ -159,11 +157,7 @@ bool NFSServiceHandler::GetDataV2(Json::Value& result) {
 }
 
 bool NFSServiceHandler::CheckDataV2(const Json::Value& params) {
-  const bool accepted =
-      CheckServiceSwitch(params) && CheckOptionalKeys(params, {
-                                                                  {"enable_nfs_v4", &Json::Value::isBool},
-                                                                  {"nfs_v4_domain", &Json::Value::isString},
-                                                              });
+  const bool accepted = CheckServiceSwitch(params) && CheckTypes(HasNFSv4Types(params));
   return accepted || Fail(kBadParameter);
 }
 

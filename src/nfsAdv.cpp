@@ -11,54 +11,73 @@ namespace {
 
 constexpr char kSource[] = "nfsAdv";
 
-// For the log: what cannot be converted reads as 0.
+constexpr Setting kCustomPorts = {"custom_port_enable", Setting::Kind::kSwitchShownAsInteger,
+                                  &NFSConfRecord::custom_port_enable, &SettingsChange::service_affected};
+
+// The fixed port of a daemon. A changed port must not belong to another service.
+struct Port {
+  Setting setting;
+  const char* service;   // the name of the daemon in the port test
+  const char* conflict;  // the log text of a conflict
+};
+
+constexpr Port kPorts[] = {
+    {{"statd_port", Setting::Kind::kInteger, &NFSConfRecord::statd_port, &SettingsChange::service_affected},
+     "nfs_statd",
+     "nfs statd port is conflict"},
+    {{"nlm_port", Setting::Kind::kInteger, &NFSConfRecord::nlm_port, &SettingsChange::service_affected},
+     "nfs_nlm",
+     "nfs nlm is conflict"},
+};
+
+// Converts a refused value for the log. A value that cannot be converted is logged as 0.
 int AsIntOrZero(const Json::Value& value) { return value.isConvertibleTo(Json::intValue) ? value.asInt() : 0; }
 
-bool CheckInteger(const Json::Value& params, const char* key) {
-  const Json::Value& value = params[key];
-  if (value.isInt()) return true;
-  LOG_ERROR("Invalid type of input of %s:%d", key, AsIntOrZero(value));
+bool CheckSetting(const Setting& setting, const Json::Value& params) {
+  const Json::Value& given = params[setting.key];
+  if (setting.Accepts(given)) return true;
+  if (setting.IsSwitch()) {
+    LOG_ERROR("Invalid type of input of %s", setting.key);
+  } else {
+    LOG_ERROR("Invalid type of input of %s:%d", setting.key, AsIntOrZero(given));
+  }
   return false;
 }
 
-bool CheckBoolean(const Json::Value& params, const char* key) {
-  if (params[key].isBool()) return true;
-  LOG_ERROR("Invalid type of input of %s", key);
-  return false;
+bool CheckSettings(const Json::Value& params) {
+  for (const Setting& setting : kLiveSettings) {
+    if (!CheckSetting(setting, params)) return false;
+  }
+  return CheckSetting(kCustomPorts, params);
 }
 
+// The ports are required only while they are used: docs/decisions/0019.
 bool CheckPorts(const Json::Value& params) {
-  if (!params["custom_port_enable"].asBool()) return true;
-  return CheckInteger(params, "statd_port") && CheckInteger(params, "nlm_port");
+  if (!params[kCustomPorts.key].asBool()) return true;
+  for (const Port& port : kPorts) {
+    if (!CheckSetting(port.setting, params)) return false;
+  }
+  return true;
 }
 
-// Whether a port is given that is not the stored one and that belongs to somebody else.
-bool PlanPort(const Json::Value& port, const char* service, int32_t NFSConfRecord::*field, SettingsChange* change) {
-  if (port.isNull() || port.asInt() == change->stored.*field) return true;
-  if (WebUtils::IsPortConflict(service, port.asInt(), port.asInt()) != 0) return false;
-  change->working.*field = port.asInt();
-  change->service_affected = true;
-  return true;
+// Returns whether the port is neither given nor changed, or free for the daemon.
+bool IsFree(const Port& port, const Json::Value& params, const NFSConfRecord& stored) {
+  const Json::Value& given = params[port.setting.key];
+  if (given.isNull() || given.asInt() == stored.*port.setting.field) return true;
+  if (WebUtils::IsPortConflict(port.service, given.asInt(), given.asInt()) == 0) return true;
+  LOG_ERROR("%s", port.conflict);
+  return false;
 }
 
 bool PlanPorts(const Json::Value& params, SettingsChange* change) {
-  const Json::Value& enable = params["custom_port_enable"];
-  if (SwitchDiffers(enable, change->stored.custom_port_enable)) {
-    change->working.custom_port_enable = enable.asBool() ? 1 : 0;
-    change->service_affected = true;
-  }
-  if (!PlanPort(params["statd_port"], "nfs_statd", &NFSConfRecord::statd_port, change)) {
-    LOG_ERROR("nfs statd port is conflict");
-    return false;
-  }
-  if (!PlanPort(params["nlm_port"], "nfs_nlm", &NFSConfRecord::nlm_port, change)) {
-    LOG_ERROR("nfs nlm is conflict");
-    return false;
+  for (const Port& port : kPorts) {
+    if (!IsFree(port, params, change->stored)) return false;
+    port.setting.Plan(params, change);
   }
   return true;
 }
 
-// Settings are in force by now: a firewall that does not follow is a matter for the log.
+// A failure is logged only (docs/decisions/0024): the settings are stored and in force by now.
 void ReloadFirewall() {
   if (VORNFwRuleHup() < 0) LOG_ERROR("Failed to reload firewall rules");
 }
@@ -77,20 +96,14 @@ bool NFSServiceAdvHandler::GetData(Json::Value& result) {
   const VornConf configuration;
   NFSConfRecord record{};
   if (!ReadRecord(HERE, &record)) return Fail(kPlatformFailure);
-  result["read_size"] = record.read_size;
-  result["write_size"] = record.write_size;
-  result["unix_pri_enable"] = record.unix_pri_enable != 0;
-  result["statd_port"] = record.statd_port;
-  result["nlm_port"] = record.nlm_port;
-  result["custom_port_enable"] = record.custom_port_enable;  // an integer here, though set takes a boolean
+  for (const Setting& setting : kLiveSettings) result[setting.key] = setting.Show(record);
+  result[kCustomPorts.key] = kCustomPorts.Show(record);
+  for (const Port& port : kPorts) result[port.setting.key] = port.setting.Show(record);
   return true;
 }
 
 bool NFSServiceAdvHandler::CheckData(const Json::Value& params) {
-  const bool accepted = CheckInteger(params, "read_size") && CheckInteger(params, "write_size") &&
-                        CheckBoolean(params, "unix_pri_enable") && CheckBoolean(params, "custom_port_enable") &&
-                        CheckPorts(params);
-  return accepted || Fail(kBadParameter);
+  return (CheckSettings(params) && CheckPorts(params)) || Fail(kBadParameter);
 }
 
 bool NFSServiceAdvHandler::SetData(const Json::Value& params) {
@@ -98,11 +111,11 @@ bool NFSServiceAdvHandler::SetData(const Json::Value& params) {
   SettingsChange change;
   if (!ReadRecord(HERE, &change.stored) || !ReadRecord(HERE, &change.working)) return Fail(kPlatformFailure);
   change.enabled = IsServiceEnabled();
-  change.wanted = params["enable_nfs"].asBool();
-  PlanTransferSizes(params, &change);
-  PlanUNIXPermissions(params, &change);
+  change.wanted = params["enable_nfs"].asBool();  // optional here: docs/decisions/0018
+  for (const Setting& setting : kLiveSettings) setting.Plan(params, &change);
+  kCustomPorts.Plan(params, &change);
   if (!PlanPorts(params, &change)) return Fail(kPortConflict);
-  // Live first, stored second: a setting that the service refuses is not stored.
+  // The order is the reverse of the service API: docs/decisions/0014.
   const bool done = ApplyLive(HERE, change) && StoreRecord(HERE, change.working) && DriveService(HERE, change);
   if (!done) return Fail(kPlatformFailure);
   if (change.service_affected) ReloadFirewall();

@@ -1,4 +1,4 @@
-// Owners of what the platform hands out: released by the platform's own operation, on every path.
+// Owners of the platform's objects. Each releases its object with the platform's operation for it.
 #ifndef VORN_SRC_OWNED_H
 #define VORN_SRC_OWNED_H
 
@@ -17,7 +17,8 @@ using IDMap = std::unique_ptr<_tag_nfs_id_map_, Release<_tag_nfs_id_map_, VORNNF
 using Keytab = std::unique_ptr<KeytabEntry, Release<KeytabEntry, VORNNFSKeytabInfoFree>>;
 using Share = std::unique_ptr<VORNSHARE, Release<VORNSHARE, VORNShareFree>>;
 
-// An object that the platform may move: handed over by slot, and its address never remembered.
+// Owns an object that platform operations may move. Never store its address: use get() again after each
+// operation that was given slot(). Not thread-safe.
 template <typename T, void (*kFree)(T*)>
 class Movable {
  public:
@@ -29,7 +30,7 @@ class Movable {
   Movable& operator=(const Movable&) = delete;
 
   explicit operator bool() const { return object_ != nullptr; }
-  T* get() const { return object_; }  // good until the next slot()
+  T* get() const { return object_; }  // valid until the next slot()
   T** slot() { return &object_; }     // for operations that may move the object
 
  private:

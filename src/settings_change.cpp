@@ -33,7 +33,35 @@ int Perform(ServiceAction action) {
   return 0;
 }
 
+// Returns whether the value is to be stored. A stored switch is compared by truth, not by number.
+bool Differs(const Setting& setting, const Json::Value& given, int32_t stored) {
+  switch (setting.kind) {
+    case Setting::Kind::kSwitch:
+    case Setting::Kind::kSwitchShownAsInteger:
+      return given.asBool() != (stored != 0);
+    case Setting::Kind::kInteger:
+      return given.asInt() != stored;
+    case Setting::Kind::kIntegerComparedAsJson:
+      return given != Json::Value(stored);
+  }
+  return false;
+}
+
 }  // namespace
+
+bool Setting::Accepts(const Json::Value& given) const { return IsSwitch() ? given.isBool() : given.isInt(); }
+
+Json::Value Setting::Show(const NFSConfRecord& record) const {
+  if (kind == Kind::kSwitch) return record.*field != 0;
+  return record.*field;
+}
+
+void Setting::Plan(const Json::Value& params, SettingsChange* change) const {
+  const Json::Value& given = params[key];
+  if (given.isNull() || !Differs(*this, given, change->stored.*field)) return;
+  change->working.*field = IsSwitch() ? int32_t{given.asBool()} : given.asInt();
+  change->*effect = true;
+}
 
 ServiceAction DecideServiceAction(const SettingsChange& change) {
   if (change.enabled == change.wanted && !change.service_affected) return ServiceAction::kNone;
@@ -53,31 +81,6 @@ bool StoreRecord(const CallSite& site, const NFSConfRecord& record) {
   return false;
 }
 
-bool SwitchDiffers(const Json::Value& given, int32_t stored) {
-  return !given.isNull() && given.asBool() != (stored != 0);
-}
-
-void PlanTransferSizes(const Json::Value& params, SettingsChange* change) {
-  const Json::Value& read_size = params["read_size"];
-  if (!read_size.isNull() && read_size.asInt() != change->stored.read_size) {
-    change->working.read_size = read_size.asInt();
-    change->sizes_changed = true;
-  }
-  // Unlike the read size this one is compared as a JSON value, type included: callers rely on both.
-  const Json::Value& write_size = params["write_size"];
-  if (!write_size.isNull() && write_size != Json::Value(change->stored.write_size)) {
-    change->working.write_size = write_size.asInt();
-    change->sizes_changed = true;
-  }
-}
-
-void PlanUNIXPermissions(const Json::Value& params, SettingsChange* change) {
-  const Json::Value& enable = params["unix_pri_enable"];
-  if (!SwitchDiffers(enable, change->stored.unix_pri_enable)) return;
-  change->working.unix_pri_enable = enable.asBool() ? 1 : 0;
-  change->permissions_changed = true;
-}
-
 bool ApplyLive(const CallSite& site, const SettingsChange& change) {
   if (!change.enabled || !change.wanted) return true;
   if (change.sizes_changed && !ApplySizes(site, change.working)) return false;
@@ -87,7 +90,7 @@ bool ApplyLive(const CallSite& site, const SettingsChange& change) {
 bool DriveService(const CallSite& site, const SettingsChange& change) {
   const ServiceAction action = DecideServiceAction(change);
   if (Perform(action) == 0) return true;
-  // The texts are crossed over with the actions, and log readers match on them as they are.
+  // The texts are exchanged on purpose: docs/decisions/0010.
   if (action == ServiceAction::kStart) {
     LOG_ERROR_AT(site, "failed to restart service nfs");
   } else {

@@ -1,41 +1,73 @@
-// The steps that the APIs share which change the NFS configuration record. Those that can fail log
-// the reason at the caller's place and answer false.
+// The settings of the NFS configuration record, and the steps that every API shares which changes them.
+//
+// A step that can fail logs the reason at the given call site (docs/decisions/0002) and returns false.
+// Nothing here has state: all functions are thread-safe on different objects.
 #ifndef VORN_SRC_SETTINGS_CHANGE_H
 #define VORN_SRC_SETTINGS_CHANGE_H
 
 #include "handler.h"
 #include "nfsconf.h"
 
-// One request's way from the stored settings to the wanted ones.
+// A change of the settings by one request.
 struct SettingsChange {
-  NFSConfRecord stored{};
-  NFSConfRecord working{};  // what will be stored, whole
-  bool enabled = false;     // the service is on now
-  bool wanted = false;      // the request wants it on
-  bool sizes_changed = false;
+  NFSConfRecord stored{};      // the record as read
+  NFSConfRecord working{};     // the record to be written
+  bool enabled = false;        // the service is enabled now
+  bool wanted = false;         // the request wants the service enabled
+  bool sizes_changed = false;  // a transfer size changes
   bool permissions_changed = false;
-  bool service_affected = false;  // something changed that the service only sees when it starts
+  bool service_affected = false;  // a setting changes that takes effect at the next start of the service
+};
+
+// A request parameter that is stored in one field of the NFS configuration record. Each API has a table of
+// its settings, which serves the check, the answer and the change. CONTRIBUTING.md, "Add a parameter".
+struct Setting {
+  enum class Kind {
+    kSwitch,                 // JSON boolean; the field is true when non-zero and written as 0 or 1
+    kSwitchShownAsInteger,   // the same, but answered as the integer of the field (docs/decisions/0011)
+    kInteger,                // JSON integer, without a range check (docs/decisions/0012)
+    kIntegerComparedAsJson,  // the same, but compared as a JSON value (docs/decisions/0009)
+  };
+
+  const char* key;  // of the request and the answer
+  Kind kind;
+  int32_t NFSConfRecord::*field;
+  bool SettingsChange::*effect;  // what a change of the value raises
+
+  bool IsSwitch() const { return kind == Kind::kSwitch || kind == Kind::kSwitchShownAsInteger; }
+
+  // Returns whether `given` has the JSON type of the setting. Null has none.
+  bool Accepts(const Json::Value& given) const;
+
+  // Returns the stored value as the answer shows it.
+  Json::Value Show(const NFSConfRecord& record) const;
+
+  // Puts the request's value into the working record and raises the effect, if the value is given and
+  // differs from the stored one. Throws Json::Exception if the value cannot be converted.
+  void Plan(const Json::Value& params, SettingsChange* change) const;
+};
+
+// The settings that a running service adopts without a restart. Two APIs have them.
+inline constexpr Setting kLiveSettings[] = {
+    {"read_size", Setting::Kind::kInteger, &NFSConfRecord::read_size, &SettingsChange::sizes_changed},
+    {"write_size", Setting::Kind::kIntegerComparedAsJson, &NFSConfRecord::write_size, &SettingsChange::sizes_changed},
+    {"unix_pri_enable", Setting::Kind::kSwitch, &NFSConfRecord::unix_pri_enable, &SettingsChange::permissions_changed},
 };
 
 enum class ServiceAction { kNone, kStart, kStop, kRestart };
 
-// What the service needs: nothing while its state stays and nothing affects it. A service that is
-// to be off is stopped even if it is off already.
+// Returns the action that brings the service into the wanted state. A service that is to be disabled is
+// stopped even if it is disabled already and only a setting changed (docs/decisions/0013).
 ServiceAction DecideServiceAction(const SettingsChange& change);
 
+// Reads or writes the whole record with the platform's operation.
 bool ReadRecord(const CallSite& site, NFSConfRecord* record);
 bool StoreRecord(const CallSite& site, const NFSConfRecord& record);
 
-// Takes given values that differ from the stored ones into the working record.
-void PlanTransferSizes(const Json::Value& params, SettingsChange* change);
-void PlanUNIXPermissions(const Json::Value& params, SettingsChange* change);
-
-// Tells a service that is on and stays on about changed sizes and permissions.
+// Applies changed transfer sizes and UNIX permissions to the service if it is enabled and stays enabled.
 bool ApplyLive(const CallSite& site, const SettingsChange& change);
 
+// Performs the action of DecideServiceAction.
 bool DriveService(const CallSite& site, const SettingsChange& change);
-
-// Whether a switch is given and is not as stored.
-bool SwitchDiffers(const Json::Value& given, int32_t stored);
 
 #endif  // VORN_SRC_SETTINGS_CHANGE_H

@@ -19,7 +19,7 @@ namespace {
 constexpr char kSource[] = "share_privilege";
 constexpr char kExportsFile[] = "/etc/exports";
 
-// They would end the client's text in exports(5), or begin something else there.
+// Characters that end a client in exports(5) or begin another token.
 constexpr char kForbiddenInClient[] = "()|= '\"";
 
 bool CheckClient(const Json::Value& client) {
@@ -42,7 +42,7 @@ bool CheckRootSquash(const Json::Value& root_squash) {
   return false;
 }
 
-// A key, and what the log says when it is not a boolean.
+// A boolean key of a rule, and the log text if its value is not a boolean.
 struct BoolKey {
   const char* name;
   const char* text;
@@ -90,10 +90,10 @@ bool CheckFlavours(const Json::Value& flavours) {
   return false;
 }
 
-// Whether a rule object may be saved. The security flavours are looked at only `with_kerberos`;
-// whether the client is one that exports(5) knows is the platform's to judge.
+// Returns whether a rule may be saved. The security flavours are checked only `with_kerberos`
+// (docs/decisions/0033). The platform checks the syntax of the client.
 bool CheckRule(const Json::Value& rule, bool with_kerberos) {
-  // An element that is no object has no client, and is refused as one without.
+  // An element that is not an object is refused like a rule without a client.
   if (!rule.isObject()) return CheckClient(Json::Value::nullSingleton());
   return CheckClient(rule["client"]) && CheckPrivilege(rule["privilege"]) && CheckRootSquash(rule["root_squash"]) &&
          CheckSwitches(rule) && (!with_kerberos || CheckFlavours(rule["security_flavor"]));
@@ -108,7 +108,7 @@ Share LoadShare(const Json::Value& name) {
   return nullptr;
 }
 
-// A share whose mounts cannot be looked at may be exported all the same.
+// A failed test does not prevent an export: docs/decisions/0021.
 bool IsExportable(const char* path) {
   const int result = VORNFSHasMountPointType(path, VORNFS_MOUNT_UNEXPORTABLE);
   if (result < 0) {
@@ -130,7 +130,7 @@ bool CheckRules(const Json::Value& rules) {
   return true;
 }
 
-// A zeroed record that the platform may free. Null on failure, which is logged.
+// Allocates a zeroed record with malloc(3), as VORNNFSRuleExtFree requires. Logs a failure and returns nullptr.
 template <typename Record>
 Record* Allocate() {
   void* const block = malloc(sizeof(Record));
@@ -139,7 +139,7 @@ Record* Allocate() {
   return nullptr;
 }
 
-// Appends every rule in order; what was built until a failure hangs from the list all the same.
+// Appends all rules in order. After a failure the list owns the records that were built until then.
 bool BuildRules(const Json::Value& rules, ExportRuleList* list) {
   const bool with_kerberos = IsKerberosSupported();
   ExportRule** end = &list->first;
@@ -219,9 +219,10 @@ bool NFSSharePrivilegeHandler::SetData(const Json::Value& params) {
   if (!list) return Fail(kPlatformFailure);
   const Share share = LoadShare(params["share_name"]);
   if (!share) return Fail(kNoShare);
+  // A longer path is cut: docs/decisions/0034.
   snprintf(list->path, sizeof list->path, "%s", KLIBSharePathGet(share.get()));
   if (!BuildRules(params["rule"], list.get()) || !WriteRules(*list)) return Fail(kPlatformFailure);
-  // The rules are saved; whether the service took them up at once does not change that.
+  // The result is ignored: docs/decisions/0024.
   static_cast<void>(KLIBServiceReload(kService));
   return true;
 }

@@ -5,6 +5,7 @@
 #include <memory>
 #include <sstream>
 #include <string>
+#include <utility>
 
 namespace vorn::server {
 namespace {
@@ -12,28 +13,39 @@ namespace {
 std::unique_ptr<Json::StreamWriter> NewWriter() {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
-  // All but ASCII is escaped: a module's text that is no UTF-8 still makes valid JSON.
+  // Everything but ASCII is escaped, so that a string that is not UTF-8 still makes valid JSON.
   builder["emitUTF8"] = false;
   return std::unique_ptr<Json::StreamWriter>(builder.newStreamWriter());
 }
 
 std::string Text(const Json::Value& value) {
-  // Making a writer costs more than most answers.
+  // Constructing a writer costs more than most answers.
   thread_local const std::unique_ptr<Json::StreamWriter> writer = NewWriter();
   std::ostringstream text;
   writer->write(value, &text);
   return text.str();
 }
 
+// `,"name":["...", ...]`, or an empty string if there are no sentences.
+std::string Member(std::string_view name, const std::vector<std::string>& sentences) {
+  if (sentences.empty()) return "";
+  Json::Value list(Json::arrayValue);
+  for (const std::string& sentence : sentences) list.append(sentence);
+  return ",\"" + std::string(name) + "\":" + Text(list);
+}
+
 }  // namespace
 
-Response Success(const Json::Value& data) { return {200, R"({"success":true,"data":)" + Text(data) + "}", {}}; }
+Response Success(const Json::Value& data, const Remarks& remarks) {
+  return {200, R"({"success":true,"data":)" + Text(data) + Member("warnings", remarks.warnings) + "}", {}};
+}
 
-Response Failure(int status, int code, std::string_view text, const Json::Value& details) {
+Response Failure(int status, int code, std::string_view text, const Json::Value& details, const Remarks& remarks) {
   std::string body = R"({"success":false,"error":{"code":)" + std::to_string(code) + R"(,"text":)" +
                      Text(Json::Value(text.data(), text.data() + text.size()));
   if (!details.isNull()) body += R"(,"details":)" + Text(details);
-  return {status, body + "}}", {}};
+  body += Member("reasons", remarks.reasons) + "}" + Member("warnings", remarks.warnings) + "}";
+  return {status, std::move(body), {}};
 }
 
 Response Refusal(int status, std::string_view text) { return Failure(status, status, text); }

@@ -1,25 +1,38 @@
-// The envelope around every answer: {"success": true, "data": ...}, or
-// {"success": false, "error": {"code": ..., "text": ..., "details": ...}}.
+// The JSON envelope of every answer:
+//     {"success": true, "data": ...}
+//     {"success": false, "error": {"code": ..., "text": ..., "details": ..., "reasons": [...]}}
+// with "warnings": [...] beside "success". Details, reasons and warnings are left out if there are none.
 #ifndef VORN_SERVER_ANSWER_H
 #define VORN_SERVER_ANSWER_H
 
 #include <json/value.h>
 
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "http.h"
 
 namespace vorn::server {
 
-// Also the module's own code for "a platform operation failed": what a caller can do is the same.
+// The error code of an answer whose call failed inside the server. It is the modules' code for a failed
+// platform operation, too, because a caller can do the same about both.
 constexpr int kInternalFailure = 2302;
 
-Response Success(const Json::Value& data);
+// The sentences that the platform added to a call.
+struct Remarks {
+  std::vector<std::string> reasons;   // why operations of a failed call failed
+  std::vector<std::string> warnings;  // what the caller should know besides the result
+};
 
-// A method's failure. Null details are left out.
-Response Failure(int status, int code, std::string_view text, const Json::Value& details = Json::Value());
+// The answer of a method that succeeded. The reasons are ignored.
+Response Success(const Json::Value& data, const Remarks& remarks = {});
 
-// The server's own: the code is the HTTP status, `text` says what is wrong with the request.
+// The answer of a method that failed. `details` may be null.
+Response Failure(int status, int code, std::string_view text, const Json::Value& details = Json::Value(),
+                 const Remarks& remarks = {});
+
+// The answer of the server itself to a request that it does not carry out: the error code is the HTTP status.
 Response Refusal(int status, std::string_view text);
 
 }  // namespace vorn::server

@@ -9,6 +9,7 @@
 #include <string>
 #include <string_view>
 #include <variant>
+#include <vector>
 
 #include "http.h"
 
@@ -24,6 +25,9 @@ class Body {
 
   // The parameter object, once the body has ended, or why there is none. Called once.
   virtual std::variant<Json::Value, Response> TakeParameters() = 0;
+
+  // The paths of the files that were uploaded, as they are in the parameters. Valid after TakeParameters().
+  virtual std::vector<std::string> Uploads() const { return {}; }
 };
 
 // What the server itself adds to a parameter's name for the path of an uploaded file. No caller may

@@ -1,17 +1,26 @@
-// What a module's descriptor tells the server. X.json stands beside X.so: a fragment of an
-// OpenAPI 3.1 document, in which
-//     "x-error-codes": {"2301": {"status": 400, "text": "..."}}
-// gives the HTTP status and the administrator's text of each error code.
+// What a module's descriptor tells the server. X.json is the descriptor of X.so: a fragment of an OpenAPI 3.1
+// document. The server reads from it
+//
+//   - "paths": a path item for each method, under the path that the method is called at, for example
+//         "/api/VORN.Core.FileServ.NFS/v1/get": {"post": {"summary": "...", "x-read-only": true}}
+//     "x-read-only" (default false) declares that the method changes nothing. A request body with a content of
+//     type "multipart/form-data" declares that the method takes a file.
+//   - "x-error-codes": {"2301": {"status": 400, "text": "..."}}, the HTTP status of an error code and the text
+//     that an administrator reads.
 #ifndef VORN_SERVER_DESCRIPTOR_H
 #define VORN_SERVER_DESCRIPTOR_H
+
+#include <json/value.h>
 
 #include <map>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace vorn::server {
 
+// Immutable after Parse(), so any thread may read it.
 class Descriptor {
  public:
   struct ErrorCode {
@@ -19,16 +28,32 @@ class Descriptor {
     std::string text;
   };
 
-  // An empty one: every code is status 500 with a plain text.
+  // What is known of a method. A method without a description may write and takes no file.
+  struct Method {
+    bool reads_only = false;
+    bool takes_file = false;
+  };
+
+  // An empty descriptor: every error code has status 500 and a general text, no method is described.
   Descriptor() = default;
 
-  // None when `json` is no such document; `error` then says why.
+  // Returns std::nullopt if `json` is not such a document; `error` then has the reason.
   static std::optional<Descriptor> Parse(std::string_view json, std::string* error);
 
   ErrorCode Describe(int code) const;
 
+  // `path` is the path that the method is called at: "/api/{api}/v{version}/{method}".
+  Method MethodAt(const std::string& path) const;
+
+  // The paths of all methods that are described.
+  std::vector<std::string> Paths() const;
+
  private:
+  bool ReadErrorCodes(const Json::Value& codes, std::string* error);
+  bool ReadPaths(const Json::Value& paths, std::string* error);
+
   std::map<int, ErrorCode> codes_;
+  std::map<std::string, Method> methods_;
 };
 
 }  // namespace vorn::server

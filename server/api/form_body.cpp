@@ -36,6 +36,12 @@ std::variant<Json::Value, Response> FormBody::TakeParameters() {
   return std::move(parameters_);
 }
 
+std::vector<std::string> FormBody::Uploads() const {
+  std::vector<std::string> paths;
+  for (const Upload& file : files_) paths.push_back(file.path());
+  return paths;
+}
+
 bool FormBody::BeginPart(const PartHead& head) {
   part_ = head;
   part_bytes_ = 0;

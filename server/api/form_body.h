@@ -10,6 +10,7 @@
 #include <string>
 #include <string_view>
 #include <variant>
+#include <vector>
 
 #include "body.h"
 #include "multipart.h"
@@ -30,6 +31,7 @@ class FormBody : public Body, private PartReceiver {
 
   std::optional<Response> Receive(std::string_view piece) override;
   std::variant<Json::Value, Response> TakeParameters() override;
+  std::vector<std::string> Uploads() const override;
 
  private:
   bool BeginPart(const PartHead& head) override;

@@ -6,6 +6,7 @@
 #include <charconv>
 #include <cstddef>
 #include <optional>
+#include <utility>
 
 namespace vorn::server {
 namespace {
@@ -42,14 +43,22 @@ std::string Quoted(std::string_view text) { return '"' + std::string(text) + '"'
 
 std::string Route::Name() const { return std::string(row.api) + " v" + std::to_string(row.version) + " " + row.method; }
 
+std::string Route::Id() const { return std::string(row.api) + "/v" + std::to_string(row.version) + "/" + row.method; }
+
 Routes::Routes(const std::vector<Module>& modules) {
   for (const Module& module : modules) {
     for (const APIRow& row : module.rows) Add(row, module);
+    for (const std::string& path : module.descriptor.Paths()) {
+      std::string unknown;
+      if (Find(path, &unknown) == nullptr) syslog(LOG_ERR, "%s: descriptor: %s", module.path.c_str(), unknown.c_str());
+    }
   }
 }
 
 void Routes::Add(const APIRow& row, const Module& module) {
-  const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, Route{row, &module.descriptor});
+  Route route{row, &module.descriptor, {}};
+  route.method = module.descriptor.MethodAt(std::string(kPrefix) + route.Id());
+  const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, std::move(route));
   if (!added) syslog(LOG_ERR, "%s: %s is there already", module.path.c_str(), place->second.Name().c_str());
 }
 

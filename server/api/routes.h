@@ -14,16 +14,20 @@
 
 namespace vorn::server {
 
+// A method that can be called.
 struct Route {
   APIRow row;
   const Descriptor* descriptor;
+  Descriptor::Method method;  // the descriptor's entry for it
 
-  std::string Name() const;  // "API v1 method", for the log
+  std::string Name() const;  // "Api v1 method", for the log
+  std::string Id() const;    // "Api/v1/method", as in its path
 };
 
 class Routes {
  public:
-  // The modules must outlive this. Of two rows with one name the first is taken, the other logged.
+  // The modules must outlive this. If two rows have the same name, the first one is used. The second one is
+  // logged, and so is each path of a descriptor that belongs to none of its module's rows.
   explicit Routes(const std::vector<Module>& modules);
 
   // The row of "/api/{api}/v{version}/{method}". Null when there is none: `unknown` then says which

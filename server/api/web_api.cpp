@@ -6,9 +6,9 @@
 #include "answer.h"
 #include "body.h"
 #include "browser_guard.h"
-#include "call.h"
 #include "form_body.h"
 #include "header_value.h"
+#include "method_call.h"
 #include "multipart.h"
 
 namespace vorn::server {
@@ -69,7 +69,10 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
   if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
   NewBody body = OpenBody(head, uploads_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
-  return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), pool_);
+  VORN::CallDescription description;
+  if (!head.over_tcp) description.origin = "unix";
+  return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),
+                                pool_);
 }
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }

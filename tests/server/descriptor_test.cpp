@@ -33,10 +33,45 @@ TEST(Descriptor, IsRefusedWhenFaulty) {
         R"({"x-error-codes": {"0": {"status": 400, "text": "x"}}})", R"({"x-error-codes": {"1": 400}})",
         R"({"x-error-codes": {"1": {"text": "x"}}})", R"({"x-error-codes": {"1": {"status": 200, "text": "x"}}})",
         R"({"x-error-codes": {"1": {"status": 600, "text": "x"}}})",
-        R"({"x-error-codes": {"1": {"status": 400, "text": 1}}})"}) {
+        R"({"x-error-codes": {"1": {"status": 400, "text": 1}}})", R"({"paths": []})", R"({"paths": {"/a": 1}})",
+        R"({"paths": {"/a": {"get": {}}}})", R"({"paths": {"/a": {"post": {"x-read-only": "true"}}}})"}) {
     std::string error;
     EXPECT_FALSE(Descriptor::Parse(json, &error)) << json;
     EXPECT_NE(error, "") << json;
+  }
+}
+
+TEST(Descriptor, TellsWhatAMethodDoes) {
+  std::string error;
+  const auto descriptor = Descriptor::Parse(R"({"paths": {
+      "/api/A/v1/get": {"post": {"x-read-only": true}},
+      "/api/A/v1/set": {"post": {"x-read-only": false, "requestBody": {"content": {"application/json": {}}}}},
+      "/api/A/v1/put": {"post": {"requestBody": {"content": {"multipart/form-data": {}}}}}}})",
+                                            &error);
+  ASSERT_TRUE(descriptor) << error;
+  EXPECT_TRUE(descriptor->MethodAt("/api/A/v1/get").reads_only);
+  EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/set").reads_only);
+  EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/set").takes_file);
+  EXPECT_TRUE(descriptor->MethodAt("/api/A/v1/put").takes_file);
+  EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/unknown").reads_only) << "an undescribed method may write";
+}
+
+TEST(Descriptor, OfTheNfsModuleDescribesItsMethods) {
+  std::string error;
+  const auto descriptor = Descriptor::Parse(ReadWholeFile(NFS_DESCRIPTOR), &error);
+  ASSERT_TRUE(descriptor) << error;
+  const std::string nfs = "/api/VORN.Core.FileServ.NFS";
+  for (const char* reading : {"/v1/get", "/v2/get", ".AdvancedSetting/v1/get", ".Kerberos/v1/get", ".Kerberos/v1/list",
+                              ".IDMap/v1/list", ".SharePrivilege/v1/load"}) {
+    EXPECT_TRUE(descriptor->MethodAt(nfs + reading).reads_only) << reading;
+  }
+  EXPECT_EQ(descriptor->Paths().size(), 15U);
+  for (const std::string& path : descriptor->Paths()) {
+    const bool writes = path.find("/set") != std::string::npos || path.find("/save") != std::string::npos ||
+                        path.find("/create") != std::string::npos || path.find("/delete") != std::string::npos ||
+                        path.find("/upload_key") != std::string::npos;
+    EXPECT_NE(descriptor->MethodAt(path).reads_only, writes) << path;
+    EXPECT_EQ(descriptor->MethodAt(path).takes_file, path == nfs + ".Kerberos/v1/upload_key") << path;
   }
 }
 

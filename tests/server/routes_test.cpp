@@ -24,6 +24,17 @@ TEST(Routes, LeadToRows) {
   EXPECT_NE(routes.Find("/api/Nfs.IDMap/v1/list", &unknown), nullptr) << unknown;
 }
 
+TEST(Routes, KnowWhatTheDescriptorTellsOfAMethod) {
+  std::string error;
+  std::vector<Module> modules = TwoModules();
+  modules[0].descriptor =
+      *Descriptor::Parse(R"({"paths": {"/api/Nfs/v1/get": {"post": {"x-read-only": true}}}})", &error);
+  const Routes routes(modules);
+  EXPECT_EQ(routes.Find("/api/Nfs/v1/get", &error)->Id(), "Nfs/v1/get");
+  EXPECT_TRUE(routes.Find("/api/Nfs/v1/get", &error)->method.reads_only);
+  EXPECT_FALSE(routes.Find("/api/Nfs/v1/set", &error)->method.reads_only);
+}
+
 TEST(Routes, OfTwoRowsWithOneNameTheFirstCounts) {
   const std::vector<Module> modules = TwoModules();
   std::string unknown;

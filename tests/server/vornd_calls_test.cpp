@@ -76,13 +76,36 @@ TEST_F(Calls, WithWrongJsonSayWhere) {
 
 TEST_F(Calls, AnswerValidJsonWhateverTheModuleSays) { EXPECT_TRUE(Call("v1/binary").Envelope()["success"].asBool()); }
 
+TEST_F(Calls, AnswerReasonsAndWarnings) {
+  const std::string remarks = R"("reasons": ["a", "b"], "warnings": ["c"])";
+  const Json::Value failed = Call("v1/remark", "{" + remarks + R"(, "code": 2301})").Envelope();
+  EXPECT_EQ(failed["error"]["reasons"].size(), 2U);
+  EXPECT_EQ(failed["error"]["reasons"][1], "b");
+  EXPECT_EQ(failed["warnings"][0], "c");
+  const Json::Value succeeded = Call("v1/remark", "{" + remarks + "}").Envelope();
+  EXPECT_FALSE(succeeded.isMember("error"));
+  EXPECT_EQ(succeeded["warnings"][0], "c");
+  const Json::Value plain = Call("v1/remark", R"({"code": 2301})").Envelope();
+  EXPECT_FALSE(plain.isMember("warnings"));
+  EXPECT_FALSE(plain["error"].isMember("reasons"));
+}
+
+TEST_F(Calls, MayWriteUnlessTheDescriptorSaysThatTheyOnlyRead) {
+  const Json::Value changing = Call("v1/context").Envelope()["data"];
+  EXPECT_EQ(changing["may_write"], true);
+  EXPECT_EQ(changing["method"], "Test.Echo/v1/context");
+  EXPECT_EQ(changing["origin"], "unix");
+  EXPECT_TRUE(changing["uploads"].empty());
+  EXPECT_EQ(Call("v2/context").Envelope()["data"]["may_write"], false);
+}
+
 TEST_F(Calls, AreListed) {
   Connection client = server_.ConnectTcp();
   client.Send(Get("/api"));
   const Json::Value data = client.Receive().Envelope()["data"];
-  ASSERT_EQ(data.size(), 10U);
-  EXPECT_EQ(data[9]["api"], "Test.Echo");
-  EXPECT_EQ(data[9]["version"], 2);
+  ASSERT_EQ(data.size(), 13U);
+  EXPECT_EQ(data[12]["api"], "Test.Echo");
+  EXPECT_EQ(data[12]["version"], 2);
   client.Send(Get("/healthz"));
   EXPECT_EQ(client.Receive().status, 200);
 }

@@ -48,6 +48,15 @@ TEST_F(Uploads, ReachTheMethodAsPrivateFiles) {
   EXPECT_TRUE(NothingIsLeft());
 }
 
+TEST_F(Uploads, AreListedInTheCallContext) {
+  const std::string form = Part("name=note", "text") + Part(file_, "keytab") + "--b--\r\n";
+  Connection client = server_.Connect();
+  client.Send(FormHead(form.size(), "context") + form);
+  const Json::Value uploads = client.Receive().Envelope()["data"]["uploads"];
+  ASSERT_EQ(uploads.size(), 1U);
+  EXPECT_EQ(uploads[0].asString().rfind(sandbox_.File("run/vorn/uploads/"), 0), 0U) << uploads[0].asString();
+}
+
 TEST_F(Uploads, ThatTheMethodRemovesAreNoTrouble) {
   EXPECT_EQ(Send(Part(file_, "k") + Part("name=remove", "yes") + "--b--").Envelope()["data"]["size"], 1);
   EXPECT_TRUE(NothingIsLeft());

@@ -11,6 +11,7 @@
 #include <string>
 #include <thread>
 
+#include "call.h"
 #include "webapi.h"
 
 namespace {
@@ -66,12 +67,36 @@ void Upload(VORN::APIRequest* request, VORN::APIResponse* response) {
 // Bytes that are no UTF-8.
 void Binary(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess("\xff\xfe"); }
 
-const APIRow table[] = {{"Test.Echo", 1, "get", Echo},      {"Test.Echo", 1, "fail", Fail},
-                        {"Test.Echo", 1, "throw", Throw},   {"Test.Echo", 1, "throw_number", ThrowNumber},
-                        {"Test.Echo", 1, "silent", Silent}, {"Test.Echo", 1, "wait", Wait},
-                        {"Test.Echo", 1, "root", Root},     {"Test.Echo", 1, "binary", Binary},
-                        {"Test.Echo", 1, "upload", Upload}, {"Test.Echo", 2, "get", EchoV2},
-                        {nullptr, 0, nullptr, nullptr}};
+// Adds the sentences of "reasons" and "warnings" to the call context, then fails with "code" unless it is 0.
+void Remark(VORN::APIRequest* request, VORN::APIResponse* response) {
+  VORN::CallContext* context = VORN::CallContext::Current();
+  for (const auto& reason : request->GetParam("reasons", Json::arrayValue)) context->AddReason(reason.asString());
+  for (const auto& warning : request->GetParam("warnings", Json::arrayValue)) context->AddWarning(warning.asString());
+  const int code = request->GetParam("code", 0).asInt();
+  if (code != 0) return response->SetError(code, Json::Value());
+  response->SetSuccess("done");
+}
+
+// The description of the call. One source serves two methods, one of which is described as reading only.
+void Context(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
+  const VORN::CallDescription& description = VORN::CallContext::Current()->description();
+  Json::Value result;
+  result["caller"] = description.caller;
+  result["origin"] = description.origin;
+  result["method"] = description.method;
+  result["may_write"] = description.may_write;
+  result["uploads"] = Json::arrayValue;
+  for (const std::string& path : description.uploads) result["uploads"].append(path);
+  response->SetSuccess(result);
+}
+
+const APIRow table[] = {{"Test.Echo", 1, "get", Echo},        {"Test.Echo", 1, "fail", Fail},
+                        {"Test.Echo", 1, "throw", Throw},     {"Test.Echo", 1, "throw_number", ThrowNumber},
+                        {"Test.Echo", 1, "silent", Silent},   {"Test.Echo", 1, "wait", Wait},
+                        {"Test.Echo", 1, "root", Root},       {"Test.Echo", 1, "binary", Binary},
+                        {"Test.Echo", 1, "upload", Upload},   {"Test.Echo", 2, "get", EchoV2},
+                        {"Test.Echo", 1, "remark", Remark},   {"Test.Echo", 1, "context", Context},
+                        {"Test.Echo", 2, "context", Context}, {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace
 

@@ -1,4 +1,4 @@
-#include "call.h"
+#include "method_call.h"
 
 #include <gtest/gtest.h>
 
@@ -23,7 +23,7 @@ void AnswerThenThrow(VORN::APIRequest* /*request*/, VORN::APIResponse* response)
 Response RunHandler(decltype(APIRow::handler) handler, const Json::Value& parameters = Json::objectValue) {
   std::string error;
   const auto descriptor = Descriptor::Parse(R"({"x-error-codes":{"2351":{"status":409,"text":"There."}}})", &error);
-  return RunEntryFunction({{"Api", 1, "method", handler}, &*descriptor}, parameters);
+  return RunEntryFunction({{"Api", 1, "method", handler}, &*descriptor, {}}, parameters, {});
 }
 
 TEST(EntryFunction, AnswersWithItsData) {
@@ -46,6 +46,22 @@ TEST(EntryFunction, IsAnsweredForWhenItDoesNotAnswer) {
   }
 }
 
+void AddRemarks(VORN::APIRequest* request, VORN::APIResponse* response) {
+  VORN::CallContext::Current()->AddReason("10.0.0.256 is not an address.");
+  VORN::CallContext::Current()->AddWarning("The reload failed.");
+  request->GetParam("fail", false).asBool() ? response->SetError(2351, {}) : response->SetSuccess({});
+}
+
+TEST(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
+  EXPECT_EQ(RunHandler(AddRemarks).body, R"({"success":true,"data":null,"warnings":["The reload failed."]})");
+  Json::Value parameters;
+  parameters["fail"] = true;
+  EXPECT_EQ(RunHandler(AddRemarks, parameters).body,
+            R"({"success":false,"error":{"code":2351,"text":"There.","reasons":["10.0.0.256 is not an address."]},)"
+            R"("warnings":["The reload failed."]})");
+  EXPECT_EQ(VORN::CallContext::Current(), nullptr);
+}
+
 // A body that tells when it is gone.
 class TracedBody : public Body {
  public:
@@ -60,23 +76,22 @@ class TracedBody : public Body {
 
 TEST(Call, ReleasesItsBodyBeforeItAnswers) {
   const Descriptor descriptor;
-  const Route route{{"Api", 1, "echo", Echo}, &descriptor};
+  const Route route{{"Api", 1, "echo", Echo}, &descriptor, {}};
   WorkerPool pool({1, 1, 1});
   bool gone = false;
   std::promise<bool> gone_at_answer;
-  const auto call = std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone), pool);
+  const auto call = std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone), VORN::CallDescription{}, pool);
   call->Run([&](const Response& /*response*/) { gone_at_answer.set_value(gone); });
   EXPECT_TRUE(gone_at_answer.get_future().get());
 }
 
 TEST(Call, IsRefusedWhenTooManyWait) {
   const Descriptor descriptor;
-  const Route route{{"Api", 1, "echo", Echo}, &descriptor};
+  const Route route{{"Api", 1, "echo", Echo}, &descriptor, {}};
   WorkerPool pool({1, 1, 0});
   Response answer;
-  std::make_shared<Call>(route, std::make_unique<JsonBody>(), pool)->Run([&](Response response) {
-    answer = std::move(response);
-  });
+  std::make_shared<Call>(route, std::make_unique<JsonBody>(), VORN::CallDescription{}, pool)
+      ->Run([&](Response response) { answer = std::move(response); });
   EXPECT_EQ(answer.status, 503);
   ASSERT_EQ(answer.headers.size(), 1U);
   EXPECT_EQ(answer.headers[0].first, "Retry-After");

@@ -1,4 +1,4 @@
-#include "call.h"
+#include "method_call.h"
 
 #include <syslog.h>
 
@@ -17,21 +17,23 @@ Response NoAnswer(const Route& route, const char* reason) {
   return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
 }
 
-Response CallEntryFunction(const Route& route, Json::Value parameters) {
+Response CallEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
+  const VORN::CallContext context(std::move(description));
   VORN::APIRequest request(std::move(parameters));
   VORN::APIResponse response;
   route.row.handler(&request, &response);
   if (!response.answered()) return NoAnswer(route, "the method ended without one");
-  if (response.error() == 0) return Success(response.data());
+  const Remarks remarks{context.reasons(), context.warnings()};
+  if (response.error() == 0) return Success(response.data(), remarks);
   const Descriptor::ErrorCode code = route.descriptor->Describe(response.error());
-  return Failure(code.status, response.error(), code.text, response.data());
+  return Failure(code.status, response.error(), code.text, response.data(), remarks);
 }
 
 }  // namespace
 
-Response RunEntryFunction(const Route& route, Json::Value parameters) {
+Response RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
   try {
-    return CallEntryFunction(route, std::move(parameters));
+    return CallEntryFunction(route, std::move(parameters), std::move(description));
   } catch (const std::exception& exception) {
     return NoAnswer(route, exception.what());
   } catch (...) {
@@ -39,8 +41,11 @@ Response RunEntryFunction(const Route& route, Json::Value parameters) {
   }
 }
 
-Call::Call(const Route& route, std::unique_ptr<Body> body, WorkerPool& pool)
-    : route_(route), body_(std::move(body)), pool_(pool) {}
+Call::Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription description, WorkerPool& pool)
+    : route_(route), body_(std::move(body)), description_(std::move(description)), pool_(pool) {
+  description_.method = route_.Id();
+  description_.may_write = !route_.method.reads_only;
+}
 
 std::optional<Response> Call::Receive(std::string_view piece) { return body_->Receive(piece); }
 
@@ -55,9 +60,11 @@ void Call::Run(Answer answer) {
 
 Response Call::Execute() {
   std::variant<Json::Value, Response> parameters = body_->TakeParameters();
-  Response response = std::holds_alternative<Response>(parameters)
-                          ? std::get<Response>(std::move(parameters))
-                          : RunEntryFunction(route_, std::get<Json::Value>(std::move(parameters)));
+  description_.uploads = body_->Uploads();
+  Response response =
+      std::holds_alternative<Response>(parameters)
+          ? std::get<Response>(std::move(parameters))
+          : RunEntryFunction(route_, std::get<Json::Value>(std::move(parameters)), std::move(description_));
   body_.reset();  // before the client can see the answer
   return response;
 }

@@ -2,10 +2,14 @@
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 
+#include "private_namespaces.h"
 #include "processes.h"
+#include "requirements.h"
 #include "temporary_root.h"
 
 namespace {
+
+[[maybe_unused]] const bool kRequired = RequirePrivateNamespaces();
 
 using testing::HasSubstr;
 
@@ -41,20 +45,22 @@ class Box {
 
   ProgramResult Run(const std::string& word) const {
     const std::string place = folder_.directory();
-    return RunProgram({"unshare", "-Urm", "sh", "-ec",
-                       "mount --bind " + place +
-                           "/nfs.conf /etc/nfs.conf\n"
-                           "mount --bind " +
-                           place +
-                           "/conf.d /etc/nfs.conf.d\n"
-                           "mount --bind " +
-                           place +
-                           "/proc /proc\n"
-                           "mount --bind " +
-                           place +
-                           "/run /run\n"
-                           "PATH=" +
-                           place + "/bin:$PATH VORN_ROOT=/ exec " BOX_SCRIPT " " + word});
+    std::vector<std::string> command = GetPrivateNamespaces().command;
+    command.insert(command.end(), {"sh", "-ec",
+                                   "mount --bind " + place +
+                                       "/nfs.conf /etc/nfs.conf\n"
+                                       "mount --bind " +
+                                       place +
+                                       "/conf.d /etc/nfs.conf.d\n"
+                                       "mount --bind " +
+                                       place +
+                                       "/proc /proc\n"
+                                       "mount --bind " +
+                                       place +
+                                       "/run /run\n"
+                                       "PATH=" +
+                                       place + "/bin:$PATH VORN_ROOT=/ exec " BOX_SCRIPT " " + word});
+    return RunProgram(command);
   }
 
   std::string Calls() const { return folder_.Read("/calls").value_or(""); }

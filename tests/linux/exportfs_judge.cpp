@@ -1,18 +1,22 @@
 #include "exportfs_judge.h"
 
-#include <unistd.h>
-
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
 
+#include "private_namespaces.h"
+#include "processes.h"
+#include "requirements.h"
+
 namespace vorn {
 namespace {
 
-constexpr const char* kNamespaces = "unshare --map-root-user --mount --net bash -euc '";
+[[maybe_unused]] const bool kRequired = !RunsInCI() || RequirePrograms({"exportfs"});
 
+// Its argument is the folder that holds the files.
 constexpr const char* kScript = R"(
+  cd "$0"
   mount -t tmpfs tmpfs /var/lib/nfs
   [ ! -d /etc/exports.d ] || mount -t tmpfs tmpfs /etc/exports.d
   mount --bind hosts /etc/hosts
@@ -29,8 +33,6 @@ constexpr const char* kScript = R"(
     umount /etc/exports
   done
 )";
-
-std::string Quoted(const std::string& folder) { return "cd '" + folder + "' && "; }
 
 void Write(const std::string& path, const std::string& text) { std::ofstream(path, std::ios::binary) << text; }
 
@@ -52,9 +54,8 @@ ExportfsJudge::~ExportfsJudge() {
 }
 
 std::string ExportfsJudge::Unavailable() const {
-  if (access("/usr/sbin/exportfs", X_OK) != 0) return "exportfs(8) is not installed";
-  const std::string probe = std::string(kNamespaces) + "mount -t tmpfs tmpfs /var/lib/nfs' 2>/dev/null";
-  return std::system(probe.c_str()) == 0 ? "" : "this system lets nobody make a mount namespace";
+  const std::string missing = ProgramMissing("exportfs");
+  return missing.empty() ? GetPrivateNamespaces().unavailable : missing;
 }
 
 std::vector<ExportfsVerdict> ExportfsJudge::Judge(const std::vector<std::string>& files,
@@ -64,8 +65,9 @@ std::vector<ExportfsVerdict> ExportfsJudge::Judge(const std::vector<std::string>
   Write(folder_ + "/hosts", known);
   const auto name = [this](std::size_t i) { return folder_ + "/" + std::to_string(i) + ".exports"; };
   for (std::size_t i = 0; i < files.size(); ++i) Write(name(i), files[i]);
-  const std::string command = Quoted(folder_) + kNamespaces + kScript + "'";
-  const bool ran = std::system(("PATH=$PATH:/usr/sbin; " + command).c_str()) == 0;
+  std::vector<std::string> command = GetPrivateNamespaces().command;
+  command.insert(command.end(), {"bash", "-euc", kScript, folder_});
+  const bool ran = RunProgram(command).status == 0;
   std::vector<ExportfsVerdict> verdicts(files.size());
   for (std::size_t i = 0; i < files.size(); ++i) {
     if (ran)

@@ -1,5 +1,5 @@
-// Asks the real exportfs(8) what it makes of an exports file, in namespaces of its own: nothing of
-// this system is exported or changed, and an ordinary user may do it.
+// Asks the real exportfs(8) how it reads an exports file, in mount and network namespaces of its own
+// (private_namespaces.h): nothing of this system is exported or changed.
 #ifndef VORN_TESTS_LINUX_EXPORTFS_JUDGE_H
 #define VORN_TESTS_LINUX_EXPORTFS_JUDGE_H
 

@@ -4,9 +4,12 @@
 
 #include "ini_text.h"
 #include "processes.h"
+#include "requirements.h"
 #include "temporary_root.h"
 
 namespace {
+
+[[maybe_unused]] const bool kRequired = RequirePrograms({"nfsconf"});
 
 std::string Unquoted(const std::string& value) {
   const bool quoted =

@@ -5,9 +5,12 @@
 #include <stdexcept>
 
 #include "processes.h"
+#include "requirements.h"
 #include "temporary_root.h"
 
 namespace {
+
+[[maybe_unused]] const bool kRequired = RequirePrograms({"kadmin.local", "kdb5_util", "klist", "ktutil"});
 
 std::string RunShell(const std::string& script) {
   const ProgramResult result = RunProgram({"sh", "-ec", script});

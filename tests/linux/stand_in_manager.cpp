@@ -7,7 +7,11 @@
 #include <stdexcept>
 #include <utility>
 
+#include "requirements.h"
+
 namespace {
+
+[[maybe_unused]] const bool kRequired = RequirePrograms({"dbus-daemon"});
 
 constexpr char kPath[] = "/org/freedesktop/systemd1";
 constexpr char kInterface[] = "org.freedesktop.systemd1.Manager";

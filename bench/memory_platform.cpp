@@ -1,5 +1,5 @@
-// The operations that the measured methods call, in memory and without the fake platform's
-// recording: what is left to measure is the module. Everything else is the fake's.
+// The platform operations of the measured methods, in memory. They replace those of the fake platform, which would
+// record every call: the benchmarks measure the module only. All other operations are the fake platform's.
 #include "memory_platform.h"
 
 #include <syslog.h>
@@ -11,7 +11,9 @@
 #include <utility>
 
 #include "core.h"
+#include "filesystem.h"
 #include "nfsconf.h"
+#include "share.h"
 #include "webapi.h"
 
 namespace {
@@ -74,7 +76,37 @@ void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
   free(record);
 }
 
-// Formats as the C library does, and sends nothing.
+struct VORNSHARE {};
+
+int VORNShareGet(const char* /*name*/, VORNSHARE** share) {
+  static VORNSHARE data;
+  *share = &data;
+  return 0;
+}
+
+void VORNShareFree(VORNSHARE* /*share*/) {}
+
+const char* KLIBSharePathGet(const VORNSHARE* /*share*/) { return "/volume1/data"; }
+
+int VORNFSHasMountPointType(const char* /*path*/, int /*type*/) { return 0; }
+
+int VORNNFSSupportKerberos(void) { return 1; }
+
+int VORNNFSRuleExtSetAll(const char* /*path*/, const ExportRuleList* /*list*/) { return 0; }
+
+void VORNNFSRuleExtFree(ExportRuleList* list) {
+  if (list == nullptr) return;
+  for (ExportRule* rule = list->first; rule != nullptr;) {
+    ExportRule* const next = rule->next;
+    free(rule);
+    rule = next;
+  }
+  free(list);
+}
+
+int KLIBServiceReload(const char* /*service*/) { return 0; }
+
+// Formats a log line as the C library does, but does not send it.
 void syslog(int /*priority*/, const char* format, ...) {
   char line[1024];
   va_list arguments;

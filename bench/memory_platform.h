@@ -1,4 +1,4 @@
-// What the benchmarks' platform holds, for the floors to answer with.
+// The content of the platform of the benchmarks. The floors answer with the same values.
 #ifndef VORN_BENCH_MEMORY_PLATFORM_H
 #define VORN_BENCH_MEMORY_PLATFORM_H
 

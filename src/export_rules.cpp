@@ -1,7 +1,10 @@
 #include "export_rules.h"
 
 #include <cstdio>
-#include <string>
+#include <optional>
+#include <string_view>
+
+#include "json_text.h"
 
 namespace {
 
@@ -34,9 +37,10 @@ void AddWord(const Word (&words)[kCount], int32_t code, Json::Value& member_hold
   }
 }
 
-// Returns the code of the word `text`, or `fallback` if no word equals it (docs/decisions/0023).
+// Returns the code of the word `value`, or `fallback` if no word equals it (docs/decisions/0023).
 template <size_t kCount>
-int32_t CodeOf(const Word (&words)[kCount], const std::string& text, int32_t fallback) {
+int32_t CodeOf(const Word (&words)[kCount], const Json::Value& value, int32_t fallback) {
+  const std::optional<std::string_view> text = TextOf(value);
   for (const Word& word : words) {
     if (text == word.text) return word.code;
   }
@@ -75,8 +79,8 @@ void RuleFromJson(const Json::Value& rule, bool with_kerberos, ExportRule* recor
   record->next = nullptr;
   // A longer client is cut: docs/decisions/0034.
   snprintf(record->client, sizeof record->client, "%s", rule["client"].asCString());
-  record->privilege = CodeOf(kPrivileges, rule["privilege"].asString(), 0);
-  record->squash = CodeOf(kSquashModes, rule["root_squash"].asString(), VORNNFS_SQUASH_GUEST);
+  record->privilege = CodeOf(kPrivileges, rule["privilege"], 0);
+  record->squash = CodeOf(kSquashModes, rule["root_squash"], VORNNFS_SQUASH_GUEST);
   record->write_mode = rule["async"].asBool() ? VORNNFS_WRITE_ASYNC : VORNNFS_WRITE_SYNC;
   record->insecure = Flag(rule["insecure"].asBool());
   record->crossmnt = Flag(rule["crossmnt"].asBool());

@@ -3,8 +3,10 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <string_view>
 #include <vector>
 
+#include "json_text.h"
 #include "log.h"
 #include "owned.h"
 #include "page.h"
@@ -23,7 +25,7 @@ const Json::Value& Member(const Json::Value& value, const char* key) {
   return value.isObject() ? value[key] : Json::Value::nullSingleton();
 }
 
-bool IsText(const Json::Value& value) { return value.isString() && !value.asString().empty(); }
+bool IsText(const Json::Value& value) { return !TextOf(value).value_or("").empty(); }
 
 bool IsIntegerOrAbsent(const Json::Value& value) { return value.isNull() || value.isInt(); }
 
@@ -128,9 +130,9 @@ bool CheckLocalUser(const KLIBSZLIST* users, const std::string& name) {
   return false;
 }
 
-bool CheckPrincipalSymbols(const std::string& principal) {
-  if (principal.find('=') == std::string::npos) return true;
-  LOG_ERROR("KERBEROS_PRINCIPAL:%s contains invalid symbol \"=\"", principal.c_str());
+bool CheckPrincipalSymbols(const Json::Value& principal) {
+  if (TextOf(principal).value_or("").find('=') == std::string_view::npos) return true;
+  LOG_ERROR("KERBEROS_PRINCIPAL:%s contains invalid symbol \"=\"", principal.asCString());
   return false;
 }
 
@@ -141,7 +143,7 @@ int CheckMapping(const Json::Value& mapping, const KLIBSZLIST* users) {
     LOG_ERROR("string variable 'kerberos_principal' is missing or empty in idmap.");
     return kBadParameter;
   }
-  if (!CheckPrincipalSymbols(principal.asString())) return kPrincipalSymbol;
+  if (!CheckPrincipalSymbols(principal)) return kPrincipalSymbol;
   const Json::Value& local_name = Member(mapping, "local_name");
   if (!IsText(local_name)) {
     LOG_ERROR("string variable 'local_name' is missing or empty in idmap.");
@@ -373,7 +375,7 @@ bool NFSIDMapServiceHandler::SetIDMap(const Json::Value& params, Json::Value& /*
     LOG_ERROR("string variable 'id', 'kerberos_principal', or 'local_name' are missing.");
     return Fail(kBadParameter);
   }
-  if (!CheckPrincipalSymbols(principal.asString())) return Fail(kPrincipalSymbol);
+  if (!CheckPrincipalSymbols(principal)) return Fail(kPrincipalSymbol);
   const IDMap record = GetIDMapWithTable();
   // The old mapping is removed first, so that a request may keep the principal: docs/decisions/0029.
   if (!record || !RemoveOldMapping(record->table, id.asCString())) return Fail(kPlatformFailure);

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "core.h"
+#include "json_text.h"
 #include "log.h"
 #include "nfsconf.h"
 #include "owned.h"
@@ -21,30 +22,49 @@ constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 constexpr Setting kEnableNFSv4 = {"enable_nfs_v4", Setting::Kind::kSwitch, &NFSConfRecord::enable_nfs_v4,
                                   &SettingsChange::service_affected};
 
-bool CheckServiceSwitch(const Json::Value& params) {
-  if (params["enable_nfs"].isBool()) return true;
+// The parameters of "set". Each key is looked up once, for the check and for the change.
+struct ServiceParameters {
+  explicit ServiceParameters(const Json::Value& params)
+      : enable_nfs(params["enable_nfs"]),
+        enable_nfs_v4(params[kEnableNFSv4.key]),
+        nfs_v4_domain(params["nfs_v4_domain"]) {
+    for (size_t i = 0; i < std::size(kLiveSettings); ++i) live[i] = &params[kLiveSettings[i].key];
+  }
+
+  const Json::Value& enable_nfs;
+  const Json::Value& enable_nfs_v4;
+  const Json::Value& nfs_v4_domain;
+  const Json::Value* live[std::size(kLiveSettings)];  // in the order of kLiveSettings
+};
+
+bool CheckServiceSwitch(const ServiceParameters& given) {
+  if (given.enable_nfs.isBool()) return true;
   LOG_ERROR("bool variable 'enable_nfs' is missing.");
   return false;
 }
 
-bool IsAcceptedOrAbsent(const Setting& setting, const Json::Value& params) {
-  const Json::Value& given = params[setting.key];
+bool IsAcceptedOrAbsent(const Setting& setting, const Json::Value& given) {
   return given.isNull() || setting.Accepts(given);
 }
 
-bool HasNFSv4Types(const Json::Value& params) {
-  const Json::Value& domain = params["nfs_v4_domain"];
-  return IsAcceptedOrAbsent(kEnableNFSv4, params) && (domain.isNull() || domain.isString());
+bool HasNFSv4Types(const ServiceParameters& given) {
+  return IsAcceptedOrAbsent(kEnableNFSv4, given.enable_nfs_v4) &&
+         (given.nfs_v4_domain.isNull() || given.nfs_v4_domain.isString());
 }
 
-bool HasLiveTypes(const Json::Value& params) {
-  return std::all_of(std::begin(kLiveSettings), std::end(kLiveSettings),
-                     [&](const Setting& setting) { return IsAcceptedOrAbsent(setting, params); });
+bool HasLiveTypes(const ServiceParameters& given) {
+  return std::equal(
+      std::begin(kLiveSettings), std::end(kLiveSettings), given.live,
+      [](const Setting& setting, const Json::Value* value) { return IsAcceptedOrAbsent(setting, *value); });
 }
 
 bool CheckTypes(bool accepted) {
   if (!accepted) LOG_ERROR("Invalid type of input.");
   return accepted;
+}
+
+bool CheckParameters(const ServiceParameters& given) {
+  return CheckServiceSwitch(given) && CheckTypes(HasNFSv4Types(given) && HasLiveTypes(given));
 }
 
 void AddServiceAndNFSv4(const NFSConfRecord& record, const IDMap& id_map, Json::Value& result) {
@@ -62,10 +82,10 @@ bool ReadSettings(NFSConfRecord* record, IDMap* id_map) {
   return false;
 }
 
-void PlanServiceAndNFSv4(const Json::Value& params, SettingsChange* change) {
+void PlanServiceAndNFSv4(const ServiceParameters& given, SettingsChange* change) {
   change->enabled = IsServiceEnabled();
-  change->wanted = params["enable_nfs"].asBool();
-  kEnableNFSv4.Plan(params, change);
+  change->wanted = given.enable_nfs.asBool();
+  kEnableNFSv4.Plan(given.enable_nfs_v4, change);
 }
 
 bool ReplaceDomain(const std::string& domain, _tag_nfs_id_map_* id_map) {
@@ -83,8 +103,7 @@ bool ReplaceDomain(const std::string& domain, _tag_nfs_id_map_* id_map) {
 
 // Writes the given domain if NFSv4 will be enabled and the domain differs from the stored one. The caller keeps the
 // ID-map record until the end of the request: it holds the configuration lock.
-bool SaveDomain(const Json::Value& params, SettingsChange* change, IDMap* id_map) {
-  const Json::Value& domain = params["nfs_v4_domain"];
+bool SaveDomain(const Json::Value& domain, SettingsChange* change, IDMap* id_map) {
   if (change->working.enable_nfs_v4 == 0 || domain.isNull()) return true;
   id_map->reset(VORNNFSIDMapGet());
   if (!*id_map) {
@@ -95,9 +114,22 @@ bool SaveDomain(const Json::Value& params, SettingsChange* change, IDMap* id_map
     LOG_ERROR("szDomain should not be NULL");
     return false;
   }
-  if (domain.asString() == (*id_map)->domain) return true;
+  if (TextOf(domain) == (*id_map)->domain) return true;
   change->service_affected = true;
   return ReplaceDomain(domain.asString(), id_map->get());
+}
+
+// Stores the record first and then applies it: docs/decisions/0014.
+bool ApplyParameters(const ServiceParameters& given) {
+  const VornConf configuration;
+  SettingsChange change;
+  if (!ReadRecord(HERE, &change.stored)) return false;
+  change.working = change.stored;
+  PlanServiceAndNFSv4(given, &change);
+  IDMap id_map;
+  if (!SaveDomain(given.nfs_v4_domain, &change, &id_map)) return false;
+  for (size_t i = 0; i < std::size(kLiveSettings); ++i) kLiveSettings[i].Plan(*given.live[i], &change);
+  return StoreRecord(HERE, change.working) && ApplyLive(HERE, change) && DriveService(HERE, change);
 }
 
 }  // namespace
@@ -107,7 +139,7 @@ void NFSServiceHandler::Get() {
 }
 
 void NFSServiceHandler::Set() {
-  AnswerTo(HERE, [this](const Json::Value& params) { return CheckData(params) && SetData(params); });
+  AnswerTo(HERE, [this](const Json::Value& params) { return CheckAndSet(params); });
 }
 
 // Version 2 runs the data functions of version 1: docs/decisions/0015.
@@ -116,7 +148,7 @@ void NFSServiceHandler::GetV2() {
 }
 
 void NFSServiceHandler::SetV2() {
-  AnswerTo(HERE, [this](const Json::Value& params) { return CheckData(params) && SetData(params); });
+  AnswerTo(HERE, [this](const Json::Value& params) { return CheckAndSet(params); });
 }
 
 bool NFSServiceHandler::GetData(Json::Value& result) {
@@ -130,21 +162,17 @@ bool NFSServiceHandler::GetData(Json::Value& result) {
 }
 
 bool NFSServiceHandler::CheckData(const Json::Value& params) {
-  const bool accepted = CheckServiceSwitch(params) && CheckTypes(HasNFSv4Types(params) && HasLiveTypes(params));
-  return accepted || Fail(kBadParameter);
+  return CheckParameters(ServiceParameters(params)) || Fail(kBadParameter);
 }
 
 bool NFSServiceHandler::SetData(const Json::Value& params) {
-  const VornConf configuration;
-  SettingsChange change;
-  if (!ReadRecord(HERE, &change.stored)) return Fail(kPlatformFailure);
-  change.working = change.stored;
-  PlanServiceAndNFSv4(params, &change);
-  IDMap id_map;
-  if (!SaveDomain(params, &change, &id_map)) return Fail(kPlatformFailure);
-  for (const Setting& setting : kLiveSettings) setting.Plan(params, &change);
-  const bool done = StoreRecord(HERE, change.working) && ApplyLive(HERE, change) && DriveService(HERE, change);
-  return done || Fail(kPlatformFailure);
+  return ApplyParameters(ServiceParameters(params)) || Fail(kPlatformFailure);
+}
+
+bool NFSServiceHandler::CheckAndSet(const Json::Value& params) {
+  const ServiceParameters given(params);
+  if (!CheckParameters(given)) return Fail(kBadParameter);
+  return ApplyParameters(given) || Fail(kPlatformFailure);
 }
 
 bool NFSServiceHandler::GetDataV2(Json::Value& result) {
@@ -157,16 +185,17 @@ bool NFSServiceHandler::GetDataV2(Json::Value& result) {
 }
 
 bool NFSServiceHandler::CheckDataV2(const Json::Value& params) {
-  const bool accepted = CheckServiceSwitch(params) && CheckTypes(HasNFSv4Types(params));
-  return accepted || Fail(kBadParameter);
+  const ServiceParameters given(params);
+  return (CheckServiceSwitch(given) && CheckTypes(HasNFSv4Types(given))) || Fail(kBadParameter);
 }
 
 bool NFSServiceHandler::SetDataV2(const Json::Value& params) {
   const VornConf configuration;
   SettingsChange change;
   if (!ReadRecord(HERE, &change.stored) || !ReadRecord(HERE, &change.working)) return Fail(kPlatformFailure);
-  PlanServiceAndNFSv4(params, &change);
+  const ServiceParameters given(params);
+  PlanServiceAndNFSv4(given, &change);
   IDMap id_map;
-  if (!SaveDomain(params, &change, &id_map)) return Fail(kPlatformFailure);
+  if (!SaveDomain(given.nfs_v4_domain, &change, &id_map)) return Fail(kPlatformFailure);
   return (StoreRecord(HERE, change.working) && DriveService(HERE, change)) || Fail(kPlatformFailure);
 }

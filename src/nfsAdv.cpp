@@ -60,9 +60,8 @@ bool CheckPorts(const Json::Value& params) {
   return true;
 }
 
-// Returns whether the port is neither given nor changed, or free for the daemon.
-bool IsFree(const Port& port, const Json::Value& params, const NFSConfRecord& stored) {
-  const Json::Value& given = params[port.setting.key];
+// Returns whether the port is absent, unchanged or free for the daemon.
+bool IsFree(const Port& port, const Json::Value& given, const NFSConfRecord& stored) {
   if (given.isNull() || given.asInt() == stored.*port.setting.field) return true;
   if (WebUtils::IsPortConflict(port.service, given.asInt(), given.asInt()) == 0) return true;
   LOG_ERROR("%s", port.conflict);
@@ -71,8 +70,9 @@ bool IsFree(const Port& port, const Json::Value& params, const NFSConfRecord& st
 
 bool PlanPorts(const Json::Value& params, SettingsChange* change) {
   for (const Port& port : kPorts) {
-    if (!IsFree(port, params, change->stored)) return false;
-    port.setting.Plan(params, change);
+    const Json::Value& given = params[port.setting.key];
+    if (!IsFree(port, given, change->stored)) return false;
+    port.setting.Plan(given, change);
   }
   return true;
 }
@@ -112,8 +112,8 @@ bool NFSServiceAdvHandler::SetData(const Json::Value& params) {
   if (!ReadRecord(HERE, &change.stored) || !ReadRecord(HERE, &change.working)) return Fail(kPlatformFailure);
   change.enabled = IsServiceEnabled();
   change.wanted = params["enable_nfs"].asBool();  // optional here: docs/decisions/0018
-  for (const Setting& setting : kLiveSettings) setting.Plan(params, &change);
-  kCustomPorts.Plan(params, &change);
+  for (const Setting& setting : kLiveSettings) setting.Plan(params[setting.key], &change);
+  kCustomPorts.Plan(params[kCustomPorts.key], &change);
   if (!PlanPorts(params, &change)) return Fail(kPortConflict);
   // The order is the reverse of the service API: docs/decisions/0014.
   const bool done = ApplyLive(HERE, change) && StoreRecord(HERE, change.working) && DriveService(HERE, change);

@@ -56,8 +56,7 @@ Json::Value Setting::Show(const NFSConfRecord& record) const {
   return record.*field;
 }
 
-void Setting::Plan(const Json::Value& params, SettingsChange* change) const {
-  const Json::Value& given = params[key];
+void Setting::Plan(const Json::Value& given, SettingsChange* change) const {
   if (given.isNull() || !Differs(*this, given, change->stored.*field)) return;
   change->working.*field = IsSwitch() ? int32_t{given.asBool()} : given.asInt();
   change->*effect = true;

@@ -42,9 +42,9 @@ struct Setting {
   // Returns the stored value as the answer shows it.
   Json::Value Show(const NFSConfRecord& record) const;
 
-  // Puts the request's value into the working record and raises the effect, if the value is given and
+  // Puts the given value into the working record and raises the effect, if the value is not null and
   // differs from the stored one. Throws Json::Exception if the value cannot be converted.
-  void Plan(const Json::Value& params, SettingsChange* change) const;
+  void Plan(const Json::Value& given, SettingsChange* change) const;
 };
 
 // The settings that a running service adopts without a restart. Two APIs have them.

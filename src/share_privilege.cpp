@@ -4,11 +4,14 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "core.h"
 #include "export_rules.h"
 #include "filesystem.h"
+#include "json_text.h"
 #include "log.h"
 #include "nfsconf.h"
 #include "owned.h"
@@ -23,20 +26,23 @@ constexpr char kExportsFile[] = "/etc/exports";
 constexpr char kForbiddenInClient[] = "()|= '\"";
 
 bool CheckClient(const Json::Value& client) {
-  if (client.isString() && client.asString().find_first_of(kForbiddenInClient) == std::string::npos) return true;
+  const std::optional<std::string_view> text = TextOf(client);
+  if (text && text->find_first_of(kForbiddenInClient) == std::string_view::npos) return true;
   LOG_ERROR("string variable 'client' is missing or contain error symbol in rule.");
   return false;
 }
 
 bool CheckPrivilege(const Json::Value& privilege) {
-  if (privilege == "rw" || privilege == "ro") return true;
+  const std::optional<std::string_view> word = TextOf(privilege);
+  if (word == "rw" || word == "ro") return true;
   LOG_ERROR("string variable 'client' is missing in rule, or the value is not valid.");
   return false;
 }
 
 bool CheckRootSquash(const Json::Value& root_squash) {
+  const std::optional<std::string_view> word = TextOf(root_squash);
   for (const char* mode : {"root", "admin", "guest", "all_admin"}) {
-    if (root_squash == mode) return true;
+    if (word == mode) return true;
   }
   LOG_ERROR("string variable 'root_squash' is missing in rule, or the value is not valid.");
   return false;
@@ -67,25 +73,21 @@ bool CheckSwitches(const Json::Value& rule) {
   return true;
 }
 
-bool CheckFlavourTypes(const Json::Value& flavours) {
-  for (const BoolKey& key : kFlavours) {
-    const Json::Value& flavour = flavours[key.name];
-    if (flavour.isNull() || flavour.isBool()) continue;
-    LOG_ERROR("%s", key.text);
-    return false;
-  }
-  return true;
-}
-
 bool CheckFlavours(const Json::Value& flavours) {
   if (!flavours.isObject()) {
     LOG_ERROR("array variable 'security_flavor' is missing.");
     return false;
   }
-  if (!CheckFlavourTypes(flavours)) return false;
+  bool any = false;
   for (const BoolKey& key : kFlavours) {
-    if (flavours[key.name].asBool()) return true;
+    const Json::Value& flavour = flavours[key.name];
+    if (!flavour.isNull() && !flavour.isBool()) {
+      LOG_ERROR("%s", key.text);
+      return false;
+    }
+    any = any || flavour.asBool();
   }
+  if (any) return true;
   LOG_ERROR("should specify at least one variable as true in security_flavor.");
   return false;
 }

@@ -79,14 +79,15 @@ struct Method {
 // The methods in the order of gTable.
 const Method kMethods[] = {
     {"", 1, "get", 7, 0, "{}"},
-    {"", 1, "set", 2, 0,
+    {"", 1, "set", 1, 0,
      R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "a.domain.long.enough.for.the.heap",
          "read_size": 4096, "write_size": 4096, "unix_pri_enable": true})"},
     {"", 2, "get", 7, 0, "{}"},
-    {"", 2, "set", 2, 0,
+    {"", 2, "set", 1, 0,
      R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "a.domain.long.enough.for.the.heap"})"},
     {".AdvancedSetting", 1, "get", 7, 0, "{}"},
-    // The port is in use: a request that succeeds allocates nothing, one that fails is logged.
+    // This method and "save" allocate nothing until a failed request is logged: the port is in use, and the rules
+    // cannot be written.
     {".AdvancedSetting", 1, "set", 9, 2303,
      R"({"enable_nfs": true, "read_size": 4096, "write_size": 4096, "unix_pri_enable": true,
          "custom_port_enable": true, "statd_port": 5000, "nlm_port": 5001})"},
@@ -95,15 +96,15 @@ const Method kMethods[] = {
      R"({"keytab_file_tmp": "/nowhere/a-name-that-does-not-fit-into-the-text-itself"})"},
     {".Kerberos", 1, "list", 14, 0, "{}"},
     {".IDMap", 1, "list", 19, 0, R"({"suggestion": true, "filter": "o"})"},
-    {".IDMap", 1, "create", 13, 0,
+    {".IDMap", 1, "create", 9, 0,
      R"({"idmap": [{"kerberos_principal": "somebody.with.a.long.name@BOX", "local_name": "alice"},
                    {"kerberos_principal": "somebody.else.at.length@BOX", "local_name": "bob"}]})"},
-    {".IDMap", 1, "set", 4, 0,
+    {".IDMap", 1, "set", 1, 0,
      R"({"id": "one.principal.of.length@BOX", "kerberos_principal": "two.principals.of.length@BOX",
          "local_name": "somebody-with-a-name-that-needs-the-heap"})"},
     {".IDMap", 1, "delete", 2, 0, R"({"id": ["one.principal.of.length@BOX"]})"},
     {".SharePrivilege", 1, "load", 17, 0, R"({"share_name": "data"})"},
-    {".SharePrivilege", 1, "save", 1, 0,
+    {".SharePrivilege", 1, "save", 11, 2302,
      R"({"share_name": "data", "rule": [{"client": "a.client.with.a.long.name.example",
         "privilege": "rw", "root_squash": "admin", "async": true, "insecure": true, "crossmnt": true,
         "security_flavor": {"sys": true, "kerberos": true}}]})"},
@@ -134,6 +135,7 @@ class Memory : public testing::Test {
     platform->users = {"alice", "bob", "somebody-with-a-name-that-needs-the-heap"};
     platform->files = {"/etc/nfs/krb5.keytab"};
     platform->port_conflicts = {"nfs_nlm 5001"};
+    platform->Fail("VORNNFSRuleExtSetAll");
     ExportRule rule{};
     std::strcpy(rule.client, "a.client.with.a.long.name.example");
     platform->rules = {rule};

@@ -11,7 +11,7 @@ namespace {
 // Plans every live setting of the parameters.
 void Plan(const char* params, SettingsChange* change) {
   const Json::Value given = Parse(params);
-  for (const Setting& setting : kLiveSettings) setting.Plan(given, change);
+  for (const Setting& setting : kLiveSettings) setting.Plan(given[setting.key], change);
 }
 
 TEST(SettingsChange, BeginsAsNone) {
@@ -54,7 +54,7 @@ TEST(Setting, ShowsTheFieldInItsForm) {
 
 TEST(Setting, RaisesItsOwnEffect) {
   SettingsChange change;
-  kIntegerSwitch.Plan(Parse(R"({"enable_nfs_v4": true})"), &change);
+  kIntegerSwitch.Plan(Json::Value(true), &change);
   EXPECT_EQ(change.working.enable_nfs_v4, 1);
   EXPECT_TRUE(change.service_affected);
   EXPECT_FALSE(change.sizes_changed || change.permissions_changed);

@@ -1,7 +1,8 @@
 """Runs the steps of a check: some side by side, each in a process group of its own, with its output in build/run/NAME.
 
-A step that fails ends the run: the steps that are still running are killed with all their children. The results are
-kept in build/run/results.json, where those of earlier runs stay until the step runs again.
+A step that fails ends the run, unless it is told to keep going: the steps that are still running are killed with all
+their children. The results are kept in build/run/results.json, where those of earlier runs stay until the step runs
+again.
 """
 
 import ctypes
@@ -56,11 +57,12 @@ class Stopped(Exception):
 class Run:
     """Runs steps, once. Safe to stop() from another thread or a signal handler."""
 
-    def __init__(self, steps, limit_minutes):
+    def __init__(self, steps, limit_minutes, keep_going=False):
         self._steps = [step for step in steps if step.wanted]
         self._finished = {step.name: threading.Event() for step in self._steps}
         self._deadline = time.monotonic() + 60 * limit_minutes
         self._limit_minutes = limit_minutes
+        self._keep_going = keep_going
         self._stop = threading.Event()
         self._lock = threading.Lock()
         self.results = {}
@@ -118,10 +120,10 @@ class Run:
         with open(FOLDER / step.name, "wb") as output:
             result.status = self._wait(step, result, output)
         self._keep(result)
-        if result.outcome() != "passed":
-            self.stop(f"{step.name} failed with status {result.status}")
+        print(f"== {step.name} {result.outcome()} after {result.seconds:.0f} s", flush=True)
+        if result.outcome() != "passed" and not self._keep_going:
+            self.stop(f"{step.name} {result.outcome()}")
             raise Stopped
-        print(f"== {step.name} passed after {result.seconds:.0f} s", flush=True)
         self._finished[step.name].set()
 
     def _wait(self, step, result, output):
@@ -211,7 +213,7 @@ def show_times(run, steps, shares, limit_minutes):
     for step in steps:
         result = run.results.get(step.name)
         if result is None:
-            print(f"{step.name:<14} {step.share:<10} {'-':>8} {'-':>8}  {'not run' if step.wanted else 'another turn'}")
+            print(f"{step.name:<14} {step.share:<10} {'-':>8} {'-':>8}  {'not run' if step.wanted else 'not this time'}")
             continue
         used[step.share] = used.get(step.share, 0) + result.seconds
         print(f"{step.name:<14} {step.share:<10} {result.seconds:8.0f} {result.cpu_seconds:8.0f}  "

@@ -1,15 +1,15 @@
-// The platform's file-system library.
+// The platform's file-system library. Thread-safe.
 #ifndef VORN_PLATFORM_FILESYSTEM_H
 #define VORN_PLATFORM_FILESYSTEM_H
 
 extern "C" {
 
-// A mount whose file system the kernel's NFS server cannot export: FUSE, CIFS, NFS, an overlay
-// without file handles.
+// The type of mounts whose file system the kernel's NFS server cannot export: FUSE, CIFS, NFS, and overlays without
+// file handles (name_to_handle_at(2), exports(5)).
 enum { VORNFS_MOUNT_UNEXPORTABLE = 32 };
 
-// 1 when `path`, or a folder below it, is a mount point of that type; 0 when none is. Negative when
-// that cannot be found out.
+// Returns 1 if `path`, or a folder below it, is a mount point of that type, and 0 if not. Returns a negative value if
+// the mounts cannot be read; the reason is then in the error facility (core.h).
 int VORNFSHasMountPointType(const char* path, int type);
 
 }  // extern "C"

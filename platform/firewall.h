@@ -1,11 +1,12 @@
-// The platform's firewall library.
+// The platform's firewall library. Thread-safe.
 #ifndef VORN_PLATFORM_FIREWALL_H
 #define VORN_PLATFORM_FIREWALL_H
 
 extern "C" {
 
-// Makes the firewall follow the configured service ports, in one transaction: on failure the old
-// rules stay. Does nothing, successfully, when the box's firewall is switched off.
+// Opens the configured ports of the NFS service in the firewall (nft(8)), in one transaction: on failure the old rules
+// stay. Returns a non-negative value on success, also if the firewall of the box is switched off, and a negative value
+// on failure; the reason is then in the error facility (core.h).
 int VORNFwRuleHup(void);
 
 }  // extern "C"

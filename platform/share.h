@@ -1,18 +1,18 @@
-// The platform's share library: shared folders by name.
+// The platform's share library: shared folders by name. Thread-safe on different handles.
 #ifndef VORN_PLATFORM_SHARE_H
 #define VORN_PLATFORM_SHARE_H
 
 extern "C" {
 
-// A shared folder, as it was when it was looked up. Its path is KLIBSharePathGet's (core.h).
+// A shared folder as it was at the lookup. KLIBSharePathGet (core.h) returns its path.
 typedef struct VORNSHARE VORNSHARE;
 
-// Looks a share up by its exact name. Negative when there is none, or it cannot be read; the error
-// facility has the reason, and `*share` is left as it was. Otherwise `*share` is the caller's and
-// goes with one VORNShareFree.
+// Looks up a share by its exact name and stores its handle in `*share`. The handle belongs to the caller, who releases
+// it with VORNShareFree. Returns a negative value if there is no such share or it cannot be read; `*share` is then
+// unchanged and the reason is in the error facility (core.h).
 int VORNShareGet(const char* name, VORNSHARE** share);
 
-// Releases a handle. Null is allowed.
+// Releases a handle. Accepts null.
 void VORNShareFree(VORNSHARE* share);
 
 }  // extern "C"

@@ -1,8 +1,8 @@
-// The web-API framework, as a module sees it: one request, one answer, and the port check of the
+// The web-API framework that modules use: a request, its answer, the rows of an API table, and the port test of the
 // appliance's service registry.
 //
-// These classes are defined by the platform library, never inline, so that a module binary runs on
-// whichever platform is loaded below it.
+// The platform library defines the members of these classes, never inline: a module binary contains no layout of a
+// platform and runs on every platform library. Objects are not thread-safe; each request has its own.
 #ifndef VORN_PLATFORM_WEBAPI_H
 #define VORN_PLATFORM_WEBAPI_H
 
@@ -12,25 +12,25 @@
 
 namespace VORN {
 
-// The parameters of one request. The server makes it, a module only reads it.
+// The parameters of one request. The server constructs and owns the object; a module only reads it.
 class APIRequest {
  public:
-  // `parameters` is the request's parameter object, or null for a request without any.
+  // `parameters` is the JSON object of the parameters, or null if the request has none.
   explicit APIRequest(Json::Value parameters);
   ~APIRequest();
   APIRequest(const APIRequest&) = delete;
   APIRequest& operator=(const APIRequest&) = delete;
 
-  // The empty name asks for the whole parameter object. Any other name asks for the member of that
-  // name; `fallback` is the answer when the member (or the whole object) is absent.
-  // Throws what copying a JSON value throws.
+  // Returns a copy of the whole parameter object if `name` is empty, and of the member `name` otherwise. Returns
+  // `fallback` if the object or the member is absent. Throws std::bad_alloc, as copying a JSON value does.
   Json::Value GetParam(const std::string& name, const Json::Value& fallback) const;
 
  private:
   Json::Value parameters_;
 };
 
-// The one answer to a request. A module calls SetSuccess or SetError once; the server then reads it.
+// The answer to a request. The server constructs and owns the object. A module calls SetSuccess or SetError exactly
+// once; the server then reads the answer.
 class APIResponse {
  public:
   APIResponse();
@@ -38,10 +38,10 @@ class APIResponse {
   APIResponse(const APIResponse&) = delete;
   APIResponse& operator=(const APIResponse&) = delete;
 
-  // Success with `data`; null stands for an answer without data.
+  // Answers success with `data`. Null means no data.
   void SetSuccess(const Json::Value& data);
 
-  // Failure with a non-zero error code; `details` is null where the code says it all.
+  // Answers failure with a non-zero error code. `details` is null if the code is sufficient.
   void SetError(int code, const Json::Value& details);
 
   // For the server.
@@ -59,16 +59,16 @@ class APIResponse {
 
 namespace WebUtils {
 
-// Whether a port from `first` to `last` (both included) cannot be given to `service`: 0 when every
-// one is free for it. A conflict is a number outside 1..65535, the configured port of another
-// service, or a socket that somebody other than `service` itself listens on.
-// Services are named as the appliance names them: "nfs_statd", "nfs_nlm".
+// Tests whether `service` can use the ports from `first` to `last`, both included. Returns 0 if all of them are free
+// for it, and a non-zero value otherwise. A port conflicts if it is outside 1 to 65535, if another service is
+// configured to use it, or if a process other than `service` listens on it. Services have the appliance's names:
+// "nfs_statd" for rpc.statd(8), "nfs_nlm" for the lock manager. Thread-safe.
 int IsPortConflict(const char* service, int first, int last);
 
 }  // namespace WebUtils
 
-// One method of one API. A module exports an array of these that ends with a row of zeros.
-// On a 32-bit target a row is 16 bytes.
+// A row of an API table: one method of one API. A module exports an array of rows; the row after the last one is all
+// zero. On a 32-bit target a row has 16 bytes. The strings are valid as long as the module is loaded.
 struct APIRow {
   const char* api;     // "VORN.Core.FileServ.NFS"
   int version;         // 1 or 2
@@ -78,7 +78,8 @@ struct APIRow {
 
 static_assert(sizeof(APIRow) == 4 * sizeof(void*), "the row's layout is part of the binary contract");
 
-// What every module exports as "GetAPITable": the address of its first row.
+// The type of the function that every module exports under the undecorated name "GetAPITable". It returns the address
+// of the first row, and null only if the module cannot be used.
 using GetAPITableFunction = const void* (*)();
 
 #endif  // VORN_PLATFORM_WEBAPI_H

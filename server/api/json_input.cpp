@@ -4,9 +4,12 @@
 #include <unistr.h>
 
 #include <algorithm>
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
+#include <cstdlib>
 #include <memory>
+#include <utility>
 
 namespace vorn::server {
 namespace {
@@ -21,13 +24,19 @@ std::size_t Utf8End(std::string_view text) {
   return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
 }
 
-// What JsonCpp lets pass even in its strict mode: characters, numbers and texts that RFC 8259 has no
-// place for. Leaves the structure, and so what comes after what, to JsonCpp.
+// What JsonCpp allocates for a value: the Json::Value itself, the node of the map that holds it, and for an array
+// or an object the map.
+constexpr std::size_t kValueCost = 192;
+// A key, and a string, are copied into an allocation of their own.
+constexpr std::size_t kTextCost = 32;
+
+// Finds characters, numbers and strings that RFC 8259 does not allow and JsonCpp accepts even in its strict mode,
+// and bounds what JsonCpp would spend. Leaves the order of the tokens to JsonCpp.
 class LexicalCheck {
  public:
   explicit LexicalCheck(std::string_view text) : text_(text) {}
 
-  // What is wrong at position(), or null.
+  // Returns what is wrong at position(), or nullptr.
   const char* Run() {
     if (const std::size_t end = Utf8End(text_); end != text_.size()) return Fault(end, "not UTF-8");
     while (at_ < text_.size()) {
@@ -36,6 +45,8 @@ class LexicalCheck {
     return nullptr;
   }
   std::size_t position() const { return at_; }
+  bool too_large() const { return values_ > kMaxJsonValues; }
+  std::size_t cost() const { return values_ * kValueCost + texts_ * kTextCost + text_.size(); }
 
  private:
   const char* Fault(std::size_t at, const char* what) {
@@ -46,13 +57,42 @@ class LexicalCheck {
 
   const char* Token() {
     const char c = Peek();
+    if (c == ' ' || c == '\t' || c == '\r' || c == '\n') return Blank();
+    if (c == ':') return Colon();
+    after_string_ = c == '"';
+    if (c == ',' || c == '}' || c == ']') return Separator(c);
+    if (++values_ > kMaxJsonValues) return "more than 100000 values";
     if (c == '"') return String();
     if (c == '-' || IsDigit(c)) return Number();
     if (c >= 'a' && c <= 'z') return Word();
-    if (c == '{' || c == '[') ++depth_;
-    if (c == '}' || c == ']') --depth_;
-    if (depth_ > kMaxJsonDepth) return "nested too deep";
-    return Skip("{}[]:, \t\r\n") ? nullptr : "unexpected character";
+    return Opening(c);
+  }
+
+  const char* Blank() {
+    ++at_;
+    return nullptr;
+  }
+
+  // The string before a colon is a key and not a value.
+  const char* Colon() {
+    if (!after_string_) return "unexpected character";
+    after_string_ = false;
+    --values_;
+    ++at_;
+    return nullptr;
+  }
+
+  const char* Separator(char c) {
+    if (c != ',') --depth_;
+    ++at_;
+    return nullptr;
+  }
+
+  const char* Opening(char c) {
+    if (c != '{' && c != '[') return "unexpected character";
+    if (++depth_ > kMaxJsonDepth) return "nested too deep";
+    ++at_;
+    return nullptr;
   }
 
   const char* Word() {
@@ -70,9 +110,17 @@ class LexicalCheck {
     if (Peek() == '0' && IsDigit(Peek(1))) return Fault(begin, "a number begins with 0");
     if (!Digits()) return Fault(begin, "not a number");
     if (Skip(".") && !Digits()) return Fault(begin, "not a number");
-    if (!Skip("eE")) return nullptr;
-    Skip("+-");
-    return Digits() ? nullptr : Fault(begin, "not a number");
+    if (Skip("eE")) {
+      Skip("+-");
+      if (!Digits()) return Fault(begin, "not a number");
+    }
+    return IsFinite(text_.substr(begin, at_ - begin)) ? nullptr : Fault(begin, "a number beyond the range of a double");
+  }
+
+  // Some versions of JsonCpp read a number that is too large as infinity.
+  static bool IsFinite(std::string_view number) {
+    const bool may_be_large = number.size() > 300 || number.find_first_of("eE") != std::string_view::npos;
+    return !may_be_large || std::isfinite(std::strtod(std::string(number).c_str(), nullptr));
   }
 
   bool Skip(std::string_view one_of) {
@@ -88,6 +136,7 @@ class LexicalCheck {
   }
 
   const char* String() {
+    ++texts_;
     for (++at_; at_ < text_.size() && Peek() != '"';) {
       if (static_cast<unsigned char>(Peek()) < 0x20) return "control character in a text";
       if (Peek() != '\\') {
@@ -133,6 +182,9 @@ class LexicalCheck {
   std::string_view text_;
   std::size_t at_ = 0;
   int depth_ = 0;
+  std::size_t values_ = 0;
+  std::size_t texts_ = 0;      // keys and strings
+  bool after_string_ = false;  // the last token was a string
 };
 
 std::string Located(std::string_view text, std::size_t position, const char* what) {
@@ -164,22 +216,33 @@ bool IsPlainUtf8(std::string_view text) {
   return Utf8End(text) == text.size() && text.find('\0') == std::string_view::npos;
 }
 
-std::optional<Json::Value> ParseJsonObject(std::string_view text, std::string* error) {
+std::optional<JsonText> JsonText::Check(std::string_view text, JsonFault* fault) {
   LexicalCheck check(text);
-  if (const char* fault = check.Run(); fault != nullptr) {
-    *error = Located(text, check.position(), fault);
-    return std::nullopt;
-  }
-  // Making a reader costs as much as reading a small request.
+  const char* what = check.Run();
+  if (what == nullptr) return JsonText(text, check.cost());
+  *fault = {Located(text, check.position(), what), check.too_large()};
+  return std::nullopt;
+}
+
+std::optional<Json::Value> JsonText::ParseObject(std::string* error) const {
+  // Constructing a reader costs as much as reading a small request.
   thread_local const std::unique_ptr<Json::CharReader> reader = NewReader();
   Json::Value value;
   std::string messages;
-  if (!reader->parse(text.data(), text.data() + text.size(), &value, &messages)) {
+  if (!reader->parse(text_.data(), text_.data() + text_.size(), &value, &messages)) {
     *error = FirstMessage(messages);
     return std::nullopt;
   }
   if (value.isObject()) return value;
   *error = "Line 1, Column 1: one JSON object is expected";
+  return std::nullopt;
+}
+
+std::optional<Json::Value> ParseJsonObject(std::string_view text, std::string* error) {
+  JsonFault fault;
+  const std::optional<JsonText> checked = JsonText::Check(text, &fault);
+  if (checked) return checked->ParseObject(error);
+  *error = std::move(fault.text);
   return std::nullopt;
 }
 

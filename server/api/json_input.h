@@ -1,9 +1,10 @@
-// JSON as strict as RFC 8259 has it, and stricter where two readers could differ.
+// JSON as strict as RFC 8259 defines it, and stricter where two readers could differ.
 #ifndef VORN_SERVER_JSON_INPUT_H
 #define VORN_SERVER_JSON_INPUT_H
 
 #include <json/value.h>
 
+#include <cstddef>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -11,13 +12,40 @@
 namespace vorn::server {
 
 constexpr int kMaxJsonDepth = 64;
+constexpr std::size_t kMaxJsonValues = 100000;  // every object, array, string, number and literal counts
 
-// One JSON object, the whole of `text`, in UTF-8. None for anything else, also for a key given
-// twice, U+0000, half a surrogate pair and deeper nesting than kMaxJsonDepth; `error` then says what
-// is wrong and where: "Line 1, Column 7: ..." (columns are bytes, both count from 1).
+// Why a text was refused: "Line 1, Column 7: ..." (columns are bytes, and both count from 1).
+struct JsonFault {
+  std::string text;
+  bool too_large = false;  // more than kMaxJsonValues values
+};
+
+// A text whose characters, tokens, depth and number of values have been checked, before any memory is spent on it.
+// Refers to the text, which must outlive it.
+class JsonText {
+ public:
+  // Returns std::nullopt, with the reason in `fault`, for a text that is not UTF-8, that has a token which RFC 8259
+  // does not know, U+0000, half a surrogate pair, a number beyond the range of a double, a deeper nesting than
+  // kMaxJsonDepth or more than kMaxJsonValues values.
+  static std::optional<JsonText> Check(std::string_view text, JsonFault* fault);
+
+  // An upper bound of the memory, in bytes, that the value of ParseObject() takes.
+  std::size_t cost() const { return cost_; }
+
+  // Returns std::nullopt, with the reason in `error`, unless the text is one JSON object without duplicate keys.
+  std::optional<Json::Value> ParseObject(std::string* error) const;
+
+ private:
+  JsonText(std::string_view text, std::size_t cost) : text_(text), cost_(cost) {}
+
+  std::string_view text_;
+  std::size_t cost_;
+};
+
+// Checks and parses in one step.
 std::optional<Json::Value> ParseJsonObject(std::string_view text, std::string* error);
 
-// Whether `text` is UTF-8 without U+0000, and so fit to be a parameter.
+// Whether `text` is UTF-8 without U+0000, and so can be a parameter.
 bool IsPlainUtf8(std::string_view text);
 
 }  // namespace vorn::server

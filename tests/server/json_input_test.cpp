@@ -1,6 +1,7 @@
 #include "json_input.h"
 
 #include <gtest/gtest.h>
+#include <malloc.h>
 
 #include <string>
 
@@ -73,7 +74,10 @@ const RefusedInput kRefusedInputs[] = {
     {"no digit before the point", R"({"a":.5})", "Line 1, Column "},
     {"no exponent", R"({"a":1e})", "Line 1, Column 6: not a number"},
     {"hexadecimal", R"({"a":0x10})", "Line 1, Column "},
-    {"beyond any number", R"({"a":1e999})", "Line 1, Column 6: "},
+    {"beyond any number", R"({"a":1e999})", "Line 1, Column 6: a number beyond the range of a double"},
+    {"below any number", R"({"a":-1e999})", "Line 1, Column 6: a number beyond the range of a double"},
+    {"beyond any number, all its digits", "{\"a\":1" + std::string(400, '0') + "}", "Line 1, Column 6: a number"},
+    {"colon after a number", R"({1:1})", "Line 1, Column 3: unexpected character"},
     {"infinity", R"({"a":Infinity})", "Line 1, Column "},
     {"not a number", R"({"a":NaN})", "Line 1, Column "},
     {"comment", R"({"a":1} // x)", "Line 1, Column "},
@@ -86,6 +90,52 @@ const RefusedInput kRefusedInputs[] = {
     {"words in one", R"({"a":truefalse})", "Line 1, Column "},
     {"vertical tab", "{\v}", "Line 1, Column "},
 };
+
+std::string ArrayOf(std::size_t count, const std::string& value) {
+  std::string text = R"({"a":[)";
+  for (std::size_t i = 0; i < count; ++i) text += (i == 0 ? "" : ",") + value;
+  return text + "]}";
+}
+
+TEST(JsonInput, AllowsItsNumberOfValuesAndNoMore) {
+  const std::size_t most = kMaxJsonValues - 2;  // without the object and the array
+  for (const char* value : {"1", "[]", "{}", "null", "\"\""}) {
+    JsonFault fault;
+    EXPECT_TRUE(JsonText::Check(ArrayOf(most, value), &fault)) << fault.text;
+    EXPECT_FALSE(JsonText::Check(ArrayOf(most + 1, value), &fault)) << value;
+    EXPECT_TRUE(fault.too_large);
+    EXPECT_NE(fault.text.find("more than 100000 values"), std::string::npos) << fault.text;
+  }
+  JsonFault fault;
+  EXPECT_TRUE(JsonText::Check(ArrayOf(most / 2, R"({"key" : 1})"), &fault)) << "a key is not a value: " << fault.text;
+  EXPECT_FALSE(JsonText::Check(ArrayOf(1, "::::"), &fault));
+  EXPECT_FALSE(fault.too_large);
+}
+
+// mallinfo2(3) counts what the value takes.
+TEST(JsonInput, BoundsTheMemoryOfTheValue) {
+  const std::string texts[] = {ArrayOf(50000, "1"),
+                               ArrayOf(50000, "[]"),
+                               ArrayOf(50000, "{}"),
+                               ArrayOf(33000, R"({"k":1})"),
+                               ArrayOf(33000, R"({"a longer key":"a longer string"})"),
+                               ArrayOf(50000, "\"a string of some 40 characters, I believe\""),
+                               R"({"a":1})"};
+  for (const std::string& text : texts) {
+    JsonFault fault;
+    const auto checked = JsonText::Check(text, &fault);
+    ASSERT_TRUE(checked) << fault.text;
+    std::string error;
+    const auto before = mallinfo2();
+    const auto value = checked->ParseObject(&error);
+    const auto after = mallinfo2();
+    ASSERT_TRUE(value) << error;
+    const std::size_t taken = after.uordblks + after.hblkhd - before.uordblks - before.hblkhd;
+    if (taken == 0) GTEST_SKIP() << "the sanitizers' allocator keeps no statistics";
+    EXPECT_LE(taken, checked->cost()) << text.substr(0, 60);
+    EXPECT_LE(checked->cost(), 3 * taken + 4096) << text.substr(0, 60);
+  }
+}
 
 TEST(JsonInput, RefusesWhatIsNotStrictJson) {
   for (const RefusedInput& c : kRefusedInputs) {

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <climits>
+#include <cstddef>
 #include <cstdlib>
 #include <filesystem>
 #include <optional>
@@ -14,8 +15,10 @@
 #include <variant>
 #include <vector>
 
+#include "budget.h"
 #include "http.h"
 #include "listener.h"
+#include "memory.h"
 #include "module.h"
 #include "options.h"
 #include "routes.h"
@@ -27,6 +30,9 @@
 
 namespace vorn::server {
 namespace {
+
+// The memory of all requests together. The most expensive single call takes 42 MiB of it.
+constexpr std::size_t kMemory = std::size_t{48} * 1024 * 1024;
 
 // systemd puts standard error into the log that syslog(3) ends in: each line would be there twice.
 bool StartedBySystemd() {
@@ -89,13 +95,15 @@ int Serve(const Options& options) {
   if (!listeners) return EXIT_FAILURE;
 
   const Routes routes(modules);
-  WorkerPool pool(WorkerPool::Limits{});
-  WebApi api(routes, *uploads, pool);
+  Budget memory(kMemory, kMemory);
+  Workers workers;
+  WebApi api({routes, *uploads, workers, memory});
   HttpServer server(api, std::move(*listeners));
   Notify("READY=1");
   WaitForTermination();
   Notify("STOPPING=1");
   server.Stop();
+  workers.Close();
   server.Join();
   return EXIT_SUCCESS;
 }
@@ -120,6 +128,7 @@ int main(int argc, char** argv) {
   using namespace vorn::server;  // NOLINT(google-build-using-namespace)
   std::variant<Options, int> parsed = ParseOptions(argc, argv);
   if (const int* status = std::get_if<int>(&parsed)) return *status;
+  ConfigureAllocator();
   openlog("vornd", LOG_PID | (StartedBySystemd() ? 0 : LOG_PERROR), LOG_DAEMON);
   auto& options = std::get<Options>(parsed);
   const int status = SettleRoot(&options) ? Serve(options) : EXIT_FAILURE;

@@ -50,4 +50,10 @@ Response Failure(int status, int code, std::string_view text, const Json::Value&
 
 Response Refusal(int status, std::string_view text) { return Failure(status, status, text); }
 
+Response Busy(std::string_view text) {
+  Response response = Refusal(503, text);
+  response.headers.emplace_back("Retry-After", "1");
+  return response;
+}
+
 }  // namespace vorn::server

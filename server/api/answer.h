@@ -35,6 +35,9 @@ Response Failure(int status, int code, std::string_view text, const Json::Value&
 // The answer of the server itself to a request that it does not carry out: the error code is the HTTP status.
 Response Refusal(int status, std::string_view text);
 
+// A refusal with status 503 and a Retry-After of one second.
+Response Busy(std::string_view text);
+
 }  // namespace vorn::server
 
 #endif  // VORN_SERVER_ANSWER_H

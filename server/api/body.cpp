@@ -2,8 +2,28 @@
 
 #include "answer.h"
 #include "json_input.h"
+#include "memory.h"
 
 namespace vorn::server {
+namespace {
+
+// The parameters are in memory a second time when the method has asked for all of them at once.
+constexpr std::size_t kCopies = 2;
+
+// From here on it pays to give memory back immediately: the tree of 20,000 values.
+constexpr std::size_t kMuchMemory = std::size_t{8} * 1024 * 1024;
+
+Response NotJson(int status, const std::string& error) {
+  return Refusal(status, "The parameters are not valid JSON. " + error + ".");
+}
+
+}  // namespace
+
+std::optional<Response> Body::Receive(std::string_view piece) {
+  if (piece.size() > most_bytes_ - text_.size()) return too_large_();
+  text_ += piece;
+  return std::nullopt;
+}
 
 bool IsReservedName(std::string_view name) {
   return name.size() >= kUploadSuffix.size() && name.substr(name.size() - kUploadSuffix.size()) == kUploadSuffix;
@@ -16,17 +36,25 @@ Response ReservedName(std::string_view name) {
 
 Response JsonBody::TooLarge() { return Refusal(413, "The parameters are larger than 1 MiB."); }
 
-std::optional<Response> JsonBody::Receive(std::string_view piece) {
-  if (piece.size() > kMaxBytes - text_.size()) return TooLarge();
-  text_ += piece;
-  return std::nullopt;
+// The parameters have been destroyed by now.
+JsonBody::~JsonBody() {
+  if (charge_ && charge_->amount() >= kMuchMemory) ReturnFreeMemory();
 }
 
 std::variant<Json::Value, Response> JsonBody::TakeParameters() {
-  if (text_.empty()) return Json::Value(Json::objectValue);
+  if (text().empty()) return Json::Value(Json::objectValue);
+  return Parse();
+}
+
+std::variant<Json::Value, Response> JsonBody::Parse() {
+  JsonFault fault;
+  const std::optional<JsonText> checked = JsonText::Check(text(), &fault);
+  if (!checked) return NotJson(fault.too_large ? 413 : 400, fault.text);
+  charge_ = budget_.Take("", checked->cost() * kCopies);
+  if (!charge_) return Busy("The server has no memory left for parameters of this size. Try again soon.");
   std::string error;
-  std::optional<Json::Value> parameters = ParseJsonObject(text_, &error);
-  if (!parameters) return Refusal(400, "The parameters are not valid JSON. " + error + ".");
+  std::optional<Json::Value> parameters = checked->ParseObject(&error);
+  if (!parameters) return NotJson(400, error);
   for (auto member = parameters->begin(); member != parameters->end(); ++member) {
     if (IsReservedName(member.name())) return ReservedName(member.name());
   }

@@ -1,4 +1,4 @@
-// How a request's body becomes parameters.
+// How the body of a request becomes parameters.
 #ifndef VORN_SERVER_BODY_H
 #define VORN_SERVER_BODY_H
 
@@ -11,42 +11,61 @@
 #include <variant>
 #include <vector>
 
+#include "budget.h"
 #include "http.h"
 
 namespace vorn::server {
 
-// A body and what it holds (files, for one), until the request is answered.
+// A body, and the files and memory that it holds until the request is answered. The network thread receives it, a
+// worker takes the parameters and destroys it. The whole body is kept in memory, so that the network thread never
+// touches a file.
 class Body {
  public:
   virtual ~Body() = default;
 
-  // The next piece; a response refuses the request.
-  virtual std::optional<Response> Receive(std::string_view piece) = 0;
+  // Appends the next piece. A response refuses the request.
+  std::optional<Response> Receive(std::string_view piece);
 
-  // The parameter object, once the body has ended, or why there is none. Called once.
+  // Returns the parameter object, or a response that refuses the request. Called once, after the last piece.
   virtual std::variant<Json::Value, Response> TakeParameters() = 0;
 
   // The paths of the files that were uploaded, as they are in the parameters. Valid after TakeParameters().
   virtual std::vector<std::string> Uploads() const { return {}; }
+
+ protected:
+  Body(std::size_t most_bytes, Response (*too_large)()) : most_bytes_(most_bytes), too_large_(too_large) {}
+
+  std::string_view text() const { return text_; }
+
+ private:
+  const std::size_t most_bytes_;
+  Response (*const too_large_)();
+  std::string text_;
 };
 
-// What the server itself adds to a parameter's name for the path of an uploaded file. No caller may
-// use such a name, or it could have any file of the machine read.
+// The suffix that the server appends to the name of a parameter to name the path of the uploaded file. A caller must
+// not use such a name, because it could otherwise have any file of the machine read.
 constexpr std::string_view kUploadSuffix = "_tmp";
 bool IsReservedName(std::string_view name);
 Response ReservedName(std::string_view name);
 
-// One JSON object, or nothing at all for an empty one.
+// One JSON object. An empty body is an empty object.
 class JsonBody : public Body {
  public:
   static constexpr std::size_t kMaxBytes = std::size_t{1024} * 1024;
   static Response TooLarge();
 
-  std::optional<Response> Receive(std::string_view piece) override;
+  // Charges the memory of the parsed parameters to `budget`, which must outlive this.
+  explicit JsonBody(Budget& budget) : Body(kMaxBytes, TooLarge), budget_(budget) {}
+  ~JsonBody() override;
+
   std::variant<Json::Value, Response> TakeParameters() override;
 
  private:
-  std::string text_;
+  std::variant<Json::Value, Response> Parse();
+
+  Budget& budget_;
+  std::optional<Charge> charge_;
 };
 
 }  // namespace vorn::server

@@ -2,6 +2,7 @@
 
 #include <syslog.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <utility>
@@ -12,6 +13,7 @@
 namespace vorn::server {
 namespace {
 
+constexpr std::size_t kPieceBytes = std::size_t{64} * 1024;
 constexpr std::size_t kMaxTextBytes = std::size_t{64} * 1024;  // of one part
 
 std::string Quoted(const std::string& name) { return "\"" + name + "\""; }
@@ -20,19 +22,18 @@ std::string Quoted(const std::string& name) { return "\"" + name + "\""; }
 
 Response FormBody::TooLarge() { return Refusal(413, "The form is larger than a file of 1 MiB and its envelope."); }
 
-FormBody::FormBody(const std::string& boundary, const UploadFolder& uploads)
-    : uploads_(uploads), parser_(boundary, *this) {}
-
-std::optional<Response> FormBody::Receive(std::string_view piece) {
-  received_ += piece.size();
-  if (received_ > kMaxBytes) return TooLarge();
-  if (parser_.Feed(piece)) return std::nullopt;
-  if (!refusal_) Refuse(Refusal(400, "The form is malformed: " + parser_.error() + "."));
-  return refusal_;
-}
+FormBody::FormBody(std::string boundary, const UploadFolder& uploads)
+    : Body(kMaxBytes, TooLarge), boundary_(std::move(boundary)), uploads_(uploads) {}
 
 std::variant<Json::Value, Response> FormBody::TakeParameters() {
-  if (!parser_.complete()) return Refusal(400, "The form ends before its closing boundary.");
+  MultipartParser parser(boundary_, *this);
+  // In pieces, because the parser copies each one.
+  for (std::string_view rest = text(); !rest.empty(); rest.remove_prefix(std::min(rest.size(), kPieceBytes))) {
+    if (parser.Feed(rest.substr(0, kPieceBytes))) continue;
+    if (refusal_) return *std::move(refusal_);
+    return Refusal(400, "The form is malformed: " + parser.error() + ".");
+  }
+  if (!parser.complete()) return Refusal(400, "The form ends before its closing boundary.");
   return std::move(parameters_);
 }
 
@@ -45,7 +46,8 @@ std::vector<std::string> FormBody::Uploads() const {
 bool FormBody::BeginPart(const PartHead& head) {
   part_ = head;
   part_bytes_ = 0;
-  text_.clear();
+  part_text_.clear();
+  if (++parts_ > kMaxParts) return Refuse(Refusal(413, "The form has more than 8 parts."));
   if (!IsPlainUtf8(head.name)) return Refuse(Refusal(400, "The name of a part is not UTF-8."));
   if (IsReservedName(head.name)) return Refuse(ReservedName(head.name));
   const std::string parameter = head.is_file ? head.name + std::string(kUploadSuffix) : head.name;
@@ -68,14 +70,14 @@ bool FormBody::PartData(std::string_view data) {
         Refusal(413, "The part " + Quoted(part_.name) + " is larger than " + (part_.is_file ? "1 MiB." : "64 KiB.")));
   }
   if (part_.is_file) return files_.back().Append(data) || CannotStore();
-  text_ += data;
+  part_text_ += data;
   return true;
 }
 
 bool FormBody::EndPart() {
-  if (part_.is_file) return true;
-  if (!IsPlainUtf8(text_)) return Refuse(Refusal(400, "The part " + Quoted(part_.name) + " is not UTF-8 text."));
-  parameters_[part_.name] = text_;
+  if (part_.is_file) return files_.back().Close() || CannotStore();
+  if (!IsPlainUtf8(part_text_)) return Refuse(Refusal(400, "The part " + Quoted(part_.name) + " is not UTF-8 text."));
+  parameters_[part_.name] = part_text_;
   return true;
 }
 

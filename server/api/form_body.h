@@ -18,18 +18,19 @@
 
 namespace vorn::server {
 
-// multipart/form-data. A part that is text is a parameter. A part that is a file goes to a file of
-// its own as it comes; the parameter NAME_tmp is that file's path.
+// multipart/form-data. A part that is text is a parameter. A part that is a file is stored in a file of its own; the
+// parameter NAME_tmp is the path of that file.
 class FormBody : public Body, private PartReceiver {
  public:
+  static constexpr std::size_t kMaxParts = 8;
   static constexpr std::size_t kMaxFileBytes = std::size_t{1024} * 1024;
-  static constexpr std::size_t kMaxBytes = kMaxFileBytes + std::size_t{64} * 1024;  // and what is around the file
+  // A file of the largest size, other parts, and the boundaries and heads around them.
+  static constexpr std::size_t kMaxBytes = kMaxFileBytes + std::size_t{64} * 1024;
   static Response TooLarge();
 
   // The folder must outlive this.
-  FormBody(const std::string& boundary, const UploadFolder& uploads);
+  FormBody(std::string boundary, const UploadFolder& uploads);
 
-  std::optional<Response> Receive(std::string_view piece) override;
   std::variant<Json::Value, Response> TakeParameters() override;
   std::vector<std::string> Uploads() const override;
 
@@ -41,13 +42,13 @@ class FormBody : public Body, private PartReceiver {
   bool Refuse(Response response);
   bool CannotStore();
 
+  const std::string boundary_;
   const UploadFolder& uploads_;
-  MultipartParser parser_;
-  std::size_t received_ = 0;
   PartHead part_;
+  std::size_t parts_ = 0;
   std::size_t part_bytes_ = 0;
-  std::string text_;         // of the part that is text
-  std::list<Upload> files_;  // the last one is the part's
+  std::string part_text_;    // of a part that is not a file
+  std::list<Upload> files_;  // while a file part is read, the last one is its file
   Json::Value parameters_{Json::objectValue};
   std::optional<Response> refusal_;
 };

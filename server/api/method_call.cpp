@@ -8,13 +8,33 @@
 #include <variant>
 
 #include "answer.h"
+#include "log_quote.h"
 
 namespace vorn::server {
 namespace {
 
-Response NoAnswer(const Route& route, const char* reason) {
-  syslog(LOG_ERR, "%s: no answer: %s", route.Name().c_str(), reason);
-  return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
+// If even this answer finds no memory, the client gets the status alone.
+Response NoAnswer(const Route& route, const char* reason) noexcept {
+  try {
+    syslog(LOG_ERR, "%s: no answer: %s", route.Name().c_str(), QuotedForLog(reason).c_str());
+    return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
+  } catch (...) {
+    Response response;
+    response.status = 500;
+    return response;
+  }
+}
+
+// Returns the result of `function`, or the answer to a call that ended with an exception.
+template <typename Function>
+Response AnswerOf(const Route& route, Function function) noexcept {
+  try {
+    return function();
+  } catch (const std::exception& exception) {
+    return NoAnswer(route, exception.what());
+  } catch (...) {
+    return NoAnswer(route, "an exception of unknown type");
+  }
 }
 
 Response CallEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
@@ -32,17 +52,11 @@ Response CallEntryFunction(const Route& route, Json::Value parameters, VORN::Cal
 }  // namespace
 
 Response RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
-  try {
-    return CallEntryFunction(route, std::move(parameters), std::move(description));
-  } catch (const std::exception& exception) {
-    return NoAnswer(route, exception.what());
-  } catch (...) {
-    return NoAnswer(route, "an exception of unknown type");
-  }
+  return AnswerOf(route, [&] { return CallEntryFunction(route, std::move(parameters), std::move(description)); });
 }
 
-Call::Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription description, WorkerPool& pool)
-    : route_(route), body_(std::move(body)), description_(std::move(description)), pool_(pool) {
+Call::Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription description, Environment environment)
+    : route_(route), body_(std::move(body)), description_(std::move(description)), environment_(environment) {
   description_.method = route_.Id();
   description_.may_write = !route_.method.reads_only;
 }
@@ -50,23 +64,49 @@ Call::Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription
 std::optional<Response> Call::Receive(std::string_view piece) { return body_->Receive(piece); }
 
 void Call::Run(Answer answer) {
-  const bool queued = pool_.Submit(&route_, [self = shared_from_this(), answer] { answer(self->Execute()); });
-  if (queued) return;
-  syslog(LOG_WARNING, "%s: refused, too many requests are waiting", route_.Name().c_str());
-  Response busy = Refusal(503, "Too many requests are waiting. Try again soon.");
-  busy.headers.emplace_back("Retry-After", "1");
-  answer(std::move(busy));
+  answer_.Await(std::move(answer));
+  try {
+    if (environment_.pool.Submit(&route_, shared_from_this(), environment_.deadline)) return;
+    answer_.Give(Busy("Too many calls of this method are waiting. Try again soon."));
+  } catch (const std::exception& exception) {
+    answer_.Give(NoAnswer(route_, exception.what()));
+  }
+}
+
+void Call::Work() {
+  Response response;
+  if (abandoned_) {
+    response.status = 503;  // nobody reads it
+  } else {
+    response = AnswerOf(route_, [this] { return Execute(); });
+  }
+  body_.reset();  // before the client can see the answer
+  const int status = response.status;
+  if (!answer_.Give(std::move(response))) {
+    syslog(LOG_NOTICE, "%s: ended with status %d after its deadline", route_.Name().c_str(), status);
+  }
 }
 
 Response Call::Execute() {
   std::variant<Json::Value, Response> parameters = body_->TakeParameters();
+  if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
   description_.uploads = body_->Uploads();
-  Response response =
-      std::holds_alternative<Response>(parameters)
-          ? std::get<Response>(std::move(parameters))
-          : RunEntryFunction(route_, std::get<Json::Value>(std::move(parameters)), std::move(description_));
-  body_.reset();  // before the client can see the answer
-  return response;
+  return RunEntryFunction(route_, std::get<Json::Value>(std::move(parameters)), std::move(description_));
+}
+
+void Call::Expire(bool running) {
+  if (!running) {
+    answer_.Give(AnswerOf(route_, [] { return Busy("The call has waited too long for others. Try again soon."); }));
+    return;
+  }
+  syslog(LOG_ERR, "%s: not done at its deadline", route_.Name().c_str());
+  answer_.Give(AnswerOf(route_, [] {
+    return Refusal(504, "The operation takes longer than expected. It goes on; the server's log tells when it ends.");
+  }));
+}
+
+void Call::Refuse() {
+  answer_.Give(AnswerOf(route_, [] { return Busy("The server is stopping. Try again soon."); }));
 }
 
 }  // namespace vorn::server

@@ -15,7 +15,7 @@
 namespace vorn::server {
 namespace {
 
-// A folder of our own, and no link to somebody else's.
+// Whether the path is a folder that the server's user owns, and not a symbolic link.
 bool IsPrivateFolder(const std::string& path) {
   struct stat there {};
   if (lstat(path.c_str(), &there) != 0) return false;
@@ -44,6 +44,9 @@ bool Upload::Append(std::string_view data) {
   }
   return true;
 }
+
+// close(2) must not be repeated after EINTR.
+bool Upload::Close() { return close(file_.release()) == 0 || errno == EINTR; }
 
 UploadFolder::UploadFolder(std::string path) : path_(std::move(path)) {}
 

@@ -1,4 +1,4 @@
-// Uploaded files, from their first byte to the end of their request.
+// Uploaded files. Each exists until its request has been answered.
 #ifndef VORN_SERVER_UPLOAD_H
 #define VORN_SERVER_UPLOAD_H
 
@@ -10,7 +10,7 @@
 
 namespace vorn::server {
 
-// A file that nobody but the server's own user may read (mode 0600), removed with its object.
+// A file that only the server's own user may read (mode 0600). The destructor removes it.
 class Upload {
  public:
   Upload(std::string path, UniqueFd file);
@@ -20,22 +20,25 @@ class Upload {
 
   const std::string& path() const { return path_; }
 
-  // False, with errno set, when not all of it could be written.
+  // Returns false, with errno set, if not all of the data could be written.
   bool Append(std::string_view data);
+
+  // Closes the descriptor; the file stays. Returns false, with errno set, if the data could not be written.
+  bool Close();
 
  private:
   std::string path_;
   UniqueFd file_;
 };
 
-// Where they are kept: a folder of mode 0700.
+// The folder of the uploads, with mode 0700.
 class UploadFolder {
  public:
-  // Makes the folder and removes what a killed server has left in it. None on failure; `error` then
-  // says why.
+  // Creates the folder, or removes everything that a killed server left in it. Returns std::nullopt on failure,
+  // with the reason in `error`.
   static std::optional<UploadFolder> Open(const std::string& path, std::string* error);
 
-  // A new, empty file under a name of its own. None with errno set.
+  // Creates an empty file with a unique name. Returns std::nullopt with errno set on failure.
   std::optional<Upload> Create() const;
 
  private:

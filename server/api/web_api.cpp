@@ -10,6 +10,7 @@
 #include "header_value.h"
 #include "method_call.h"
 #include "multipart.h"
+#include "probe.h"
 
 namespace vorn::server {
 namespace {
@@ -32,9 +33,9 @@ Response MethodNotAllowed(std::string_view path, const std::string& allowed) {
   return response;
 }
 
-NewBody OpenJson(const Head& head) {
+NewBody OpenJson(const Head& head, Budget& memory) {
   if (head.content_length > JsonBody::kMaxBytes) return JsonBody::TooLarge();
-  return std::make_unique<JsonBody>();
+  return std::make_unique<JsonBody>(memory);
 }
 
 NewBody OpenForm(const Head& head, const HeaderValue& type, const UploadFolder& uploads) {
@@ -46,41 +47,55 @@ NewBody OpenForm(const Head& head, const HeaderValue& type, const UploadFolder& 
   return std::make_unique<FormBody>(boundary->second, uploads);
 }
 
-NewBody OpenBody(const Head& head, const UploadFolder& uploads) {
-  if (!head.has_body) return std::make_unique<JsonBody>();
+// A form is accepted by methods that take a file only: a page of another site can send one without asking first.
+NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& parts) {
+  if (!head.has_body) return std::make_unique<JsonBody>(parts.memory);
   const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
-  if (type && type->value == "application/json") return OpenJson(head);
-  if (type && type->value == "multipart/form-data") return OpenForm(head, *type, uploads);
-  return Refusal(415, "Parameters are sent as application/json, files as multipart/form-data; not as \"" +
+  if (type && type->value == "application/json") return OpenJson(head, parts.memory);
+  if (type && type->value == "multipart/form-data" && route.method.takes_file) {
+    return OpenForm(head, *type, parts.uploads);
+  }
+  return Refusal(415, std::string("This method takes its parameters as application/json") +
+                          (route.method.takes_file ? " and its file as multipart/form-data" : "") + ", not as \"" +
                           std::string(head.content_type) + "\".");
 }
 
 }  // namespace
 
-WebApi::WebApi(const Routes& routes, const UploadFolder& uploads, WorkerPool& pool)
-    : routes_(routes), uploads_(uploads), pool_(pool) {}
+WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
+WebApi::WebApi(Parts parts, Limits limits) : parts_(parts), limits_(limits) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepStrangersOut(head)) return *std::move(refusal);
-  if (auto page = AnswerPage(head)) return *std::move(page);
+  if (auto page = BeginPage(head)) return *std::move(page);
   std::string unknown;
-  const Route* route = routes_.Find(head.target, &unknown);
+  const Route* route = parts_.routes.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
   if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
-  NewBody body = OpenBody(head, uploads_);
+  return BeginCall(*route, head);
+}
+
+WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
+  NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
   VORN::CallDescription description;
   if (!head.over_tcp) description.origin = "unix";
-  return std::make_shared<Call>(*route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),
-                                pool_);
+  WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
+  return std::make_shared<Call>(route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),
+                                Call::Environment{pool, limits_.call});
 }
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }
 
-std::optional<Response> WebApi::AnswerPage(const Head& head) const {
-  if (head.target != "/api" && head.target != "/healthz") return std::nullopt;
+// "/healthz" and "/healthz/live" are answered by the network thread: the process is alive.
+std::optional<WebApi::Begun> WebApi::BeginPage(const Head& head) const {
+  const bool list = head.target == "/api";
+  const bool alive = head.target == "/healthz" || head.target == "/healthz/live";
+  const bool ready = head.target == "/healthz/ready";
+  if (!list && !alive && !ready) return std::nullopt;
   if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
-  return Success(head.target == "/api" ? routes_.List() : Json::Value());
+  if (ready) return std::make_shared<Probe>(parts_.workers.reading, limits_.ready);
+  return Success(list ? parts_.routes.List() : Json::Value());
 }
 
 }  // namespace vorn::server

@@ -1,12 +1,14 @@
-// What the server offers: the methods of the loaded modules, their list, and a sign of life.
+// The resources of the server: the methods of the loaded modules, the list of them, and the health checks.
 #ifndef VORN_SERVER_WEB_API_H
 #define VORN_SERVER_WEB_API_H
 
+#include <chrono>
 #include <memory>
 #include <optional>
 #include <string_view>
 #include <variant>
 
+#include "budget.h"
 #include "http.h"
 #include "routes.h"
 #include "upload.h"
@@ -16,18 +18,33 @@ namespace vorn::server {
 
 class WebApi : public Service {
  public:
-  // All must outlive this.
-  WebApi(const Routes& routes, const UploadFolder& uploads, WorkerPool& pool);
+  struct Limits {
+    std::chrono::milliseconds call{60000};  // until a call is answered with 504
+    std::chrono::milliseconds ready{1000};  // in which a worker must be free
+  };
+
+  // What requests are answered with. All must outlive the WebApi.
+  struct Parts {
+    const Routes& routes;
+    const UploadFolder& uploads;
+    Workers& workers;
+    Budget& memory;  // of parsed parameters
+  };
+
+  explicit WebApi(Parts parts);
+  WebApi(Parts parts, Limits limits);
 
   std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
   Response Refuse(int status, std::string_view text) const override;
 
  private:
-  std::optional<Response> AnswerPage(const Head& head) const;
+  using Begun = std::variant<std::shared_ptr<Exchange>, Response>;
 
-  const Routes& routes_;
-  const UploadFolder& uploads_;
-  WorkerPool& pool_;
+  std::optional<Begun> BeginPage(const Head& head) const;
+  Begun BeginCall(const Route& route, const Head& head) const;
+
+  const Parts parts_;
+  const Limits limits_;
 };
 
 }  // namespace vorn::server

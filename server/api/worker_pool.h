@@ -2,10 +2,11 @@
 #ifndef VORN_SERVER_WORKER_POOL_H
 #define VORN_SERVER_WORKER_POOL_H
 
+#include <chrono>
 #include <condition_variable>
 #include <cstddef>
-#include <deque>
-#include <functional>
+#include <list>
+#include <memory>
 #include <mutex>
 #include <thread>
 #include <unordered_map>
@@ -13,43 +14,109 @@
 
 namespace vorn::server {
 
-// Runs jobs in the order of arrival, except that the jobs of one lane never take more than their
-// share of the threads: while four restarts are waited for, everything else goes on.
+// A unit of work. Exactly one of Work() and Refuse() is called, or Expire(false). None of them may throw.
+class Job {
+ public:
+  virtual ~Job() = default;
+
+  // Does the work, on a worker thread.
+  virtual void Work() = 0;
+
+  // The deadline has passed. Called at most once, on a thread of the pool. If `running`, then Work() has begun and
+  // may end at any moment; otherwise it is never called.
+  virtual void Expire(bool running) = 0;
+
+  // The pool was closed before the job began.
+  virtual void Refuse() = 0;
+};
+
+// Runs jobs in the order of their arrival, except that:
+//   - A lane (a method) has a share of the threads and of the queue. A lane that hangs delays no other lane.
+//   - Only a few threads work at the same time as long as jobs are short, because more of them would only compete
+//     for the same locks and caches. A job that has run for `long_after` counts as long, and a further thread
+//     takes the next job.
+// All functions are thread-safe.
 class WorkerPool {
  public:
+  using Clock = std::chrono::steady_clock;
+
   struct Limits {
-    std::size_t threads = 16;  // started one by one, when there is work for them
-    std::size_t per_lane = 4;
-    std::size_t queue = 256;  // jobs that no thread has begun
+    std::size_t short_threads = 2;  // threads that run short jobs at the same time
+    std::size_t threads = 64;       // all threads; each is started when it is needed for the first time
+    std::size_t lane_threads = 4;   // jobs of one lane that run at the same time
+    std::size_t lane_queue = 256;   // jobs of one lane that wait
+    std::chrono::milliseconds long_after{5};
   };
-  using Job = std::function<void()>;
 
   explicit WorkerPool(Limits limits);
-  ~WorkerPool();  // runs what is queued to the end
+
+  // Closes the pool and waits until all running jobs have ended.
+  ~WorkerPool();
   WorkerPool(const WorkerPool&) = delete;
   WorkerPool& operator=(const WorkerPool&) = delete;
 
-  // False, and the job will not run, when the queue is full. A lane is known by its address alone.
-  bool Submit(const void* lane, Job job);
+  // Takes a job that must be done `time` from now. Returns false, without calling any of the job's functions, if
+  // the lane's share of the queue is used up or the pool is closed. A lane is identified by its address only.
+  // Throws std::bad_alloc and has then no effect.
+  bool Submit(const void* lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
+
+  // Refuses the jobs that wait and all further ones. Running jobs go on. Does not wait.
+  void Close();
 
  private:
-  struct Queued {
-    const void* lane;
-    Job job;
+  struct Lane {
+    std::size_t running = 0;
+    std::size_t queued = 0;
   };
+  struct Entry {
+    Lane* lane;
+    std::shared_ptr<Job> job;
+    Clock::time_point deadline;
+    Clock::time_point begun;
+    bool is_long = false;
+    bool expired = false;
+  };
+  using Entries = std::list<Entry>;
 
-  void StartThread();
   void Work();
-  std::deque<Queued>::iterator FirstRunnable();
+  void Watch();
+  bool MayTake() const { return running_.size() < limits_.short_threads + long_jobs_; }
+  Entries::iterator FirstRunnable();
+  void EngageThread();
+  void Begin(Entries::iterator entry);
+  void RunUnlocked(Entries::iterator entry, std::unique_lock<std::mutex>* lock);
+  void WatchNoLaterThan(Clock::time_point time);
+  void MarkLongJobs(Clock::time_point now);
+  std::shared_ptr<Job> TakeOverdue(Clock::time_point now, bool* running);
+  Clock::time_point NextWatch() const;
 
   const Limits limits_;
   std::mutex mutex_;
-  std::condition_variable wake_;
-  std::deque<Queued> queue_;
-  std::unordered_map<const void*, std::size_t> running_;  // by lane
-  std::size_t idle_ = 0;                                  // threads that wait for a job
-  bool stopping_ = false;
+  std::condition_variable wake_;        // workers wait for a job
+  std::condition_variable watch_wake_;  // the watch thread waits for the next deadline or stall
+  std::unordered_map<const void*, Lane> lanes_;
+  Entries queue_;
+  Entries running_;
+  std::size_t long_jobs_ = 0;  // of running_
+  std::size_t idle_ = 0;       // threads that wait for a job
+  bool closed_ = false;
+  bool ending_ = false;
+  Clock::time_point next_watch_ = Clock::time_point::max();
   std::vector<std::thread> threads_;
+  std::thread watch_;
+};
+
+// The methods that only read have threads of their own, which those that change something cannot take from them.
+struct Workers {
+  explicit Workers(WorkerPool::Limits limits = {}) : reading(limits), changing(limits) {}
+
+  void Close() {
+    reading.Close();
+    changing.Close();
+  }
+
+  WorkerPool reading;
+  WorkerPool changing;
 };
 
 }  // namespace vorn::server

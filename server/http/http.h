@@ -51,6 +51,10 @@ class Exchange {
 
   // The body has ended. Returns at once and calls `answer` exactly once, from any thread.
   virtual void Run(Answer answer) = 0;
+
+  // The client has left before the answer. Called at most once, after Run(). A call that has not begun need not begin;
+  // `answer` is still called.
+  virtual void Abandon() {}
 };
 
 class Service {

@@ -2,11 +2,14 @@
 
 #include <gtest/gtest.h>
 
+#include <memory>
+
 namespace vorn::server {
 namespace {
 
 std::variant<Json::Value, Response> Read(const std::string& text) {
-  JsonBody body;
+  Budget memory(std::size_t{1} << 30, std::size_t{1} << 30);
+  JsonBody body(memory);
   for (const char c : text) EXPECT_FALSE(body.Receive(std::string_view(&c, 1)));
   return body.TakeParameters();
 }
@@ -38,11 +41,28 @@ TEST(JsonBody, CannotNameAPathOfTheServer) {
 }
 
 TEST(JsonBody, HasALimit) {
-  JsonBody body;
+  Budget memory(0, 0);
+  JsonBody body(memory);
   EXPECT_FALSE(body.Receive(std::string(JsonBody::kMaxBytes, ' ')));
   const auto refusal = body.Receive(" ");
   ASSERT_TRUE(refusal);
   EXPECT_EQ(refusal->status, 413);
+}
+
+TEST(JsonBody, ChargesItsMemoryUntilItIsDestroyed) {
+  Budget memory(10000, 10000);
+  auto first = std::make_unique<JsonBody>(memory);
+  EXPECT_FALSE(first->Receive(R"({"a": [1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14]})"));
+  EXPECT_TRUE(std::holds_alternative<Json::Value>(first->TakeParameters()));
+  EXPECT_GT(memory.used(), 0U);
+  JsonBody second(memory);
+  EXPECT_FALSE(second.Receive(R"({"a": [1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14]})"));
+  const auto refused = second.TakeParameters();
+  ASSERT_TRUE(std::holds_alternative<Response>(refused));
+  EXPECT_EQ(std::get<Response>(refused).status, 503);
+  first.reset();
+  EXPECT_EQ(memory.used(), 0U);
+  EXPECT_TRUE(std::holds_alternative<Json::Value>(second.TakeParameters()));
 }
 
 }  // namespace

@@ -26,6 +26,7 @@ class Connection {
   static Connection ToPort(int port);  // of 127.0.0.1
 
   bool connected() const { return static_cast<bool>(socket_); }
+  int socket() const { return socket_.get(); }
 
   // False when the server has gone.
   bool Send(std::string_view bytes);

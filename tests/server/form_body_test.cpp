@@ -15,6 +15,18 @@ std::string Part(const std::string& disposition, const std::string& data) {
   return "--b\r\nContent-Disposition: form-data; " + disposition + "\r\n\r\n" + data + "\r\n";
 }
 
+// Files, each of which would hold a descriptor.
+std::string Parts(int count) {
+  std::string form;
+  for (int i = 0; i < count; ++i) form += Part("name=f" + std::to_string(i) + "; filename=k", "x");
+  return form;
+}
+
+std::size_t OpenDescriptors() {
+  const std::filesystem::directory_iterator entries("/proc/self/fd");
+  return static_cast<std::size_t>(std::distance(begin(entries), end(entries)));
+}
+
 class FormBodyTest : public testing::Test {
  protected:
   // The status that the form is refused with; 0 if it is taken.
@@ -70,6 +82,8 @@ TEST_F(FormBodyTest, AFormIsRefusedWithAReason) {
       {"large preamble", std::string(FormBody::kMaxBytes, 'x') + "\r\n--b--", 413},
       {"the largest text", Part("name=a", std::string(64 * 1024, 'x')) + "--b--", 0},
       {"the largest file", Part(file, std::string(FormBody::kMaxFileBytes, 'x')) + "--b--", 0},
+      {"the largest number of parts", Parts(8) + "--b--", 0},
+      {"more parts", Parts(9) + "--b--", 413},
       {"empty file", Part(file, "") + "--b--", 0},
       {"no part", "--b--", 0},
   };
@@ -77,6 +91,16 @@ TEST_F(FormBodyTest, AFormIsRefusedWithAReason) {
     EXPECT_EQ(Refusal(c.form), c.status) << c.name;
     EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("uploads"))) << c.name;
   }
+}
+
+TEST_F(FormBodyTest, FilesAreMadeWhenTheParametersAreTakenAndAreNotKeptOpen) {
+  const std::size_t before = OpenDescriptors();
+  FormBody body("b", *uploads_);
+  EXPECT_FALSE(body.Receive(Parts(8) + "--b--"));
+  EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("uploads")));
+  EXPECT_TRUE(std::holds_alternative<Json::Value>(body.TakeParameters()));
+  EXPECT_EQ(body.Uploads().size(), 8U);
+  EXPECT_EQ(OpenDescriptors(), before);
 }
 
 TEST_F(FormBodyTest, AFileThatCannotBeStoredIsAFailureOfTheServer) {

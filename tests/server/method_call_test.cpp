@@ -2,11 +2,21 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <chrono>
 #include <future>
+#include <memory>
+#include <new>
 #include <stdexcept>
+#include <thread>
+#include <utility>
+
+#include "sandbox.h"
 
 namespace vorn::server {
 namespace {
+
+using std::chrono::milliseconds;
 
 void Echo(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(request->GetParam("", Json::Value()));
@@ -65,36 +75,110 @@ TEST(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
 // A body that tells when it is gone.
 class TracedBody : public Body {
  public:
-  explicit TracedBody(bool* gone) : gone_(gone) {}
+  explicit TracedBody(bool* gone) : Body(1, JsonBody::TooLarge), gone_(gone) {}
   ~TracedBody() override { *gone_ = true; }
-  std::optional<Response> Receive(std::string_view /*piece*/) override { return std::nullopt; }
   std::variant<Json::Value, Response> TakeParameters() override { return Json::Value(Json::objectValue); }
 
  private:
   bool* gone_;
 };
 
-TEST(Call, ReleasesItsBodyBeforeItAnswers) {
-  const Descriptor descriptor;
-  const Route route{{"Api", 1, "echo", Echo}, &descriptor, {}};
-  WorkerPool pool({1, 1, 1});
-  bool gone = false;
+// A body for whose parameters there is no memory.
+class FailingBody : public Body {
+ public:
+  FailingBody() : Body(1, JsonBody::TooLarge) {}
+  std::variant<Json::Value, Response> TakeParameters() override { throw std::bad_alloc(); }
+};
+
+std::atomic<bool> held{false};  // whether Hold goes on
+std::atomic<int> held_calls{0};
+void Hold(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
+  ++held_calls;
+  while (held) std::this_thread::sleep_for(milliseconds(1));
+  response->SetSuccess("late");
+}
+
+class CallTest : public testing::Test {
+ protected:
+  CallTest() {
+    held = false;
+    held_calls = 0;
+  }
+  ~CallTest() override { held = false; }
+
+  std::shared_ptr<Call> NewCall(const Route& route, milliseconds deadline = std::chrono::hours(1)) {
+    return std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone_), VORN::CallDescription{},
+                                  Call::Environment{pool_, deadline});
+  }
+  // Runs the call; the future is its answer.
+  static std::future<Response> Run(const std::shared_ptr<Call>& call) {
+    const auto promise = std::make_shared<std::promise<Response>>();
+    call->Run([promise](Response response) { promise->set_value(std::move(response)); });
+    return promise->get_future();
+  }
+
+  static WorkerPool::Limits OneOfALane() {
+    WorkerPool::Limits limits;
+    limits.lane_threads = 1;
+    limits.lane_queue = 1;
+    return limits;
+  }
+
+  const Descriptor descriptor_;
+  const Route echo_{{"Api", 1, "echo", Echo}, &descriptor_, {}};
+  const Route hold_{{"Api", 1, "hold", Hold}, &descriptor_, {}};
+  bool gone_ = false;
+  WorkerPool pool_{OneOfALane()};
+};
+
+TEST_F(CallTest, ReleasesItsBodyBeforeItAnswers) {
   std::promise<bool> gone_at_answer;
-  const auto call = std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone), VORN::CallDescription{}, pool);
-  call->Run([&](const Response& /*response*/) { gone_at_answer.set_value(gone); });
+  NewCall(echo_)->Run([&](const Response& /*response*/) { gone_at_answer.set_value(gone_); });
   EXPECT_TRUE(gone_at_answer.get_future().get());
 }
 
-TEST(Call, IsRefusedWhenTooManyWait) {
-  const Descriptor descriptor;
-  const Route route{{"Api", 1, "echo", Echo}, &descriptor, {}};
-  WorkerPool pool({1, 1, 0});
-  Response answer;
-  std::make_shared<Call>(route, std::make_unique<JsonBody>(), VORN::CallDescription{}, pool)
-      ->Run([&](Response response) { answer = std::move(response); });
-  EXPECT_EQ(answer.status, 503);
-  ASSERT_EQ(answer.headers.size(), 1U);
-  EXPECT_EQ(answer.headers[0].first, "Retry-After");
+TEST_F(CallTest, IsRefusedWhenTooManyWait) {
+  held = true;
+  auto running = Run(NewCall(hold_));
+  ASSERT_TRUE(Eventually([] { return held_calls == 1; }));
+  auto waiting = Run(NewCall(hold_));
+  const Response refused = Run(NewCall(hold_)).get();
+  EXPECT_EQ(refused.status, 503);
+  ASSERT_EQ(refused.headers.size(), 1U);
+  EXPECT_EQ(refused.headers[0].first, "Retry-After");
+  held = false;
+  EXPECT_EQ(running.get().status, 200);
+  EXPECT_EQ(waiting.get().status, 200);
+}
+
+TEST_F(CallTest, IsAnsweredAtItsDeadline) {
+  held = true;
+  auto running = Run(NewCall(hold_, milliseconds(1)));
+  EXPECT_EQ(running.get().status, 504);
+  EXPECT_EQ(held_calls, 1);
+  auto waiting = Run(NewCall(hold_, milliseconds(1)));
+  EXPECT_EQ(waiting.get().status, 503) << "it has done nothing";
+  held = false;
+  EXPECT_EQ(Run(NewCall(echo_)).get().status, 200);
+  EXPECT_EQ(held_calls, 1);
+}
+
+TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {
+  held = true;
+  auto running = Run(NewCall(hold_));
+  ASSERT_TRUE(Eventually([] { return held_calls == 1; }));
+  const auto abandoned = NewCall(hold_);
+  auto answer = Run(abandoned);
+  abandoned->Abandon();
+  held = false;
+  answer.get();
+  EXPECT_EQ(held_calls, 1);
+}
+
+TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
+  const auto call = std::make_shared<Call>(echo_, std::make_unique<FailingBody>(), VORN::CallDescription{},
+                                           Call::Environment{pool_, std::chrono::hours(1)});
+  EXPECT_EQ(Run(call).get().status, 500);
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 // Calls of methods through the real vornd.
 #include <gmock/gmock.h>
+#include <poll.h>
 
 #include <atomic>
 #include <csignal>
@@ -123,24 +124,43 @@ TEST_F(Calls, ThatAreSlowDelayNobody) {
   for (Connection& client : slow) EXPECT_EQ(client.Receive().Envelope()["data"], "released");
 }
 
-TEST_F(Calls, BeyondTheQueueAreRefused) {
+TEST_F(Calls, BeyondTheQueueOfTheirMethodAreRefused) {
   std::vector<Connection> slow;
-  Reply reply;
-  for (int i = 0; reply.status == 0 && i < 400; ++i) {
+  for (int i = 0; i < 260; ++i) {  // four run, 256 wait
     slow.push_back(server_.Connect());
     slow.back().Send(Post("/api/Test.Echo/v1/wait", Wait("0")));
-    if (i >= 259) {  // four run, 256 wait
-      Connection last = server_.Connect();
-      last.Send(Post("/api/Test.Echo/v1/get"));
-      reply = last.Receive();
-      if (reply.status == 200) reply.status = 0;  // this one came before the queue was full
-    }
   }
-  EXPECT_EQ(reply.status, 503);
-  EXPECT_EQ(reply.headers["Retry-After"], "1");
+  Reply refused;
+  EXPECT_TRUE(Eventually([&] {
+    Connection one_more = server_.Connect();
+    one_more.Send(Post("/api/Test.Echo/v1/wait", Wait("0")));
+    pollfd answered{one_more.socket(), POLLIN, 0};
+    if (poll(&answered, 1, 20) == 1) refused = one_more.Receive();
+    slow.push_back(std::move(one_more));
+    return refused.status != 0;
+  }));
+  EXPECT_EQ(refused.status, 503);
+  EXPECT_EQ(refused.headers["Retry-After"], "1");
+  EXPECT_EQ(Call("v1/get").status, 200) << "other methods have queues of their own";
   sandbox_.Write("release", "");
   EXPECT_EQ(slow[0].Receive().status, 200);
-  EXPECT_TRUE(Eventually([&] { return Call("v1/get").status == 200; }));
+  EXPECT_TRUE(Eventually([&] { return Call("v1/wait", Wait("0")).status == 200; }));
+}
+
+TEST_F(Calls, WithMoreValuesThanAllowedAreRefused) {
+  std::string bomb = R"({"a":[[])";
+  for (int i = 0; i < 300000; ++i) bomb += ",[]";
+  const Reply reply = Call("v1/get", bomb + "]}");
+  EXPECT_EQ(reply.status, 413);
+  EXPECT_THAT(reply.Envelope()["error"]["text"].asString(), HasSubstr("more than 100000 values"));
+}
+
+TEST_F(Calls, ShowThatTheServerIsReady) {
+  Connection client = server_.Connect();
+  for (const char* target : {"/healthz", "/healthz/live", "/healthz/ready"}) {
+    client.Send(Get(target));
+    EXPECT_EQ(client.Receive().status, 200) << target;
+  }
 }
 
 TEST_F(Calls, InParallelEachGetTheirOwnAnswer) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <future>
+
 #include "body.h"
 #include "form_body.h"
 #include "sandbox.h"
@@ -20,7 +22,10 @@ class WebApiTest : public testing::Test {
     return head;
   }
   static Head PostJson(std::string_view type, std::uint64_t length = 2) {
-    Head head = Post("/api/Nfs/v1/get");
+    return PostBody("/api/Nfs/v1/get", type, length);
+  }
+  static Head PostBody(std::string_view target, std::string_view type, std::uint64_t length = 2) {
+    Head head = Post(target);
     head.has_body = true;
     head.content_type = type;
     head.content_length = length;
@@ -32,13 +37,21 @@ class WebApiTest : public testing::Test {
     return std::holds_alternative<Response>(begun) ? std::get<Response>(begun).status : 0;
   }
 
-  std::vector<Module> modules_{{"a.so", {{"Nfs", 1, "get", Nothing}}, {}}};
+  static Descriptor ParseDescriptor() {
+    std::string error;
+    return *Descriptor::Parse(
+        R"({"paths": {"/api/Nfs/v1/put": {"post": {"requestBody": {"content": {"multipart/form-data": {}}}}}}})",
+        &error);
+  }
+
+  std::vector<Module> modules_{{"a.so", {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}}, ParseDescriptor()}};
   Routes routes_{modules_};
-  WorkerPool pool_{{1, 1, 1}};
+  Workers workers_;
+  Budget memory_{std::size_t{1} << 30, std::size_t{1} << 30};
   Sandbox sandbox_;
   std::string error_;
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
-  WebApi api_{routes_, *uploads_, pool_};
+  WebApi api_{{routes_, *uploads_, workers_, memory_}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {
@@ -60,7 +73,7 @@ TEST_F(WebApiTest, RefusesOtherHttpMethodsAndSaysWhichIsAllowed) {
 }
 
 TEST_F(WebApiTest, HasPagesForGet) {
-  for (const char* target : {"/api", "/healthz"}) {
+  for (const char* target : {"/api", "/healthz", "/healthz/live"}) {
     Head head = Post(target);
     EXPECT_EQ(Begin(head), 405) << target;
     head.method = "GET";
@@ -68,6 +81,23 @@ TEST_F(WebApiTest, HasPagesForGet) {
     head.method = "HEAD";
     EXPECT_EQ(Begin(head), 200) << target;
   }
+}
+
+TEST_F(WebApiTest, IsReadyWhenAWorkerIsFree) {
+  Head head = Post("/healthz/ready");
+  EXPECT_EQ(Begin(head), 405);
+  head.method = "GET";
+  const auto ask = [&] {
+    auto begun = api_.Begin(head);
+    std::promise<int> status;
+    std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& answer) { status.set_value(answer.status); });
+    return status.get_future().get();
+  };
+  EXPECT_EQ(ask(), 200);
+  workers_.changing.Close();
+  EXPECT_EQ(ask(), 200) << "changing methods have other threads";
+  workers_.reading.Close();
+  EXPECT_EQ(ask(), 503);
 }
 
 TEST_F(WebApiTest, KnowsNothingElse) {
@@ -84,12 +114,19 @@ TEST_F(WebApiTest, TakesJsonOnly) {
 }
 
 TEST_F(WebApiTest, TakesFormsWithAProperBoundary) {
-  EXPECT_EQ(Begin(PostJson("multipart/form-data; boundary=x", FormBody::kMaxBytes)), 0);
-  EXPECT_EQ(Begin(PostJson("multipart/form-data; boundary=x", FormBody::kMaxBytes + 1)), 413);
+  const auto form = [this](const char* type, std::uint64_t length) {
+    return Begin(PostBody("/api/Nfs/v1/put", type, length));
+  };
+  EXPECT_EQ(form("multipart/form-data; boundary=x", FormBody::kMaxBytes), 0);
+  EXPECT_EQ(form("multipart/form-data; boundary=x", FormBody::kMaxBytes + 1), 413);
   for (const char* type : {"multipart/form-data", "multipart/form-data; boundary=",
                            "multipart/form-data; boundary=\"\"", "multipart/form-data; boundary=\"a\\\"b\""}) {
-    EXPECT_NE(Begin(PostJson(type)), 0) << type;
+    EXPECT_GE(form(type, 2), 400) << type;
   }
+}
+
+TEST_F(WebApiTest, TakesFormsOnlyForMethodsThatTakeAFile) {
+  EXPECT_EQ(Begin(PostBody("/api/Nfs/v1/get", "multipart/form-data; boundary=x")), 415);
 }
 
 TEST_F(WebApiTest, RefusesALargeBodyBeforeItComes) {

@@ -3,81 +3,172 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <functional>
 #include <future>
+#include <utility>
 
 #include "sandbox.h"
 
 namespace vorn::server {
 namespace {
 
-constexpr char kLanes[3] = "";
+using std::chrono::hours;
+using std::chrono::milliseconds;
 
-TEST(WorkerPool, RunsEveryJob) {
-  std::atomic<int> done{0};
-  {
-    WorkerPool pool({4, 2, 10000});
-    for (int i = 0; i < 10000; ++i) ASSERT_TRUE(pool.Submit(&kLanes[i % 3], [&done] { ++done; }));
+constexpr char kLanes[100] = "";
+
+// A job that counts what becomes of it.
+class TestJob : public Job {
+ public:
+  struct Counts {
+    std::atomic<int> done{0};
+    std::atomic<int> refused{0};
+    std::atomic<int> expired_waiting{0};
+    std::atomic<int> expired_running{0};
+  };
+  explicit TestJob(Counts& counts, std::function<void()> work = {}) : counts_(counts), work_(std::move(work)) {}
+
+  void Work() override {
+    if (work_) work_();
+    ++counts_.done;
   }
-  EXPECT_EQ(done, 10000);
+  void Expire(bool running) override { ++(running ? counts_.expired_running : counts_.expired_waiting); }
+  void Refuse() override { ++counts_.refused; }
+
+ private:
+  Counts& counts_;
+  const std::function<void()> work_;
+};
+
+// Limits for tests in which a job counts as long only if the test says so.
+WorkerPool::Limits Limits(std::size_t short_threads, std::size_t lane_threads, std::size_t lane_queue) {
+  WorkerPool::Limits limits;
+  limits.short_threads = short_threads;
+  limits.lane_threads = lane_threads;
+  limits.lane_queue = lane_queue;
+  return limits;
 }
 
-TEST(WorkerPool, ABusyLaneLeavesThreadsToTheOthers) {
-  std::promise<void> release;
-  const std::shared_future<void> released = release.get_future().share();
-  std::promise<void> other_done;
-  std::atomic<int> busy{0};
-  std::atomic<int> most{0};
-  {
-    WorkerPool pool({3, 2, 100});
-    for (int i = 0; i < 10; ++i) {
-      pool.Submit(&kLanes[0], [&] {
-        most = std::max(most.load(), ++busy);
-        released.wait();
-        --busy;
-      });
-    }
-    pool.Submit(&kLanes[1], [&] { other_done.set_value(); });
-    EXPECT_EQ(other_done.get_future().wait_for(kGenerous), std::future_status::ready);
-    release.set_value();
+class WorkerPoolTest : public testing::Test {
+ protected:
+  ~WorkerPoolTest() override { Release(); }
+
+  bool Submit(WorkerPool& pool, int lane, std::function<void()> work = {}, milliseconds time = hours(1)) {
+    return pool.Submit(&kLanes[lane], std::make_shared<TestJob>(counts_, std::move(work)), time);
   }
-  EXPECT_EQ(most, 2);
+  // Submits a job that runs until Release().
+  bool SubmitHanging(WorkerPool& pool, int lane, milliseconds time = hours(1)) {
+    const auto hang = [this] {
+      most_ = std::max(most_.load(), ++hanging_);
+      released_.wait();
+      --hanging_;
+    };
+    return Submit(pool, lane, hang, time);
+  }
+  void Release() {
+    if (!std::exchange(is_released_, true)) release_.set_value();
+  }
+
+  TestJob::Counts counts_;
+  std::atomic<int> hanging_{0};
+  std::atomic<int> most_{0};  // hanging at the same time
+
+ private:
+  std::promise<void> release_;
+  const std::shared_future<void> released_ = release_.get_future().share();
+  bool is_released_ = false;
+};
+
+TEST_F(WorkerPoolTest, RunsEveryJob) {
+  WorkerPool pool(Limits(4, 2, 10000));
+  for (int i = 0; i < 10000; ++i) ASSERT_TRUE(Submit(pool, i % 3));
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 10000; }));
 }
 
-TEST(WorkerPool, AJobBehindASlowOneGetsAThreadOfItsOwn) {
-  std::promise<void> release;
-  std::promise<void> second_done;
-  {
-    WorkerPool pool({2, 2, 100});
-    pool.Submit(&kLanes[0], [&] { release.get_future().wait(); });
-    pool.Submit(&kLanes[0], [&] { second_done.set_value(); });
-    EXPECT_EQ(second_done.get_future().wait_for(kGenerous), std::future_status::ready);
-    release.set_value();
-  }
+TEST_F(WorkerPoolTest, AHangingLaneKeepsToItsShareOfThreads) {
+  WorkerPool pool(Limits(2, 2, 100));
+  for (int i = 0; i < 10; ++i) SubmitHanging(pool, 0);
+  Submit(pool, 1);
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 1; }));
+  EXPECT_EQ(most_, 2);
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 11; }));
+  EXPECT_EQ(most_, 2);
 }
 
-TEST(WorkerPool, RefusesWhatDoesNotFitIntoTheQueue) {
-  std::promise<void> release;
-  std::promise<void> begun;
-  WorkerPool pool({1, 1, 2});
-  pool.Submit(&kLanes[0], [&] {
-    begun.set_value();
-    release.get_future().wait();
-  });
-  begun.get_future().wait();
-  EXPECT_TRUE(pool.Submit(&kLanes[0], [] {}));
-  EXPECT_TRUE(pool.Submit(&kLanes[1], [] {}));
-  EXPECT_FALSE(pool.Submit(&kLanes[2], [] {}));
-  release.set_value();
-  EXPECT_TRUE(Eventually([&] { return pool.Submit(&kLanes[2], [] {}); }));
+TEST_F(WorkerPoolTest, ManyHangingLanesLeaveThreadsToOthers) {
+  WorkerPool pool(Limits(2, 1, 100));
+  for (int lane = 0; lane < 20; ++lane) SubmitHanging(pool, lane);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 20; }));
+  Submit(pool, 20);
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 1; }));
+  Release();
 }
 
-TEST(WorkerPool, EndsWithAFullLaneAndIdleThreads) {
-  std::atomic<int> done{0};
+TEST_F(WorkerPoolTest, RunsFewShortJobsAtTheSameTime) {
+  WorkerPool::Limits limits = Limits(2, 100, 100);
+  limits.long_after = hours(1);  // so that even a hanging job is a short one
+  WorkerPool pool(limits);
+  for (int i = 0; i < 10; ++i) SubmitHanging(pool, i);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 2; }));
+  std::this_thread::sleep_for(milliseconds(50));  // in which a third one would begin
+  EXPECT_EQ(most_, 2);
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 10; }));
+}
+
+TEST_F(WorkerPoolTest, RefusesMoreThanALanesShareOfTheQueue) {
+  WorkerPool pool(Limits(1, 1, 2));
+  SubmitHanging(pool, 0);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 1; }));
+  EXPECT_TRUE(Submit(pool, 0));
+  EXPECT_TRUE(Submit(pool, 0));
+  EXPECT_FALSE(Submit(pool, 0));
+  EXPECT_TRUE(Submit(pool, 1)) << "another lane";
+  Release();
+  EXPECT_TRUE(Eventually([&] { return Submit(pool, 0); }));
+}
+
+TEST_F(WorkerPoolTest, TellsAJobThatItsDeadlineHasPassed) {
+  WorkerPool pool(Limits(1, 1, 10));
+  SubmitHanging(pool, 0, milliseconds(1));
+  EXPECT_TRUE(Eventually([&] { return counts_.expired_running == 1; }));
+  Submit(pool, 0, {}, milliseconds(1));  // its lane is busy
+  EXPECT_TRUE(Eventually([&] { return counts_.expired_waiting == 1; }));
+  Submit(pool, 0, {}, hours(1));
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 2; }));
+  EXPECT_EQ(counts_.expired_running, 1);
+  EXPECT_EQ(counts_.expired_waiting, 1);
+}
+
+TEST_F(WorkerPoolTest, RefusesAJobOnceItIsClosed) {
+  WorkerPool pool(Limits(1, 1, 10));
+  SubmitHanging(pool, 0);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 1; }));
+  Submit(pool, 0);
+  Submit(pool, 0);
+  pool.Close();
+  EXPECT_EQ(counts_.refused, 2);
+  EXPECT_FALSE(Submit(pool, 0));
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 1; })) << "the running job goes on";
+}
+
+TEST_F(WorkerPoolTest, DestroysAJobOnceItIsDone) {
+  WorkerPool pool(Limits(1, 1, 10));
+  auto job = std::make_shared<TestJob>(counts_);
+  const std::weak_ptr<TestJob> watched = job;
+  pool.Submit(&kLanes[0], std::move(job), hours(1));
+  EXPECT_TRUE(Eventually([&] { return watched.expired(); }));
+}
+
+TEST_F(WorkerPoolTest, LeavesNothingToDoWhenItEnds) {
   {
-    WorkerPool pool({4, 1, 100});
-    for (int i = 0; i < 50; ++i) pool.Submit(&kLanes[0], [&done] { ++done; });
+    WorkerPool pool(Limits(2, 1, 100));
+    for (int i = 0; i < 50; ++i) Submit(pool, 0);
   }
-  EXPECT_EQ(done, 50);
+  EXPECT_EQ(counts_.done + counts_.refused, 50);
 }
 
 }  // namespace

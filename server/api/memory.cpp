@@ -1,0 +1,22 @@
+#include "memory.h"
+
+#include <malloc.h>
+
+namespace vorn::server {
+namespace {
+
+// An arena of its own for each of a hundred threads would keep what each thread once needed.
+constexpr int kArenas = 2;
+constexpr int kLargeBlock = 128 * 1024;  // also turns off the growth of this limit with each freed block
+
+}  // namespace
+
+void ConfigureAllocator() {
+  mallopt(M_ARENA_MAX, kArenas);
+  mallopt(M_MMAP_THRESHOLD, kLargeBlock);
+  mallopt(M_TRIM_THRESHOLD, kLargeBlock);
+}
+
+void ReturnFreeMemory() { malloc_trim(0); }
+
+}  // namespace vorn::server

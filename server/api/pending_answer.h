@@ -1,0 +1,39 @@
+// An answer that several threads may give, and that is given once.
+#ifndef VORN_SERVER_PENDING_ANSWER_H
+#define VORN_SERVER_PENDING_ANSWER_H
+
+#include <mutex>
+#include <utility>
+
+#include "http.h"
+
+namespace vorn::server {
+
+// Thread-safe.
+class PendingAnswer {
+ public:
+  void Await(Answer answer) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    answer_ = std::move(answer);
+  }
+
+  // Answers with `response`. Returns false, without an effect, if somebody else has answered already.
+  bool Give(Response response) {
+    Answer answer;
+    {
+      const std::lock_guard<std::mutex> lock(mutex_);
+      answer.swap(answer_);
+    }
+    if (!answer) return false;
+    answer(std::move(response));
+    return true;
+  }
+
+ private:
+  std::mutex mutex_;
+  Answer answer_;
+};
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_PENDING_ANSWER_H

@@ -1,0 +1,46 @@
+#include "probe.h"
+
+#include <utility>
+
+#include "answer.h"
+
+namespace vorn::server {
+namespace {
+
+const char kLane = 0;
+
+// Not ready for lack of memory either.
+Response Unready(const char* text) noexcept {
+  try {
+    return Busy(text);
+  } catch (...) {
+    Response response;
+    response.status = 503;
+    return response;
+  }
+}
+
+}  // namespace
+
+void Probe::Run(Answer answer) {
+  answer_.Await(std::move(answer));
+  try {
+    if (pool_.Submit(&kLane, shared_from_this(), time_)) return;
+  } catch (const std::bad_alloc&) {
+  }
+  Refuse();
+}
+
+void Probe::Work() {
+  try {
+    answer_.Give(Success(Json::Value()));
+  } catch (const std::bad_alloc&) {
+    Refuse();
+  }
+}
+
+void Probe::Expire(bool /*running*/) { answer_.Give(Unready("No worker was free in time.")); }
+
+void Probe::Refuse() { answer_.Give(Unready("The server takes no calls.")); }
+
+}  // namespace vorn::server

@@ -1,0 +1,45 @@
+#include "probe.h"
+
+#include <gtest/gtest.h>
+
+#include <future>
+
+#include "sandbox.h"
+
+namespace vorn::server {
+namespace {
+
+// A job that takes the pool's only thread until it is told to end.
+class Blocker : public Job {
+ public:
+  explicit Blocker(std::shared_future<void> end) : end_(std::move(end)) {}
+  void Work() override { end_.wait(); }
+  void Expire(bool /*running*/) override {}
+  void Refuse() override {}
+
+ private:
+  const std::shared_future<void> end_;
+};
+
+int StatusOf(WorkerPool& pool, std::chrono::milliseconds time) {
+  std::promise<int> status;
+  std::make_shared<Probe>(pool, time)->Run([&](const Response& answer) { status.set_value(answer.status); });
+  return status.get_future().get();
+}
+
+TEST(Probe, TellsWhetherAWorkerIsFreeInTime) {
+  WorkerPool::Limits limits;
+  limits.threads = 1;
+  WorkerPool pool(limits);
+  EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 200);
+  std::promise<void> end;
+  pool.Submit(&limits, std::make_shared<Blocker>(end.get_future().share()), std::chrono::hours(1));
+  EXPECT_EQ(StatusOf(pool, std::chrono::milliseconds(1)), 503);
+  end.set_value();
+  EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 200);
+  pool.Close();
+  EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 503);
+}
+
+}  // namespace
+}  // namespace vorn::server

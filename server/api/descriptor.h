@@ -1,4 +1,4 @@
-// What a module's descriptor tells the server. X.json is the descriptor of X.so: a fragment of an OpenAPI 3.1
+// The descriptor of a module: X.json describes X.so. It is a fragment of an OpenAPI 3.1
 // document. The server reads from it
 //
 //   - "paths": a path item for each method, under the path that the method is called at, for example
@@ -28,7 +28,7 @@ class Descriptor {
     std::string text;
   };
 
-  // What is known of a method. A method without a description may write and takes no file.
+  // The description of a method. A method without a description may write and takes no file.
   struct Method {
     bool reads_only = false;
     bool takes_file = false;

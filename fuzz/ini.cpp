@@ -14,7 +14,7 @@ std::string EntriesOf(const IniDocument& document, std::string_view section) {
   return text;
 }
 
-// What the edited text reads as is what the edited document says.
+// Parsing the text of an edited document gives a document with the same values.
 void RequireSameAfterReading(const IniDocument& document) {
   const std::optional<IniDocument> again = IniDocument::Parse(document.Text());
   Require(again.has_value());

@@ -90,7 +90,7 @@ void RequireSameList(krb5_context context, krb5_keytab keytab, const std::vector
   krb5_kt_end_seq_get(context, keytab, &cursor);
 }
 
-// As rpc.svcgssd(8) asks: by the principal, any version and type.
+// The lookup of rpc.svcgssd(8): by principal, with any version and encryption type.
 void RequireFound(krb5_context context, krb5_keytab keytab, const KeytabKey& key) {
   const Principal principal(context, key.principal);
   krb5_keytab_entry entry{};

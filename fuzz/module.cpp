@@ -24,7 +24,7 @@ constexpr std::size_t kRows = 15;
 constexpr std::size_t kHead = 3;  // method, state of the box, failing call
 constexpr char kUploads[] = "/dev/null/";
 
-// As lenient as a web server may be: comments, NaN, lone surrogates, any root, as deep as the reader goes.
+// The most lenient reader that a web server could use: it accepts comments, NaN, lone surrogates, any root, any depth.
 std::optional<Json::Value> ReadLeniently(std::string_view text) {
   Json::CharReaderBuilder builder;
   builder["collectComments"] = false;

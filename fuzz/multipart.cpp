@@ -29,7 +29,7 @@ class Transcript : public vorn::server::PartReceiver {
   std::string text;
 };
 
-// What became of it. What an unfinished or malformed form has told so far depends on its pieces.
+// Returns the events of a form. The events before the end of an unfinished or malformed form depend on its pieces.
 std::string Read(std::string_view form, std::size_t first, std::size_t rest) {
   Transcript transcript;
   MultipartParser parser("b", transcript);

@@ -53,7 +53,7 @@ Json::Value DataShare() {
   return params;
 }
 
-// As the server does it: it stores the upload and names it.
+// Stores the upload in a file and passes its path, as the server does.
 void StoreUpload(const GuardedBox& box, Json::Value* params) {
   if (!params->isMember("keytab_file_tmp")) return;
   Json::Value& upload = (*params)["keytab_file_tmp"];
@@ -64,7 +64,7 @@ void StoreUpload(const GuardedBox& box, Json::Value* params) {
 void RemoveUpload(const GuardedBox& box) { static_cast<void>(std::remove(box.root().At(kUpload).c_str())); }
 
 // ---------------------------------------------------------------------------------------------
-// What the box says after a method that succeeded.
+// The checks of the box's state after a method that succeeded.
 
 bool IsListed(const Json::Value& idmap, const std::string& principal, const std::string& local_name) {
   return std::any_of(idmap.begin(), idmap.end(), [&](const Json::Value& mapping) {
@@ -76,7 +76,7 @@ void CheckMappings(const Json::Value& params) {
   Json::Value wanted = params["idmap"];
   if (wanted.isNull()) wanted.append(params);
   const Json::Value idmap = Ask(NFSIDMapList)["idmap"];
-  // Of a principal that is given twice the last name counts.
+  // If a principal is given twice, the last name counts.
   for (const Json::Value& mapping : wanted) {
     const std::string principal = mapping["kerberos_principal"].asString();
     const auto same = [&](const Json::Value& other) { return other["kerberos_principal"] == principal; };
@@ -112,7 +112,7 @@ void CheckEffect(Entry entry, const Json::Value& params) {
   if (entry == NFSSharePrivilegeSet) CheckRules(params);
 }
 
-// Whatever became of the request: what others ask for is answered.
+// Checks that all reading methods still answer, with success or failure of the request.
 void CheckReadable() {
   for (const Entry entry : {NFSGet, NFSAdvGet, NFSKerberosGet, NFSKerberosList, NFSIDMapList}) Ask(entry);
   Ask(NFSSharePrivilegeGet, DataShare());

@@ -1,4 +1,4 @@
-// What every target asserts with.
+// The assertion that every target uses.
 #ifndef VORN_FUZZ_REQUIRE_H
 #define VORN_FUZZ_REQUIRE_H
 

@@ -24,7 +24,7 @@ namespace vorn::server {
 // when the pool closes, is answered with 503.
 class Call : public Exchange, public Job, public std::enable_shared_from_this<Call> {
  public:
-  // What calls have in common. Both must outlive them.
+  // The objects that all calls share. Both must outlive the calls.
   struct Environment {
     WorkerPool& pool;
     std::chrono::milliseconds deadline;  // from the end of the body

@@ -23,7 +23,7 @@ class WebApi : public Service {
     std::chrono::milliseconds ready{1000};  // in which a worker must be free
   };
 
-  // What requests are answered with. All must outlive the WebApi.
+  // The objects that answer requests. All must outlive the WebApi.
   struct Parts {
     const Routes& routes;
     const UploadFolder& uploads;

@@ -41,7 +41,7 @@ struct Case {
   }
 };
 
-// What the change leaves when nothing happens to it; that its readers understand it is proved where it is tested.
+// The contents after an undisturbed change. Other tests check that the readers of the files understand them.
 Contents After(const Case& test) {
   const TemporaryRoot root;
   const Change change = test.On(root);

@@ -19,7 +19,7 @@ using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it
 using testing::ElementsAre;
 using testing::HasSubstr;
 
-// What is exported to whom, and how: as far as exportfs(8) gets.
+// The exports that exportfs(8) understands: path and client, with the options.
 using Table = std::map<std::pair<std::string, std::string>, std::string>;
 
 Table TableOf(const std::string& text) {

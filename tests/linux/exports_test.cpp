@@ -207,7 +207,7 @@ TEST_F(Exports, AreWrittenWhateverIsWrongWithOtherLines) {
   EXPECT_THAT(File(), HasSubstr("/x y(foo)\n/volume1/data a("));
 }
 
-// As after a reload of the file as it is.
+// Compares the table with the file, as the platform does after a reload.
 vorn::Status CheckTable() {
   const auto reloaded = vorn::ExportsFileStamp();
   return reloaded.ok() ? vorn::CheckExportTable(*reloaded) : reloaded.status();

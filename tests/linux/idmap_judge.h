@@ -1,4 +1,4 @@
-// What the ID-mapping library of nfs-utils makes of an idmapd.conf: libnfsidmap.
+// Reads an idmapd.conf with libnfsidmap, the ID-mapping library of nfs-utils.
 #ifndef VORN_TESTS_LINUX_IDMAP_JUDGE_H
 #define VORN_TESTS_LINUX_IDMAP_JUDGE_H
 

@@ -55,7 +55,7 @@ void SetDomain(_tag_nfs_id_map_* record, const char* domain) {
   record->domain = strdup(domain);
 }
 
-// What an API request does: get, change, set, free.
+// The calls of an API request: get, change, set, free.
 int Store(const Pairs& mappings, const std::vector<std::string>& gone = {}) {
   const IDMap record(VORNNFSIDMapGet());
   if (record == nullptr) return -1;

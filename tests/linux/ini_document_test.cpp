@@ -22,7 +22,7 @@ void Set(IniDocument* document, std::string_view section, std::string_view key, 
   document->Set(*IniSection::From(section), *IniKey::From(key), *IniValue::From(value));
 }
 
-// What the document says of two sections, as the judge tells it.
+// The values of two sections of the document, in the form that nfsconf(8) gives.
 IniContent ContentOf(const IniDocument& document) {
   IniContent content;
   for (const char* section : {"a", "b c"}) {

@@ -1,4 +1,4 @@
-// What nfs-utils itself reads in an INI file: nfsconf(8).
+// Reads INI files with nfsconf(8), the reader of nfs-utils.
 #ifndef VORN_TESTS_LINUX_INI_JUDGE_H
 #define VORN_TESTS_LINUX_INI_JUDGE_H
 

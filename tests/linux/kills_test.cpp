@@ -34,7 +34,7 @@ struct Free {
   void operator()(ExportRuleList* list) const { VORNNFSRuleExtFree(list); }
 };
 
-// What the writers leave for their parent, whatever becomes of them.
+// Memory that the writers share with their parent; it survives them.
 struct Board {
   std::atomic<bool> over{false};
   std::atomic<int> acknowledged[4]{};  // the steps of each writer, which count from 1
@@ -51,7 +51,7 @@ struct Unmap {
 };
 
 // ---------------------------------------------------------------------------------------------
-// What writers do, and whether it is there.
+// The changes of the writers, and the checks of their effects.
 
 std::string Principal(int writer, int step) {
   return std::to_string(step) + "." + std::to_string(writer) + "@LAB.TEST";

@@ -44,7 +44,7 @@ bool Same(const NFSConfRecord& a, const NFSConfRecord& b) {
          a.custom_port_enable == b.custom_port_enable;
 }
 
-// What the services themselves read.
+// The value that the services read.
 std::string Judged(const TemporaryRoot& root, const char* section, const char* key) {
   return GetByNfsconf(root.At("/etc/nfs.conf"), section, key);
 }

@@ -36,7 +36,7 @@ const std::vector<std::string> kBringUp = {"Reload",
                                            "Subscribe",
                                            "TryRestartUnit rpc-statd.service replace"};
 
-// As exportfs(8) writes it.
+// An export table in the format of exportfs(8).
 constexpr char kTable[] =
     "/volume1/data\t10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,no_all_squash,no_subtree_check,"
     "secure_locks,acl,no_pnfs,anonuid=65534,anongid=65534,sec=sys,rw,secure,root_squash,no_all_squash)\n";

@@ -26,7 +26,7 @@ class StandInManager {
 
   const std::string& address() const { return address_; }
 
-  // What was called, in order: "StartUnit nfs-server.service replace".
+  // Returns the calls since the last time, in order: "StartUnit nfs-server.service replace".
   std::vector<std::string> TakeCalls();
 
   // "MethodName unit" answers with an error: org.freedesktop.systemd1.`error`.

@@ -36,7 +36,7 @@ void LeaveFilesToBeMade(const TemporaryRoot& root);
 
 using Contents = std::map<std::string, std::optional<std::string>>;  // by path; none where there is no file
 
-// What is in the files of a change.
+// Returns the contents of the files of a change.
 Contents ContentsOf(const TemporaryRoot& root, const Change& change);
 
 // The temporary files that lie beside the files of a change.

@@ -1,5 +1,4 @@
-// What a request does when one of its calls goes wrong: tried with each of them, not with those that
-// somebody thought of.
+// Tests a request with each of its platform calls failing in turn.
 #ifndef VORN_TESTS_SUPPORT_EACH_CALL_H
 #define VORN_TESTS_SUPPORT_EACH_CALL_H
 

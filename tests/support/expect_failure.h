@@ -1,4 +1,4 @@
-// What every failed request looks like from outside.
+// The expectations on the answer of every failed request.
 #ifndef VORN_TESTS_SUPPORT_EXPECT_FAILURE_H
 #define VORN_TESTS_SUPPORT_EXPECT_FAILURE_H
 

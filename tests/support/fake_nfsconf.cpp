@@ -15,7 +15,7 @@ struct VORNSHARE {
 
 namespace {
 
-// What a test sees of a record's text.
+// The contents of a hash, for tests.
 Pairs PairsOf(const KLIBSZHASH* hash) { return hash == nullptr ? Pairs() : hash->pairs; }
 
 ExportRuleList* CopyRules(const std::string& path, const std::vector<ExportRule>& rules) {

@@ -123,7 +123,7 @@ void syslog(int priority, const char* format, ...) {
   va_end(arguments);
 }
 
-// What the compiler makes of syslog in a hardened build.
+// The function that a hardened build calls instead of syslog.
 // NOLINTNEXTLINE(bugprone-reserved-identifier)
 [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {
   va_list arguments;

@@ -15,7 +15,7 @@
 #include "nfsconf.h"
 #include "webapi.h"
 
-// What the module put into the system log.
+// One message that the module logged.
 struct LogLine {
   int priority;
   std::string source;  // of the "source:line " that every text begins with; "" if it does not
@@ -64,7 +64,7 @@ class FakePlatform {
   std::vector<LogLine> log;
   std::vector<std::string> failed_calls;  // the calls that failed on demand
   std::vector<std::string> LogTexts() const;
-  // What was called after the last call that failed or threw on demand.
+  // Returns the calls after the last one that failed or threw on demand.
   std::vector<std::string> CallsAfterFailure() const;
 
   // ---- what is still held
@@ -75,7 +75,7 @@ class FakePlatform {
   void FailCall(int n) { fail_at_ = n; }
   // The n-th call of `operation` does; 0 stands for every one.
   void Fail(const std::string& operation, int n = 0) { failing_[operation] = n; }
-  // What a failing integer operation answers, -1 unless it is said here.
+  // Sets the result of a failing integer operation; the default is -1.
   void FailWith(const std::string& operation, int result) { failure_results_[operation] = result; }
   // `operation` throws std::runtime_error("thrown on demand").
   void Throw(const std::string& operation) { throwing_ = operation; }
@@ -107,8 +107,8 @@ class FakePlatform {
   std::string throwing_;
 
  public:
-  // What KLIBCErrGet answers right after a failing call, and at any other time: whoever reads the
-  // reason too late prints the wrong one.
+  // The results of KLIBCErrGet immediately after a failing call, and at any other time. A caller that reads the
+  // reason too late therefore logs the wrong one.
   static constexpr int kReason = 0x0AB;
   static constexpr int kNoFailure = 0xDEAD;
 };

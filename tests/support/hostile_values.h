@@ -1,4 +1,4 @@
-// What somebody may send who means harm, or whose program is broken.
+// Parameters that an attacker or a faulty program may send.
 #ifndef VORN_TESTS_SUPPORT_HOSTILE_VALUES_H
 #define VORN_TESTS_SUPPORT_HOSTILE_VALUES_H
 
@@ -22,7 +22,7 @@ struct HostileJson {
   std::string text;  // one JSON value, or what somebody takes for one
 };
 
-// What stands where JSON has a value, and is none.
+// Texts that are no valid JSON values.
 const std::vector<HostileJson>& HostileJsonTexts();
 
 #endif  // VORN_TESTS_SUPPORT_HOSTILE_VALUES_H

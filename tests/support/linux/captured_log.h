@@ -10,7 +10,7 @@ struct LogLine {
   std::string text;
 };
 
-// What was logged since the last call, by all threads.
+// Returns the messages that all threads logged since the last call.
 std::vector<LogLine> TakeLog();
 
 #endif  // VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H

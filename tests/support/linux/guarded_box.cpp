@@ -97,7 +97,7 @@ constexpr File kFiles[] = {
     {"/volume1/media/README", ""},
 };
 
-// What requests may add to the box.
+// The files that requests may add to the box.
 constexpr const char* kMayAppear[] = {"/etc/nfs/krb5.keytab", "/etc/systemd/system/nfs-server.service.d/vorn.conf",
                                       "/run/vorn/config.lock", "/run/vorn/service-nfsd.lock",
                                       "/var/lib/vorn/nfsd.state"};

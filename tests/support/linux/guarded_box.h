@@ -16,9 +16,8 @@ class GuardedBox {
 
   const TemporaryRoot& root() const { return root_; }
 
-  // What requests that asked for at most `mappings` new ID mappings have broken, one sentence each: a
-  // line of the administrator's changed, one too many, a file that its readers stop at, characters
-  // that nobody sees, a file left behind.
+  // Returns the damage that requests did, one sentence each: a changed line of the administrator's, more than
+  // `mappings` new ID mappings, a file that its readers refuse, invisible characters, a temporary file.
   std::vector<std::string> Faults(std::size_t mappings) const;
 
   // Whether every file is as it was at first.

@@ -24,8 +24,8 @@ std::size_t Utf8End(std::string_view text) {
   return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
 }
 
-// The memory that JsonCpp allocates for a value: the Json::Value itself, the node of the map that holds it, and for an array
-// or an object the map.
+// The memory that JsonCpp allocates for a value: the Json::Value itself, the node of the map that holds it, and for an
+// array or an object the map.
 constexpr std::size_t kValueCost = 192;
 // A key, and a string, are copied into an allocation of their own.
 constexpr std::size_t kTextCost = 32;

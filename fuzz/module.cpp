@@ -1,5 +1,6 @@
-// The parameters of all methods, on a box in any state, with any call of the platform failing or throwing.
-// A request is answered once, or ends with an exception; nothing of it stays behind, and its log is in form.
+// Fuzzes the parameters of all methods, with the box in any state and any platform call failing or throwing.
+// Properties: a request is answered exactly once, or ends with a foreseen exception; no object is leaked; every log
+// line has its form.
 #include <json/reader.h>
 
 #include <algorithm>
@@ -24,7 +25,7 @@ constexpr std::size_t kRows = 15;
 constexpr std::size_t kHead = 3;  // method, state of the box, failing call
 constexpr char kUploads[] = "/dev/null/";
 
-// The most lenient reader that a web server could use: it accepts comments, NaN, lone surrogates, any root, any depth.
+// Parses JSON as leniently as a web server may: comments, NaN, lone surrogates, any root, any depth of the reader.
 std::optional<Json::Value> ReadLeniently(std::string_view text) {
   Json::CharReaderBuilder builder;
   builder["collectComments"] = false;
@@ -41,14 +42,14 @@ std::optional<Json::Value> ReadLeniently(std::string_view text) {
   return value;
 }
 
-// The server names the upload; what it names is removed by the module, so it is nothing that exists.
+// The module deletes the file that the server names as an upload. The path is changed to one that cannot exist.
 void ConfineUpload(Json::Value* params) {
   if (!params->isObject() || !(*params)["keytab_file_tmp"].isString()) return;
   Json::Value& upload = (*params)["keytab_file_tmp"];
   upload = kUploads + upload.asString();
 }
 
-// Each bit of the state is something else that the box may have, or lack.
+// Each bit of the state adds something to the box or removes it.
 void FurnishBox(FakePlatform* platform, unsigned state) {
   Furnish(platform, static_cast<int>(state & 1));
   platform->kerberos_support = (state & 2) != 0 ? 0 : 1;
@@ -72,7 +73,7 @@ bool IsControl(char c) { return static_cast<unsigned char>(c) < 0x20; }
 
 bool IsRequestLine(const LogLine& line) { return line.text.rfind("Request: ", 0) == 0; }
 
-// Its place, then the text; the request itself, whatever it holds, is one line.
+// Checks that a log line begins with its call site, and that a logged request is a single line.
 void CheckLine(const LogLine& line) {
   constexpr const char* kSources[] = {"handler", "nfs", "nfsAdv", "kerberos", "idmap", "share_privilege"};
   const bool known = std::any_of(std::begin(kSources), std::end(kSources), [&](auto s) { return line.source == s; });
@@ -97,7 +98,7 @@ void CheckAnswer(const FakePlatform& platform, const VORN::APIResponse& response
   Require(requests == (response.error() == 0 ? 0 : 1), "a failed request is logged once");
 }
 
-// Whether the method answered; if not, it left with an exception that somebody foresaw.
+// Runs the method. Returns whether it returned; otherwise it ended with a foreseen exception.
 bool Run(const APIRow& row, VORN::APIRequest* request, VORN::APIResponse* response) {
   try {
     row.handler(request, response);

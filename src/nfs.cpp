@@ -1,6 +1,7 @@
 #include "nfs.h"
 
 #include <algorithm>
+#include <array>
 #include <cstdlib>
 #include <cstring>
 #include <iterator>
@@ -28,13 +29,14 @@ struct ServiceParameters {
       : enable_nfs(params["enable_nfs"]),
         enable_nfs_v4(params[kEnableNFSv4.key]),
         nfs_v4_domain(params["nfs_v4_domain"]) {
-    for (size_t i = 0; i < std::size(kLiveSettings); ++i) live[i] = &params[kLiveSettings[i].key];
+    std::transform(std::begin(kLiveSettings), std::end(kLiveSettings), live.begin(),
+                   [&](const Setting& setting) { return &params[setting.key]; });
   }
 
   const Json::Value& enable_nfs;
   const Json::Value& enable_nfs_v4;
   const Json::Value& nfs_v4_domain;
-  const Json::Value* live[std::size(kLiveSettings)];  // in the order of kLiveSettings
+  std::array<const Json::Value*, std::size(kLiveSettings)> live;  // in the order of kLiveSettings
 };
 
 bool CheckServiceSwitch(const ServiceParameters& given) {
@@ -54,7 +56,7 @@ bool HasNFSv4Types(const ServiceParameters& given) {
 
 bool HasLiveTypes(const ServiceParameters& given) {
   return std::equal(
-      std::begin(kLiveSettings), std::end(kLiveSettings), given.live,
+      std::begin(kLiveSettings), std::end(kLiveSettings), given.live.begin(),
       [](const Setting& setting, const Json::Value* value) { return IsAcceptedOrAbsent(setting, *value); });
 }
 

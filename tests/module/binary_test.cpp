@@ -58,7 +58,7 @@ TEST(Binary, RunsNothingWhenItIsLoaded) {
   EXPECT_THAT(constructors, IsEmpty());
 }
 
-TEST(Binary, IsBoundToThePlatformThatIsThere) {
+TEST(Binary, UsesThePlatformThatIsLoaded) {
   FakePlatform platform;
   const auto module = LoadModule();
   ASSERT_NE(module, nullptr) << dlerror();

@@ -11,14 +11,14 @@ namespace {
 constexpr char kPlainRule[] = R"({"client": "*", "privilege": "ro", "root_squash": "root", "async": false,
                                   "insecure": false, "crossmnt": false, "security_flavor": {"kerberos": true}})";
 
-// A record of which no bit is as it shall be.
+// A record in which no field has a valid value.
 ExportRule Garbage() {
   ExportRule record;
   std::memset(&record, 0x55, sizeof record);
   return record;
 }
 
-TEST(RuleFromJson, LeavesNothingOfWhatTheRecordHeld) {
+TEST(RuleFromJson, OverwritesTheWholeRecord) {
   ExportRule record = Garbage();
   RuleFromJson(Parse(kPlainRule), true, &record);
   EXPECT_STREQ(record.client, "*");
@@ -41,7 +41,7 @@ TEST(RuleFromJson, AcceptsSysAloneWithoutKerberos) {
   }
 }
 
-TEST(RuleFromJson, GivesAClientTheLeastForAWordItDoesNotKnow) {
+TEST(RuleFromJson, GrantsTheLeastForAnUnknownWord) {
   Json::Value rule = Parse(kPlainRule);
   rule["privilege"] = rule["root_squash"] = "unknown";
   ExportRule record = Garbage();

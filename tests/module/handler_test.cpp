@@ -9,7 +9,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-// Opens what handlers use of their base.
+// Makes the protected members of the base class public.
 class Handler : public ServiceHandler {
  public:
   using ServiceHandler::AnswerTo;
@@ -20,7 +20,7 @@ class Handler : public ServiceHandler {
 
 constexpr CallSite kSite{"somewhere", 7};
 
-// What a test does with a fresh handler, as one request.
+// Runs `action` on a new handler as one request.
 template <typename Action>
 Answer Handle(const char* params, Action action) {
   return Call(

@@ -1,4 +1,4 @@
-// "create": what it accepts, conflicts, and the way of new mappings into the ID map.
+// The method "create": accepted parameters, conflicts, and the writing of new mappings.
 #include <gmock/gmock.h>
 
 #include <string>
@@ -34,7 +34,7 @@ void Furnish(FakePlatform* platform) {
   platform->enabled = 1;
 }
 
-// Request parameters with `items`, the inside of a JSON array.
+// Request parameters with `items`, the elements of a JSON array.
 std::string Mappings(const std::string& items) { return R"({"idmap": [)" + items + "]}"; }
 
 std::string Mapping(const std::string& principal, const std::string& local_name) {
@@ -120,7 +120,7 @@ TEST(NFSIDMapCreate, RefusesTheFirstBadMappingBeforeItReadsTheIDMap) {
   }
 }
 
-TEST(NFSIDMapCreate, RefusesWhatIsNoArrayBeforeItTouchesAnything) {
+TEST(NFSIDMapCreate, RefusesANonArrayBeforeAnyPlatformCall) {
   for (const char* params : {"null", "{}", R"({"idmap": null})", R"({"idmap": true})", R"({"idmap": 5})",
                              R"({"idmap": 0.5})", R"({"idmap": "x"})", R"({"idmap": ""})", R"({"idmap": {}})",
                              R"({"idmap": {"kerberos_principal": "b@BOX", "local_name": "bob"}})"}) {
@@ -172,7 +172,7 @@ struct CheckFailure {
   std::vector<std::string> calls;
 };
 
-TEST(NFSIDMapCreate, FailsWhenItCannotTellTheLocalUsers) {
+TEST(NFSIDMapCreate, FailsWhenTheLocalUsersCannotBeListed) {
   const CheckFailure failures[] = {
       {"KLIBCSzListAlloc", "Failed to KLIBCSzListAlloc.", {"KLIBCSzListAlloc 1024"}},
       {"VORNUserEnum", "Failed to VORNUserEnum.", {"KLIBCSzListAlloc 1024", "VORNUserEnum 1", "KLIBCSzListFree"}},
@@ -198,7 +198,7 @@ struct ConflictCase {
   const char* conflicts;   // as JSON, or null
 };
 
-TEST(GetConflictPrincipal, ListsThoseThatAreMappedAsOftenAsTheyOccur) {
+TEST(GetConflictPrincipal, ListsMappedPrincipalsOncePerOccurrence) {
   const ConflictCase cases[] = {
       {"", nullptr},      {"B", nullptr},     {"a", nullptr},           {"BB", nullptr},          {"A", R"(["A"])"},
       {"AB", R"(["A"])"}, {"BA", R"(["A"])"}, {"ABA", R"(["A", "A"])"}, {"CBA", R"(["C", "A"])"},
@@ -217,7 +217,7 @@ TEST(GetConflictPrincipal, ListsThoseThatAreMappedAsOftenAsTheyOccur) {
   }
 }
 
-TEST(NFSIDMapCreate, AddsNothingWhenAPrincipalIsMappedAndNamesThoseThatAre) {
+TEST(NFSIDMapCreate, AddsNothingAndListsTheConflictsIfAPrincipalIsMapped) {
   FakePlatform platform;
   Furnish(&platform);
   const Pairs before = platform.mappings;
@@ -232,7 +232,7 @@ TEST(NFSIDMapCreate, AddsNothingWhenAPrincipalIsMappedAndNamesThoseThatAre) {
                                           "VORNNFSIDMapFree", "KLIBCSzHashFree", "SetError"));
 }
 
-TEST(NFSIDMapCreate, ListsAConflictAsOftenAsItIsSent) {
+TEST(NFSIDMapCreate, ListsAConflictOncePerOccurrence) {
   FakePlatform platform;
   Furnish(&platform);
   const std::string a = Mapping("a@BOX", "bob");
@@ -242,7 +242,7 @@ TEST(NFSIDMapCreate, ListsAConflictAsOftenAsItIsSent) {
 
 // --------------------------------------------------------------------------------------- create
 
-TEST(NFSIDMapCreate, AddsTheMappingsWritesThemAndHasThemTakenUp) {
+TEST(NFSIDMapCreate, AddsWritesAndReloadsTheMappings) {
   FakePlatform platform;
   Furnish(&platform);
   const Answer answer = Call(NFSIDMapCreate, kTwoNew);
@@ -262,7 +262,7 @@ TEST(NFSIDMapCreate, AddsTheMappingsWritesThemAndHasThemTakenUp) {
   EXPECT_THAT(platform.live_objects, IsEmpty());
 }
 
-TEST(NFSIDMapCreate, WritesAndReloadsForNoMappingToo) {
+TEST(NFSIDMapCreate, WritesAndReloadsForAnEmptyArray) {
   FakePlatform platform;
   Furnish(&platform);
   const Answer answer = Call(NFSIDMapCreate, R"({"idmap": []})");
@@ -279,7 +279,7 @@ TEST(NFSIDMapCreate, ListsAPrincipalThatIsSentTwiceTwice) {
   EXPECT_EQ(platform.mappings, (Pairs{{"b@BOX", "carol"}}));
 }
 
-TEST(NFSIDMapCreate, LeavesOutAMappingThatCannotBeStored) {
+TEST(NFSIDMapCreate, SkipsAMappingThatCannotBeStored) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCSzHashSetValue", 1);
@@ -359,7 +359,7 @@ TEST(NFSIDMapCreate, RefusesAnIDMapWithoutTable) {
   EXPECT_THAT(platform.live_objects, IsEmpty());
 }
 
-TEST(NFSIDMapCreate, ConflictsWithItselfWhenItIsSentAgainAfterAFailedReload) {
+TEST(NFSIDMapCreate, ReportsAConflictWhenRepeatedAfterAFailedReload) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCExec", 1);
@@ -369,20 +369,20 @@ TEST(NFSIDMapCreate, ConflictsWithItselfWhenItIsSentAgainAfterAFailedReload) {
   EXPECT_EQ(again.data, Parse(R"({"principal_conflict": ["b@BOX", "r@BOX"]})"));
 }
 
-TEST(NFSIDMapCreate, AnswersOnceWhicheverCallFails) {
+TEST(NFSIDMapCreate, AnswersOnceWhenAnyCallFails) {
   // A mapping whose look-up fails counts as new.
   const std::vector<std::string> tolerated{"KLIBCSzHashGetValue", "KLIBCSzHashSetValue"};
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapCreate, kTwoNew, Furnish}, tolerated), 11);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapCreate, kTwoNew, Furnish}, tolerated), 11);
 }
 
-TEST(NFSIDMapCreate, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapCreate, kTwoNew, Furnish}), 17);
+TEST(NFSIDMapCreate, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapCreate, kTwoNew, Furnish}), 17);
   const char* const conflict = R"({"idmap": [{"kerberos_principal": "a@BOX", "local_name": "bob"}]})";
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapCreate, conflict, Furnish}), 8);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapCreate, conflict, Furnish}), 8);
 }
 
-TEST(NFSIDMapCreate, SucceedsHoweverThePlatformSaysThatItIsDone) {
-  ExpectSuccessHoweverItIsSaid({NFSIDMapCreate, kTwoNew, Furnish});
+TEST(NFSIDMapCreate, AcceptsEveryNonNegativeResult) {
+  ExpectSuccessForEveryNonNegativeResult({NFSIDMapCreate, kTwoNew, Furnish});
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// "delete": mappings go by their principals.
+// The method "delete": mappings are removed by principal.
 #include <gmock/gmock.h>
 
 #include <string>
@@ -26,7 +26,7 @@ void Furnish(FakePlatform* platform) {
   platform->enabled = 1;
 }
 
-TEST(NFSIDMapDelete, RemovesTheMappingsWritesTheRestAndHasItTakenUp) {
+TEST(NFSIDMapDelete, RemovesTheMappingsThenWritesAndReloads) {
   FakePlatform platform;
   Furnish(&platform);
   const Answer answer = Call(NFSIDMapDelete, kTwo);
@@ -43,7 +43,7 @@ TEST(NFSIDMapDelete, RemovesTheMappingsWritesTheRestAndHasItTakenUp) {
   EXPECT_THAT(platform.live_objects, IsEmpty());
 }
 
-TEST(NFSIDMapDelete, TakesOneTextLikeAnArrayOfOne) {
+TEST(NFSIDMapDelete, TreatsAStringLikeAnArrayOfOneString) {
   std::vector<std::vector<std::string>> calls;
   for (const char* params : {R"({"id": "a@BOX"})", R"({"id": ["a@BOX"]})"}) {
     FakePlatform platform;
@@ -60,7 +60,7 @@ struct AcceptedCase {
   size_t left;  // of three
 };
 
-TEST(NFSIDMapDelete, LeavesIDsThatAreNotMappedToThePlatformAndWritesAlways) {
+TEST(NFSIDMapDelete, PassesUnmappedIDsToThePlatformAndAlwaysWrites) {
   const AcceptedCase cases[] = {
       {R"({"id": []})", 3},
       {R"({"id": ""})", 3},
@@ -81,7 +81,7 @@ TEST(NFSIDMapDelete, LeavesIDsThatAreNotMappedToThePlatformAndWritesAlways) {
   }
 }
 
-TEST(NFSIDMapDelete, TakesAnIDMapWithoutTableAsItIs) {
+TEST(NFSIDMapDelete, PassesOnAnIDMapWithoutTable) {
   FakePlatform platform;
   Furnish(&platform);
   platform.has_table = false;
@@ -98,7 +98,7 @@ struct RefusedCase {
   const char* text;
 };
 
-TEST(NFSIDMapDelete, RefusesWhatIsNoTextBeforeItTouchesAnything) {
+TEST(NFSIDMapDelete, RefusesANonStringBeforeAnyPlatformCall) {
   const RefusedCase cases[] = {
       {"null", kMissing},
       {"{}", kMissing},
@@ -117,7 +117,7 @@ TEST(NFSIDMapDelete, RefusesWhatIsNoTextBeforeItTouchesAnything) {
   }
 }
 
-TEST(NFSIDMapDelete, RemovesNothingWhenOneElementIsNoText) {
+TEST(NFSIDMapDelete, RemovesNothingWhenOneElementIsNotAString) {
   for (const char* params : {R"({"id": ["a@BOX", null]})", R"({"id": ["a@BOX", true]})", R"({"id": ["a@BOX", 5]})",
                              R"({"id": [0.5]})", R"({"id": [["a@BOX"]]})", R"({"id": [{}, "a@BOX"]})"}) {
     FakePlatform platform;
@@ -131,7 +131,7 @@ TEST(NFSIDMapDelete, RemovesNothingWhenOneElementIsNoText) {
 
 // ------------------------------------------------------------------------------------- failures
 
-TEST(NFSIDMapDelete, LeavesOutAnIDThatCannotBeListed) {
+TEST(NFSIDMapDelete, SkipsAnIDThatCannotBeListed) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCSzListPush", 1);
@@ -188,17 +188,17 @@ TEST(NFSIDMapDelete, StopsWhereItFailsAndKeepsWhatIsWritten) {
   }
 }
 
-TEST(NFSIDMapDelete, AnswersOnceWhicheverCallFails) {
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapDelete, kTwo, Furnish}, {"KLIBCSzListPush"}), 7);
+TEST(NFSIDMapDelete, AnswersOnceWhenAnyCallFails) {
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapDelete, kTwo, Furnish}, {"KLIBCSzListPush"}), 7);
 }
 
-TEST(NFSIDMapDelete, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapDelete, kTwo, Furnish}), 11);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapDelete, R"({"id": ["a@BOX", 5]})", Furnish}), 3);
+TEST(NFSIDMapDelete, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapDelete, kTwo, Furnish}), 11);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapDelete, R"({"id": ["a@BOX", 5]})", Furnish}), 3);
 }
 
-TEST(NFSIDMapDelete, SucceedsHoweverThePlatformSaysThatItIsDone) {
-  ExpectSuccessHoweverItIsSaid({NFSIDMapDelete, kTwo, Furnish});
+TEST(NFSIDMapDelete, AcceptsEveryNonNegativeResult) {
+  ExpectSuccessForEveryNonNegativeResult({NFSIDMapDelete, kTwo, Furnish});
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// "list": the configured mappings, and suggestions.
+// The method "list": configured mappings and suggestions.
 #include <gmock/gmock.h>
 
 #include <string>
@@ -77,7 +77,7 @@ TEST(NFSIDMapList, ListsSuggestionsForRootAndForTheUsersAsEnumerated) {
   EXPECT_THAT(platform.log, IsEmpty());
 }
 
-TEST(NFSIDMapList, AnswersAnEmptyListWhereThereIsNoMapping) {
+TEST(NFSIDMapList, AnswersAnEmptyListWithoutMappings) {
   FakePlatform platform;
   const Answer answer = Call(NFSIDMapList, R"({"offset": 3, "limit": 2})");
   EXPECT_EQ(answer.code, 0);
@@ -86,7 +86,7 @@ TEST(NFSIDMapList, AnswersAnEmptyListWhereThereIsNoMapping) {
 
 // --------------------------------------------------------------------------------------- filter
 
-TEST(NFSIDMapList, LeavesTheFilterOfMappingsToThePlatform) {
+TEST(NFSIDMapList, PassesTheFilterOfMappingsToThePlatform) {
   FakePlatform platform;
   Furnish(&platform);
   const Answer answer = Call(NFSIDMapList, R"({"filter": "carol", "limit": 0})");
@@ -94,7 +94,7 @@ TEST(NFSIDMapList, LeavesTheFilterOfMappingsToThePlatform) {
   EXPECT_THAT(platform.calls, Contains("VORNNFSStaticMapGet carol"));
 }
 
-TEST(NFSIDMapList, HandsOnAnEmptyFilterOfMappingsAsOne) {
+TEST(NFSIDMapList, PassesOnAnEmptyFilterOfMappings) {
   FakePlatform platform;
   Call(NFSIDMapList, R"({"filter": ""})");
   EXPECT_THAT(platform.calls, Contains("VORNNFSStaticMapGet")) << "the empty text, not a null pointer";
@@ -106,7 +106,7 @@ struct SuggestionCase {
   std::vector<std::string> local_names;  // out of "carol", "rootless" and "u5"
 };
 
-TEST(NFSIDMapList, SuggestsRootWhereItsNameContainsTheFilterInAnyCase) {
+TEST(NFSIDMapList, SuggestsRootIfItsNameContainsTheFilterIgnoringCase) {
   const SuggestionCase cases[] = {
       {"null", "VORNUserEnum 1", {"root", "carol", "rootless", "u5"}},
       {R"("")", "VORNUserEnum 1", {"root", "carol", "rootless", "u5"}},
@@ -139,7 +139,7 @@ TEST(NFSIDMapList, SuggestsRootWhereItsNameContainsTheFilterInAnyCase) {
   }
 }
 
-TEST(NFSIDMapList, ComparesAFilterWithRootAfterItHasAskedForTheUsers) {
+TEST(NFSIDMapList, MatchesRootAfterTheUsersWereListed) {
   FakePlatform platform;
   platform.users = {"carol"};
   Call(NFSIDMapList, With(kSuggest, R"("filter": "ro")"));
@@ -152,7 +152,7 @@ TEST(NFSIDMapList, ComparesAFilterWithRootAfterItHasAskedForTheUsers) {
 
 // ---------------------------------------------------------------------------------------- sizes
 
-TEST(NFSIDMapList, TakesAFilterOfUpTo491BytesForSuggestions) {
+TEST(NFSIDMapList, AcceptsAFilterOfUpTo491BytesForSuggestions) {
   FakePlatform platform;
   const std::string longest(491, 'r');
   EXPECT_EQ(Call(NFSIDMapList, With(kSuggest, R"("filter": ")" + longest + '"')).data,
@@ -165,7 +165,7 @@ TEST(NFSIDMapList, TakesAFilterOfUpTo491BytesForSuggestions) {
                 {"KLIBCUnicodeUTF8StrUpper failed, str=[" + too_long + "]", "AddRootToList Failed"});
 }
 
-TEST(NFSIDMapList, TakesARealmOfUpTo511Bytes) {
+TEST(NFSIDMapList, AcceptsARealmOfUpTo511Bytes) {
   FakePlatform platform;
   platform.realm = std::string(511, 'R');
   EXPECT_EQ(Call(NFSIDMapList, kSuggest).data["idmap"][0]["id"], "root@" + platform.realm);
@@ -173,7 +173,7 @@ TEST(NFSIDMapList, TakesARealmOfUpTo511Bytes) {
   EXPECT_EQ(Call(NFSIDMapList, kSuggest).code, 2302);
 }
 
-TEST(NFSIDMapList, CutsASuggestedPrincipalTo1023Bytes) {
+TEST(NFSIDMapList, TruncatesASuggestedPrincipalTo1023Bytes) {
   FakePlatform platform;
   const std::string fits(1023 - platform.realm.size() - 1, 'u');
   platform.users = {fits, fits + "v", std::string(2000, 'w')};
@@ -218,7 +218,7 @@ const PagingCase kPagingCases[] = {
     {R"("offset": 3, "limit": -1)", 3, 5},
 };
 
-TEST(NFSIDMapList, CutsThePageOutOfTheWholeListing) {
+TEST(NFSIDMapList, ReturnsThePageOfTheWholeListing) {
   for (const char* params : {"{}", kSuggest}) {
     FakePlatform platform;
     Furnish(&platform);
@@ -235,7 +235,7 @@ TEST(NFSIDMapList, CutsThePageOutOfTheWholeListing) {
   }
 }
 
-TEST(NFSIDMapList, ReadsNothingButThePage) {
+TEST(NFSIDMapList, ReadsOnlyTheItemsOfThePage) {
   FakePlatform platform;
   Furnish(&platform);
   Call(NFSIDMapList, R"({"offset": 1, "limit": 1})");
@@ -314,7 +314,7 @@ void ExpectType(const std::string& params, bool accepted) {
   EXPECT_THAT(platform.calls, ElementsAre("GetParam", "SetError")) << params;
 }
 
-TEST(NFSIDMapList, ChecksEveryTypeBeforeItTouchesAnything) {
+TEST(NFSIDMapList, ChecksEveryTypeBeforeAnyPlatformCall) {
   for (const TypeCase& c : kTypeCases) {
     const std::string member = std::string("\"") + c.key + "\": " + c.value;
     ExpectType(With("{}", member), c.accepted_for_mappings);
@@ -326,7 +326,7 @@ TEST(NFSIDMapList, ChecksEveryTypeBeforeItTouchesAnything) {
   }
 }
 
-TEST(NFSIDMapList, LogsOneTypeHoweverManyAreBad) {
+TEST(NFSIDMapList, LogsOneLineForSeveralWrongTypes) {
   ExpectType(R"({"suggestion": 1, "offset": "x", "limit": [], "filter": {}})", false);
   ExpectType(R"({"suggestion": true, "offset": "x", "limit": [], "filter": {}})", false);
   ExpectType(R"({"offset": "x", "limit": [], "filter": {}})", false);
@@ -401,7 +401,7 @@ TEST(NFSIDMapList, SuggestsNothingWithoutARealm) {
   EXPECT_EQ(Call(NFSIDMapList, "{}").code, 0) << "mappings need none";
 }
 
-TEST(NFSIDMapList, LeavesOutAKeyThatCannotBeReadAndPutsNothingInItsPlace) {
+TEST(NFSIDMapList, SkipsAnUnreadableKeyWithoutReplacement) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCSzListGet", 2);
@@ -412,7 +412,7 @@ TEST(NFSIDMapList, LeavesOutAKeyThatCannotBeReadAndPutsNothingInItsPlace) {
   ExpectLog(platform, "idmap", {"Failed to KLIBCSzListGet, vornerr=[0x00AB]"});
 }
 
-TEST(NFSIDMapList, LeavesOutAKeyWithoutValueAndPutsNothingInItsPlace) {
+TEST(NFSIDMapList, SkipsAKeyWithoutValueWithoutReplacement) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCSzHashGetValue", 1);
@@ -423,7 +423,7 @@ TEST(NFSIDMapList, LeavesOutAKeyWithoutValueAndPutsNothingInItsPlace) {
   ExpectLog(platform, "idmap", {"Failed to KLIBCSzHashGetValue."});
 }
 
-TEST(NFSIDMapList, AnswersAnEmptyListWhereNoKeyCanBeRead) {
+TEST(NFSIDMapList, AnswersAnEmptyListIfNoKeyCanBeRead) {
   FakePlatform platform;
   Furnish(&platform);
   platform.Fail("KLIBCSzListGet");
@@ -432,7 +432,7 @@ TEST(NFSIDMapList, AnswersAnEmptyListWhereNoKeyCanBeRead) {
   }
 }
 
-TEST(NFSIDMapList, SuggestsTheUsersWhereRootCannotBeInserted) {
+TEST(NFSIDMapList, SuggestsTheUsersIfRootCannotBeInserted) {
   FakePlatform platform;
   platform.users = {"alice"};
   platform.Fail("KLIBCSzListInsert");
@@ -440,27 +440,27 @@ TEST(NFSIDMapList, SuggestsTheUsersWhereRootCannotBeInserted) {
   EXPECT_THAT(platform.log, IsEmpty());
 }
 
-TEST(NFSIDMapList, AnswersOnceWhicheverCallFails) {
+TEST(NFSIDMapList, AnswersOnceWhenAnyCallFails) {
   const std::vector<std::string> tolerated{"KLIBCSzListGet", "KLIBCSzHashGetValue", "KLIBCSzListInsert"};
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapList, R"({"limit": 3})", Furnish}, tolerated), 4 + 3 * 2);
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapList, kSuggest, Furnish}, tolerated), 4 + 5);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapList, R"({"limit": 3})", Furnish}, tolerated), 4 + 3 * 2);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapList, kSuggest, Furnish}, tolerated), 4 + 5);
   const char* const filtered = R"({"suggestion": true, "filter": "o"})";
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapList, filtered, Furnish}, tolerated), 5 + 3);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapList, filtered, Furnish}, tolerated), 5 + 3);
 }
 
-TEST(NFSIDMapList, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapList, R"({"limit": 3})", Furnish}), 1 + 5 + 3 * 2 + 1);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapList, kSuggest, Furnish}), 1 + 4 + 5 + 1);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapList, R"({"offset": ""})", Furnish}), 2);
+TEST(NFSIDMapList, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapList, R"({"limit": 3})", Furnish}), 1 + 5 + 3 * 2 + 1);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapList, kSuggest, Furnish}), 1 + 4 + 5 + 1);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapList, R"({"offset": ""})", Furnish}), 2);
 }
 
-TEST(NFSIDMapList, SucceedsHoweverThePlatformSaysThatItIsDone) {
+TEST(NFSIDMapList, AcceptsEveryNonNegativeResult) {
   for (const char* params : {"{}", kSuggest, R"({"suggestion": true, "filter": "o"})"}) {
-    ExpectSuccessHoweverItIsSaid({NFSIDMapList, params, Furnish});
+    ExpectSuccessForEveryNonNegativeResult({NFSIDMapList, params, Furnish});
   }
 }
 
-TEST(NFSIDMapList, TakesEmptyTextsOfThePlatformForWhatTheyAre) {
+TEST(NFSIDMapList, AcceptsEmptyStringsFromThePlatform) {
   FakePlatform platform;
   platform.users = {"alice"};
   platform.realm = "";

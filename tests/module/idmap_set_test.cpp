@@ -1,4 +1,4 @@
-// "set": one mapping takes the place of another.
+// The method "set": one mapping replaces another.
 #include <gmock/gmock.h>
 
 #include <string>
@@ -28,7 +28,7 @@ void Furnish(FakePlatform* platform) {
   platform->enabled = 1;
 }
 
-TEST(NFSIDMapSet, ReplacesTheMappingWritesItAndHasItTakenUp) {
+TEST(NFSIDMapSet, ReplacesWritesAndReloadsTheMapping) {
   FakePlatform platform;
   Furnish(&platform);
   const Answer answer = Call(NFSIDMapSet, kReplace);
@@ -94,7 +94,7 @@ struct TextCase {
   bool accepted_as_id;
 };
 
-TEST(NFSIDMapSet, TakesNothingButTextsOfWhichOnlyTheIDMayBeEmpty) {
+TEST(NFSIDMapSet, AcceptsOnlyStringsOfWhichOnlyTheIDMayBeEmpty) {
   const TextCase values[] = {{"null", false}, {"true", false}, {"5", false},        {"0.5", false},
                              {"[]", false},   {"{}", false},   {R"(["x"])", false}, {R"("")", true}};
   for (const char* key : {"id", "kerberos_principal", "local_name"}) {
@@ -111,7 +111,7 @@ TEST(NFSIDMapSet, TakesNothingButTextsOfWhichOnlyTheIDMayBeEmpty) {
   }
 }
 
-TEST(NFSIDMapSet, WantsAllThreeKeys) {
+TEST(NFSIDMapSet, RequiresAllThreeKeys) {
   for (const char* params :
        {"null", "{}", R"({"kerberos_principal": "b@BOX", "local_name": "bob"})",
         R"({"id": "a@BOX", "local_name": "bob"})", R"({"id": "a@BOX", "kerberos_principal": "b@BOX"})"}) {
@@ -179,7 +179,7 @@ const RefusedCase kRefusedCases[] = {
       "VORNUserEnum 1", "KLIBCSzListFind Root", "KLIBCSzListFree", "VORNNFSIDMapFree"}},
 };
 
-TEST(NFSIDMapSet, RefusesInItsOrderAndWritesNothing) {
+TEST(NFSIDMapSet, ChecksInItsOrderAndWritesNothing) {
   for (const RefusedCase& c : kRefusedCases) {
     FakePlatform platform;
     Furnish(&platform);
@@ -257,19 +257,19 @@ TEST(NFSIDMapSet, RefusesAnIDMapWithoutTable) {
   EXPECT_THAT(platform.live_objects, IsEmpty());
 }
 
-TEST(NFSIDMapSet, AnswersOnceWhicheverCallFails) {
+TEST(NFSIDMapSet, AnswersOnceWhenAnyCallFails) {
   // A principal whose look-up fails counts as free.
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSIDMapSet, kReplace, Furnish}, {"KLIBCSzHashGetValue"}), 8);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSIDMapSet, kReplace, Furnish}, {"KLIBCSzHashGetValue"}), 8);
 }
 
-TEST(NFSIDMapSet, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapSet, kReplace, Furnish}), 13);
+TEST(NFSIDMapSet, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapSet, kReplace, Furnish}), 13);
   const char* const unknown_user = R"({"id": "a@BOX", "kerberos_principal": "b@BOX", "local_name": "dave"})";
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSIDMapSet, unknown_user, Furnish}), 8);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSIDMapSet, unknown_user, Furnish}), 8);
 }
 
-TEST(NFSIDMapSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
-  ExpectSuccessHoweverItIsSaid({NFSIDMapSet, kReplace, Furnish});
+TEST(NFSIDMapSet, AcceptsEveryNonNegativeResult) {
+  ExpectSuccessForEveryNonNegativeResult({NFSIDMapSet, kReplace, Furnish});
 }
 
 }  // namespace

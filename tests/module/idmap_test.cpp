@@ -1,4 +1,4 @@
-// What the methods that change the ID map share: the write, the reload, and the logged request.
+// Behaviour that all ID-map methods share: the write, the reload, and the logged request.
 #include "idmap.h"
 
 #include <gmock/gmock.h>
@@ -34,7 +34,7 @@ const Change kChanges[] = {
     {NFSIDMapDelete, R"({"id": "a@BOX"})", {}},
 };
 
-TEST(NFSIDMap, WritesWhileTheServiceIsOffAndRunsNoScript) {
+TEST(NFSIDMap, WritesAndRunsNoScriptWhileTheServiceIsDisabled) {
   for (const Change& change : kChanges) {
     FakePlatform platform;
     platform.mappings = {{"a@BOX", "alice"}};
@@ -67,7 +67,7 @@ TEST(NFSIDMap, KeepsWhatIsWrittenWhenTheReloadFails) {
   }
 }
 
-TEST(NFSIDMap, TakesOnlyANegativeResultOfTheReloadForAFailure) {
+TEST(NFSIDMap, TreatsOnlyANegativeReloadResultAsFailure) {
   for (const auto& [result, code] : {std::pair{3, 0}, {-1, 2302}, {-2, 2302}}) {
     FakePlatform platform;
     platform.enabled = 1;
@@ -77,7 +77,7 @@ TEST(NFSIDMap, TakesOnlyANegativeResultOfTheReloadForAFailure) {
   }
 }
 
-TEST(SaveIDMapAndReloadIDMap, HoldsTheConfigurationForTheWholeCall) {
+TEST(SaveIDMapAndReloadIDMap, HoldsTheConfigurationLockForTheWholeCall) {
   for (const char* failing : {"", "VORNNFSIDMapSet", "KLIBCExec"}) {
     FakePlatform platform;
     platform.enabled = 1;
@@ -91,7 +91,7 @@ TEST(SaveIDMapAndReloadIDMap, HoldsTheConfigurationForTheWholeCall) {
   }
 }
 
-TEST(NFSIDMap, LogsTheParametersItReadFirstAtTheMethodsOwnLine) {
+TEST(NFSIDMap, LogsTheParametersOfTheFirstReadWithTheLineOfTheDriver) {
   std::set<int> lines;
   for (const Entry entry : {NFSIDMapList, NFSIDMapCreate, NFSIDMapSet, NFSIDMapDelete}) {
     FakePlatform platform;

@@ -21,7 +21,7 @@ using testing::Not;
 constexpr char kKeytabFile[] = "/etc/nfs/krb5.keytab";
 constexpr char kScript[] = "KLIBCExec /usr/vorn/etc/rc.sysv/S83nfsd.sh reloadidmap - - -";
 
-// A file as the web server leaves an upload.
+// An uploaded file, as the web server stores it.
 class Upload {
  public:
   Upload() : path_(testing::TempDir() + "vorn-upload-" + std::to_string(getpid())) { std::ofstream(path_) << "keys"; }
@@ -79,7 +79,7 @@ TEST(NFSKerberosGet, SucceedsWithoutKerberosSupport) {
   EXPECT_EQ(answer.data["kerberos_support"], false);
 }
 
-TEST(NFSKerberosGet, TakesAnyNonZeroAnswerForSupport) {
+TEST(NFSKerberosGet, TreatsEveryNonZeroResultAsSupport) {
   FakePlatform platform;
   platform.kerberos_support = -1;
   EXPECT_EQ(Call(NFSKerberosGet, "{}").data["kerberos_support"], true);
@@ -114,7 +114,7 @@ TEST(NFSKerberosList, IsEmptyForAnEmptyKeytabAndReleasesNothing) {
   EXPECT_THAT(platform.calls, ElementsAre("VORNNFSKeytabInfoGet /etc/nfs/krb5.keytab", "SetSuccess"));
 }
 
-TEST(NFSKerberosList, FailsAndReleasesWhatAFailedReadLeft) {
+TEST(NFSKerberosList, FailsAndReleasesTheListOfAFailedRead) {
   for (const bool leaves_list : {true, false}) {
     FakePlatform platform;
     if (leaves_list) Furnish(&platform);
@@ -126,7 +126,7 @@ TEST(NFSKerberosList, FailsAndReleasesWhatAFailedReadLeft) {
 
 // ---------------------------------------------------------------------------------------- upload
 
-TEST(NFSKerberosUploadKey, ImportsHasTheServiceTakeItUpAndRemovesTheFile) {
+TEST(NFSKerberosUploadKey, ImportsReloadsAndRemovesTheFile) {
   FakePlatform platform;
   Furnish(&platform);
   const Upload upload;
@@ -140,7 +140,7 @@ TEST(NFSKerberosUploadKey, ImportsHasTheServiceTakeItUpAndRemovesTheFile) {
   EXPECT_THAT(platform.log, IsEmpty());
 }
 
-TEST(NFSKerberosUploadKey, RunsNoScriptWhileTheServiceIsOff) {
+TEST(NFSKerberosUploadKey, RunsNoScriptWhileTheServiceIsDisabled) {
   FakePlatform platform;
   const Upload upload;
   EXPECT_EQ(Call(NFSKerberosUploadKey, upload.Params()).code, 0);
@@ -148,7 +148,7 @@ TEST(NFSKerberosUploadKey, RunsNoScriptWhileTheServiceIsOff) {
   EXPECT_FALSE(upload.IsThere());
 }
 
-TEST(NFSKerberosUploadKey, TakesAnUnknownServiceStateForOn) {
+TEST(NFSKerberosUploadKey, TreatsAnUnknownServiceStateAsEnabled) {
   FakePlatform platform;
   platform.enabled = -1;
   const Upload upload;
@@ -162,7 +162,7 @@ struct ImportCase {
   std::vector<std::string> texts;
 };
 
-TEST(NFSKerberosUploadKey, TellsImportResultsApartAndRemovesTheFileAfterEach) {
+TEST(NFSKerberosUploadKey, DistinguishesImportResultsAndAlwaysRemovesTheFile) {
   const ImportCase cases[] = {
       {-2, 2331, {"Failed to VORNNFSKeytabImport: wrong keytab file format."}},
       {-1, 2302, {"Failed to VORNNFSKeytabImport."}},
@@ -193,7 +193,7 @@ TEST(NFSKerberosUploadKey, ReportsAFailedScriptAlthoughTheKeytabIsInstalled) {
   EXPECT_FALSE(upload.IsThere());
 }
 
-TEST(NFSKerberosUploadKey, LeavesTheFileWhereKerberosIsNotSupported) {
+TEST(NFSKerberosUploadKey, KeepsTheFileIfKerberosIsNotSupported) {
   FakePlatform platform;
   platform.kerberos_support = 0;
   const Upload upload;
@@ -216,27 +216,27 @@ TEST(NFSKerberosUploadKey, RefusesARequestThatNamesNoFile) {
   }
 }
 
-TEST(NFSKerberosUploadKey, RemovesNothingThatIsGoneAlready) {
+TEST(NFSKerberosUploadKey, RemovesNoFileThatDoesNotExist) {
   FakePlatform platform;
   EXPECT_EQ(Call(NFSKerberosUploadKey, R"({"keytab_file_tmp": "/nowhere/keytab"})").code, 0);
 }
 
 // ------------------------------------------------------------------------------------- each call
 
-TEST(NFSKerberos, ReleasesEverythingWhicheverCallFailsOrThrows) {
+TEST(NFSKerberos, ReleasesEverythingWhenAnyCallFailsOrThrows) {
   const Request get{NFSKerberosGet, "{}", Furnish};
   const Request list{NFSKerberosList, "{}", Furnish};
   const Request upload{NFSKerberosUploadKey, R"({"keytab_file_tmp": "/nowhere/keytab"})", Furnish};
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails(get), 1);
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails(list), 1);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows(get), 4);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows(list), 2);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows(upload), 8);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails(get), 1);
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails(list), 1);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows(get), 4);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows(list), 2);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows(upload), 8);
 }
 
-TEST(NFSKerberos, SucceedsHoweverThePlatformSaysThatItIsDone) {
-  ExpectSuccessHoweverItIsSaid({NFSKerberosGet, "{}", Furnish});
-  ExpectSuccessHoweverItIsSaid({NFSKerberosList, "{}", Furnish});
+TEST(NFSKerberos, AcceptsEveryNonNegativeResult) {
+  ExpectSuccessForEveryNonNegativeResult({NFSKerberosGet, "{}", Furnish});
+  ExpectSuccessForEveryNonNegativeResult({NFSKerberosList, "{}", Furnish});
 }
 
 }  // namespace

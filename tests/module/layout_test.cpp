@@ -1,5 +1,5 @@
-// The binary contract as this target has it: sizes and offsets that a platform in another language would be written
-// against. The headers assert them too; here they are seen, also where the tests run on the appliance's own ABI.
+// The binary contract on this target: sizes and offsets of the records. The headers assert them at compile time; this
+// test prints them, also on the ABI of the appliance.
 #include <gtest/gtest.h>
 
 #include <cstddef>
@@ -42,7 +42,7 @@ bool IsBigEndian() {
   return *reinterpret_cast<const unsigned char*>(&number) == 0;
 }
 
-TEST(Layout, IsTheContracts) {
+TEST(Layout, MatchesTheContract) {
   std::cout << 8 * sizeof(void*) << " bits, " << (IsBigEndian() ? "big" : "little") << "-endian\n";
   for (const Measure& measure : kMeasures) {
     std::cout << "  " << measure.name << ": " << measure.value << "\n";

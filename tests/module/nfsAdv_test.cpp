@@ -24,14 +24,14 @@ using testing::StartsWith;
 
 void FurnishRunning(FakePlatform* platform) { Furnish(platform, 1); }
 
-// What a furnished box holds already.
+// The values that a box of Furnish has already.
 constexpr char kUnchanged[] = R"({"enable_nfs": true, "read_size": 8192, "write_size": 16384, "unix_pri_enable": false,
                                   "custom_port_enable": true, "statd_port": 4000, "nlm_port": 4001})";
 
 constexpr char kEverything[] = R"({"enable_nfs": true, "read_size": 1024, "write_size": 2048, "unix_pri_enable": true,
                                    "custom_port_enable": true, "statd_port": 5000, "nlm_port": 5001})";
 
-// `params` with other members; one that is null there is left out.
+// Returns `params` with the given members replaced. A null member is removed.
 std::string With(const char* params, const char* members) {
   Json::Value all = Parse(params);
   const Json::Value others = Parse(members);
@@ -86,10 +86,10 @@ TEST(NFSAdvGet, FailsWhenTheRecordCannotBeRead) {
   EXPECT_THAT(platform.calls, ElementsAre("VornConf", "VORNNFSConfGet", "~VornConf", "SetError", "GetParam"));
 }
 
-TEST(NFSAdvGet, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSAdvGet, "{}", FurnishRunning}), 3);
+TEST(NFSAdvGet, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSAdvGet, "{}", FurnishRunning}), 3);
   const auto furnish_unreadable = [](FakePlatform* platform) { platform->Fail("VORNNFSConfGet"); };
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSAdvGet, "{}", furnish_unreadable}), 4);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSAdvGet, "{}", furnish_unreadable}), 4);
 }
 
 // ----------------------------------------------------------------------------------------- check
@@ -136,7 +136,7 @@ void ExpectChecked(const std::string& params, const std::string& text) {
   EXPECT_THAT(platform.calls, ElementsAre("GetParam", "SetError", "GetParam")) << params;
 }
 
-TEST(NFSAdvSet, WantsAnIntegerForSizesAndUsedPorts) {
+TEST(NFSAdvSet, RequiresAnIntegerForSizesAndUsedPorts) {
   for (const char* key : {"read_size", "write_size", "statd_port", "nlm_port"}) {
     for (const IntegerCase& c : kIntegerCases) {
       Json::Value params = Parse(kUnchanged);
@@ -150,7 +150,7 @@ TEST(NFSAdvSet, WantsAnIntegerForSizesAndUsedPorts) {
   }
 }
 
-TEST(NFSAdvSet, WantsABooleanForTheSwitches) {
+TEST(NFSAdvSet, RequiresABooleanForTheSwitches) {
   for (const char* key : {"unix_pri_enable", "custom_port_enable"}) {
     const std::string text = std::string("Invalid type of input of ") + key;
     for (const char* value : {"null", "0", "1", "1.0", "0.5", R"("true")", R"("")", "[]", "[true]", "{}"}) {
@@ -191,15 +191,15 @@ TEST(NFSAdvSet, ChecksItsKeysInOrderAndStopsAtTheFirstBadOne) {
   for (const OrderCase& c : cases) ExpectChecked(c.params, c.text);
 }
 
-TEST(NFSAdvSet, DoesNotWantPortsWhileCustomPortsAreOff) {
+TEST(NFSAdvSet, RequiresNoPortsWhileCustomPortsAreDisabled) {
   for (const char* members : {R"({"statd_port": null, "nlm_port": null})", R"({"statd_port": null})",
                               R"({"nlm_port": null, "unknown": []})"}) {
     ExpectChecked(With(With(kUnchanged, R"({"custom_port_enable": false})").c_str(), members), "");
   }
 }
 
-// What is read without having been checked: JSON's own conversion, or its exception.
-TEST(NFSAdvSet, LetsAnExceptionOfAnUncheckedTypePassBeforeAnythingIsWritten) {
+// Values that are read without a check: JsonCpp converts them or throws.
+TEST(NFSAdvSet, PropagatesTheExceptionOfAnUncheckedTypeBeforeAnythingIsWritten) {
   for (const char* members :
        {R"({"enable_nfs": "true"})", R"({"enable_nfs": []})", R"({"enable_nfs": {}})",
         R"({"custom_port_enable": false, "statd_port": "5000"})", R"({"custom_port_enable": false, "nlm_port": {}})",
@@ -315,7 +315,7 @@ const SetCase kSetCases[] = {
       "VORNNFSUNIXPriEnableSet 1", "VORNNFSConfSet", "KLIBServiceRestart nfsd", "VORNFwRuleHup"}},
 };
 
-TEST(NFSAdvSet, CallsThePlatformInOrderAndHoldsTheConfigurationThroughout) {
+TEST(NFSAdvSet, CallsThePlatformInOrderAndHoldsTheConfigurationLock) {
   for (const SetCase& c : kSetCases) {
     FakePlatform platform;
     Furnish(&platform, c.enabled);
@@ -333,7 +333,7 @@ TEST(NFSAdvSet, CallsThePlatformInOrderAndHoldsTheConfigurationThroughout) {
   }
 }
 
-TEST(NFSAdvSet, WritesTheRecordBackAsItWasButForItsOwnFields) {
+TEST(NFSAdvSet, ChangesOnlyItsOwnFieldsOfTheRecord) {
   FakePlatform platform;
   Furnish(&platform, 1);
   NFSConfRecord expected = platform.record;
@@ -386,7 +386,7 @@ struct ConflictCase {
   const char* text;  // null: no conflict
 };
 
-TEST(NFSAdvSet, RefusesAChangedPortThatIsTakenAndLeavesEverythingAsItWas) {
+TEST(NFSAdvSet, RefusesAChangedPortThatIsInUseAndChangesNothing) {
   const ConflictCase cases[] = {
       {"status daemon", R"({"statd_port": 5000})", {"nfs_statd 5000"}, "nfs statd port is conflict"},
       {"lock manager", R"({"nlm_port": 5001})", {"nfs_nlm 5001"}, "nfs nlm is conflict"},
@@ -475,7 +475,7 @@ TEST(NFSAdvSet, StopsWhereItFailsAndUndoesNothing) {
   }
 }
 
-TEST(NFSAdvSet, LeavesLiveSizesWhenUNIXPermissionsCannotFollow) {
+TEST(NFSAdvSet, KeepsLiveSizesWhenUNIXPermissionsCannotBeApplied) {
   FakePlatform platform;
   Furnish(&platform, 1);
   platform.Fail("VORNNFSUNIXPriEnableSet");
@@ -484,7 +484,7 @@ TEST(NFSAdvSet, LeavesLiveSizesWhenUNIXPermissionsCannotFollow) {
   EXPECT_EQ(platform.record.read_size, 8192);
 }
 
-TEST(NFSAdvSet, SucceedsWhenTheFirewallDoesNotFollow) {
+TEST(NFSAdvSet, SucceedsWhenTheFirewallCannotBeReloaded) {
   FakePlatform platform;
   Furnish(&platform, 1);
   platform.Fail("VORNFwRuleHup");
@@ -496,7 +496,7 @@ TEST(NFSAdvSet, SucceedsWhenTheFirewallDoesNotFollow) {
   EXPECT_THAT(platform.CallsAfterFailure(), ElementsAre("~VornConf", "SetSuccess"));
 }
 
-TEST(NFSAdvSet, TakesAnyNonZeroServiceResultForAFailure) {
+TEST(NFSAdvSet, TreatsEveryNonZeroServiceResultAsFailure) {
   for (const char* operation : {"KLIBServiceRestart", "KLIBServiceStart", "KLIBServiceStop"}) {
     for (const int result : {1, -2}) {
       FakePlatform platform;
@@ -511,18 +511,18 @@ TEST(NFSAdvSet, TakesAnyNonZeroServiceResultForAFailure) {
   }
 }
 
-TEST(NFSAdvSet, AnswersOnceWhicheverCallFails) {
-  EXPECT_EQ(ExpectOneAnswerWhicheverCallFails({NFSAdvSet, kEverything, FurnishRunning}, {"VORNFwRuleHup"}), 7);
+TEST(NFSAdvSet, AnswersOnceWhenAnyCallFails) {
+  EXPECT_EQ(ExpectOneAnswerWhenAnyCallFails({NFSAdvSet, kEverything, FurnishRunning}, {"VORNFwRuleHup"}), 7);
 }
 
-TEST(NFSAdvSet, ReleasesEverythingWhicheverCallThrows) {
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSAdvSet, kEverything, FurnishRunning}), 13);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSAdvSet, "{}", FurnishRunning}), 3);
+TEST(NFSAdvSet, ReleasesEverythingWhenAnyCallThrows) {
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSAdvSet, kEverything, FurnishRunning}), 13);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSAdvSet, "{}", FurnishRunning}), 3);
 }
 
-TEST(NFSAdvSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
-  ExpectSuccessHoweverItIsSaid({NFSAdvSet, kEverything, FurnishRunning});
-  ExpectSuccessHoweverItIsSaid({NFSAdvGet, "{}", FurnishRunning});
+TEST(NFSAdvSet, AcceptsEveryNonNegativeResult) {
+  ExpectSuccessForEveryNonNegativeResult({NFSAdvSet, kEverything, FurnishRunning});
+  ExpectSuccessForEveryNonNegativeResult({NFSAdvGet, "{}", FurnishRunning});
 }
 
 }  // namespace

@@ -24,7 +24,7 @@ bool g_strdup_fails = false;
 #pragma GCC visibility push(default)  // libraries see it too
 extern "C" {
 
-// strdup(3) of this program, the module included.
+// Replaces strdup(3) in this program, the module included.
 // NOLINTBEGIN(bugprone-reserved-identifier): the linker's names for what it wraps
 char* __real_strdup(const char* text);
 
@@ -44,7 +44,7 @@ using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::SizeIs;
 
-// Fails every strdup(3) while it lives.
+// Makes every strdup(3) fail during its lifetime.
 class FailingStrdup {
  public:
   FailingStrdup() { g_strdup_fails = true; }
@@ -53,7 +53,7 @@ class FailingStrdup {
   FailingStrdup& operator=(const FailingStrdup&) = delete;
 };
 
-// The data functions that no method runs, called as a driver would.
+// The data functions that no driver runs, called as a driver would call them.
 void SetDataV2(VORN::APIRequest* request, VORN::APIResponse* response) {
   NFSServiceHandler handler(request, response);
   const Json::Value params = request->GetParam("", Json::Value());
@@ -100,7 +100,7 @@ TEST(NFSGet, ReadsAnyNonZeroSwitchAsTrue) {
   EXPECT_EQ(answer.data["unix_pri_enable"], true);
 }
 
-TEST(NFSGet, AnswersAnEmptyDomainWhereThePlatformHasNone) {
+TEST(NFSGet, AnswersAnEmptyDomainIfThePlatformHasNone) {
   FakePlatform platform;
   platform.has_domain = false;
   const Answer answer = Call(NFSGet, "{}");
@@ -183,7 +183,7 @@ struct CheckCase {
 constexpr char kNoSwitch[] = "bool variable 'enable_nfs' is missing.";
 constexpr char kBadType[] = "Invalid type of input.";
 
-// For version 1 only, which knows more keys.
+// Keys of version 1 only.
 constexpr CheckCase kVersion1Cases[] = {
     {R"({"enable_nfs": true, "read_size": "8192"})", kBadType},
     {R"({"enable_nfs": true, "read_size": true})", kBadType},
@@ -255,7 +255,7 @@ void ExpectCheck(Entry entry, const CheckCase& c) {
   EXPECT_THAT(platform.calls, testing::Not(testing::Contains("VornConf"))) << c.params;
 }
 
-TEST(NFSSet, ChecksEveryKeyBeforeItTouchesAnything) {
+TEST(NFSSet, ChecksEveryKeyBeforeAnyPlatformCall) {
   for (const Entry entry : {NFSSet, NFSSetV2}) {
     for (const CheckCase& c : kCommonCases) ExpectCheck(entry, c);
     for (const CheckCase& c : kVersion1Cases) ExpectCheck(entry, c);
@@ -356,7 +356,7 @@ const SetCase kSetCases[] = {
       "VORNNFSConfSet", "KLIBServiceStop nfsd 0", "VORNNFSIDMapFree"}},
 };
 
-TEST(NFSSet, CallsThePlatformInOrderAndHoldsTheConfigurationThroughout) {
+TEST(NFSSet, CallsThePlatformInOrderAndHoldsTheConfigurationLock) {
   for (const Entry entry : {NFSSet, NFSSetV2}) {
     for (const SetCase& c : kSetCases) {
       FakePlatform platform;
@@ -375,14 +375,14 @@ TEST(NFSSet, CallsThePlatformInOrderAndHoldsTheConfigurationThroughout) {
   }
 }
 
-TEST(NFSSet, IgnoresADomainWhileNFSv4IsOff) {
+TEST(NFSSet, IgnoresADomainWhileNFSv4IsDisabled) {
   FakePlatform platform;
   Call(NFSSet, R"({"enable_nfs": false, "nfs_v4_domain": "new.example"})");
   EXPECT_EQ(platform.domain, "box.example");
   EXPECT_THAT(platform.calls, testing::Not(testing::Contains("VORNNFSIDMapGet")));
 }
 
-TEST(NFSSet, TakesADomainWhenNFSv4GoesOn) {
+TEST(NFSSet, StoresADomainWhenNFSv4IsBeingEnabled) {
   FakePlatform platform;
   platform.mappings = {{"alice@BOX", "alice"}};
   Call(NFSSet, R"({"enable_nfs": true, "enable_nfs_v4": true, "nfs_v4_domain": "new.example"})");
@@ -391,7 +391,7 @@ TEST(NFSSet, TakesADomainWhenNFSv4GoesOn) {
   EXPECT_EQ(platform.record.enable_nfs_v4, 1);
 }
 
-TEST(NFSSet, WritesTheRecordBackAsItWasButForItsOwnFields) {
+TEST(NFSSet, ChangesOnlyItsOwnFieldsOfTheRecord) {
   FakePlatform platform;
   Furnish(&platform, 1);
   const NFSConfRecord before = platform.record;
@@ -418,7 +418,7 @@ TEST(NFSSet, ReadsAnyNonZeroStoredSwitchAsTrue) {
   EXPECT_THAT(platform.calls, testing::Not(testing::Contains("KLIBServiceRestart nfsd")));
 }
 
-TEST(NFSSet, TellsItsVersionsApartOnlyByTheLineOfTheLoggedRequest) {
+TEST(NFSSet, DiffersBetweenVersionsOnlyInTheLineOfTheLoggedRequest) {
   FakePlatform platform;
   Call(NFSSet, "{}");
   Call(NFSSetV2, "{}");
@@ -487,7 +487,7 @@ TEST(NFSSet, StopsWhereItFailsAndKeepsWhatIsWritten) {
       EXPECT_EQ(written, failure.written) << failure.name;
       EXPECT_THAT(platform.live_objects, IsEmpty()) << failure.name;
 
-      // After the failing call come only releases, the answer and the log.
+      // After the failing call there are only releases, the answer and the log.
       auto call = platform.calls.begin();
       while (call->rfind(failure.operation, 0) != 0) ++call;
       for (++call; call != platform.calls.end(); ++call) {
@@ -497,7 +497,7 @@ TEST(NFSSet, StopsWhereItFailsAndKeepsWhatIsWritten) {
   }
 }
 
-TEST(NFSSet, TakesAnyNonZeroServiceResultForAFailure) {
+TEST(NFSSet, TreatsEveryNonZeroServiceResultAsFailure) {
   for (const int result : {1, -2}) {
     FakePlatform platform;
     platform.Fail("KLIBServiceStart");
@@ -526,7 +526,7 @@ TEST(NFSSet, FailsWithoutMemoryForTheDomainAndKeepsTheOldOne) {
   EXPECT_EQ(platform.domain, "box.example");
 }
 
-TEST(NFSSet, GivesBackTheDomainThatItReplaces) {
+TEST(NFSSet, FreesTheReplacedDomain) {
   constexpr size_t kLength = 64 << 10;
   constexpr size_t kTimes = 100;
   const size_t before = mallinfo2().uordblks;
@@ -539,7 +539,7 @@ TEST(NFSSet, GivesBackTheDomainThatItReplaces) {
   EXPECT_LT(mallinfo2().uordblks, before + kTimes * kLength / 2);
 }
 
-TEST(NFSSet, ReleasesEverythingWhicheverCallFails) {
+TEST(NFSSet, ReleasesEverythingWhenAnyCallFails) {
   for (const char* params : {kEverything, kDomainAndSizes}) {
     int failed = 0;
     for (int n = 1;; ++n) {
@@ -557,7 +557,7 @@ TEST(NFSSet, ReleasesEverythingWhicheverCallFails) {
   }
 }
 
-TEST(NFSSet, ReleasesEverythingWhicheverCallThrows) {
+TEST(NFSSet, ReleasesEverythingWhenAnyCallThrows) {
   for (const char* operation : {"VORNNFSConfGet", "KLIBServiceIsEnabled", "VORNNFSIDMapGet", "VORNNFSIDMapSet",
                                 "VORNNFSConfSet", "VORNNFSUDPPrefSizeSet", "KLIBServiceRestart"}) {
     FakePlatform platform;
@@ -569,10 +569,11 @@ TEST(NFSSet, ReleasesEverythingWhicheverCallThrows) {
   }
 }
 
-TEST(NFSSet, SucceedsHoweverThePlatformSaysThatItIsDone) {
+TEST(NFSSet, AcceptsEveryNonNegativeResult) {
   const auto furnish = [](FakePlatform* platform) { Furnish(platform, 1); };
-  for (const char* params : {kEverything, kDomainAndSizes}) ExpectSuccessHoweverItIsSaid({NFSSet, params, furnish});
-  ExpectSuccessHoweverItIsSaid({NFSGet, "{}", furnish});
+  for (const char* params : {kEverything, kDomainAndSizes})
+    ExpectSuccessForEveryNonNegativeResult({NFSSet, params, furnish});
+  ExpectSuccessForEveryNonNegativeResult({NFSGet, "{}", furnish});
 }
 
 // ---------------------------------------------------------------------------- set, NFSv4 alone
@@ -599,7 +600,7 @@ TEST(SetDataV2, ChangesTheNFSv4Switch) {
   EXPECT_EQ(platform.record.read_size, 8192);
 }
 
-TEST(SetDataV2, FailsWhicheverCopyCannotBeRead) {
+TEST(SetDataV2, FailsIfEitherCopyCannotBeRead) {
   for (const int nth : {1, 2}) {
     FakePlatform platform;
     Furnish(&platform, 1);

@@ -19,7 +19,7 @@ struct PageCase {
   int end;
 };
 
-TEST(Page, IsThePartOfTheListingThatTheRequestAsksFor) {
+TEST(Page, IsTheRequestedRange) {
   const PageCase cases[] = {
       {"everything", 5, 0, -1, 0, 5},
       {"everything from an offset on", 5, 3, -1, 3, 5},
@@ -52,7 +52,7 @@ TEST(Page, IsThePartOfTheListingThatTheRequestAsksFor) {
   }
 }
 
-// The rule in numbers that cannot overflow: the first item, and how many there are.
+// The same rule in 64-bit numbers, which cannot overflow here: the first item and the number of items.
 void ExpectRule(int count, int offset, int limit) {
   const std::int64_t first = 0 <= offset && offset < count ? offset : 0;
   const std::int64_t wanted = limit == -1 ? std::int64_t{count} : limit;

@@ -14,7 +14,7 @@ void Plan(const char* params, SettingsChange* change) {
   for (const Setting& setting : kLiveSettings) setting.Plan(given[setting.key], change);
 }
 
-TEST(SettingsChange, BeginsAsNone) {
+TEST(SettingsChange, IsEmptyInitially) {
   const SettingsChange change;
   EXPECT_FALSE(change.enabled || change.wanted);
   EXPECT_FALSE(change.sizes_changed || change.permissions_changed || change.service_affected);

@@ -11,7 +11,7 @@
 #include "expect_failure.h"
 #include "fake_platform.h"
 
-// malloc(3) of everything that is linked into this program, the module included, on demand.
+// Replaces malloc(3) in everything that is linked into this program, the module included. Fails on demand.
 namespace {
 
 size_t g_failing_size = 0;
@@ -39,7 +39,7 @@ void* __real_calloc(size_t count, size_t size);
 
 void* __wrap_malloc(size_t size) { return FailsAllocation(size) ? nullptr : __real_malloc(size); }
 
-// What the compiler makes of a malloc whose block is zeroed.
+// The compiler replaces malloc(3) and memset(3) of the block by calloc(3).
 void* __wrap_calloc(size_t count, size_t size) {
   return FailsAllocation(count * size) ? nullptr : __real_calloc(count, size);
 }
@@ -55,7 +55,7 @@ using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::Not;
 
-// Fails the n-th allocation of a size while it lives.
+// Makes the n-th allocation of a size fail during its lifetime.
 class FailingMalloc {
  public:
   FailingMalloc(size_t size, int n) {
@@ -75,7 +75,7 @@ constexpr char kFullRule[] =
 
 std::string Save(const std::string& rules) { return R"({"share_name": "data", "rule": [)" + rules + "]}"; }
 
-// A good rule with one key changed, or removed when `value` is empty.
+// Returns a valid rule with one key changed, or removed if `value` is empty.
 std::string SaveWith(const std::string& key, const std::string& value) {
   Json::Value rule = Parse(kFullRule);
   rule.removeMember(key);
@@ -147,7 +147,7 @@ TEST(NFSSharePrivilegeLoad, AnswersWithAnEmptyArrayForAShareWithoutRules) {
   }
 }
 
-TEST(NFSSharePrivilegeLoad, ShowsNoRulesUnlessTheyAreFoundAndThere) {
+TEST(NFSSharePrivilegeLoad, ShowsRulesOnlyIfTheyAreFoundAndPresent) {
   FakePlatform platform;
   platform.rules_found = 1;  // without a list
   EXPECT_EQ(Call(NFSSharePrivilegeGet, R"({"share_name": "data"})").data, Parse(R"({"rule": []})"));
@@ -165,7 +165,7 @@ struct CodeCase {
   const char* value;  // null: the key is left out
 };
 
-TEST(NFSSharePrivilegeLoad, GivesEachCodeItsWordAndLeavesOutWhatHasNone) {
+TEST(NFSSharePrivilegeLoad, ShowsEachCodeAsItsWordAndOmitsUnknownCodes) {
   const CodeCase cases[] = {
       {"ro", &ExportRule::privilege, 0, "privilege", R"("ro")"},
       {"rw", &ExportRule::privilege, 1, "privilege", R"("rw")"},
@@ -362,14 +362,14 @@ TEST(NFSSharePrivilegeSave, ChecksEveryKeyBeforeItWritesAnything) {
   }
 }
 
-TEST(NFSSharePrivilegeSave, FindsTheFirstBadKeyOfTheFirstBadRule) {
+TEST(NFSSharePrivilegeSave, ReportsTheFirstBadKeyOfTheFirstBadRule) {
   const std::string params =
       Save(std::string(kFullRule) + R"(, {"client": "ok", "privilege": "RW"}, {"client": "bad one"})");
   FakePlatform platform;
   ExpectFailure(platform, Call(NFSSharePrivilegeSet, params), params, 2301, "share_privilege", {kPrivilege});
 }
 
-TEST(NFSSharePrivilegeSave, LooksAtNoFlavourWithoutKerberos) {
+TEST(NFSSharePrivilegeSave, IgnoresFlavoursWithoutKerberos) {
   for (const char* flavour : {"", "null", "5", "[]", "{}", R"({"sys": "x"})", R"({"sys": false})"}) {
     FakePlatform platform;
     platform.kerberos_support = 0;
@@ -400,7 +400,7 @@ TEST(NFSSharePrivilegeSave, RefusesAShareWithAMountThatCannotBeExported) {
                           "VORNFSHasMountPointType /volume1/data 32", "VORNShareFree", "SetError", "GetParam"));
 }
 
-TEST(NFSSharePrivilegeSave, IsNotKeptFromSavingByMountsThatCannotBeLookedAt) {
+TEST(NFSSharePrivilegeSave, SavesAlthoughTheMountTestFails) {
   FakePlatform platform;
   platform.Fail("VORNFSHasMountPointType");
   EXPECT_EQ(Call(NFSSharePrivilegeSet, Save(kFullRule)).code, 0);
@@ -408,7 +408,7 @@ TEST(NFSSharePrivilegeSave, IsNotKeptFromSavingByMountsThatCannotBeLookedAt) {
   EXPECT_EQ(platform.rules.size(), 1U);
 }
 
-TEST(NFSSharePrivilegeSave, TakesAnyOtherMountPointAnswerForNone) {
+TEST(NFSSharePrivilegeSave, TreatsEveryOtherMountTestResultAsNoMount) {
   FakePlatform platform;
   platform.mount_point_result = 2;
   EXPECT_EQ(Call(NFSSharePrivilegeSet, Save(kFullRule)).code, 0);
@@ -488,7 +488,7 @@ TEST(NFSSharePrivilegeSave, RemovesAllRulesForAnEmptyArray) {
   EXPECT_THAT(platform.calls, Contains("KLIBServiceReload nfsd"));
 }
 
-TEST(NFSSharePrivilegeSave, CutsWhatIsTooLongForTheRecord) {
+TEST(NFSSharePrivilegeSave, TruncatesTextsThatDoNotFitTheRecord) {
   FakePlatform platform;
   platform.shares["data"] = "/" + std::string(600, 'p');
   EXPECT_EQ(Call(NFSSharePrivilegeSet, SaveWith("client", '"' + std::string(2000, 'c') + '"')).code, 0);
@@ -497,14 +497,14 @@ TEST(NFSSharePrivilegeSave, CutsWhatIsTooLongForTheRecord) {
   EXPECT_THAT(platform.calls, Contains("VORNNFSRuleExtSetAll /" + std::string(506, 'p')));
 }
 
-TEST(NFSSharePrivilegeSave, IsDoneOnceWrittenWhateverTheReloadSays) {
+TEST(NFSSharePrivilegeSave, SucceedsAlthoughTheReloadFails) {
   FakePlatform platform;
   platform.Fail("KLIBServiceReload");
   EXPECT_EQ(Call(NFSSharePrivilegeSet, Save(kFullRule)).code, 0);
   EXPECT_THAT(platform.log, IsEmpty());
 }
 
-TEST(NFSSharePrivilegeSave, DoesNotReloadWhatItCouldNotWrite) {
+TEST(NFSSharePrivilegeSave, DoesNotReloadAfterAFailedWrite) {
   FakePlatform platform;
   platform.Fail("VORNNFSRuleExtSetAll");
   const std::string params = Save(kFullRule);
@@ -523,7 +523,7 @@ TEST(NFSSharePrivilegeSave, FailsWhenTheShareIsGoneAfterTheCheck) {
               ElementsAreArray(AfterChecks({"VORNShareGet data", "VORNNFSRuleExtFree", "SetError", "GetParam"})));
 }
 
-TEST(NFSSharePrivilegeSave, ReleasesWhatItHasWhicheverAllocationFails) {
+TEST(NFSSharePrivilegeSave, ReleasesEverythingWhenAnyAllocationFails) {
   const std::string params = Save(std::string(kFullRule) + "," + kFullRule + "," + kFullRule);
   const struct {
     size_t size;
@@ -549,16 +549,16 @@ TEST(NFSSharePrivilegeSave, LoadsBackWhatItSaved) {
 
 // ------------------------------------------------------------------------------------- each call
 
-TEST(NFSSharePrivilege, ReleasesEverythingWhicheverCallThrows) {
+TEST(NFSSharePrivilege, ReleasesEverythingWhenAnyCallThrows) {
   const std::string save = Save(kFullRule);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSSharePrivilegeSet, save.c_str(), Furnish}), 11);
-  EXPECT_EQ(ExpectOnlyReleasesWhicheverCallThrows({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish}), 6);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSSharePrivilegeSet, save.c_str(), Furnish}), 11);
+  EXPECT_EQ(ExpectOnlyReleasesWhenAnyCallThrows({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish}), 6);
 }
 
-TEST(NFSSharePrivilege, SucceedsHoweverThePlatformSaysThatItIsDone) {
+TEST(NFSSharePrivilege, AcceptsEveryNonNegativeResult) {
   const std::string save = Save(kFullRule);
-  ExpectSuccessHoweverItIsSaid({NFSSharePrivilegeSet, save.c_str(), Furnish});
-  ExpectSuccessHoweverItIsSaid({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish});
+  ExpectSuccessForEveryNonNegativeResult({NFSSharePrivilegeSet, save.c_str(), Furnish});
+  ExpectSuccessForEveryNonNegativeResult({NFSSharePrivilegeGet, R"({"share_name": "data"})", Furnish});
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// Tests a request with each of its platform calls failing in turn.
+// Tests a request with every platform call failing or throwing once, one call per run.
 #ifndef VORN_TESTS_SUPPORT_EACH_CALL_H
 #define VORN_TESTS_SUPPORT_EACH_CALL_H
 
@@ -15,10 +15,10 @@
 struct Request {
   Entry entry;
   const char* params;
-  void (*furnish)(FakePlatform* platform);  // the box on which every call of the request succeeds
+  void (*furnish)(FakePlatform* platform);  // sets up a box on which every call of the request succeeds
 };
 
-// Releases, the answer and the parameters for the log: all that may follow a failure.
+// Matches the calls that may follow a failure: releases, the answer, and the parameters for the log.
 inline testing::Matcher<std::string> IsRelease() {
   using testing::EndsWith;
   return testing::AnyOf(testing::StartsWith("~"), EndsWith("Free"));
@@ -26,10 +26,10 @@ inline testing::Matcher<std::string> IsRelease() {
 
 inline testing::Matcher<std::string> IsEndOfRequest() { return testing::AnyOf(IsRelease(), "SetError", "GetParam"); }
 
-// Fails each call that can fail, one per run. The request answers once, with an error unless the
-// call's operation is one of the `tolerated`; nothing stays alive, and nothing is begun after an
-// error. How many runs there were.
-inline int ExpectOneAnswerWhicheverCallFails(const Request& request, const std::vector<std::string>& tolerated = {}) {
+// Makes each call that can fail do so, one per run, and returns the number of runs. Expects that the
+// request answers once, with an error unless the operation is one of the `tolerated`, that no object is
+// leaked, and that only releases follow an error.
+inline int ExpectOneAnswerWhenAnyCallFails(const Request& request, const std::vector<std::string>& tolerated = {}) {
   for (int n = 1;; ++n) {
     FakePlatform platform;
     request.furnish(&platform);
@@ -49,9 +49,9 @@ inline int ExpectOneAnswerWhicheverCallFails(const Request& request, const std::
   }
 }
 
-// Has each call throw, one per run: the exception leaves the entry function, and only releases are
-// called on its way. How many runs there were.
-inline int ExpectOnlyReleasesWhicheverCallThrows(const Request& request) {
+// Makes each call throw, one per run, and returns the number of runs. Expects that the exception leaves
+// the entry function and that only releases are called meanwhile.
+inline int ExpectOnlyReleasesWhenAnyCallThrows(const Request& request) {
   for (int n = 1;; ++n) {
     FakePlatform platform;
     request.furnish(&platform);
@@ -68,8 +68,8 @@ inline int ExpectOnlyReleasesWhicheverCallThrows(const Request& request) {
   }
 }
 
-// Succeeds, and logs nothing, with whichever non-negative number its calls say that they are done.
-inline void ExpectSuccessHoweverItIsSaid(const Request& request) {
+// Expects success without log lines for every non-negative result of the platform operations.
+inline void ExpectSuccessForEveryNonNegativeResult(const Request& request) {
   for (const int done : {0, 1, std::numeric_limits<int>::max()}) {
     FakePlatform platform;
     request.furnish(&platform);

@@ -1,4 +1,4 @@
-// The expectations on the answer of every failed request.
+// Expectations on failed requests.
 #ifndef VORN_TESTS_SUPPORT_EXPECT_FAILURE_H
 #define VORN_TESTS_SUPPORT_EXPECT_FAILURE_H
 
@@ -12,14 +12,14 @@
 
 constexpr char kNoErrorSetup[] = "There is no error setup";
 
-// The last line of a failed request.
+// The text of the last log line of a failed request.
 inline std::string RequestText(const std::string& params) {
   Json::StreamWriterBuilder one_line;
   one_line["indentation"] = "";
   return "Request: " + Json::writeString(one_line, Parse(params)) + "\n";
 }
 
-// Every line is an error of `source` (but one, which the handlers' base logs).
+// Expects these log texts, at priority LOG_ERR and from `source`. The base class of the handlers logs one of them.
 inline void ExpectLog(const FakePlatform& platform, const std::string& source, const std::vector<std::string>& texts) {
   EXPECT_THAT(platform.LogTexts(), testing::ElementsAreArray(texts));
   for (const LogLine& line : platform.log) {
@@ -29,7 +29,7 @@ inline void ExpectLog(const FakePlatform& platform, const std::string& source, c
   }
 }
 
-// One answer, `code`; `texts` in the log and, last of all that is done, the request; nothing left behind.
+// Expects one answer with `code`, the log lines `texts`, the request as the last line after all calls, and no leak.
 inline void ExpectFailure(const FakePlatform& platform, const Answer& answer, const std::string& params, int code,
                           const std::string& source, std::vector<std::string> texts) {
   SCOPED_TRACE(params);

@@ -1,4 +1,4 @@
-// The core library: configuration context, errors, services, files, programs.
+// The core library of the fake platform: configuration context, errors, services, files, programs.
 #include <unistd.h>
 
 #include <algorithm>

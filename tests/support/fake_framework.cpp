@@ -1,4 +1,4 @@
-// The framework's classes: they record what the module asks and how it answers.
+// The web-API framework of the fake platform. It records the requested parameters and the answers.
 #include <utility>
 
 #include "fake_platform.h"

@@ -1,5 +1,5 @@
-// String lists and hashes. An operation that may move its object always does, so that whoever keeps
-// the old pointer is found by the address sanitizer.
+// String lists and hashes of the fake platform. An operation that may move its object always does, so that the
+// address sanitizer detects the use of an old pointer.
 #include "fake_lists.h"
 
 #include <algorithm>
@@ -36,7 +36,7 @@ void Move(KLIBSZHASH** hash) {
   delete old;
 }
 
-// Ignoring case.
+// Returns whether `text` contains `part`, ignoring case.
 bool Contains(const std::string& text, const char* part) { return strcasestr(text.c_str(), part) != nullptr; }
 
 template <typename Pairs>

@@ -1,4 +1,4 @@
-// The fake platform's own view of its lists and hashes.
+// The lists and hashes of the fake platform.
 #ifndef VORN_TESTS_SUPPORT_FAKE_LISTS_H
 #define VORN_TESTS_SUPPORT_FAKE_LISTS_H
 
@@ -20,7 +20,7 @@ using FakeHash = KLIBSZHASH;
 inline FakeHash* Real(KLIBSZHASH* hash) { return hash; }
 inline const FakeHash* Real(const KLIBSZHASH* hash) { return hash; }
 
-// Counted among the live objects.
+// Create an empty list or hash and count it as a live object.
 FakeList* MakeList();
 FakeHash* MakeHash();
 

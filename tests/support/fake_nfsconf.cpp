@@ -1,4 +1,4 @@
-// The NFS configuration library, and the small libraries beside it.
+// The NFS configuration library of the fake platform, and the share, user, file-system and firewall libraries.
 #include <cstdlib>
 #include <cstring>
 
@@ -15,7 +15,7 @@ struct VORNSHARE {
 
 namespace {
 
-// The contents of a hash, for tests.
+// Returns the pairs of a table as tests compare them.
 Pairs PairsOf(const KLIBSZHASH* hash) { return hash == nullptr ? Pairs() : hash->pairs; }
 
 ExportRuleList* CopyRules(const std::string& path, const std::vector<ExportRule>& rules) {
@@ -157,7 +157,7 @@ void VORNNFSRuleExtFree(ExportRuleList* list) {
     rule = next;
   }
   free(list);
-  // A list that the module made was never born here; the address sanitizer watches over those.
+  // A list that the module allocated is not counted here; the address sanitizer detects its leak.
   auto& live = FakePlatform::Current().live_objects;
   if (live.count("ExportRuleList") != 0) FakePlatform::Current().Died("ExportRuleList");
 }

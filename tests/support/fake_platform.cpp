@@ -113,7 +113,7 @@ Json::Value Parse(const std::string& json) {
   return value;
 }
 
-// These stand before the C library's: what the module logs comes here.
+// These replace the functions of the C library, so that the log lines of the module arrive here.
 extern "C" {
 
 void syslog(int priority, const char* format, ...) {
@@ -123,7 +123,7 @@ void syslog(int priority, const char* format, ...) {
   va_end(arguments);
 }
 
-// The function that a hardened build calls instead of syslog.
+// The compiler replaces syslog(3) by this function in a hardened build.
 // NOLINTNEXTLINE(bugprone-reserved-identifier)
 [[gnu::format(printf, 3, 4)]] void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {
   va_list arguments;

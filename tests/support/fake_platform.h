@@ -1,5 +1,5 @@
-// The one fake platform of the module's tests: it behaves, in memory, as the contract says; it
-// records what was called in which order; it fails on demand; and it counts what is not released.
+// The fake platform of the module's tests. It implements the contract in memory, records all calls in
+// order, fails or throws on demand, and counts objects that are not released. Not thread-safe.
 #ifndef VORN_TESTS_SUPPORT_FAKE_PLATFORM_H
 #define VORN_TESTS_SUPPORT_FAKE_PLATFORM_H
 
@@ -15,19 +15,19 @@
 #include "nfsconf.h"
 #include "webapi.h"
 
-// One message that the module logged.
+// A line that the module wrote to the system log.
 struct LogLine {
   int priority;
-  std::string source;  // of the "source:line " that every text begins with; "" if it does not
+  std::string source;  // the source name at the beginning of the line; "" if there is none
   int line;
-  std::string text;  // without that beginning
-  size_t calls;      // how many the module had made by then
+  std::string text;  // the text behind "source:line "
+  size_t calls;      // the number of calls that the module had made before
 };
 
-// A mapping or an account table in the order in which it was given.
+// Static mappings in the order in which they were given.
 using Pairs = std::vector<std::pair<std::string, std::string>>;
 
-// The platform of one test: the last one made that still lives.
+// The platform of one test. The most recently constructed object that still exists is the current one.
 class FakePlatform {
  public:
   FakePlatform();
@@ -37,7 +37,7 @@ class FakePlatform {
 
   static FakePlatform& Current();
 
-  // ---- what the box holds, for tests to set and to look at
+  // ---- The state of the box. Tests set and read it.
   NFSConfRecord record{};
   bool has_domain = true;  // of the ID map, as its table
   bool has_table = true;
@@ -59,37 +59,37 @@ class FakePlatform {
   std::vector<std::string> port_conflicts;  // "nfs_statd 4000"
   int done = 3;  // what an operation answers on success where every non-negative number says so
 
-  // ---- what happened
+  // ---- Recorded events.
   std::vector<std::string> calls;  // "KLIBServiceStop nfsd 0"; VornConf's end is "~VornConf"
   std::vector<LogLine> log;
   std::vector<std::string> failed_calls;  // the calls that failed on demand
   std::vector<std::string> LogTexts() const;
-  // Returns the calls after the last one that failed or threw on demand.
+  // The calls after the last one that failed or threw on demand.
   std::vector<std::string> CallsAfterFailure() const;
 
-  // ---- what is still held
-  std::map<std::string, int> live_objects;  // by kind; a kind of which none lives is not there
+  // ---- Objects that are not released.
+  std::map<std::string, int> live_objects;  // number per kind; a kind without objects has no entry
 
-  // ---- failures on demand
-  // The n-th call (from 1) that can fail does, counted over all operations.
+  // ---- Failures on demand.
+  // Makes the n-th call that can fail do so, from 1, counted over all operations.
   void FailCall(int n) { fail_at_ = n; }
-  // The n-th call of `operation` does; 0 stands for every one.
+  // Makes the n-th call of `operation` fail; 0: every call.
   void Fail(const std::string& operation, int n = 0) { failing_[operation] = n; }
-  // Sets the result of a failing integer operation; the default is -1.
+  // Sets the result of a failing integer operation. The default is -1.
   void FailWith(const std::string& operation, int result) { failure_results_[operation] = result; }
-  // `operation` throws std::runtime_error("thrown on demand").
+  // Makes `operation` throw std::runtime_error("thrown on demand").
   void Throw(const std::string& operation) { throwing_ = operation; }
-  // The n-th call (from 1) does, releases left out: those must not.
+  // Makes the n-th call throw, from 1. Releases never throw and are not counted.
   void ThrowCall(int n) { throw_at_ = n; }
 
-  // ---- for the operations' bodies
+  // ---- For the implementations of the operations.
   void Record(const std::string& operation, const std::string& arguments = "");
-  // Records a call that can fail, and whether it shall.
+  // Records a call that can fail, and returns whether it must fail.
   bool Fails(const std::string& operation, const std::string& arguments = "");
   int FailureResult(const std::string& operation) const;
   void Born(const std::string& kind) { ++live_objects[kind]; }
   void Died(const std::string& kind);
-  // The failing result of an operation that what the box holds makes fail.
+  // Returns the result of an operation that fails because of the state of the box.
   int Refuse();
   int last_error() const { return last_error_; }
 
@@ -107,23 +107,23 @@ class FakePlatform {
   std::string throwing_;
 
  public:
-  // The results of KLIBCErrGet immediately after a failing call, and at any other time. A caller that reads the
-  // reason too late therefore logs the wrong one.
+  // The results of KLIBCErrGet directly after a failing call and at any other time. A log line with the
+  // second value shows that the reason was read too late.
   static constexpr int kReason = 0x0AB;
   static constexpr int kNoFailure = 0xDEAD;
 };
 
-// One answer of the module to one request.
+// The answer of the module to one request.
 struct Answer {
-  int count = 0;  // how often it answered
+  int count = 0;  // number of answers; one is right
   int code = -1;  // 0 for success
   Json::Value data;
 };
 
-// Strict JSON; a test's own mistake ends it.
+// Parses strict JSON. Throws std::logic_error on a mistake in the test.
 Json::Value Parse(const std::string& json);
 
-// Calls an entry function (or anything with its arguments) with the JSON text `params` as parameters.
+// Calls an entry function, or another function with its parameters, with the JSON text `params`.
 template <typename Entry>
 Answer Call(Entry entry, const std::string& params) {
   VORN::APIRequest request(Parse(params));

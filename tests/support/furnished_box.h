@@ -1,4 +1,4 @@
-// A box whose NFS record has a value of its own in every field, so that one that moves is seen.
+// A box with a different value in every field of its NFS record, so that tests notice an exchanged field.
 #ifndef VORN_TESTS_SUPPORT_FURNISHED_BOX_H
 #define VORN_TESTS_SUPPORT_FURNISHED_BOX_H
 
@@ -11,7 +11,7 @@ inline void Furnish(FakePlatform* platform, int enabled = 0) {
   platform->record.read_size = 8192;
   platform->record.write_size = 16384;
   std::strcpy(platform->record.kerberos_principal, "nfs/box.example@EXAMPLE");
-  platform->record.kerberos_principal[515] = '!';  // behind the text's end, and written back all the same
+  platform->record.kerberos_principal[515] = '!';  // behind the end of the string; must be written back unchanged
   platform->record.enable_nfs_v4 = 1;
   platform->record.unix_pri_enable = 0;
   platform->record.statd_port = 4000;

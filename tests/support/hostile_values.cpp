@@ -29,7 +29,7 @@ class Collection {
     values_.push_back({kind, name, std::move(value), never_stored});
   }
 
-  // A piece of text alone, in front, behind and in the middle.
+  // Adds a string alone, at the beginning, at the end and in the middle of a text.
   void AddPiece(const char* kind, const std::string& name, const std::string& piece, bool never_stored = true) {
     for (const std::string& text : {piece, piece + "b", "a" + piece, "a" + piece + "b"}) {
       Add(kind, name + " in " + Hex(text), text, never_stored);
@@ -85,7 +85,7 @@ const NamedText kNoUtf8[] = {{"continuation alone", "\x80"},
                              {"FF", "\xFF"},
                              {"cut off", "\xE2\x80"}};
 
-// Some of these are good texts for some parameters: a domain may have blanks, and it is quoted.
+// Some parameters accept some of these: a domain may contain blanks, which are quoted.
 constexpr const char* kSyntax[] = {
     "",           "=",         "a=b",        "#",         "a#b",       ";",        "a;b",         "[",     "[Static]",
     "]",          "\"",        "a\"b",       "'",         "a'b",       "a\"b'c#d", "$x",          "${x}",  "`id`",
@@ -104,9 +104,9 @@ void AddTexts(Collection* all) {
     all->AddPiece("control characters", "C1", high);
   for (const NamedText& text : kMarks) all->AddPiece("marks of direction", text.name, text.text);
   for (const NamedText& text : kNoUtf8) all->AddPiece("no UTF-8", text.name, text.text);
-  // Alone it is a word of its own, and no word of two alphabets.
+  // The character is combined with Latin letters, because a word of one alphabet is valid.
   for (const NamedText& text : kLookAlikes) all->Add("look-alikes", text.name, "alice" + text.text + "@X", true);
-  // A C text ends there, so what stands before it may be stored.
+  // A C string ends at the NUL byte, so the text before it may be stored.
   all->AddPiece("NUL", "NUL", std::string(1, '\0'), false);
   all->Add("NUL", "behind a name", std::string("alice\0[Static]", 14), false);
   for (const char* text : kSyntax) all->Add("syntax of files", text, text, false);

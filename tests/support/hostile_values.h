@@ -1,4 +1,4 @@
-// Parameters that an attacker or a faulty program may send.
+// Parameters of attackers and of faulty programs.
 #ifndef VORN_TESTS_SUPPORT_HOSTILE_VALUES_H
 #define VORN_TESTS_SUPPORT_HOSTILE_VALUES_H
 
@@ -11,18 +11,18 @@ struct HostileValue {
   std::string kind;
   std::string name;
   Json::Value value;
-  bool never_stored;  // whatever parameter it is sent for, no file changes
+  bool never_stored;  // must change no file, for whichever parameter it is sent
 };
 
-// Values of parameters, by kind.
+// Returns the values of parameters, ordered by kind.
 const std::vector<HostileValue>& HostileValues();
 
 struct HostileJson {
   std::string kind;
-  std::string text;  // one JSON value, or what somebody takes for one
+  std::string text;  // one JSON value, or malformed text in its place
 };
 
-// Texts that are no valid JSON values.
+// Returns malformed texts to be placed where JSON has a value.
 const std::vector<HostileJson>& HostileJsonTexts();
 
 #endif  // VORN_TESTS_SUPPORT_HOSTILE_VALUES_H

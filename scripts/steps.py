@@ -206,6 +206,14 @@ def show_failures(run):
         print("\n".join(lines[-SHOWN:]), flush=True)
 
 
+def show_skipped(run):
+    """Prints the tests that scripts/test reports as skipped, with the reasons."""
+    for name in run.passed():
+        for line in (FOLDER / name).read_text(encoding="utf-8", errors="replace").splitlines():
+            if line.startswith("test: skipped"):
+                print(f"{name}: {line}")
+
+
 def show_times(run, steps, shares, limit_minutes):
     """Prints a table of the steps, and of the shares of the time budget (in minutes)."""
     print(f"\n{'step':<14} {'share':<10} {'seconds':>8} {'CPU s':>8}  result")

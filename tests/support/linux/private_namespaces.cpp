@@ -27,14 +27,13 @@ ProgramResult Probe(Command command) {
 PrivateNamespaces Find() {
   std::vector<Command> candidates{WithUserNamespace()};
   if (geteuid() == 0) candidates.insert(candidates.begin(), AsRoot());
-  std::string errors;
+  std::string error;
   for (const Command& command : candidates) {
     const ProgramResult result = Probe(command);
     if (result.status == 0) return {command, ""};
-    errors += " " + result.errors.substr(0, result.errors.find('\n')) + ";";
+    error = result.errors.substr(0, result.errors.find('\n'));
   }
-  errors.pop_back();
-  return {{}, "mount and network namespaces are not permitted here:" + errors};
+  return {{}, "mount and network namespaces are not permitted here: " + error};
 }
 
 }  // namespace

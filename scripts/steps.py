@@ -128,8 +128,10 @@ class Run:
 
     def _wait(self, step, result, output):
         """Runs the command to its end, or kills it. Returns its exit status."""
+        # The other lanes wait for clocks and guests; the compilers of the main lane must not slow them down.
+        prefix = ("nice", "-n", "10") if step.lane == "main" else ()
         process = subprocess.Popen(  # pylint: disable=consider-using-with
-            step.command, cwd=PROJECT, stdin=subprocess.DEVNULL, stdout=output, stderr=output, start_new_session=True)
+            prefix + step.command, cwd=PROJECT, stdin=subprocess.DEVNULL, stdout=output, stderr=output, start_new_session=True)
         told = None  # when the step was told to end
         while True:
             pid, status, usage = os.wait4(process.pid, os.WNOHANG)

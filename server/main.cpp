@@ -1,11 +1,14 @@
 // vornd: joins the parts, in the order in which they need each other.
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <syslog.h>
 #include <systemd/sd-daemon.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <climits>
 #include <cstddef>
+#include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <optional>
@@ -15,6 +18,7 @@
 #include <variant>
 #include <vector>
 
+#include "access_log.h"
 #include "budget.h"
 #include "http.h"
 #include "listener.h"
@@ -31,8 +35,13 @@
 namespace vorn::server {
 namespace {
 
-// The memory of all requests together. The most expensive single call takes 42 MiB of it.
+// The memory that the bodies of all requests may have, and those of one address.
+constexpr std::size_t kBodies = std::size_t{16} * 1024 * 1024;
+constexpr std::size_t kBodiesOfPeer = std::size_t{4} * 1024 * 1024;
+
+// The memory of the parsed parameters of all requests. The most expensive single call takes 42 MiB of it.
 constexpr std::size_t kMemory = std::size_t{48} * 1024 * 1024;
+constexpr std::chrono::seconds kStopLimit{10};  // for running calls, after SIGTERM
 
 // systemd puts standard error into the log that syslog(3) ends in: each line would be there twice.
 bool StartedBySystemd() {
@@ -50,6 +59,21 @@ std::string DefaultModuleFolder() {
   const auto installed = prefix / VORN_MODULE_FOLDER;
   const auto built = prefix / "modules";
   return std::filesystem::is_directory(built, failure) ? built.string() : installed.string();
+}
+
+// The number of descriptors that this process may have open (getrlimit(2)).
+rlim_t DescriptorLimit() {
+  rlimit limit{};
+  return getrlimit(RLIMIT_NOFILE, &limit) == 0 ? limit.rlim_cur : FOPEN_MAX;
+}
+
+// A thread that runs a module's method cannot be ended, and destructors would wait for it. Files that are left are
+// removed at the next start.
+[[noreturn]] void EndWithRunningCalls() {
+  syslog(LOG_WARNING, "Ends although calls are still running: they have had %lld s",
+         static_cast<long long>(kStopLimit.count()));
+  closelog();
+  _exit(EXIT_SUCCESS);
 }
 
 std::optional<std::vector<Listener>> Listen(const Options& options, const RuntimeFolder& folder) {
@@ -96,15 +120,18 @@ int Serve(const Options& options) {
 
   const Routes routes(modules);
   Budget memory(kMemory, kMemory);
+  Budget bodies(kBodies, kBodiesOfPeer);
   Workers workers;
   WebApi api({routes, *uploads, workers, memory});
-  HttpServer server(api, std::move(*listeners));
+  const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
+  AccessLog log(StartedBySystemd() ? JournalSink() : SyslogSink());
+  HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
   Notify("READY=1");
   WaitForTermination();
   Notify("STOPPING=1");
   server.Stop();
   workers.Close();
-  server.Join();
+  if (!server.JoinFor(kStopLimit)) EndWithRunningCalls();
   return EXIT_SUCCESS;
 }
 

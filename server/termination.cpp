@@ -1,6 +1,7 @@
 #include "termination.h"
 
 #include <semaphore.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <csignal>
@@ -10,9 +11,12 @@ namespace vorn::server {
 namespace {
 
 sem_t terminated;  // one of the few things that a signal handler may touch
+volatile std::sig_atomic_t signals = 0;
 
-void OnSignal(int /*number*/) {
+void OnSignal(int number) {
   const int saved = errno;
+  if (signals > 0) _exit(128 + number);
+  signals = 1;
   sem_post(&terminated);
   errno = saved;
 }

@@ -6,11 +6,12 @@
 
 namespace vorn::server {
 
-// From here on SIGTERM and SIGINT are waited for instead of ending the process, and SIGPIPE is
-// ignored. No signal is blocked, so programs that a module starts begin as usual. False with `error`.
+// Makes the first SIGTERM or SIGINT end WaitForTermination() instead of the process; a second one ends the process
+// immediately, with status 128 + its number. Ignores SIGPIPE. No signal is blocked, so programs that a module starts
+// have the usual signal mask. Returns false and sets `error` on failure.
 bool CatchTermination(std::string* error);
 
-// Returns when the first of them has come.
+// Waits for the first of the two signals.
 void WaitForTermination();
 
 }  // namespace vorn::server

@@ -79,7 +79,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
   VORN::CallDescription description;
-  if (!head.over_tcp) description.origin = "unix";
+  description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
   return std::make_shared<Call>(route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),
                                 Call::Environment{pool, limits_.call});

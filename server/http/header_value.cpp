@@ -71,6 +71,21 @@ std::string LowerAscii(std::string_view text) {
   return lower;
 }
 
+bool EqualsIgnoringCase(std::string_view a, std::string_view b) {
+  const auto lower = [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; };
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [lower](char left, char right) { return lower(left) == lower(right); });
+}
+
+void ForEachElement(std::string_view list, const std::function<void(std::string_view)>& visit) {
+  while (!list.empty()) {
+    const std::size_t comma = std::min(list.find(','), list.size());
+    const std::string_view element = TrimBlanks(list.substr(0, comma));
+    if (!element.empty()) visit(element);
+    list.remove_prefix(std::min(comma + 1, list.size()));
+  }
+}
+
 std::optional<HeaderValue> ParseHeaderValue(std::string_view text) {
   std::string_view rest = TrimBlanks(text);
   const std::size_t end = std::min(rest.find(';'), rest.size());

@@ -2,6 +2,7 @@
 #ifndef VORN_SERVER_HEADER_VALUE_H
 #define VORN_SERVER_HEADER_VALUE_H
 
+#include <functional>
 #include <map>
 #include <optional>
 #include <string>
@@ -16,6 +17,11 @@ struct HeaderValue {
 
 std::string_view TrimBlanks(std::string_view text);  // spaces and tabs, at both ends
 std::string LowerAscii(std::string_view text);
+bool EqualsIgnoringCase(std::string_view a, std::string_view b);  // of ASCII letters
+
+// Calls `visit` for each non-empty element of a comma-separated list (RFC 9110, 5.6.1), without the blanks around it.
+// Commas in quoted strings are not recognised.
+void ForEachElement(std::string_view list, const std::function<void(std::string_view)>& visit);
 
 // None for a value that does not follow the grammar or that gives a parameter twice.
 std::optional<HeaderValue> ParseHeaderValue(std::string_view text);

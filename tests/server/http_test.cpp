@@ -2,74 +2,12 @@
 
 #include <gmock/gmock.h>
 
-#include <mutex>
-#include <thread>
-
-#include "connection.h"
-#include "sandbox.h"
+#include "echo_service.h"
 
 namespace vorn::server {
 namespace {
 
 using testing::HasSubstr;
-
-// Answers with the body it was sent, from another thread; "/no" is refused at its head, a body
-// with "stop" in it where that arrives.
-class EchoService : public Service {
- public:
-  class Echo : public Exchange {
-   public:
-    explicit Echo(std::vector<std::thread>& threads) : threads_(threads) {}
-    std::optional<Response> Receive(std::string_view piece) override {
-      body_ += piece;
-      if (body_.find("stop") != std::string::npos) return Response{413, "stopped", {}};
-      return std::nullopt;
-    }
-    void Run(Answer answer) override {
-      threads_.emplace_back([body = body_, answer] { answer({200, body, {{"Extra", "yes"}}}); });
-    }
-
-   private:
-    std::vector<std::thread>& threads_;
-    std::string body_;
-  };
-
-  ~EchoService() override {
-    for (std::thread& thread : threads_) thread.join();
-  }
-  std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    ++heads_;
-    if (head.target == "/no") return Response{404, "refused", {}};
-    return std::make_shared<Echo>(threads_);
-  }
-  Response Refuse(int status, std::string_view text) const override { return {status, std::string(text), {}}; }
-  int heads() {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return heads_;
-  }
-
- private:
-  std::mutex mutex_;
-  int heads_ = 0;
-  std::vector<std::thread> threads_;  // touched by the network thread, and after its end
-};
-
-class HttpTest : public testing::Test {
- protected:
-  void Start(const HttpLimits& limits = {}) {
-    std::string error;
-    std::vector<Listener> listeners;
-    listeners.push_back(*OpenListener("unix:" + path_, false, &error));
-    server_ = std::make_unique<HttpServer>(service_, std::move(listeners), limits);
-  }
-  Connection Connect() const { return Connection::ToUnix(path_); }
-
-  Sandbox sandbox_;
-  const std::string path_ = sandbox_.File("socket");
-  EchoService service_;
-  std::unique_ptr<HttpServer> server_;
-};
 
 TEST_F(HttpTest, AnswersWithTheHeadersOfEveryAnswer) {
   Start();
@@ -169,52 +107,6 @@ TEST_F(HttpTest, TheConnectionLastsAsTheClientAsks) {
   old_but_kept.Send("GET /no HTTP/1.0\r\nConnection: keep-alive\r\n\r\n" + Get("/no"));
   EXPECT_EQ(old_but_kept.Receive().status, 404);
   EXPECT_EQ(old_but_kept.Receive().status, 404);
-}
-
-TEST_F(HttpTest, SlowSendersAreDroppedAndDisturbNobody) {
-  HttpLimits limits;
-  limits.head = limits.body = limits.idle = std::chrono::seconds(1);
-  Start(limits);
-  std::vector<Connection> slow;
-  for (int i = 0; i < 100; ++i) slow.push_back(Connect());
-  for (Connection& client : slow) client.Send("POST /echo HTTP/1.1\r\nHost");
-  Connection body = Connect();
-  body.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 5\r\n\r\nab");
-  Connection idle = Connect();
-  idle.Send(Post("/echo", "on"));
-  EXPECT_EQ(idle.Receive().body, "on");
-  for (Connection& client : slow) EXPECT_TRUE(client.IsClosedByServer());
-  EXPECT_TRUE(body.IsClosedByServer());
-  EXPECT_TRUE(idle.IsClosedByServer());
-  EXPECT_EQ(service_.heads(), 2);
-}
-
-TEST_F(HttpTest, AClientThatDoesNotReadIsDropped) {
-  HttpLimits limits;
-  limits.write = std::chrono::seconds(1);
-  Start(limits);
-  Connection client = Connect();
-  const std::string request = Post("/echo", std::string(500000, 'x'));
-  EXPECT_TRUE(Eventually([&] { return !client.Send(request); }));
-}
-
-TEST_F(HttpTest, ConnectionsBeyondTheLimitWaitForTheirTurn) {
-  HttpLimits limits;
-  limits.connections = 2;
-  Start(limits);
-  std::optional<Connection> first = Connect();
-  Connection second = Connect();
-  first->Send(Post("/echo", "1"));
-  second.Send(Post("/echo", "2"));
-  EXPECT_EQ(first->Receive().body, "1");
-  EXPECT_EQ(second.Receive().body, "2");
-  Connection third = Connect();
-  third.Send(Post("/echo", "3"));
-  second.Send(Post("/echo", "2"));
-  EXPECT_EQ(second.Receive().body, "2");
-  EXPECT_EQ(service_.heads(), 3);
-  first.reset();
-  EXPECT_EQ(third.Receive().body, "3");
 }
 
 TEST_F(HttpTest, StopClosesWhoeverHasNoRequestRunning) {

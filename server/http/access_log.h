@@ -1,0 +1,76 @@
+// One line for each request that was answered.
+#ifndef VORN_SERVER_ACCESS_LOG_H
+#define VORN_SERVER_ACCESS_LOG_H
+
+#include <chrono>
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <mutex>
+#include <string>
+#include <thread>
+
+#include "message.h"
+
+namespace vorn::server {
+
+struct AccessRecord {
+  std::string caller;  // the authenticated account or token; empty if it is unknown
+  Peer peer;
+  std::string method;
+  std::string target;  // without the query
+  int status = 0;
+  std::uint64_t bytes = 0;  // of the body, as far as it was sent
+  std::chrono::microseconds queued{0};
+  std::chrono::microseconds worked{0};
+};
+
+// Writes records from a thread of its own, so that a slow journal delays no client. A record that finds the queue
+// full, and a record of status 503, is counted instead; the counts are written every ten seconds.
+class AccessLog {
+ public:
+  struct Counts {
+    std::uint64_t busy = 0;     // answers 503
+    std::uint64_t dropped = 0;  // records without a line
+  };
+  struct Sink {
+    std::function<void(const AccessRecord&)> write;
+    std::function<void(const Counts&)> summarize;
+  };
+
+  explicit AccessLog(Sink sink, std::size_t queue = 4096);
+  ~AccessLog();  // writes everything that was added
+  AccessLog(const AccessLog&) = delete;
+  AccessLog& operator=(const AccessLog&) = delete;
+
+  // Thread-safe; does not wait and does not throw.
+  void Add(AccessRecord record) noexcept;
+
+ private:
+  void Work();
+  void WriteCounts(std::unique_lock<std::mutex>* lock);
+
+  const Sink sink_;
+  const std::size_t limit_;
+  std::mutex mutex_;
+  std::condition_variable wake_;
+  std::deque<AccessRecord> queue_;
+  Counts counts_;
+  bool stopping_ = false;
+  std::thread thread_;
+};
+
+// A record as one line: control characters of the client's text are escaped.
+std::string FormatRecord(const AccessRecord& record);
+
+// Writes to the systemd journal, in fields of their own (VORN_PEER, VORN_STATUS, ...; systemd.journal-fields(7)).
+AccessLog::Sink JournalSink();
+
+// Writes lines to syslog(3).
+AccessLog::Sink SyslogSink();
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_ACCESS_LOG_H

@@ -1,0 +1,126 @@
+// One connection: a request is read, authorised, run and answered, then the next.
+#ifndef VORN_SERVER_SESSION_H
+#define VORN_SERVER_SESSION_H
+
+#include <boost/beast/core/flat_buffer.hpp>
+#include <chrono>
+#include <cstddef>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "budget.h"
+#include "http.h"
+#include "mailbox.h"
+#include "request_reader.h"
+#include "response_writer.h"
+#include "stream.h"
+
+namespace vorn::server {
+
+class Session;
+
+// What all sessions share. Used on the network thread.
+class SessionHost {
+ public:
+  virtual ~SessionHost() = default;
+  virtual Service& service() = 0;
+  virtual const HttpLimits& limits() const = 0;
+  virtual Budget* bodies() = 0;  // may be null, as the log
+  virtual AccessLog* log() = 0;
+  virtual const std::shared_ptr<Mailbox>& mailbox() = 0;
+  virtual bool stopping() const = 0;
+  virtual const std::string& date() = 0;  // for the Date header
+  virtual void Forget(const std::shared_ptr<Session>& session) = 0;
+};
+
+// Lives on the network thread. Other threads know a session only through the letters of its mailbox.
+class Session : public std::enable_shared_from_this<Session> {
+ public:
+  using Clock = std::chrono::steady_clock;
+
+  // The host must outlive the session.
+  Session(SessionHost& host, std::unique_ptr<Stream> stream, Peer peer, std::size_t listener);
+
+  void Start();
+
+  // There is no room for the connection, which has just been accepted: it is answered with 503 and closed.
+  void TurnAway();
+
+  // The server stops: closes the connection now, or after the answer of the request that is running.
+  void Stop();
+  void Close();
+
+  // Called once a second: applies the deadline, and tells a running call if its client has left.
+  void Tick(Clock::time_point now);
+
+  std::size_t listener() const { return listener_; }  // an index into the server's listeners
+  ConnectionUse use() const;
+
+ private:
+  using Error = Stream::Error;
+  enum class Phase { kIdle, kHead, kAuthorize, kBody, kCall, kWrite, kDrain };
+
+  template <typename Step>
+  void Guard(const Step& step);
+  Stream::Done Then(void (Session::*step)(const Error& error, std::size_t bytes));
+  std::shared_ptr<Letter> LetterTo(void (Session::*step)(std::optional<Response> response));
+
+  std::chrono::seconds LimitOf(Phase phase) const;
+  void Enter(Phase phase);
+  void Expire();
+
+  void OnBegun(const Error& error, std::size_t bytes);
+  void Read();
+  void OnRead(const Error& error, std::size_t bytes);
+  void Advance();
+  void BeginExchange();
+  void Authorize();
+  void OnAuthorized(std::optional<Response> refusal);
+  bool ChargeBody();
+  void OnContinueSent(const Error& error, std::size_t bytes);
+  void Run();
+  void OnAnswer(std::optional<Response> response);
+
+  void Refuse(int status, std::string_view text);
+  void RefuseForNow(std::string_view text);
+  void Reply(Response response);
+  void Send(Response response);
+  void OnSent(const Error& error, std::size_t bytes);
+  void SendMore();
+  void Finish();
+  void Drain();
+  void Log();
+
+  SessionHost& host_;
+  const std::unique_ptr<Stream> stream_;
+  const Peer peer_;
+  const std::size_t listener_;
+
+  Phase phase_ = Phase::kHead;
+  Clock::time_point since_;     // of the phase
+  Clock::time_point deadline_;  // of the phase
+  bool closed_ = false;
+  bool reading_ = false;     // a read is under way
+  bool continuing_ = false;  // "100 Continue" is being written
+
+  boost::beast::flat_buffer buffer_;
+  RequestReader reader_;
+  AnswerForm form_;
+  std::shared_ptr<Exchange> exchange_;
+  std::optional<Charge> charge_;
+  std::uint64_t body_charge_ = 0;  // what the body of the request costs
+  bool abandoned_ = false;
+
+  Response response_;
+  std::string text_;  // what is being written besides the response's body
+  bool keep_alive_ = false;
+  bool ended_ = false;  // the last piece of a generated body has been written
+  AccessRecord record_;
+};
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_SESSION_H

@@ -1,0 +1,48 @@
+// Which connection must go when there are too many.
+#ifndef VORN_SERVER_SHARES_H
+#define VORN_SERVER_SHARES_H
+
+#include <chrono>
+#include <cstddef>
+#include <string>
+#include <vector>
+
+namespace vorn::server {
+
+// What a connection is doing, in the order in which connections are given up.
+enum class Activity {
+  kEnding,   // answered for the last time
+  kIdle,     // between two requests, or before the first
+  kWaiting,  // for the client: to send the rest of a request or to take an answer
+  kWorking,  // the client waits for us; never given up
+};
+
+// One connection of a listener.
+struct ConnectionUse {
+  std::string share_key;  // Peer::ShareKey()
+  Activity activity = Activity::kIdle;
+  std::chrono::steady_clock::time_point since;  // of this activity; a byte now and then does not renew it
+};
+
+// The connections that a listener may have.
+struct ConnectionShare {
+  std::size_t total;
+  std::size_t per_address;
+};
+
+// Whether a connection is given up before another one.
+bool GoesFirst(const ConnectionUse& left, const ConnectionUse& right);
+
+constexpr std::size_t kNoConnection = static_cast<std::size_t>(-1);
+
+// The index of the connection to close after a new one, the last of `uses`, was accepted: one of the same address if
+// that has more than its share, else one of any address if the listener has more than its own. Returns kNoConnection if
+// there is room, or if the surplus consists of connections that are working.
+std::size_t SurplusOf(const std::vector<ConnectionUse>& uses, const ConnectionShare& share);
+
+// The most expendable of all, or kNoConnection.
+std::size_t MostExpendable(const std::vector<ConnectionUse>& uses);
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_SHARES_H

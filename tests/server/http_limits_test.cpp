@@ -1,0 +1,251 @@
+// What the transport spends on clients, and what bad clients cannot take from good ones.
+#include <gmock/gmock.h>
+#include <sys/resource.h>
+
+#include "echo_service.h"
+
+namespace vorn::server {
+namespace {
+
+using testing::HasSubstr;
+
+constexpr std::chrono::seconds kShort{1};
+
+TEST_F(HttpTest, SlowSendersAreToldAndDroppedAndDisturbNobody) {
+  HttpLimits limits;
+  limits.head = limits.body = limits.idle = kShort;
+  Start(limits);
+  Connection silent = Connect();
+  std::vector<Connection> slow;
+  for (int i = 0; i < 100; ++i) slow.push_back(Connect());
+  for (Connection& client : slow) client.Send("POST /echo HTTP/1.1\r\nHost");
+  Connection body = Connect();
+  body.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 5\r\n\r\nab");
+  Connection idle = Connect();
+  idle.Send(Post("/echo", "on"));
+  EXPECT_EQ(idle.Receive().body, "on");
+  for (Connection& client : slow) EXPECT_EQ(client.Receive().status, 408);
+  for (Connection& client : slow) EXPECT_TRUE(client.IsClosedByServer());
+  EXPECT_EQ(body.Receive().status, 408);
+  EXPECT_TRUE(body.IsClosedByServer());
+  EXPECT_TRUE(idle.IsClosedByServer());
+  EXPECT_TRUE(silent.IsClosedByServer()) << "who has sent nothing is told nothing";
+  EXPECT_EQ(service_.heads(), 2);
+}
+
+TEST_F(HttpTest, AClientThatDoesNotReadIsDropped) {
+  HttpLimits limits;
+  limits.write = kShort;
+  Start(limits);
+  Connection client = Connect();
+  const std::string request = Post("/echo", std::string(500000, 'x'));
+  EXPECT_TRUE(Eventually([&] { return !client.Send(request); }));
+}
+
+TEST_F(HttpTest, TheConnectionThatIsIdleLongestMakesRoom) {
+  HttpLimits limits;
+  limits.unix_connections = {3, 3};
+  Start(limits);
+  Connection oldest = Connect();
+  Connection busy = Connect();
+  Connection newer = Connect();
+  for (Connection* client : {&oldest, &newer}) {
+    client->Send(Get("/no"));
+    EXPECT_EQ(client->Receive().status, 404);
+  }
+  busy.Send(Post("/hold", "1"));
+  const Answer held = service_.AwaitHeld();
+  Connection next = Connect();
+  next.Send(Get("/no"));
+  EXPECT_EQ(next.Receive().status, 404);
+  EXPECT_TRUE(oldest.IsClosedByServer());
+  newer.Send(Get("/no"));
+  EXPECT_EQ(newer.Receive().status, 404);
+  held({200, "held"});
+  EXPECT_EQ(busy.Receive().body, "held");
+}
+
+TEST_F(HttpTest, SlowClientsMakeRoomToo) {
+  HttpLimits limits;
+  limits.unix_connections = {20, 20};
+  Start(limits);
+  std::vector<Connection> slow;
+  for (int i = 0; i < 100; ++i) {
+    slow.push_back(Connect());
+    slow.back().Send(i % 2 == 0 ? "GET /no HT" : "POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 9\r\n\r\na");
+  }
+  for (int i = 0; i < 10; ++i) {
+    Connection good = Connect();
+    good.Send(Post("/echo", "good"));
+    EXPECT_EQ(good.Receive().body, "good");
+  }
+  EXPECT_TRUE(slow[0].IsClosedByServer());
+}
+
+TEST_F(HttpTest, WhoFindsOnlyConnectionsThatWorkIsToldToComeBack) {
+  HttpLimits limits;
+  limits.unix_connections = {2, 2};
+  Start(limits);
+  Connection first = Connect();
+  Connection second = Connect();
+  std::vector<Answer> answers;
+  for (Connection* client : {&first, &second}) {
+    client->Send(Post("/hold", "1"));
+    answers.push_back(service_.AwaitHeld());
+  }
+  Connection third = Connect();
+  Reply reply = third.Receive();
+  EXPECT_EQ(reply.status, 503);
+  EXPECT_EQ(reply.headers["Retry-After"], "1");
+  for (const Answer& answer : answers) answer({200, "held"});
+  EXPECT_EQ(first.Receive().body, "held");
+  EXPECT_EQ(second.Receive().body, "held");
+}
+
+TEST_F(HttpTest, EachListenerHasItsOwnShare) {
+  HttpLimits limits;
+  limits.tcp_connections = {4, 4};
+  Start(limits);
+  Connection local = Connect();
+  local.Send(Get("/no"));
+  EXPECT_EQ(local.Receive().status, 404);
+  std::vector<Connection> remote;
+  for (int i = 0; i < 50; ++i) remote.push_back(ConnectTcp());
+  remote.back().Send(Get("/no"));
+  EXPECT_EQ(remote.back().Receive().status, 404);
+  EXPECT_TRUE(remote.front().IsClosedByServer());
+  local.Send(Get("/no"));
+  EXPECT_EQ(local.Receive().status, 404) << "idle longest of all, but of another listener";
+}
+
+// Lowers the limit of descriptors to those that are open now and a few more.
+class FewDescriptors {
+ public:
+  explicit FewDescriptors(rlim_t more) {
+    getrlimit(RLIMIT_NOFILE, &before_);
+    const int next = dup(0);
+    close(next);
+    rlimit few = before_;
+    few.rlim_cur = static_cast<rlim_t>(next) + more;
+    setrlimit(RLIMIT_NOFILE, &few);
+  }
+  ~FewDescriptors() { setrlimit(RLIMIT_NOFILE, &before_); }
+  FewDescriptors(const FewDescriptors&) = delete;
+  FewDescriptors& operator=(const FewDescriptors&) = delete;
+
+ private:
+  rlimit before_{};
+};
+
+TEST_F(HttpTest, WithoutDescriptorsTheIdleMakeRoomForTheNext) {
+  Start();
+  std::vector<Connection> idle;
+  for (int i = 0; i < 20; ++i) {
+    idle.push_back(Connect());
+    idle.back().Send(Get("/no"));
+    EXPECT_EQ(idle.back().Receive().status, 404);
+  }
+  const FewDescriptors few(1);  // for the client's side of one connection, and none for the server's
+  Connection next = Connect();
+  ASSERT_TRUE(next.connected());
+  next.Send(Get("/no"));
+  EXPECT_EQ(next.Receive().status, 404);
+  EXPECT_TRUE(idle.front().IsClosedByServer());
+}
+
+TEST(FitToDescriptors, LeavesTheServersOwnFilesTheirReserve) {
+  std::string error;
+  const Sandbox sandbox;
+  std::vector<Listener> listeners;
+  listeners.push_back(*OpenListener("unix:" + sandbox.File("s"), false, &error));
+  listeners.push_back(*OpenListener("127.0.0.1:0", true, &error));
+  const HttpLimits wanted;
+  EXPECT_EQ(FitToDescriptors(wanted, listeners, 1100).tcp_connections.total, wanted.tcp_connections.total);
+  for (const rlim_t descriptors : {300, 500, 1000}) {
+    const HttpLimits fit = FitToDescriptors(wanted, listeners, descriptors);
+    EXPECT_LE(fit.tcp_connections.total + fit.unix_connections.total + 192, descriptors);
+    EXPECT_GT(fit.unix_connections.total, 8U) << "the Unix socket keeps its part";
+    EXPECT_LE(fit.tcp_connections.per_address, fit.tcp_connections.total);
+  }
+  EXPECT_GE(FitToDescriptors(wanted, listeners, 64).unix_connections.total, 8U);
+}
+
+TEST_F(HttpTest, ABodyBeyondTheBudgetIsRefusedBeforeItIsRead) {
+  Budget memory(1000000, 1000000);
+  Start({}, {&memory, nullptr});
+  Connection first = Connect();
+  first.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 600000\r\n\r\n");
+  EXPECT_TRUE(Eventually([&] { return memory.used() == 600000; }));
+  Connection second = Connect();
+  second.Send("POST /echo HTTP/1.1\r\nHost: x\r\nExpect: 100-continue\r\nContent-Length: 600000\r\n\r\n");
+  Reply busy = second.Receive();
+  EXPECT_EQ(busy.status, 503);
+  EXPECT_EQ(busy.headers["Retry-After"], "1");
+  Connection chunked = Connect();
+  chunked.Send("POST /echo HTTP/1.1\r\nHost: x\r\nTransfer-Encoding: chunked\r\n\r\n");
+  EXPECT_EQ(chunked.Receive().status, 503) << "of unknown length";
+  Connection small = Connect();
+  small.Send(Post("/echo", std::string(5000, 's')));
+  EXPECT_EQ(small.Receive().body.size(), 5000U) << "small bodies are not charged";
+  first.Send(std::string(600000, 'x'));
+  EXPECT_EQ(first.Receive().body.size(), 600000U);
+  EXPECT_EQ(memory.used(), 0U);
+}
+
+TEST_F(HttpTest, TheBudgetGetsBackWhatAVanishedClientHeld) {
+  Budget memory(1000000, 1000000);
+  Start({}, {&memory, nullptr});
+  {
+    Connection client = Connect();
+    client.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 600000\r\n\r\nabc");
+    EXPECT_TRUE(Eventually([&] { return memory.used() == 600000; }));
+  }
+  EXPECT_TRUE(Eventually([&] { return memory.used() == 0; }));
+}
+
+TEST_F(HttpTest, NoBodyIsAskedForBeforeTheRequestIsAuthorised) {
+  Start();
+  Connection client = Connect();
+  client.Send("POST /ask HTTP/1.1\r\nHost: x\r\nExpect: 100-continue\r\nContent-Length: 2\r\n\r\n");
+  const Proceed granted = service_.AwaitAsked();
+  std::thread([granted] { granted(std::nullopt); }).join();
+  EXPECT_EQ(client.Receive().status, 100);
+  client.Send("ok");
+  EXPECT_EQ(client.Receive().body, "ok");
+
+  client.Send("POST /ask HTTP/1.1\r\nHost: x\r\nExpect: 100-continue\r\nContent-Length: 2\r\n\r\n");
+  const Proceed refused = service_.AwaitAsked();
+  std::thread([refused] { refused(Response{401, "who?"}); }).join();
+  EXPECT_EQ(client.Receive().status, 401);
+}
+
+TEST_F(HttpTest, ABodyThatArrivesDuringAuthorisationIsKept) {
+  Start();
+  Connection client = Connect();
+  client.Send(Post("/ask", "early") + Post("/echo", "next"));
+  service_.AwaitAsked()(std::nullopt);
+  EXPECT_EQ(client.Receive().body, "early");
+  EXPECT_EQ(client.Receive().body, "next");
+}
+
+TEST_F(HttpTest, ACallIsToldThatItsClientHasLeft) {
+  Start();
+  std::optional<Connection> client = ConnectTcp();
+  client->Send(Post("/hold", "1"));
+  const Answer answer = service_.AwaitHeld();
+  client.reset();
+  EXPECT_TRUE(Eventually([&] { return service_.abandoned() == 1; }));
+  answer({200, "nobody reads this"});
+}
+
+TEST_F(HttpTest, AClientThatOnlyFinishesSendingGetsItsAnswer) {
+  Start();
+  Connection client = ConnectTcp();
+  client.Send(Post("/hold", "1"));
+  client.FinishSending();
+  service_.AwaitHeld()({200, "late"});
+  EXPECT_EQ(client.Receive().body, "late");
+}
+
+}  // namespace
+}  // namespace vorn::server

@@ -7,6 +7,8 @@
 #include <string>
 #include <utility>
 
+#include "reusable.h"
+
 namespace vorn::server {
 namespace {
 
@@ -20,10 +22,12 @@ std::unique_ptr<Json::StreamWriter> NewWriter() {
 
 std::string Text(const Json::Value& value) {
   // Constructing a writer costs more than most answers.
-  thread_local const std::unique_ptr<Json::StreamWriter> writer = NewWriter();
-  std::ostringstream text;
-  writer->write(value, &text);
-  return text.str();
+  static Reusable<Json::StreamWriter> writers(NewWriter);
+  return writers.With([&value](Json::StreamWriter& writer) {
+    std::ostringstream text;
+    writer.write(value, &text);
+    return text.str();
+  });
 }
 
 // `,"name":["...", ...]`, or an empty string if there are no sentences.

@@ -11,6 +11,8 @@
 #include <memory>
 #include <utility>
 
+#include "reusable.h"
+
 namespace vorn::server {
 namespace {
 
@@ -226,10 +228,13 @@ std::optional<JsonText> JsonText::Check(std::string_view text, JsonFault* fault)
 
 std::optional<Json::Value> JsonText::ParseObject(std::string* error) const {
   // Constructing a reader costs as much as reading a small request.
-  thread_local const std::unique_ptr<Json::CharReader> reader = NewReader();
+  static Reusable<Json::CharReader> readers(NewReader);
   Json::Value value;
   std::string messages;
-  if (!reader->parse(text_.data(), text_.data() + text_.size(), &value, &messages)) {
+  const bool parsed = readers.With([&](Json::CharReader& reader) {
+    return reader.parse(text_.data(), text_.data() + text_.size(), &value, &messages);
+  });
+  if (!parsed) {
     *error = FirstMessage(messages);
     return std::nullopt;
   }

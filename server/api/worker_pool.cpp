@@ -1,5 +1,6 @@
 #include "worker_pool.h"
 
+#include <pthread.h>
 #include <syslog.h>
 
 #include <algorithm>
@@ -76,6 +77,7 @@ WorkerPool::Entries::iterator WorkerPool::FirstRunnable() {
 }
 
 void WorkerPool::Work() {
+  pthread_setname_np(pthread_self(), "worker");
   std::unique_lock<std::mutex> lock(mutex_);
   while (!ending_) {
     const auto entry = FirstRunnable();

@@ -1,0 +1,20 @@
+// What a test and the allocator that it preloads into vornd share.
+#ifndef VORN_TESTS_SERVER_ALLOCATION_FAULTS_H
+#define VORN_TESTS_SERVER_ALLOCATION_FAULTS_H
+
+#include <atomic>
+
+namespace vorn::server {
+
+// In a file that both processes map; a file of zeros lets every allocation succeed.
+struct AllocationFaults {
+  std::atomic<int> countdown;  // the allocation of a worker thread that fails: 1 is the next one; 0 none
+  std::atomic<bool> stay;      // all later allocations fail, too, until countdown is set to 0
+  std::atomic<int> failed;     // how many have failed
+};
+static_assert(std::atomic<int>::is_always_lock_free && std::atomic<bool>::is_always_lock_free,
+              "usable between processes");
+
+}  // namespace vorn::server
+
+#endif  // VORN_TESTS_SERVER_ALLOCATION_FAULTS_H

@@ -1,0 +1,142 @@
+// The real vornd without memory: each call that finds none ends alone.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/mman.h>
+#include <sys/resource.h>
+
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <optional>
+#include <stdexcept>
+#include <vector>
+
+#include "allocation_faults.h"
+#include "server_process.h"
+
+namespace vorn::server {
+namespace {
+
+std::string Form() {
+  const std::string form =
+      "--b\r\nContent-Disposition: form-data; name=keytab_file; filename=k\r\n\r\nkeytab\r\n"
+      "--b\r\nContent-Disposition: form-data; name=note\r\n\r\na text of more than a few bytes\r\n--b--\r\n";
+  return "POST /api/Test.Echo/v1/upload HTTP/1.1\r\nHost: localhost\r\nContent-Type: multipart/form-data; "
+         "boundary=b\r\n"
+         "Content-Length: " +
+         std::to_string(form.size()) + "\r\n\r\n" + form;
+}
+
+// Requests that take different ways through the worker.
+std::vector<std::string> Requests() {
+  return {Post("/api/Test.Echo/v1/get", R"({"a": ["text that is not short any more", 1, {"b": null}]})"),
+          Post("/api/Test.Echo/v1/get", R"({"a": 1, "a": 2})"),
+          Post("/api/Test.Echo/v1/fail", R"({"code": 2351, "details": ["alice"]})"),
+          Post("/api/Test.Echo/v1/remark", R"({"code": 2301, "reasons": ["a"], "warnings": ["b"]})"),
+          Post("/api/Test.Echo/v1/throw"),
+          Form()};
+}
+
+// A vornd with the allocator of preload/failing_malloc.cpp.
+class FailingAllocator : public testing::Test {
+ protected:
+  FailingAllocator() {
+    const std::string path = sandbox_.File("faults");
+    sandbox_.Write("faults", std::string(sizeof(AllocationFaults), '\0'));
+    const UniqueFd file(open(path.c_str(), O_RDWR | O_CLOEXEC));
+    void* page = mmap(nullptr, sizeof(AllocationFaults), PROT_READ | PROT_WRITE, MAP_SHARED, file.get(), 0);
+    if (page == MAP_FAILED) throw std::runtime_error("mmap");
+    faults_ = static_cast<AllocationFaults*>(page);
+    setenv("VORN_TEST_ALLOCATION_FAULTS", path.c_str(), 1);
+    setenv("LD_PRELOAD", FAILING_MALLOC, 1);
+    server_.emplace(sandbox_);
+    unsetenv("LD_PRELOAD");
+  }
+  ~FailingAllocator() override {
+    faults_->countdown = 0;
+    server_->Signal(SIGTERM);
+    EXPECT_EQ(server_->Wait(), 0) << server_->log();
+    munmap(faults_, sizeof(AllocationFaults));
+  }
+
+  // Lets the n-th allocation from now on fail while the request is served. Returns whether it came to that.
+  bool Try(const std::string& request, int n, bool stay) {
+    faults_->failed = 0;
+    faults_->stay = stay;
+    Connection client = server_->Connect();
+    faults_->countdown = n;
+    client.Send(request);
+    const int status = client.Receive().status;
+    faults_->countdown = 0;
+    const bool failed = faults_->failed > 0;
+    EXPECT_TRUE(status >= 200) << "no answer: allocation " << n << " of " << request.substr(0, 60);
+    EXPECT_TRUE(failed || status < 500 || request.find("throw") != std::string::npos) << status;
+    return failed;
+  }
+  void ExpectHealthy() {
+    Connection client = server_->Connect();
+    client.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
+    EXPECT_EQ(client.Receive().Envelope()["data"]["a"], 1);
+  }
+
+  Sandbox sandbox_;
+  AllocationFaults* faults_ = nullptr;
+  std::optional<ServerProcess> server_;
+};
+
+TEST_F(FailingAllocator, EndsTheCallThatFindsNoMemoryAndNoOther) {
+  for (const bool stay : {false, true}) {
+    for (const std::string& request : Requests()) {
+      int n = 1;
+      while (n < 2000 && Try(request, n, stay)) ++n;
+      EXPECT_GT(n, 5) << request.substr(0, 60);
+      EXPECT_LT(n, 2000) << request.substr(0, 60);
+      ExpectHealthy();
+    }
+  }
+  EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("run/vorn/uploads")));
+}
+
+std::uint64_t AddressSpaceOf(pid_t pid) {
+  std::uint64_t pages = 0;
+  std::ifstream("/proc/" + std::to_string(pid) + "/statm") >> pages;
+  return pages * static_cast<std::uint64_t>(sysconf(_SC_PAGESIZE));
+}
+
+std::string LargestJson() {
+  std::string text = R"({"a":[[])";
+  for (int i = 0; i < 99000; ++i) text += ",[]";
+  return text + "]}";
+}
+
+TEST(MemoryLimit, EndsCallsAndNotTheServer) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  const std::string request = Post("/api/Test.Echo/v1/get", LargestJson());
+  const rlim_t limit = AddressSpaceOf(server.pid()) + rlim_t{24} * 1024 * 1024;
+  const rlimit limits{limit, limit};
+  ASSERT_EQ(prlimit(server.pid(), RLIMIT_AS, &limits, nullptr), 0);
+  int refused = 0;
+  for (int round = 0; round < 3; ++round) {
+    std::vector<Connection> clients;
+    for (int i = 0; i < 8; ++i) {
+      clients.push_back(server.Connect());
+      clients.back().Send(request);
+    }
+    for (Connection& client : clients) {
+      if (client.Receive().status != 200) ++refused;
+    }
+  }
+  EXPECT_GT(refused, 0) << "the limit must be reached";
+  const auto healthy = [&server] {
+    Connection client = server.Connect();
+    client.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
+    return client.Receive().status == 200;
+  };
+  EXPECT_TRUE(Eventually(healthy)) << server.log();
+  server.Signal(SIGTERM);
+  EXPECT_EQ(server.Wait(), 0) << server.log();
+}
+
+}  // namespace
+}  // namespace vorn::server

@@ -122,7 +122,8 @@ int Serve(const Options& options) {
   Budget memory(kMemory, kMemory);
   Budget bodies(kBodies, kBodiesOfPeer);
   Workers workers;
-  WebApi api({routes, *uploads, workers, memory});
+  const OwnNames names(options.host_names);
+  WebApi api({routes, *uploads, workers, memory, names});
   const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   AccessLog log(StartedBySystemd() ? JournalSink() : SyslogSink());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});

@@ -24,6 +24,11 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
   app.add_option("--listen", options.listen, "Listen at ADDRESS; may be given several times")
       ->type_name("ADDRESS")
       ->allow_extra_args(false);
+  app.add_option(
+         "--host-name", options.host_names,
+         "Accept requests and pages of https://NAME, which a proxy with TLS forwards; may be given several times")
+      ->type_name("NAME")
+      ->allow_extra_args(false);
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {

@@ -10,8 +10,9 @@ namespace vorn::server {
 
 struct Options {
   std::string root = "/";
-  std::string modules;              // empty: where this program's modules are
-  std::vector<std::string> listen;  // empty: the Unix socket below the root
+  std::string modules;                  // empty: where this program's modules are
+  std::vector<std::string> host_names;  // of this server, besides localhost
+  std::vector<std::string> listen;      // empty: the Unix socket below the root
 };
 
 // The options, or the status to exit with when there is nothing more to do: help and version have

@@ -2,34 +2,65 @@
 
 #include <algorithm>
 #include <string>
+#include <utility>
 
 #include "header_value.h"
 
 namespace vorn::server {
 namespace {
 
+constexpr std::string_view kHttp = "http://";
+constexpr std::string_view kHttps = "https://";
+
 bool IsPort(std::string_view text) {
   return text.size() <= 5 && std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; });
 }
 
+// Whether `host` is `name`, or `name` and a port. Both are in lower case.
+bool HasName(std::string_view host, std::string_view name) {
+  if (host.substr(0, name.size()) != name) return false;
+  const std::string_view rest = host.substr(name.size());
+  return rest.empty() || (rest.front() == ':' && IsPort(rest.substr(1)));
+}
+
+bool IsLoopback(std::string_view host) {
+  return HasName(host, "localhost") || HasName(host, "127.0.0.1") || HasName(host, "[::1]");
+}
+
+bool HasPrefix(std::string_view text, std::string_view prefix) { return text.substr(0, prefix.size()) == prefix; }
+
+// In a URL the port of the scheme can be written or not.
+std::string_view WithoutPort(std::string_view host, std::string_view port) {
+  const bool has_port = host.size() > port.size() && host.substr(host.size() - port.size()) == port;
+  return has_port ? host.substr(0, host.size() - port.size()) : host;
+}
+
 }  // namespace
 
-bool IsLoopbackHost(std::string_view host) {
-  const std::string lower = LowerAscii(host);
-  for (const std::string_view name : {"localhost", "127.0.0.1", "[::1]"}) {
-    if (lower.compare(0, name.size(), name) != 0) continue;
-    std::string_view rest = lower;
-    rest.remove_prefix(name.size());
-    return rest.empty() || (rest.front() == ':' && IsPort(rest.substr(1)));
-  }
-  return false;
+OwnNames::OwnNames(std::vector<std::string> names) : names_(std::move(names)) {
+  for (std::string& name : names_) name = LowerAscii(name);
 }
 
-bool IsLoopbackOrigin(std::string_view origin) {
-  for (const std::string_view scheme : {"http://", "https://"}) {
-    if (origin.substr(0, scheme.size()) == scheme) return IsLoopbackHost(origin.substr(scheme.size()));
-  }
-  return false;
+bool OwnNames::HasGivenName(std::string_view host) const {
+  return std::any_of(names_.begin(), names_.end(), [host](const std::string& name) { return HasName(host, name); });
 }
+
+bool OwnNames::Include(std::string_view host) const {
+  const std::string lower = LowerAscii(host);
+  return IsLoopback(lower) || HasGivenName(lower);
+}
+
+bool OwnNames::AreOrigin(std::string_view origin, std::string_view host) const {
+  const std::string own = LowerAscii(host);
+  const std::string lower = LowerAscii(origin);
+  const std::string_view sender = lower;
+  if (HasGivenName(own) && HasPrefix(sender, kHttps)) {
+    return WithoutPort(sender.substr(kHttps.size()), ":443") == WithoutPort(own, ":443");
+  }
+  return IsLoopback(own) && HasPrefix(sender, kHttp) &&
+         WithoutPort(sender.substr(kHttp.size()), ":80") == WithoutPort(own, ":80");
+}
+
+bool IsOwnFetch(std::string_view site) { return site == "same-origin" || site == "none"; }
 
 }  // namespace vorn::server

@@ -74,6 +74,7 @@ void Call::Run(Answer answer) {
 }
 
 void Call::Work() {
+  const auto begun = std::chrono::steady_clock::now();
   Response response;
   if (abandoned_) {
     response.status = 503;  // nobody reads it
@@ -81,6 +82,7 @@ void Call::Work() {
     response = AnswerOf(route_, [this] { return Execute(); });
   }
   body_.reset();  // before the client can see the answer
+  response.begun = begun;
   const int status = response.status;
   if (!answer_.Give(std::move(response))) {
     syslog(LOG_NOTICE, "%s: ended with status %d after its deadline", route_.Name().c_str(), status);

@@ -17,14 +17,14 @@ namespace {
 
 using NewBody = std::variant<std::unique_ptr<Body>, Response>;
 
-std::optional<Response> KeepStrangersOut(const Head& head) {
-  if (head.over_tcp && !IsLoopbackHost(head.host.value_or(""))) {
-    return Refusal(421, "This server is localhost, 127.0.0.1 and [::1]; the Host header names another one.");
+std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& names) {
+  const std::string_view host = head.host.value_or("");
+  if (head.over_tcp && !names.Include(host)) {
+    return Refusal(421, "The Host header names another server. Names of this one can be set with --host-name.");
   }
-  if (head.origin && !IsLoopbackOrigin(*head.origin)) {
-    return Refusal(403, "Web pages of other sites may not use this server.");
-  }
-  return std::nullopt;
+  const bool own_origin = !head.origin || names.AreOrigin(*head.origin, host);
+  if (own_origin && IsOwnFetch(head.Header("Sec-Fetch-Site").value_or("none"))) return std::nullopt;
+  return Refusal(403, "Web pages of other sites, and of other ports, may not use this server.");
 }
 
 Response MethodNotAllowed(std::string_view path, const std::string& allowed) {
@@ -47,10 +47,16 @@ NewBody OpenForm(const Head& head, const HeaderValue& type, const UploadFolder& 
   return std::make_unique<FormBody>(boundary->second, uploads);
 }
 
+bool IsUtf8(const HeaderValue& type) {
+  const auto charset = type.parameters.find("charset");
+  return charset == type.parameters.end() || EqualsIgnoringCase(charset->second, "utf-8");
+}
+
 // A form is accepted by methods that take a file only: a page of another site can send one without asking first.
 NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& parts) {
   if (!head.has_body) return std::make_unique<JsonBody>(parts.memory);
   const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
+  if (type && !IsUtf8(*type)) return Refusal(415, "Parameters are sent in UTF-8.");
   if (type && type->value == "application/json") return OpenJson(head, parts.memory);
   if (type && type->value == "multipart/form-data" && route.method.takes_file) {
     return OpenForm(head, *type, parts.uploads);
@@ -60,13 +66,18 @@ NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& part
                           std::string(head.content_type) + "\".");
 }
 
+// For logs: who sent the request, as far as the transport knows.
+std::string CallerOf(const Peer& peer) {
+  return peer.credentials ? "uid " + std::to_string(peer.credentials->uid) : "";
+}
+
 }  // namespace
 
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
 WebApi::WebApi(Parts parts, Limits limits) : parts_(parts), limits_(limits) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
-  if (auto refusal = KeepStrangersOut(head)) return *std::move(refusal);
+  if (auto refusal = KeepOtherSitesOut(head, parts_.names)) return *std::move(refusal);
   if (auto page = BeginPage(head)) return *std::move(page);
   std::string unknown;
   const Route* route = parts_.routes.Find(head.target, &unknown);
@@ -79,6 +90,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
   VORN::CallDescription description;
+  description.caller = CallerOf(head.peer);
   description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
   return std::make_shared<Call>(route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),

@@ -8,6 +8,7 @@
 #include <string_view>
 #include <variant>
 
+#include "browser_guard.h"
 #include "budget.h"
 #include "http.h"
 #include "routes.h"
@@ -29,6 +30,7 @@ class WebApi : public Service {
     const UploadFolder& uploads;
     Workers& workers;
     Budget& memory;  // of parsed parameters
+    const OwnNames& names;
   };
 
   explicit WebApi(Parts parts);

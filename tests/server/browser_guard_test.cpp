@@ -5,27 +5,68 @@
 namespace vorn::server {
 namespace {
 
-TEST(BrowserGuard, LoopbackNamesAreThisMachine) {
-  for (const char* host : {"localhost", "LocalHost:8080", "127.0.0.1", "127.0.0.1:1", "[::1]", "[::1]:65535"}) {
-    EXPECT_TRUE(IsLoopbackHost(host)) << host;
+TEST(OwnNames, AreLoopbackNamesWithAnyPort) {
+  const OwnNames names;
+  for (const char* host :
+       {"localhost", "LOCALHOST", "localhost:8080", "127.0.0.1", "127.0.0.1:1", "[::1]", "[::1]:65535", "localhost:"}) {
+    EXPECT_TRUE(names.Include(host)) << host;
+  }
+  for (const char* host :
+       {"", "nas.example", "localhost.evil.example", "127.0.0.1.evil.example", "127.0.0.10", "127.1", "::1", "[::1",
+        "localhost:80x", "localhost:808080", "evil.example:localhost", " localhost"}) {
+    EXPECT_FALSE(names.Include(host)) << host;
   }
 }
 
-TEST(BrowserGuard, EveryOtherNameIsNot) {
-  for (const char* host : {"", "evil.example", "localhost.evil.example", "127.0.0.1.evil.example", "localhost:evil",
-                           "localhost:80:80", "127.0.0.10", "127.0.0.2", "::1", "[::1", "[::1]x", "0.0.0.0",
-                           "localhost:123456", "localhost@evil.example", " localhost"}) {
-    EXPECT_FALSE(IsLoopbackHost(host)) << host;
+TEST(OwnNames, IncludeThoseThatAreGiven) {
+  const OwnNames names({"NAS.example", "[2001:db8::1]"});
+  for (const char* host : {"nas.example", "Nas.Example:8443", "[2001:db8::1]:443", "localhost"}) {
+    EXPECT_TRUE(names.Include(host)) << host;
+  }
+  for (const char* host : {"nas.example.evil.example", "xnas.example", "example", "[2001:db8::12]"}) {
+    EXPECT_FALSE(names.Include(host)) << host;
   }
 }
 
-TEST(BrowserGuard, OriginsAreWebPagesOfThisMachine) {
-  EXPECT_TRUE(IsLoopbackOrigin("http://localhost:8080"));
-  EXPECT_TRUE(IsLoopbackOrigin("https://127.0.0.1"));
-  for (const char* origin : {"", "null", "localhost", "file://", "http://evil.example", "http://localhost.evil.example",
-                             "ftp://localhost", "http://localhost/", "http://"}) {
-    EXPECT_FALSE(IsLoopbackOrigin(origin)) << origin;
-  }
+TEST(OwnNames, AreAnOriginIfSchemeHostAndPortAreTheSame) {
+  const OwnNames names({"nas.example"});
+  const struct {
+    const char* origin;
+    const char* host;
+    bool own;
+  } cases[] = {
+      {"http://localhost:8080", "localhost:8080", true},
+      {"http://LOCALHOST", "localhost:80", true},
+      {"http://localhost:80", "localhost", true},
+      {"http://[::1]:8080", "[::1]:8080", true},
+      {"https://nas.example", "nas.example", true},
+      {"https://nas.example:443", "Nas.example", true},
+      {"https://nas.example:8443", "nas.example:8443", true},
+      // another port of this machine, or another name of it
+      {"http://localhost:3000", "localhost:8080", false},
+      {"http://localhost", "localhost:8080", false},
+      {"http://127.0.0.1:8080", "localhost:8080", false},
+      {"http://localhost:443", "localhost", false},
+      // another scheme
+      {"https://localhost:8080", "localhost:8080", false},
+      {"http://nas.example", "nas.example", false},
+      {"https://nas.example:80", "nas.example", false},
+      // other sites
+      {"https://evil.example", "evil.example", false},
+      {"https://evil.example", "nas.example", false},
+      {"https://nas.example.evil.example", "nas.example", false},
+      {"null", "localhost:8080", false},
+      {"", "localhost:8080", false},
+      {"file://", "localhost", false},
+      {"http://localhost:8080", "", false},
+      {"http://", "", false},
+  };
+  for (const auto& c : cases) EXPECT_EQ(names.AreOrigin(c.origin, c.host), c.own) << c.origin << " at " << c.host;
+}
+
+TEST(FetchMetadata, TellsWhoseRequestItIs) {
+  for (const char* site : {"same-origin", "none"}) EXPECT_TRUE(IsOwnFetch(site)) << site;
+  for (const char* site : {"same-site", "cross-site", "", "new-word"}) EXPECT_FALSE(IsOwnFetch(site)) << site;
 }
 
 }  // namespace

@@ -22,11 +22,12 @@ TEST(Options, AreTheBoxItselfWithoutAny) {
 }
 
 TEST(Options, AreAllTaken) {
-  const auto options = std::get<Options>(
-      Parse({"--root", "/srv/trial", "--modules=/m", "--listen", "unix:/a", "--listen", "127.0.0.1:1"}));
+  const auto options = std::get<Options>(Parse({"--root", "/srv/trial", "--modules=/m", "--listen", "unix:/a",
+                                                "--listen", "127.0.0.1:1", "--host-name", "nas"}));
   EXPECT_EQ(options.root, "/srv/trial");
   EXPECT_EQ(options.modules, "/m");
   EXPECT_THAT(options.listen, ElementsAre("unix:/a", "127.0.0.1:1"));
+  EXPECT_THAT(options.host_names, ElementsAre("nas"));
 }
 
 TEST(Options, HelpAndVersionEndWithSuccess) {
@@ -34,7 +35,7 @@ TEST(Options, HelpAndVersionEndWithSuccess) {
   EXPECT_EQ(std::get<int>(Parse({"--help"})), 0);
   EXPECT_EQ(std::get<int>(Parse({"--version"})), 0);
   const std::string text = testing::internal::GetCapturedStdout();
-  for (const char* part : {"--root", "--modules", "--listen", "unix:/PATH", "vornd 1."})
+  for (const char* part : {"--root", "--modules", "--listen", "--host-name", "unix:/PATH", "vornd 1."})
     EXPECT_THAT(text, HasSubstr(part));
 }
 

@@ -105,7 +105,7 @@ TEST_F(Framing, ABodyOfTheLargestSizeIsTaken) {
   EXPECT_EQ(reply.Envelope()["data"]["a"].asString().size(), json.size() - 8);
 }
 
-TEST_F(Framing, RequestsOfStrangersAreRefusedOverTcp) {
+TEST_F(Framing, RequestsForPagesOfOtherSitesAreRefused) {
   const struct {
     const char* headers;
     int status;
@@ -115,7 +115,11 @@ TEST_F(Framing, RequestsOfStrangersAreRefusedOverTcp) {
       {"Host: localhost.evil.example\r\n", 421},
       {"Host: localhost\r\nOrigin: http://evil.example\r\n", 403},
       {"Host: localhost\r\nOrigin: null\r\n", 403},
-      {"Host: localhost\r\nOrigin: http://localhost:1234\r\n", 200},
+      {"Host: localhost\r\nOrigin: http://localhost:1234\r\n", 403},
+      {"Host: localhost:1234\r\nOrigin: http://localhost:1234\r\n", 200},
+      {"Host: localhost\r\nSec-Fetch-Site: same-origin\r\n", 200},
+      {"Host: localhost\r\nSec-Fetch-Site: cross-site\r\n", 403},
+      {"Host: localhost\r\nSec-Fetch-Site: same-site\r\n", 403},
   };
   for (const auto& c : cases) {
     Connection client = server_->ConnectTcp();

@@ -5,6 +5,7 @@
 #include <future>
 
 #include "body.h"
+#include "call.h"
 #include "form_body.h"
 #include "sandbox.h"
 
@@ -12,6 +13,11 @@ namespace vorn::server {
 namespace {
 
 void Nothing(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess({}); }
+
+void Who(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
+  const VORN::CallDescription& call = VORN::CallContext::Current()->description();
+  response->SetSuccess(call.caller + " at " + call.origin);
+}
 
 class WebApiTest : public testing::Test {
  protected:
@@ -44,14 +50,16 @@ class WebApiTest : public testing::Test {
         &error);
   }
 
-  std::vector<Module> modules_{{"a.so", {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}}, ParseDescriptor()}};
+  std::vector<Module> modules_{
+      {"a.so", {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}, {"Nfs", 1, "who", Who}}, ParseDescriptor()}};
   Routes routes_{modules_};
   Workers workers_;
   Budget memory_{std::size_t{1} << 30, std::size_t{1} << 30};
   Sandbox sandbox_;
   std::string error_;
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
-  WebApi api_{{routes_, *uploads_, workers_, memory_}};
+  const OwnNames names_{{"nas.example"}};
+  WebApi api_{{routes_, *uploads_, workers_, memory_, names_}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {
@@ -134,26 +142,62 @@ TEST_F(WebApiTest, RefusesALargeBodyBeforeItComes) {
   EXPECT_EQ(Begin(PostJson("application/json", JsonBody::kMaxBytes + 1)), 413);
 }
 
-TEST_F(WebApiTest, OverTcpOnlyLoopbackNamesAreServed) {
+TEST_F(WebApiTest, OverTcpOnlyItsOwnNamesAreServed) {
   Head head = Post("/api/Nfs/v1/get");
-  head.host = "nas.example";
+  head.host = "evil.example";
   EXPECT_EQ(Begin(head), 0) << "a Unix socket has no name";
   head.over_tcp = true;
   EXPECT_EQ(Begin(head), 421);
   head.host = std::nullopt;
   EXPECT_EQ(Begin(head), 421);
-  head.host = "localhost:8080";
-  EXPECT_EQ(Begin(head), 0);
+  for (const char* host : {"localhost:8080", "nas.example"}) {
+    head.host = host;
+    EXPECT_EQ(Begin(head), 0) << host;
+  }
 }
 
-TEST_F(WebApiTest, PagesOfOtherSitesAreKeptOut) {
+TEST_F(WebApiTest, PagesOfOtherSitesAndPortsAreKeptOut) {
   Head head = Post("/api/Nfs/v1/get");
-  head.origin = "http://localhost:3000";
+  head.host = "localhost:8080";
+  head.origin = "http://localhost:8080";
   EXPECT_EQ(Begin(head), 0);
-  for (const char* origin : {"http://evil.example", "null", ""}) {
+  for (const char* origin : {"http://localhost:3000", "http://evil.example", "null", ""}) {
     head.origin = origin;
     EXPECT_EQ(Begin(head), 403) << origin;
   }
+  head.host = "nas.example";
+  head.origin = "https://nas.example";
+  EXPECT_EQ(Begin(head), 0);
+}
+
+TEST_F(WebApiTest, RequestsThatABrowserMakesForOtherSitesAreRefused) {
+  Head head = Post("/api/Nfs/v1/get");
+  const struct {
+    const char* site;
+    int status;
+  } cases[] = {{"same-origin", 0}, {"none", 0}, {"same-site", 403}, {"cross-site", 403}};
+  for (const auto& c : cases) {
+    head.headers = {{"sec-fetch-site", c.site}};
+    EXPECT_EQ(Begin(head), c.status) << c.site;
+  }
+}
+
+TEST_F(WebApiTest, TakesParametersInUtf8Only) {
+  for (const char* charset : {"UTF-8", "utf-8", "\"utf-8\""}) {
+    EXPECT_EQ(Begin(PostJson("application/json; charset=" + std::string(charset))), 0) << charset;
+  }
+  for (const char* charset : {"iso-8859-1", "utf-16", "\"\""}) {
+    EXPECT_EQ(Begin(PostJson("application/json; charset=" + std::string(charset))), 415) << charset;
+  }
+}
+
+TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {
+  Head head = Post("/api/Nfs/v1/who");
+  head.peer.credentials = Peer::Credentials{1, 1000, 1000};
+  auto begun = api_.Begin(head);
+  std::promise<std::string> answer;
+  std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& response) { answer.set_value(response.body); });
+  EXPECT_EQ(answer.get_future().get(), R"({"success":true,"data":"uid 1000 at unix"})");
 }
 
 }  // namespace

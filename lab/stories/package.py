@@ -4,13 +4,18 @@ import pathlib
 
 import pytest
 
-from harness import api
-from harness.box import wait_for
-from harness.programs import run, succeeds
+from harness import api, kerberos
+from harness.programs import run, succeeds, wait_for
 
 PACKAGE = "/lab/package.deb"
-OURS = [pathlib.Path(path) for path in (
-    "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/vorn", "/var/lib/vorn")]
+WRITTEN_BY_THE_PACKAGE = [pathlib.Path(path) for path in (
+    "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/nfs/krb5.keytab",
+    "/var/lib/vorn")]
+OF_THE_ADMINISTRATOR = {pathlib.Path(path): text for path, text in {
+    "/etc/vorn/platform.conf": "[platform]\n# as the rack needs it\nkerberos = auto\n",
+    "/etc/nfs/krb5.conf": "[libdefaults]\n default_realm = LAB.TEST\n",
+    "/etc/nfs/notes": "keys are renewed in spring\n",
+    "/etc/systemd/system/nfs-server.service.d/limits.conf": "[Service]\nLimitNOFILE=4096\n"}.items()}
 
 
 def install(package):
@@ -64,12 +69,69 @@ def test_a_removed_package_leaves_its_settings_and_a_service_that_serves(box, cl
     assert len(box.rules("data")) == 1
 
 
-def test_a_purged_package_takes_its_own_files_and_nobody_elses(box, client, settings):
-    del settings
+@pytest.fixture
+def foreign_files(box):
+    """Files of an administrator in the package's folders."""
+    del box
+    for path, text in OF_THE_ADMINISTRATOR.items():
+        path.parent.mkdir(parents=True, exist_ok=True)
+        path.write_text(text, encoding="ascii")
+    yield
+    for path in OF_THE_ADMINISTRATOR:
+        path.unlink(missing_ok=True)
+
+
+def purge():
     run("dpkg", "--purge", "vorn-nfs")
-    assert [path for path in OURS if path.exists()] == []
+
+
+def test_a_purged_package_takes_what_it_wrote_and_nothing_else(box, client, settings, foreign_files, realm):
+    del settings, foreign_files, realm
+    shares = pathlib.Path("/etc/vorn/shares.conf").read_bytes()
+    api.upload("NFS.Kerberos", "upload_key", "keytab_file", kerberos.keytab(f"nfs/{kerberos.SERVER}"))
+    purge()
+    assert [path for path in WRITTEN_BY_THE_PACKAGE if path.exists()] == []
+    assert {path: path.read_text(encoding="ascii") for path in OF_THE_ADMINISTRATOR} == OF_THE_ADMINISTRATOR
+    assert pathlib.Path("/etc/vorn/shares.conf").read_bytes() == shares
     assert client.mounts("/srv/data")
     assert "/srv/data" in pathlib.Path("/etc/exports").read_text(encoding="utf-8")
     assert "kept.example" in pathlib.Path("/etc/idmapd.conf").read_text(encoding="utf-8")
     assert not succeeds("nft", "list", "table", "inet", "vorn")
     assert box.threads() > 0
+
+
+def test_a_purge_keeps_an_administrators_lines_and_keytab(box, settings, realm):
+    del box, settings, realm
+    ours, keytab = pathlib.Path("/etc/nfs.conf.d/vorn.conf"), pathlib.Path("/etc/nfs/krb5.keytab")
+    with open(ours, "a", encoding="ascii") as file:
+        file.write("[gssd]\n# chatty\nverbosity = 1\n")
+    keytab.parent.mkdir(exist_ok=True)
+    keytab.write_bytes(kerberos.keytab("nfs/by-hand.lab.test"))
+    purge()
+    lines = ours.read_text(encoding="ascii").splitlines()
+    assert lines[-3:] == ["[gssd]", "# chatty", "verbosity = 1"]
+    assert not [line for line in lines[:-3] if "=" in line]
+    assert keytab.exists()
+
+
+def files_below(*folders):
+    return {path for folder in folders for path in pathlib.Path(folder).rglob("*")}
+
+
+def test_installing_using_and_purging_leaves_no_new_file(box, client):
+    places = ("/etc", "/usr", "/var/lib", "/lib/systemd", "/run/vorn")
+    purge()
+    before = files_below(*places) - files_below("/var/lib/nfs", "/var/lib/dpkg", "/var/lib/krb5kdc")
+    install(PACKAGE)
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    box.nfs(read_size=32768)
+    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
+    box.allow("data")
+    box.nfs(enable_nfs=False)
+    purge()
+    new = files_below(*places) - files_below("/var/lib/nfs", "/var/lib/dpkg", "/var/lib/krb5kdc") - before
+    install(PACKAGE)
+    administrators = {pathlib.Path(path) for path in ("/etc/vorn", "/etc/vorn/shares.conf", "/etc/exports",
+                                                      "/etc/idmapd.conf")}
+    assert new - administrators == set()

@@ -3,8 +3,15 @@
 import http.client
 import json
 import socket
+import time
 
 _SOCKET = "/run/vorn/vornd.sock"
+
+
+_READING = ("/get", "/list", "/load")
+_READING_LIMIT, _CHANGING_LIMIT = 15, 60  # seconds; generous, because a guest may share its cores
+
+_seconds = {}  # path of a method to the longest time that an answer took
 
 
 class Refused(Exception):
@@ -26,12 +33,14 @@ class _Connection(http.client.HTTPConnection):
 def request(method, path, body=None, content_type="application/json"):
     """The status and the JSON of one request."""
     connection = _Connection("localhost")
+    begun = time.monotonic()
     try:
         connection.request(method, path, body, {"Content-Type": content_type} if body else {})
         response = connection.getresponse()
         return response.status, json.loads(response.read())
     finally:
         connection.close()
+        _seconds[path] = max(_seconds.get(path, 0), time.monotonic() - begun)
 
 
 def answers():
@@ -42,17 +51,32 @@ def answers():
         return False
 
 
-def _data(answer):
-    _, body = answer
+def _data(body):
     if not body["success"]:
         raise Refused(body["error"])
     return body["data"]
 
 
+def slow_answers():
+    """Answers since the last call of this function that took longer than their limit."""
+    slow = [f"{path} was answered after {taken:.1f} s" for path, taken in _seconds.items()
+            if taken > (_READING_LIMIT if path.endswith(_READING) else _CHANGING_LIMIT)]
+    _seconds.clear()
+    return slow
+
+
+def _path(api, method, version=1):
+    return f"/api/VORN.Core.FileServ.{api}/v{version}/{method}"
+
+
+def answer(api, method, version=1, **parameters):
+    """The whole answer to a call, successful or not."""
+    return request("POST", _path(api, method, version), json.dumps(parameters))[1]
+
+
 def call(api, method, version=1, **parameters):
     """What the method answers. Raises Refused."""
-    path = f"/api/VORN.Core.FileServ.{api}/v{version}/{method}"
-    return _data(request("POST", path, json.dumps(parameters)))
+    return _data(answer(api, method, version, **parameters))
 
 
 def upload(api, method, field, content):
@@ -60,5 +84,4 @@ def upload(api, method, field, content):
     boundary = "a-boundary-that-no-keytab-has"
     head = f'--{boundary}\r\nContent-Disposition: form-data; name="{field}"; filename="file"\r\n\r\n'
     body = head.encode() + content + f"\r\n--{boundary}--\r\n".encode()
-    path = f"/api/VORN.Core.FileServ.{api}/v1/{method}"
-    return _data(request("POST", path, body, f"multipart/form-data; boundary={boundary}"))
+    return _data(request("POST", _path(api, method), body, f"multipart/form-data; boundary={boundary}")[1])

@@ -1,39 +1,30 @@
-"""The box under test. Its settings are changed through the API alone; what became of them is seen from outside."""
+"""The box under test. Stories change its settings through the API only, and observe the result from outside."""
 
 import contextlib
 import pathlib
 import shutil
-import time
 
 from harness import api
 from harness.journal import Journal
 from harness.programs import run, succeeds
 
-# What the product writes, or has others read. The first are read when the service starts, and not again.
+# Files that the product or a story writes. The service reads the first ones only when it starts.
 SERVICE_FILES = [pathlib.Path(path) for path in (
     "/etc/idmapd.conf", "/etc/nfs.conf.d/vorn.conf", "/etc/nfs/krb5.conf", "/etc/nfs/krb5.keytab",
     "/etc/systemd/system/nfs-server.service.d/vorn.conf")]
 FILES = SERVICE_FILES + [pathlib.Path(path) for path in (
     "/etc/exports", "/etc/netgroup", "/etc/vorn/shares.conf", "/var/lib/vorn/firewall.nft")]
 
-RULE = {"privilege": "rw", "root_squash": "root", "async": False, "insecure": False, "crossmnt": False,
-        "security_flavor": {"sys": True}}
-
-
-def wait_for(condition, what, limit=30):
-    """Waits until the condition holds; fails with `what` when it does not in `limit` seconds."""
-    deadline = time.monotonic() + limit
-    while not condition():
-        assert time.monotonic() < deadline, what
-        time.sleep(0.05)
+_RULE = {"privilege": "rw", "root_squash": "root", "async": False, "insecure": False, "crossmnt": False,
+         "security_flavor": {"sys": True}}
 
 
 class Box:
     """What an administrator does, and what can be seen of it."""
 
-    def __init__(self):
+    def __init__(self, since_boot=False):
         self._before = {path: self._content(path) for path in FILES}
-        self.journal = Journal()
+        self.journal = Journal(since_boot)
 
     # The service.
 
@@ -54,7 +45,9 @@ class Box:
 
     @staticmethod
     def threads():
-        return int(pathlib.Path("/proc/fs/nfsd/threads").read_text(encoding="ascii"))
+        """How many threads serve NFS; the file is there once the service was started."""
+        threads = pathlib.Path("/proc/fs/nfsd/threads")
+        return int(threads.read_text(encoding="ascii")) if threads.exists() else 0
 
     @staticmethod
     def rpc_ports(program):
@@ -69,17 +62,26 @@ class Box:
         path = pathlib.Path("/srv") / name
         path.mkdir(exist_ok=True)
         path.chmod(0o777)
+        self.share_at(name, path)
+        return path
+
+    @staticmethod
+    def share_at(name, path):
+        """Makes an existing folder a share."""
         shares = pathlib.Path("/etc/vorn/shares.conf")
         shares.parent.mkdir(exist_ok=True)
         text = shares.read_text(encoding="utf-8") if shares.exists() else "[shares]\n"
         if f"{name} = " not in text:
             shares.write_text(f"{text}{name} = {path}\n", encoding="utf-8")
-        return path
 
     @staticmethod
-    def allow(share, *rules):
-        """The share's rules are these from now on; what a rule does not say is as in RULE."""
-        api.call("NFS.SharePrivilege", "save", share_name=share, rule=[{**RULE, **rule} for rule in rules])
+    def rule(**fields):
+        """A rule for the API; fields that are not given have the values of _RULE."""
+        return {**_RULE, **fields}
+
+    def allow(self, share, *rules):
+        """Replaces the share's rules, each a dictionary of the fields that differ from _RULE."""
+        api.call("NFS.SharePrivilege", "save", share_name=share, rule=[self.rule(**rule) for rule in rules])
 
     @staticmethod
     def rules(share):
@@ -105,10 +107,10 @@ class Box:
         """Serving, with nothing exported."""
         if self.threads() == 0:
             run("systemctl", "reset-failed")
-            run("systemctl", "start", "nfs-server")
+            self.nfs(enable_nfs=True)
 
     def put_back(self):
-        """All files as the story found them, and the services accordingly."""
+        """Restores all files that the story changed, and the services accordingly."""
         changed = [path for path in FILES if self._content(path) != self._before[path]]
         for path in changed:
             self._restore(path)

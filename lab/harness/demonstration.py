@@ -1,11 +1,12 @@
 """A box to look at: serving, with a share and a client that has it mounted."""
 
-from harness import furniture
+from harness import fixture_data
 from harness.box import Box
 
-furniture.furnish()
+fixture_data.prepare()
 box = Box()
-client = furniture.machine("client")
+client = fixture_data.machine("client")
+box.nfs(enable_nfs=True)
 box.share("data")
 box.allow("data", {"client": "10.9.0.0/24"})
 mounted = client.mount("/srv/data")

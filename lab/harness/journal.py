@@ -1,30 +1,44 @@
-"""The box's journal: what our programs and the kernel said during a story."""
+"""The box's journal: what the programs of the NFS service and the kernel said during a story."""
 
 import json
 import re
 
 from harness.programs import run
 
-WARNING = 4  # syslog(3)
+_WARNING = 4  # syslog(3)
 
-# Whatever else goes on in the box, these are ours to answer for.
-_OURS = ("vornd", "S83nfsd", "S83nfsd.sh")
-_KERNEL_TROUBLE = re.compile(r"BUG:|Oops|WARNING:|RPC fragment too large|hung task")
+# What is a complaint, by the program that says it. Our own programs and the daemons use priorities; exportfs(8) and
+# nfsdctl write to standard error, which the journal has at priority 6.
+_WARNINGS_OF = {"vornd", "S83nfsd", "S83nfsd.sh", "rpc.mountd", "rpc.statd", "rpc.idmapd", "rpc.svcgssd", "sm-notify",
+                "nfsdcld", "rpcbind"}
+_EVERY_LINE_OF = {"exportfs", "rpc.nfsd", "nft"}
+_KERNEL_TROUBLE = re.compile(r"BUG:|Oops|WARNING:|RPC fragment too large|hung task|lockd: |nfsd: |"
+                             r"NFSD: .*(fail|unable)|svc: failed")
+_UNIT_TROUBLE = re.compile(r"^(nfs-|rpc|vorn|auth-rpcgss)\S*\.(service|socket|mount): "
+                           r"(Failed|Start request repeated|State '.*' timed out)")
+
+# What a healthy box says, too.
+_NORMAL = re.compile(r"refused (un)?mount request|"  # a client that no rule admits
+                     r"exiting on signal 15|Setting log level to|Flags: TI-RPC|"
+                     r"Failed to read /var/lib/nfs/state: Success|"  # the first start of all
+                     r"Setting nobody's (user|group)|"
+                     r"NFSD: (Using|starting|end of|all clients done|no clients)|"
+                     r"nfsd: last server has exited")
 
 
 class Journal:
-    """From now on."""
+    """From now on, or since the box booted."""
 
-    def __init__(self):
+    def __init__(self, since_boot=False):
         self._foreseen = []
-        self._cursor = self._read("--lines=1")[-1]["__CURSOR"]
+        self._from = "--boot" if since_boot else f"--after-cursor={self._read('--lines=1')[-1]['__CURSOR']}"
 
     def foresee(self, pattern):
-        """A complaint that belongs to the story."""
+        """A complaint that belongs to the story; a regular expression for one kind of line."""
         self._foreseen.append(re.compile(pattern))
 
     def complaints(self):
-        """Warnings and worse of ours, and the kernel's troubles, that nobody foresaw."""
+        """The complaints that nobody foresaw."""
         lines = [line for line in map(self._complaint, self._since()) if line]
         return [line for line in lines if not any(pattern.search(line) for pattern in self._foreseen)]
 
@@ -33,7 +47,7 @@ class Journal:
         return "\n".join(self._message(entry) for entry in self._since())
 
     def _since(self):
-        return self._read(f"--after-cursor={self._cursor}")
+        return self._read(self._from)
 
     @staticmethod
     def _read(*arguments):
@@ -48,8 +62,10 @@ class Journal:
     def _complaint(self, entry):
         message = self._message(entry)
         identifier = entry.get("SYSLOG_IDENTIFIER", "")
-        if identifier in _OURS and int(entry.get("PRIORITY", 6)) <= WARNING:
-            return f"{identifier}: {message}"
-        if identifier == "kernel" and _KERNEL_TROUBLE.search(message):
-            return f"kernel: {message}"
-        return None
+        priority = int(entry.get("PRIORITY", 6))
+        if _NORMAL.search(message):
+            return None
+        wrong = (identifier in _WARNINGS_OF and priority <= _WARNING or identifier in _EVERY_LINE_OF or
+                 identifier == "kernel" and _KERNEL_TROUBLE.search(message) or
+                 identifier == "systemd" and _UNIT_TROUBLE.search(message))
+        return f"{identifier}: {message}" if wrong else None

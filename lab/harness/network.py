@@ -6,11 +6,11 @@ import os
 import pathlib
 import signal
 import subprocess
-import time
 
-from harness.programs import ProgramFailed, run, succeeds
+from harness.programs import ProgramFailed, run, succeeds, wait_for
 
 BOX_ADDRESS = "10.9.0.1"
+BOX_ADDRESS6 = "fd00:9::1"
 
 _libc = ctypes.CDLL(None, use_errno=True)
 _CLONE_NEWUTS = 0x04000000
@@ -22,12 +22,19 @@ def _check(result):
         raise OSError(ctypes.get_errno(), os.strerror(ctypes.get_errno()))
 
 
-def build():
-    """The box's own side of the network."""
-    run("modprobe", "-q", "bridge")
-    for command in ("link set lo up", "link add br0 type bridge", f"addr add {BOX_ADDRESS}/16 dev br0",
-                    "link set br0 up"):
-        run("ip", *command.split())
+def ipv4(host):
+    """The IPv4 address of host number `host` on the box's network, a /16."""
+    return f"10.9.{host // 256}.{host % 256}"
+
+
+def ipv6(host):
+    """The IPv6 address of host number `host` on the box's network, a /64."""
+    return f"fd00:9::{host:x}"
+
+
+def bracketed(server):
+    """The server as mount(8) takes it before ":" and a path."""
+    return f"[{server}]" if ":" in server else server
 
 
 class MountFailed(Exception):
@@ -37,14 +44,16 @@ class MountFailed(Exception):
 class Client:
     """A machine with an address of its own. It has no files but those that it mounts."""
 
-    def __init__(self, name, address):
+    def __init__(self, name, host):
         self.name = name
-        self.address = address
+        self.address = ipv4(host)
+        self.address6 = ipv6(host)
         self._mounts = []
         short = name.split(".", maxsplit=1)[0]
         self._namespace = f"/run/netns/{short}"
         self._folder = f"/mnt/{short}"
-        self._build(short)
+        if not os.path.exists(self._namespace):
+            self._build(short)
 
     def run(self, *command, **options):
         """What a program prints that runs on this machine. The files are the box's, the network is not."""
@@ -65,15 +74,14 @@ class Client:
                 os.killpg(process.pid, signal.SIGTERM)
 
     @contextlib.contextmanager
-    def locking(self):
-        """rpcbind(8) and rpc.statd(8) of this machine, without which it cannot lock over NFSv3."""
+    def locking(self, log="/dev/null"):
+        """rpcbind(8) and rpc.statd(8) of this machine, without which it cannot lock over NFSv3. The status daemon's
+        debugging messages go to the file `log`."""
         daemons = ("mount -t tmpfs none /run && mkdir -p /run/rpcbind /run/state/sm /run/state/sm.bak && "
-                   "rpcbind -f & sleep 1; exec rpc.statd -F --no-notify -P /run/state")
+                   "rpcbind -f & until rpcinfo -T tcp 127.0.0.1 portmapper; do sleep 0.1; done >/dev/null 2>&1; "
+                   f"exec rpc.statd -F -d --no-notify -P /run/state >{log} 2>&1")
         with self.running("unshare", "--mount", "sh", "-c", daemons):
-            for _ in range(100):
-                if self.succeeds("rpcinfo", "-T", "tcp", "127.0.0.1", "status"):
-                    break
-                time.sleep(0.1)
+            wait_for(lambda: self.succeeds("rpcinfo", "-T", "tcp", "127.0.0.1", "status"), f"{self.name}: no rpc.statd")
             yield
 
     def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=30):
@@ -86,8 +94,9 @@ class Client:
         words = [f"vers={version}", "soft", "timeo=50", "retrans=1", "retry=0", "noac"] + [options] * bool(options)
         if version == "3" and options != "lock":
             words.append("nolock")
+        source = f"{bracketed(server)}:{path}"
         try:
-            self.run("mount", "-t", "nfs", "-o", ",".join(words), f"{server}:{path}", str(target), timeout=timeout)
+            self.run("mount", "-t", "nfs", "-o", ",".join(words), source, str(target), timeout=timeout)
         except ProgramFailed as failure:
             raise MountFailed(str(failure)) from None
         self._mounts.append(target)
@@ -134,5 +143,6 @@ class Client:
         run("ip", "link", "add", f"v{name}", "type", "veth", "peer", "name", "eth0", "netns", name)
         run("ip", "link", "set", f"v{name}", "master", "br0", "up")
         run("ip", "-n", name, "addr", "add", f"{self.address}/16", "dev", "eth0")
+        run("ip", "-n", name, "addr", "add", f"{self.address6}/64", "dev", "eth0", "nodad")
         run("ip", "-n", name, "link", "set", "eth0", "up")
         run("ip", "-n", name, "link", "set", "lo", "up")

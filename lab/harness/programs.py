@@ -1,7 +1,16 @@
-"""Programs of the box, and other people's eyes."""
+"""Programs of the box, and processes that run as another user."""
 
 import os
 import subprocess
+import time
+
+
+def wait_for(condition, what, limit=60):
+    """Waits until the condition holds; fails with `what` if it does not within `limit` seconds."""
+    deadline = time.monotonic() + limit
+    while not condition():
+        assert time.monotonic() < deadline, what
+        time.sleep(0.05)
 
 
 class ProgramFailed(Exception):

@@ -1,6 +1,5 @@
 """Fixed ports: rpcbind shows them, the firewall follows them, and locks work through them."""
 
-import contextlib
 import errno
 import fcntl
 import os
@@ -8,33 +7,16 @@ import socket
 
 import pytest
 
-from harness import api
-from harness.network import BOX_ADDRESS
+from harness import api, firewall
+from harness.firewall import reaches
 from harness.programs import run
-
-# An administrator's own rules: nothing comes in but what is asked for, and what the NFS service has marked.
-STRICT = """
-table inet administrator {
-  chain input {
-    type filter hook input priority filter; policy accept;
-    ct state established,related accept
-    iifname "br0" meta mark & 0x01000000 != 0 accept
-    iifname "br0" tcp dport { 111, 2049 } accept
-    iifname "br0" ip protocol { tcp, udp } reject
-  }
-}
-"""
-
 
 @pytest.fixture
 def strict_firewall(box):
-    """The box's own rules refuse all ports that nobody opens."""
+    """The box's own rules reject every port that nobody opens."""
     del box
-    with open("/tmp/strict.nft", "w", encoding="ascii") as rules:
-        rules.write(STRICT)
-    run("nft", "-f", "/tmp/strict.nft")
-    yield
-    run("nft", "delete", "table", "inet", "administrator")
+    with firewall.strict_firewall():
+        yield
 
 
 def lock(path):
@@ -70,7 +52,7 @@ def test_a_port_of_another_service_is_refused_and_nothing_changes(box):
             box.advanced(custom_port_enable=True, statd_port=32777, nlm_port=32803)
     assert refusal.value.code == 2303
     assert 32777 not in box.rpc_ports("status")
-    box.foresees("conflict|Request: ")
+    box.foresees(r"nfs statd port is conflict|^vornd: \S+ Request: ")
 
 
 def test_locks_of_nfsv3_work_through_a_strict_firewall(box, client, other, strict_firewall):
@@ -86,17 +68,6 @@ def test_locks_of_nfsv3_work_through_a_strict_firewall(box, client, other, stric
                 assert not is_locked(two / "file")
 
 
-def reaches(client, port):
-    """Whether the client gets through to a program that listens at this port of the box."""
-    with socket.socket() as program:
-        program.setsockopt(socket.SOL_SOCKET, socket.SO_REUSEADDR, 1)
-        with contextlib.suppress(OSError):  # one of the service's own daemons is there already
-            program.bind(("0.0.0.0", port))
-            program.listen()
-        probe = f"import socket; socket.create_connection(({BOX_ADDRESS!r}, {port}), 5)"
-        return client.succeeds("python3", "-S", "-c", probe)
-
-
 def test_the_firewall_opens_the_new_ports_and_closes_the_old_ones(box, client, strict_firewall):
     del strict_firewall
     box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
@@ -107,10 +78,11 @@ def test_the_firewall_opens_the_new_ports_and_closes_the_old_ones(box, client, s
     assert not reaches(client, 32765) and not reaches(client, 32803)
 
 
-def test_the_firewall_is_as_it_was_when_the_box_has_booted(box, client, strict_firewall):
+def test_the_firewall_returns_when_the_box_loads_its_own_rules_again(box, client, strict_firewall):
     del strict_firewall
     box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
-    run("nft", "delete", "table", "inet", "vorn")  # as after a boot
+    run("nft", "delete", "table", "inet", "vorn")  # as "flush ruleset" does
     assert not reaches(client, 32765)
-    run("systemctl", "restart", "vorn-firewall")
+    run("systemctl", "restart", "nftables")  # flushes all rules, the strict ones too
+    run("nft", "-f", firewall.STRICT_RULES)
     assert reaches(client, 32765)

@@ -1,7 +1,10 @@
-"""The power fails while rules and mappings are saved: after the next boot everything that was acknowledged is there.
+"""The power fails while rules and mappings are saved and a client holds a lock: after the next boot everything that was
+acknowledged is there, and the client is told to claim its lock again.
 
-lab/run boots the box twice for it: in the first boot it dies, in the second one the damage is looked at."""
+The disk is booted twice: in the first boot the power fails, in the second one the damage is looked at."""
 
+import contextlib
+import fcntl
 import os
 import pathlib
 import random
@@ -11,16 +14,21 @@ import time
 
 import pytest
 
-from harness import api
-from harness.programs import run
+from harness import api, notified_client
+from harness.programs import run, wait_for
 
-ACKNOWLEDGED = pathlib.Path("/lab/acknowledged")  # the host's, who keeps its power
+BOOTS = 2
+GUESTS = 3  # the moment of the failure is random
 
-pytestmark = pytest.mark.power_loss
+# These files are the host's, which keeps its power.
+ACKNOWLEDGED = pathlib.Path("/lab/acknowledged")
+DIES = pathlib.Path("/lab/dies")  # tells the host that the guest ends without a verdict
+
+held = contextlib.ExitStack()  # what lasts until the power fails
 
 
 def record(line):
-    """Where no power failure reaches it."""
+    """Writes a line where no power failure reaches it."""
     with open(ACKNOWLEDGED, "a", encoding="ascii") as file:
         file.write(f"{line}\n")
         file.flush()
@@ -28,6 +36,8 @@ def record(line):
 
 
 def recorded(what):
+    if not ACKNOWLEDGED.exists():
+        return []
     numbers = re.findall(rf"^{what} (\d+)$", ACKNOWLEDGED.read_text(encoding="ascii"), re.MULTILINE)
     return [int(number) for number in numbers]
 
@@ -49,30 +59,51 @@ def create_mappings():
         record(f"mapping {number}")
 
 
-def test_before(box, client):
-    """Ends with the box, at a moment of chance."""
-    seconds = random.uniform(1, 4)
-    record(f"the power fails after {seconds:.3f} s")
+def hold_lock(client):
+    """Takes a lock over NFSv3 that lasts until the power fails."""
+    held.enter_context(client.locking())
+    mounted = client.mount("/srv/good", version="3", options="lock")
+    file = held.enter_context(open(mounted / "locked", "w", encoding="ascii"))
+    fcntl.lockf(file, fcntl.LOCK_EX | fcntl.LOCK_NB)
+    assert list(pathlib.Path("/var/lib/nfs/sm").iterdir())  # the box knows whom it must notify
+
+
+@pytest.mark.boot(1)
+def test_the_power_fails_while_changes_are_acknowledged(box, client):
+    """Ends with the box, at a random moment between two acknowledgements."""
     box.share("good")
     box.share("data")
     box.allow("good", {"client": client.address})
+    notified_client.start_at_next_boot()
+    hold_lock(client)
     run("sync")
     for load in (lambda: save_rules(box), create_mappings):
         threading.Thread(target=load, daemon=True).start()
-    time.sleep(seconds)
-    # Off at once: nothing is synced, nothing is unmounted.
+    changes = random.randint(5, 40)
+    wait_for(lambda: len(recorded("rule")) >= changes and len(recorded("mapping")) >= 2, "no changes are acknowledged")
+    time.sleep(random.uniform(0, 0.3))  # anywhere in the next change
+    DIES.touch()
+    # Off in one step: nothing is synced, nothing is unmounted.
     pathlib.Path("/proc/sysrq-trigger").write_text("o", encoding="ascii")
     time.sleep(60)
+    pytest.fail("the power has not failed")
 
 
-def test_after(box, client):
-    """What is acknowledged is there, whole; and the box serves."""
+@pytest.mark.boot(2)
+def test_everything_acknowledged_is_there_after_the_boot(box, client):
+    assert len(recorded("rule")) >= 5 and len(recorded("mapping")) >= 2  # something was tried
     (rule,) = box.rules("data")
     _, _, high, low = rule["client"].split(".")
     assert recorded("rule")[-1] <= int(high) * 250 + int(low) - 1 <= recorded("try")[-1]
     mapped = {item["id"] for item in api.call("NFS.IDMap", "list")["idmap"]}
     assert {f"user{number}@LAB.TEST" for number in recorded("mapping")} <= mapped
-    assert client.mounts("/srv/good")
+    assert client.mounts("/srv/good")  # nobody started it but the boot
     box.allow("data")
     api.call("NFS.IDMap", "delete", id=sorted(mapped))
     assert list(pathlib.Path("/etc").glob(".*.vorn-*")) == []
+
+
+@pytest.mark.boot(2)
+def test_the_client_that_held_a_lock_is_notified():
+    """sm-notify(8) repeats its message until the client answers."""
+    wait_for(lambda: "SM_NOTIFY" in notified_client.received(), "the client was not notified", limit=100)

@@ -5,8 +5,10 @@ import os
 import pathlib
 import socket
 
-from harness import api, users
-from harness.programs import as_user, run
+import pytest
+
+from harness import api
+from harness.mounts import admits_by_box, make_team_folder, negotiated
 
 
 def test_an_export_is_mounted_while_the_service_is_on_and_not_while_it_is_off(box, client):
@@ -89,17 +91,6 @@ def test_the_domain_reaches_the_daemon_that_names_owners(box, client):
             assert f"root@{domain}".encode() in sent_while(lambda: client.mounts("/srv/data"))
 
 
-def negotiated(client, path, version):
-    """What the client got: its largest read and its largest write."""
-    with client.mounted(path, version=version) as target:
-        for line in pathlib.Path("/proc/mounts").read_text(encoding="ascii").splitlines():
-            words = line.split()
-            if words[1] == str(target):
-                options = dict(option.partition("=")[::2] for option in words[3].split(","))
-                return int(options["rsize"]), int(options["wsize"])
-    raise AssertionError(f"{target} is not mounted")
-
-
 def test_clients_get_the_configured_transfer_sizes_once_nfs_has_started_anew(box, client):
     box.share("data")
     box.allow("data", {"client": client.address})
@@ -113,27 +104,13 @@ def test_clients_get_the_configured_transfer_sizes_once_nfs_has_started_anew(box
     assert negotiated(client, "/srv/data", "3") == (32768, 32768)
 
 
-def may_enter(folder, user):
-    try:
-        as_user(user, lambda: os.listdir(folder))
-    except PermissionError:
-        return False
-    return True
-
-
+@pytest.mark.timeout(240)
 def test_the_unix_permission_switch_has_the_box_decide_who_is_in_a_group(box, client):
-    team = 3000
-    run("groupadd", "-g", str(team), "team")
-    run("usermod", "-a", "-G", "team", "alice")
     data = box.share("data")
     box.allow("data", {"client": client.address})
-    (data / "team").mkdir(mode=0o770)
-    os.chown(data / "team", 0, team)
-    alice = users.ALICE  # the box knows that she is in the team, her machine does not
-    bob = users.User("bob", users.BOB.uid, users.BOB.gid, (team,))  # his machine says so, the box does not
+    make_team_folder(data)
     for box_decides in (True, False):
         box.nfs(unix_pri_enable=box_decides)
         box.restart()
         with client.mounted("/srv/data") as mounted:
-            assert may_enter(mounted / "team", alice) == box_decides
-            assert may_enter(mounted / "team", bob) != box_decides
+            assert admits_by_box(mounted) == box_decides

@@ -1,0 +1,95 @@
+"""Breaks the product on purpose, one promise at a time, and checks that the story that guards the promise fails."""
+
+import argparse
+import concurrent.futures
+import os
+import shutil
+import subprocess
+import sys
+
+from host import guest, report, stories
+from host.breaks import BREAKS
+from host.cache import PROJECT
+from host.log import LabError, say, show
+from host.main import prepare
+from host.process import build, output_of
+
+_WORK = PROJECT / "build/break"
+
+
+def broken_package(item):
+    """Builds the package from sources with the break's edit. Raises LabError where the edit changes nothing."""
+    text, expression = item.source
+    tree = _WORK / item.name
+    shutil.rmtree(tree, ignore_errors=True)
+    for name in output_of("git", "ls-files", cwd=PROJECT).splitlines():
+        (tree / name).parent.mkdir(parents=True, exist_ok=True)
+        shutil.copy(PROJECT / name, tree / name)
+    changed = False
+    for path in tree.glob("linux/**/*.cpp"):
+        before = path.read_text(encoding="utf-8")
+        if text in before:
+            subprocess.run(["sed", "-i", expression, str(path)], check=True)
+            changed |= path.read_text(encoding="utf-8") != before
+    if not changed:
+        raise LabError(f"{item.name}: no source has the text that is to be edited")
+    build([str(tree / "packaging/build")], _WORK / f"{item.name}.log")
+    return next((tree / "build/package").glob("vorn-nfs_[0-9]*.deb"))
+
+
+def run_break(item, make_guest):
+    """The stories that failed with the break, or None where the guest could not be judged."""
+    package = broken_package(item) if item.source else None
+    (story,) = stories.find([item.story])
+
+    def make(name):
+        made = make_guest(name, package=package)
+        shutil.copytree(PROJECT / "lab/breaks", made.share / "breaks")
+        shutil.copy(_WORK / "preload.so", made.share / "breaks")
+        (made.share / "break").write_text(f"{item.script}\n", encoding="utf-8")
+        return made
+
+    job = stories.Job(f"break-{item.name}", [story], story.boots)
+    guest.tell(job, ["-k", item.select] if item.select else [], make, quiet=True)
+    return report.failed(job)
+
+
+def table(results):
+    rows = [f"{'break':22} {'promise':44} noticed by"]
+    for item, failed in results:
+        rows.append(f"{item.name:22} {item.promise:44} {', '.join(failed) or 'NOBODY'}")
+    return "\n".join(rows) + "\n"
+
+
+def chosen_breaks(names):
+    known = {item.name: item for item in BREAKS}
+    for name in names:
+        if name not in known:
+            raise LabError(f"there is no break \"{name}\"; there are: {' '.join(known)}", status=2)
+    return [known[name] for name in names] or BREAKS
+
+
+def main():
+    parser = argparse.ArgumentParser(prog="lab/break", description=__doc__)
+    parser.add_argument("breaks", nargs="*", metavar="BREAK", help="names in lab/host/breaks.py; default: all")
+    parser.add_argument("--jobs", type=int, default=os.cpu_count(), help="guests at a time; default: one per core")
+    options = parser.parse_args()
+    try:
+        guest.end_on_signals()
+        items = chosen_breaks(options.breaks)
+        for folder in (guest.WORK, _WORK):
+            folder.mkdir(parents=True, exist_ok=True)
+        make_guest = prepare("uml")
+        library = ["gcc", "-shared", "-fPIC", "-o", str(_WORK / "preload.so"), str(PROJECT / "lab/breaks/preload.c")]
+        build([*library, "-ldl"], _WORK / "preload.log")
+        with concurrent.futures.ThreadPoolExecutor(options.jobs) as pool:
+            failed = list(pool.map(lambda item: run_break(item, make_guest), items))
+    except LabError as error:
+        say(error)
+        return error.status
+    show(table(zip(items, failed)))
+    return 0 if all(failed) else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main())

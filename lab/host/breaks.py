@@ -1,0 +1,70 @@
+"""The deliberate breaks: each takes one promise of docs/reliability.md away and names the story that must notice."""
+
+import dataclasses
+
+_RELOAD = "systemctl daemon-reload; systemctl restart vornd"
+_SCRIPT = "/usr/vorn/etc/rc.sysv/S83nfsd.sh"
+
+
+def _preload(what):
+    """vornd with one property taken away by lab/breaks/preload.c."""
+    return (f"cp /lab/breaks/preload.so /usr/lib/; mkdir -p /etc/systemd/system/vornd.service.d; "
+            f"printf '[Service]\\nEnvironment=LD_PRELOAD=/usr/lib/preload.so BREAK={what}\\n' "
+            f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}")
+
+
+def _package(edit):
+    """The package with an edited control file; `edit` runs in its DEBIAN folder."""
+    return (f"dpkg-deb -R /lab/package.deb /tmp/broken; (cd /tmp/broken/DEBIAN; {edit}); "
+            "dpkg-deb -Znone -b /tmp/broken /lab/package.deb; dpkg --install /lab/package.deb")
+
+
+@dataclasses.dataclass(frozen=True)
+class Break:
+    """A break of the installed product: a shell script for the guest, or an edit (sed) of each source file that has
+    a text."""
+
+    name: str
+    promise: str
+    story: str
+    script: str = ""
+    source: tuple = ()  # (text that the file has, sed expression)
+    select: str = ""  # pytest's -k
+
+
+BREAKS = [
+    Break("no-sync", "nothing acknowledged is lost", "power_loss", _preload("sync")),
+    Break("temporary-files", "no temporary file outlives the next change", "faults", _preload("temporary"),
+          select="killed"),
+    Break("disk-full-ignored", "a full disk is an error, not a loss", "faults", _preload("full"), select="full"),
+    Break("job-result-ignored", "a service that does not start is an error", "faults",
+          source=('*outcome == "done"', 's/\\*outcome == "done" || \\*outcome == "skipped"/true/'),
+          select="does_not_start"),
+    Break("clients-unchecked", "no text is smuggled into a file", "hostile_rules",
+          source=("CheckExportClient(client)", "s/: CheckExportClient(client);/: Status();/")),
+    Break("stall-at-each-save", "clients are not interrupted by a save", "save_under_load",
+          "systemd-run --quiet --unit=freeze /usr/bin/python3 /lab/breaks/freeze"),
+    Break("restart-at-each-save", "clients are not interrupted by a save", "save_under_load",
+          "mkdir -p /etc/systemd/system/nfs-server.service.d; printf '[Service]\\nExecReload=\\nExecReload=/bin/sh -c "
+          "\"systemctl --no-block restart nfs-server\"\\n' >/etc/systemd/system/nfs-server.service.d/break.conf; "
+          "systemctl daemon-reload"),
+    Break("rights-stay", "a withdrawn right ends at once", "withdrawn_rights",
+          "mv /usr/sbin/exportfs /usr/sbin/exportfs.real; printf '#!/bin/sh\\n[ \"$1\" != -r ] || set -- -a\\n"
+          "exec exportfs.real \"$@\"\\n' >/usr/sbin/exportfs; chmod 755 /usr/sbin/exportfs",
+          select="without_a_rule"),
+    Break("firewall-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vorn-firewall"),
+    Break("server-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vornd"),
+    Break("clients-not-notified", "clients reclaim their locks after a boot", "reboot",
+          "systemctl mask rpc-statd-notify"),
+    Break("firewall-not-loaded", "the firewall follows the ports", "ports", _preload("firewall"), select="firewall"),
+    Break("id-map-not-reloaded", "a changed mapping is in force at once", "kerberos",
+          f"sed -i 's/^\\treload_idmap$/\\texit 0/' {_SCRIPT}", select="id_map"),
+    Break("sizes-not-applied", "settings reach the clients", "service",
+          f"sed -i 's/^\\ttransfer_sizes$/\\texit 0/' {_SCRIPT}", select="sizes"),
+    Break("purge-takes-all", "a purge keeps what is the administrator's", "package",
+          _package("sed -i 's,^  remove_imported_keytab$,  rm -rf /etc/nfs /etc/vorn,' postrm"), select="purge"),
+    Break("purge-takes-nothing", "a purge leaves nothing of ours", "package",
+          _package("printf '#!/bin/sh\\n' >postrm"), select="purge"),
+    Break("upgrade-restarts-nfs", "an upgrade leaves NFS alone", "package",
+          _package("sed -i '$i systemctl restart nfs-server || true' postinst"), select="upgrade"),
+]

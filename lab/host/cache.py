@@ -1,0 +1,102 @@
+"""Kernels and disks, kept in $VORN_LAB_CACHE by a digest of what they are made from."""
+
+import contextlib
+import fcntl
+import hashlib
+import os
+import pathlib
+import shutil
+import tempfile
+import time
+
+from host import process
+from host.log import say
+from host.process import output_of
+
+PROJECT = pathlib.Path(__file__).resolve().parents[2]
+
+
+def _folder():
+    caches = os.environ.get("XDG_CACHE_HOME") or os.path.expanduser("~/.cache")
+    return pathlib.Path(os.environ.get("VORN_LAB_CACHE") or f"{caches}/vorn-lab")
+
+
+def digest(text, files):
+    """A digest of a string and of the contents of these files."""
+    result = hashlib.sha256(text.encode())
+    for file in files:
+        result.update(pathlib.Path(file).read_bytes())
+    return result.hexdigest()[:16]
+
+
+@contextlib.contextmanager
+def _locked(file, how):
+    with open(file, "a", encoding="ascii") as lock:
+        fcntl.flock(lock, how)
+        yield
+
+
+_used = []  # locks of folders that this process uses; held until it ends
+
+
+class Cache:
+    """Filled folders. What this run uses is not removed by another run."""
+
+    def __init__(self, logs):
+        self._folder = _folder()
+        self._folder.mkdir(parents=True, exist_ok=True)
+        self._logs = logs
+
+    def get(self, name, key, program):
+        """The folder that `program` filled for this key, now or earlier. Of each name only the newest is kept."""
+        with _locked(self._folder / "lock", fcntl.LOCK_EX):
+            folder = self._folder / f"{name}-{key}"
+            if not folder.is_dir():
+                self._remove_old(name)
+                self._build(name, folder, program)
+            self._use(folder)
+        return folder
+
+    def _build(self, name, folder, program):
+        say(f"building the {name}")
+        fresh = pathlib.Path(tempfile.mkdtemp(prefix="new.", dir=self._folder))
+        try:
+            fresh.chmod(0o755)
+            process.build([str(program), str(fresh)], self._logs / f"{name}.log")
+            fresh.rename(folder)
+        finally:
+            shutil.rmtree(fresh, ignore_errors=True)
+
+    @staticmethod
+    def _use(folder):
+        lock = open(f"{folder}.lock", "a", encoding="ascii")  # pylint: disable=consider-using-with
+        fcntl.flock(lock, fcntl.LOCK_SH)
+        _used.append(lock)
+
+    def _remove_old(self, name):
+        """Folders of the same name, and what a killed build left, unless another run uses them."""
+        for folder in [*self._folder.glob(f"{name}-????????????????"), *self._folder.glob("new.*")]:
+            with open(f"{folder}.lock", "a", encoding="ascii") as lock, contextlib.suppress(BlockingIOError):
+                fcntl.flock(lock, fcntl.LOCK_EX | fcntl.LOCK_NB)
+                shutil.rmtree(folder, ignore_errors=True)
+                os.unlink(lock.name)
+
+
+def _candidate(package):
+    """The newest version of a package in the configured archives."""
+    for line in output_of("apt-cache", "policy", package).splitlines():
+        if line.strip().startswith("Candidate:"):
+            return line.split()[-1]
+    return "none"
+
+
+def kernel(cache, machine):
+    """The folder with the kernel for this kind of machine ("uml" or "vm")."""
+    program = PROJECT / "lab" / machine / "kernel"
+    return cache.get(f"kernel-{machine}", digest(_candidate("user-mode-linux"), [program]), program)
+
+
+def disk(cache):
+    """The guest's disk image, made anew each month."""
+    files = sorted((PROJECT / "lab/guest").iterdir())
+    return cache.get("disk", digest(time.strftime("%Y-%m"), files), PROJECT / "lab/guest/disk") / "disk.img"

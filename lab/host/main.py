@@ -1,0 +1,110 @@
+"""Boots virtual boxes, installs the package of this checkout in them, and runs the stories of lab/stories/ there."""
+
+import argparse
+import concurrent.futures
+import os
+import sys
+import time
+
+from host import cache, guest, report, stories
+from host.cache import PROJECT
+from host.log import LabError, say, show
+from host.process import build, output_of
+
+_DAY = "86400"
+_EPILOG = """Installs the packages that are missing, and builds what is missing of the kernel, the guest's disk and
+the product. Results and journals are then in build/lab/GUEST/. Kernels and disks are kept in $VORN_LAB_CACHE
+(~/.cache/vorn-lab). A guest has $LIMIT (900) seconds. Arguments after "--" are pytest's."""
+
+
+def parse(arguments):
+    """The options, and pytest's arguments as `pytest`."""
+    split = arguments.index("--") if "--" in arguments else len(arguments)
+    parser = argparse.ArgumentParser(prog="lab/run", description=__doc__, epilog=_EPILOG)
+    parser.add_argument("stories", nargs="*", metavar="STORY", help="names of files in lab/stories; default: all")
+    parser.add_argument("--vm", action="store_true", help="stock kernel in QEMU: slower, but nothing is compiled")
+    parser.add_argument("--shell", action="store_true", help="a signed-in console on a running box")
+    parser.add_argument("--open", action="store_true", help="the box's web API at 127.0.0.1, port $PORT (8080)")
+    parser.add_argument("--jobs", type=int, default=os.cpu_count(), help="guests at a time; default: one per core")
+    parser.add_argument("--budget", type=float, metavar="MINUTES",
+                        help="run as many stories as fit; --turn chooses which, and all turns together run every story")
+    parser.add_argument("--turn", type=int, help="default: the number of commits")
+    parser.add_argument("--record", action="store_true", help="write the measured times to lab/times")
+    chosen = parser.parse_args(arguments[:split])
+    chosen.pytest = arguments[split + 1:]
+    chosen.machine = "vm" if chosen.vm else "uml"
+    return chosen
+
+
+def select(options):
+    """The stories of this run."""
+    chosen = stories.find(options.stories)
+    if options.budget is None:
+        return chosen
+    turn = options.turn if options.turn is not None else int(output_of("git", "rev-list", "--count", "HEAD",
+                                                                       cwd=PROJECT))
+    chosen, turns = stories.share_of(chosen, options.budget * 60 * options.jobs, turn)
+    say(f"turn {turn % turns + 1} of {turns}: {' '.join(story.name for story in chosen)}")
+    return chosen
+
+
+def prepare(machine):
+    """Builds what is missing; a function that makes a guest of this name."""
+    build([str(PROJECT / "scripts/setup"), "lab", f"lab_{machine}"], guest.WORK / "setup.log")
+    say("packing the product")
+    build([str(PROJECT / "packaging/build")], guest.WORK / "package.log")
+    kept = cache.Cache(guest.WORK)
+    kernel, disk = cache.kernel(kept, machine), cache.disk(kept)
+    return lambda name, **options: guest.Guest(name, machine, kernel, disk, **options)
+
+
+def run_stories(chosen, options, make_guest):
+    """The exit status of the worst guest; 5 where pytest's arguments select no story at all."""
+    begun = time.monotonic()
+    jobs = stories.plan(chosen, options.jobs)
+    pool = concurrent.futures.ThreadPoolExecutor(options.jobs)
+    try:
+        verdicts = list(pool.map(lambda job: guest.tell(job, options.pytest, make_guest), jobs))
+    finally:
+        pool.shutdown(cancel_futures=True)
+    show("\n" + report.table(jobs))
+    say(f"{len(jobs)} guests took {time.monotonic() - begun:.0f} s")
+    if options.record:
+        stories.record_times(report.seconds(jobs))
+    failures = [verdict for verdict in verdicts if verdict not in (0, guest.NO_STORY)]
+    if failures:
+        return failures[0]
+    if min(verdicts) == guest.NO_STORY:
+        say("no story was selected")
+    return min(verdicts)
+
+
+def look(options, make_guest):
+    """Boots a box to look at; the status of its kernel."""
+    if options.shell:
+        return make_guest("shell").boot(["shell"], {"CONSOLE": "fd:0,fd:1", "LIMIT": _DAY})
+    port = os.environ.get("PORT", "8080")
+    box = make_guest("open")
+    (box.share / "port").write_text(f"{port}\n", encoding="ascii")
+    return box.boot(["serve"], {"PORT": port, "LIMIT": _DAY})
+
+
+def main():
+    options = parse(sys.argv[1:])
+    try:
+        guest.end_on_signals()
+        chosen = select(options)  # a misspelt name is reported before anything is built
+        guest.WORK.mkdir(parents=True, exist_ok=True)
+        make_guest = prepare(options.machine)
+        if options.open and not options.vm:
+            build([str(PROJECT / "scripts/setup"), "lab_open"], guest.WORK / "setup.log")
+        if options.shell or options.open:
+            return look(options, make_guest)
+        return run_stories(chosen, options, make_guest)
+    except LabError as error:
+        say(error)
+        return error.status
+
+
+if __name__ == "__main__":
+    sys.exit(main())

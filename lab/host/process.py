@@ -1,0 +1,44 @@
+"""Child processes that never outlive the lab."""
+
+import ctypes
+import os
+import signal
+import subprocess
+
+from host.log import LabError
+
+_PR_SET_PDEATHSIG = 1
+_libc = ctypes.CDLL(None)
+
+
+def _end_with_parent():
+    """prctl(2): the child gets SIGTERM when the thread that started it ends, for whatever reason."""
+    _libc.prctl(_PR_SET_PDEATHSIG, signal.SIGTERM)
+
+
+def start(command, **options):
+    """Popen; the child cleans up after itself when it gets SIGTERM."""
+    return subprocess.Popen(command, preexec_fn=_end_with_parent, **options)
+
+
+def build(command, log, **options):
+    """Runs a build step with its output in a log file. Raises LabError with the log's end."""
+    with open(log, "w", encoding="utf-8") as output:
+        child = start(command, stdin=subprocess.DEVNULL, stdout=output, stderr=subprocess.STDOUT, **options)
+        try:
+            status = child.wait()
+        except BaseException:
+            child.terminate()
+            child.wait()
+            raise
+    if status != 0:
+        lines = log.read_text(encoding="utf-8", errors="replace").splitlines()
+        raise LabError("\n".join([*lines[-20:], f"{os.path.basename(command[0])} failed: see {log}"]))
+
+
+def output_of(*command, cwd=None):
+    """What the program printed. Raises LabError."""
+    done = subprocess.run(command, capture_output=True, text=True, check=False, cwd=cwd)
+    if done.returncode != 0:
+        raise LabError(f"{' '.join(command)}: {done.stderr.strip()}")
+    return done.stdout

@@ -7,7 +7,7 @@ import pathlib
 import pytest
 
 from harness import api, kerberos, users
-from harness.programs import as_user
+from harness.programs import as_user, wait_for
 
 FLAVOURS = {"sys": "sys", "krb5": "kerberos", "krb5i": "kerberos_integrity", "krb5p": "kerberos_privacy"}
 
@@ -91,3 +91,27 @@ def test_the_id_map_decides_who_owns_a_file_and_changes_without_a_restart(box, k
         assert owner_of_a_new_file(mounted, "changed", users.CAROL) == users.ADMIN.uid
         api.call("NFS.IDMap", "delete", id=principal)
         assert owner_of_a_new_file(mounted, "deleted", users.CAROL) == users.ALICE.uid
+
+
+def test_a_keytab_that_is_replaced_while_mounted_serves_who_signs_in_anew(box, kerberos_client, keytab):
+    """New keys take away the tickets that were made for the old ones: until a user has new tickets, access fails."""
+    box.share("data")
+    import_keytab(keytab)
+    box.allow("data", rule(kerberos_client, "krb5"))
+    kerberos.sign_in(users.ALICE, "alice")
+    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options="sec=krb5") as mounted:
+        assert owner_of_a_new_file(mounted, "before", users.ALICE) == users.ALICE.uid
+        import_keytab(kerberos.keytab(f"nfs/{kerberos.SERVER}"))
+        kerberos.sign_out(users.ALICE)
+        kerberos.sign_in(users.ALICE, "alice")
+        wait_for(lambda: may_create(mounted, users.ALICE), "a user with a new ticket is not let in")
+    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options="sec=krb5") as mounted:
+        assert owner_of_a_new_file(mounted, "again", users.ALICE) == users.ALICE.uid
+
+
+def may_create(mounted, user):
+    try:
+        as_user(user, lambda: (mounted / "after").touch())
+    except OSError:
+        return False
+    return True

@@ -9,7 +9,7 @@ _SOCKET = "/run/vorn/vornd.sock"
 
 
 _READING = ("/get", "/list", "/load")
-_READING_LIMIT, _CHANGING_LIMIT = 15, 60  # seconds; generous, because a guest may share its cores
+_READING_LIMIT, _CHANGING_LIMIT = 30, 150  # seconds; generous, because a guest may share its cores
 
 _seconds = {}  # path of a method to the longest time that an answer took
 
@@ -26,7 +26,7 @@ class Refused(Exception):
 class _Connection(http.client.HTTPConnection):
     def connect(self):
         self.sock = socket.socket(socket.AF_UNIX)
-        self.sock.settimeout(60)
+        self.sock.settimeout(300)
         self.sock.connect(_SOCKET)
 
 

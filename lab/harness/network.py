@@ -84,14 +84,14 @@ class Client:
             wait_for(lambda: self.succeeds("rpcinfo", "-T", "tcp", "127.0.0.1", "status"), f"{self.name}: no rpc.statd")
             yield
 
-    def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=30):
+    def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=120):
         """Where the exported folder is now mounted. Raises MountFailed.
 
         Soft, so that a story that goes wrong ends. An NFSv3 mount does not lock unless it is told to: the lock
         managers of all machines are the one of this kernel, and a client's takes the box's out of rpcbind."""
         target = pathlib.Path(f"{self._folder}-{len(self._mounts)}")
         target.mkdir(exist_ok=True)
-        words = [f"vers={version}", "soft", "timeo=50", "retrans=1", "retry=0", "noac"] + [options] * bool(options)
+        words = [f"vers={version}", "soft", "timeo=150", "retrans=2", "retry=0", "noac"] + [options] * bool(options)
         if version == "3" and options != "lock":
             words.append("nolock")
         source = f"{bracketed(server)}:{path}"

@@ -5,7 +5,7 @@ import subprocess
 import time
 
 
-def wait_for(condition, what, limit=60):
+def wait_for(condition, what, limit=180):
     """Waits until the condition holds; fails with `what` if it does not within `limit` seconds."""
     deadline = time.monotonic() + limit
     while not condition():
@@ -17,7 +17,7 @@ class ProgramFailed(Exception):
     """A program that did not do what it was asked to, and what it said."""
 
 
-def run(*command, user=None, timeout=60, before=None):
+def run(*command, user=None, timeout=300, before=None):
     """What the program printed. `before` runs in the child, where it may change its world."""
 
     def prepare():

@@ -1,5 +1,6 @@
 """One guest: its folder, its boots, its results."""
 
+import fcntl
 import os
 import pathlib
 import shutil
@@ -37,7 +38,17 @@ class Guest:
         self.share = self.folder / "share"
         self._boot = PROJECT / "lab" / machine / "boot"
         self._inputs = [str(kernel), str(image), str(self.share), str(self.folder / "disk")]
+        self._claim()
         self._fill(package or next((PROJECT / "build/package").glob("vorn-nfs_[0-9]*.deb")))
+
+    def _claim(self):
+        """Another run of this checkout may use a guest of the same name."""
+        WORK.mkdir(parents=True, exist_ok=True)
+        self._lock = open(f"{self.folder}.lock", "w", encoding="ascii")  # pylint: disable=consider-using-with
+        try:
+            fcntl.flock(self._lock, fcntl.LOCK_EX | fcntl.LOCK_NB)
+        except BlockingIOError:
+            raise LabError(f"another run of this checkout has a guest \"{self.folder.name}\"") from None
 
     def _fill(self, package):
         shutil.rmtree(self.folder, ignore_errors=True)
@@ -80,7 +91,7 @@ class Guest:
         if said:
             return int(said)
         if status == _TIME_LIMIT:
-            raise LabError(f"the guest had not ended after {os.environ.get('LIMIT', '900')} seconds")
+            raise LabError(f"the guest had not ended after {os.environ.get('LIMIT', '3600')} seconds")
         raise LabError(f"the guest died without a verdict (its kernel's status: {status})")
 
     def keep_results(self, boot):

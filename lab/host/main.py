@@ -14,7 +14,7 @@ from host.process import build, output_of
 _DAY = "86400"
 _EPILOG = """Installs the packages that are missing, and builds what is missing of the kernel, the guest's disk and
 the product. Results and journals are then in build/lab/GUEST/. Kernels and disks are kept in $VORN_LAB_CACHE
-(~/.cache/vorn-lab). A guest has $LIMIT (900) seconds. Arguments after "--" are pytest's."""
+(~/.cache/vorn-lab). A guest has $LIMIT (3600) seconds. Arguments after "--" are pytest's."""
 
 
 def parse(arguments):

@@ -23,7 +23,6 @@ def test_the_transfer_sizes_reach_the_clients(box, client):
     assert api.call("NFS.AdvancedSetting", "get")["write_size"] == 65536
 
 
-@pytest.mark.timeout(240)
 def test_the_unix_permission_switch_is_the_one_of_the_service(box, client):
     data = box.share("data")
     box.allow("data", {"client": client.address})

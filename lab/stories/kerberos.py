@@ -44,7 +44,6 @@ def test_an_imported_keytab_opens_kerberos_mounts_at_once(box, kerberos_client, 
     assert {entry["kerberos_principal"] for entry in entries} == {settings["kerberos_principal"]}
 
 
-@pytest.mark.timeout(300)
 def test_a_rule_opens_the_flavours_that_it_names_and_no_others(box, kerberos_client, keytab):
     box.share("data")
     import_keytab(keytab)

@@ -106,4 +106,4 @@ def test_everything_acknowledged_is_there_after_the_boot(box, client):
 @pytest.mark.boot(2)
 def test_the_client_that_held_a_lock_is_notified():
     """sm-notify(8) repeats its message until the client answers."""
-    wait_for(lambda: "SM_NOTIFY" in notified_client.received(), "the client was not notified", limit=100)
+    wait_for(lambda: "SM_NOTIFY" in notified_client.received(), "the client was not notified")

@@ -37,7 +37,7 @@ def many_shares(box):
     run("exportfs", "-r", timeout=120)
 
 
-@pytest.mark.timeout(600)
+@pytest.mark.timeout(1800)
 @pytest.mark.pending("every save runs exportfs -r over the whole table")
 def test_a_save_among_thousands_of_shares_is_as_quick_as_among_few(box, client, other, request):
     box.share("data")
@@ -51,7 +51,7 @@ def test_a_save_among_thousands_of_shares_is_as_quick_as_among_few(box, client, 
     assert other is not client and among_many < 1 + 2 * among_few
 
 
-@pytest.mark.timeout(600)
+@pytest.mark.timeout(1800)
 @pytest.mark.pending("many mappings exceed the start limit of nfs-idmapd")
 def test_ten_thousand_mappings_are_created_and_in_force(box):
     del box

@@ -5,8 +5,6 @@ import os
 import pathlib
 import socket
 
-import pytest
-
 from harness import api
 from harness.mounts import admits_by_box, make_team_folder, negotiated
 
@@ -104,7 +102,6 @@ def test_clients_get_the_configured_transfer_sizes_once_nfs_has_started_anew(box
     assert negotiated(client, "/srv/data", "3") == (32768, 32768)
 
 
-@pytest.mark.timeout(240)
 def test_the_unix_permission_switch_has_the_box_decide_who_is_in_a_group(box, client):
     data = box.share("data")
     box.allow("data", {"client": client.address})

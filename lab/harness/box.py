@@ -117,7 +117,7 @@ class Box:
         if any(path in SERVICE_FILES for path in changed) or not succeeds("systemctl", "-q", "is-active", "nfs-server"):
             run("systemctl", "daemon-reload")
             run("systemctl", "reset-failed")
-            run("systemctl", "stop", "rpc-statd")
+            run("systemctl", "try-restart", "rpc-statd")
             run("systemctl", "restart", "nfs-server")
         elif changed:
             run("exportfs", "-ra")

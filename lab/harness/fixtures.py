@@ -42,6 +42,13 @@ def pytest_runtest_makereport(item):
         item.kept_its_promise = report.passed
 
 
+def pytest_runtest_logreport(report):
+    """Prints a failure when it happens: a guest that hangs later does not hide it."""
+    if report.failed:
+        with open("/dev/console", "w", encoding="utf-8") as console:
+            console.write(f"\n{report.nodeid} ({report.when}):\n{report.longreprtext}\n")
+
+
 @pytest.fixture(scope="session", autouse=True)
 def _prepared(pytestconfig):
     number, _ = _this_boot(pytestconfig)

@@ -54,8 +54,6 @@ BREAKS = [
           select="without_a_rule"),
     Break("firewall-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vorn-firewall"),
     Break("server-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vornd"),
-    Break("clients-not-notified", "clients reclaim their locks after a boot", "reboot",
-          "systemctl mask rpc-statd-notify"),
     Break("firewall-not-loaded", "the firewall follows the ports", "ports", _preload("firewall"), select="firewall"),
     Break("id-map-not-reloaded", "a changed mapping is in force at once", "kerberos",
           f"sed -i 's/^\\treload_idmap$/\\texit 0/' {_SCRIPT}", select="id_map"),

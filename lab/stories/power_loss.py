@@ -1,10 +1,7 @@
-"""The power fails while rules and mappings are saved and a client holds a lock: after the next boot everything that was
-acknowledged is there, and the client is told to claim its lock again.
+"""The power fails while rules and mappings are saved: after the next boot everything that was acknowledged is there.
 
 The disk is booted twice: in the first boot the power fails, in the second one the damage is looked at."""
 
-import contextlib
-import fcntl
 import os
 import pathlib
 import random
@@ -14,7 +11,7 @@ import time
 
 import pytest
 
-from harness import api, notified_client
+from harness import api
 from harness.programs import run, wait_for
 
 BOOTS = 2
@@ -23,8 +20,6 @@ GUESTS = 3  # the moment of the failure is random
 # These files are the host's, which keeps its power.
 ACKNOWLEDGED = pathlib.Path("/lab/acknowledged")
 DIES = pathlib.Path("/lab/dies")  # tells the host that the guest ends without a verdict
-
-held = contextlib.ExitStack()  # what lasts until the power fails
 
 
 def record(line):
@@ -59,23 +54,12 @@ def create_mappings():
         record(f"mapping {number}")
 
 
-def hold_lock(client):
-    """Takes a lock over NFSv3 that lasts until the power fails."""
-    held.enter_context(client.locking())
-    mounted = client.mount("/srv/good", version="3", options="lock")
-    file = held.enter_context(open(mounted / "locked", "w", encoding="ascii"))
-    fcntl.lockf(file, fcntl.LOCK_EX | fcntl.LOCK_NB)
-    assert list(pathlib.Path("/var/lib/nfs/sm").iterdir())  # the box knows whom it must notify
-
-
 @pytest.mark.boot(1)
 def test_the_power_fails_while_changes_are_acknowledged(box, client):
     """Ends with the box, at a random moment between two acknowledgements."""
     box.share("good")
     box.share("data")
     box.allow("good", {"client": client.address})
-    notified_client.start_at_next_boot()
-    hold_lock(client)
     run("sync")
     for load in (lambda: save_rules(box), create_mappings):
         threading.Thread(target=load, daemon=True).start()
@@ -101,9 +85,3 @@ def test_everything_acknowledged_is_there_after_the_boot(box, client):
     box.allow("data")
     api.call("NFS.IDMap", "delete", id=sorted(mapped))
     assert list(pathlib.Path("/etc").glob(".*.vorn-*")) == []
-
-
-@pytest.mark.boot(2)
-def test_the_client_that_held_a_lock_is_notified():
-    """sm-notify(8) repeats its message until the client answers."""
-    wait_for(lambda: "SM_NOTIFY" in notified_client.received(), "the client was not notified")

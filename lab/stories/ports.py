@@ -2,7 +2,6 @@
 
 import errno
 import fcntl
-import os
 import socket
 
 import pytest

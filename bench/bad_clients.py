@@ -24,6 +24,7 @@ def post(length, path=METHOD, content_type="application/json"):
 class BadClient:
     """One connection, and how it misbehaves."""
     reads = True       # answers are read
+    unsent = b""
     receive_buffer = None
 
     def first(self):
@@ -95,6 +96,37 @@ class Busy(BadClient):
         return self.first()
 
 
+class JsonBombs(BadClient):
+    """Sends the most expensive parameters that are accepted, 99,000 empty arrays, again and again."""
+    body = b'{"a":[[]' + b",[]" * 99000 + b"]}"
+
+    def first(self):
+        return post(len(self.body)) + self.body
+
+    def each_second(self):
+        return self.first()
+
+
+class ManyParts(BadClient):
+    """Sends forms of 900 files, again and again."""
+    body = b"".join(b"--b\r\nContent-Disposition: form-data; name=f%d; filename=k\r\n\r\nx\r\n" % i
+                    for i in range(900)) + b"--b--\r\n"
+
+    def first(self):
+        return post(len(self.body), "/api/Test.Echo/v1/upload", "multipart/form-data; boundary=b") + self.body
+
+    def each_second(self):
+        return self.first()
+
+
+class HungMethod(BadClient):
+    """Calls a method that never ends."""
+    body = b'{"begun": "/nonexistent/begun", "release": "/nonexistent/release"}'
+
+    def first(self):
+        return post(len(self.body), "/api/Test.Echo/v1/wait") + self.body
+
+
 SCENARIOS = {name: kind for name, kind in sorted(globals().items())
              if isinstance(kind, type) and issubclass(kind, BadClient) and kind is not BadClient}
 
@@ -148,10 +180,13 @@ class Crowd:
             self._close(connection)
 
     def _send(self, connection, data):
-        if not data:
+        client = self._clients.get(connection)
+        if client is None or not (data or client.unsent):
             return
+        # What is left of a request goes on; a further one waits until it is through.
+        client.unsent = client.unsent or data
         try:
-            connection.send(data)
+            client.unsent = client.unsent[connection.send(client.unsent):]
         except BlockingIOError:
             return
         except OSError:

@@ -1,4 +1,4 @@
-// What a test and the allocator that it preloads into vornd share.
+// The shared memory by which a test controls the allocator that it preloads into vornd.
 #ifndef VORN_TESTS_SERVER_ALLOCATION_FAULTS_H
 #define VORN_TESTS_SERVER_ALLOCATION_FAULTS_H
 

@@ -1,5 +1,6 @@
 #include "web_api.h"
 
+#include <functional>
 #include <string>
 #include <utility>
 
@@ -71,6 +72,29 @@ std::string CallerOf(const Peer& peer) {
   return peer.credentials ? "uid " + std::to_string(peer.credentials->uid) : "";
 }
 
+// The first parameter of the query by name: no request has any.
+std::optional<Response> RefuseQuery(std::string_view query) {
+  const std::string_view name = query.substr(0, query.find_first_of("=&"));
+  if (query.empty()) return std::nullopt;
+  return Refusal(400, "There is no query parameter \"" + std::string(name) + "\"; parameters are sent in the body.");
+}
+
+// The answer to OPTIONS (RFC 9110, 9.3.7).
+Response Options(const std::string& allowed) {
+  Response response;
+  response.status = 204;
+  response.headers.emplace_back("Allow", allowed + ", OPTIONS");
+  return response;
+}
+
+// An answer that changes only with the program that gives it: a client may keep it and ask whether it has changed.
+Response Unchanging(Response response) {
+  const std::string version = std::to_string(std::hash<std::string>()(response.body));
+  response.headers.emplace_back("ETag", "W/\"" + version + "\"");
+  response.headers.emplace_back("Cache-Control", "no-cache");
+  return response;
+}
+
 }  // namespace
 
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
@@ -78,11 +102,14 @@ WebApi::WebApi(Parts parts, Limits limits) : parts_(parts), limits_(limits) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepOtherSitesOut(head, parts_.names)) return *std::move(refusal);
+  if (head.target == "*" && head.method == "OPTIONS") return Options("GET, HEAD, POST");
   if (auto page = BeginPage(head)) return *std::move(page);
   std::string unknown;
   const Route* route = parts_.routes.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
+  if (head.method == "OPTIONS") return Options("POST");
   if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
+  if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
   return BeginCall(*route, head);
 }
 
@@ -105,9 +132,11 @@ std::optional<WebApi::Begun> WebApi::BeginPage(const Head& head) const {
   const bool alive = head.target == "/healthz" || head.target == "/healthz/live";
   const bool ready = head.target == "/healthz/ready";
   if (!list && !alive && !ready) return std::nullopt;
+  if (head.method == "OPTIONS") return Options("GET, HEAD");
   if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
+  if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
   if (ready) return std::make_shared<Probe>(parts_.workers.reading, limits_.ready);
-  return Success(list ? parts_.routes.List() : Json::Value());
+  return list ? Unchanging(Success(parts_.routes.List())) : Success(Json::Value());
 }
 
 }  // namespace vorn::server

@@ -62,6 +62,31 @@ TEST(Vornd, EndsOnInterruptWithIdleClients) {
   EXPECT_EQ(server.Wait(), 0) << server.log();
 }
 
+TEST(Vornd, ASecondSignalEndsItWhileACallRuns) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  Connection running = server.Connect();
+  running.Send(Post("/api/Test.Echo/v1/wait",
+                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("release") + "\"}"));
+  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  server.Signal(SIGTERM);
+  EXPECT_TRUE(Eventually([&] { return !server.ConnectTcp().connected(); })) << "the first is being handled";
+  server.Signal(SIGINT);
+  EXPECT_EQ(server.Wait(), 128 + SIGINT) << server.log();
+}
+
+TEST(Vornd, EndsWithoutACallThatNeverEnds) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  Connection running = server.Connect();
+  running.Send(Post("/api/Test.Echo/v1/wait",
+                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("never") + "\"}"));
+  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  server.Signal(SIGTERM);
+  EXPECT_EQ(server.Wait(), 0);
+  EXPECT_THAT(server.log(), HasSubstr("calls are still running"));
+}
+
 TEST(Vornd, StartsAgainAfterItWasKilled) {
   const Sandbox sandbox;
   ServerProcess killed(sandbox);

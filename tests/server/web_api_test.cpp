@@ -70,7 +70,7 @@ TEST_F(WebApiTest, CallsAMethodByPost) {
 
 TEST_F(WebApiTest, RefusesOtherHttpMethodsAndSaysWhichIsAllowed) {
   Head head = Post("/api/Nfs/v1/get");
-  for (const char* method : {"GET", "PUT", "DELETE", "OPTIONS", "post", "BREW"}) {
+  for (const char* method : {"GET", "PUT", "DELETE", "post", "BREW"}) {
     head.method = method;
     const auto begun = api_.Begin(head);
     ASSERT_TRUE(std::holds_alternative<Response>(begun)) << method;
@@ -106,6 +106,46 @@ TEST_F(WebApiTest, IsReadyWhenAWorkerIsFree) {
   EXPECT_EQ(ask(), 200) << "changing methods have other threads";
   workers_.reading.Close();
   EXPECT_EQ(ask(), 503);
+}
+
+TEST_F(WebApiTest, OptionsNamesTheAllowedMethods) {
+  const struct {
+    const char* target;
+    const char* allowed;
+  } cases[] = {{"/api/Nfs/v1/get", "POST, OPTIONS"}, {"/api", "GET, HEAD, OPTIONS"}, {"*", "GET, HEAD, POST, OPTIONS"}};
+  for (const auto& c : cases) {
+    Head head = Post(c.target);
+    head.method = "OPTIONS";
+    const auto begun = api_.Begin(head);
+    ASSERT_TRUE(std::holds_alternative<Response>(begun)) << c.target;
+    EXPECT_EQ(std::get<Response>(begun).status, 204) << c.target;
+    ASSERT_EQ(std::get<Response>(begun).headers.size(), 1U);
+    EXPECT_EQ(std::get<Response>(begun).headers[0], (std::pair<std::string, std::string>("Allow", c.allowed)));
+  }
+}
+
+TEST_F(WebApiTest, UnknownQueryParametersAreRefusedByName) {
+  for (const char* target : {"/api/Nfs/v1/get", "/api"}) {
+    Head head = Post(target);
+    if (head.target == "/api") head.method = "GET";
+    head.query = "verbose=1&x";
+    const auto begun = api_.Begin(head);
+    ASSERT_TRUE(std::holds_alternative<Response>(begun)) << target;
+    EXPECT_EQ(std::get<Response>(begun).status, 400) << target;
+    EXPECT_NE(std::get<Response>(begun).body.find("verbose"), std::string::npos) << target;
+  }
+  Head unknown = Post("/nowhere");
+  unknown.query = "verbose=1";
+  EXPECT_EQ(Begin(unknown), 404);
+}
+
+TEST_F(WebApiTest, TheListOfMethodsHasAVersion) {
+  Head head = Post("/api");
+  head.method = "GET";
+  const auto first = std::get<Response>(api_.Begin(head));
+  ASSERT_FALSE(first.headers.empty());
+  EXPECT_EQ(first.headers[0].first, "ETag");
+  EXPECT_EQ(first.headers, std::get<Response>(api_.Begin(head)).headers);
 }
 
 TEST_F(WebApiTest, KnowsNothingElse) {

@@ -77,11 +77,12 @@ def test_the_firewall_opens_the_new_ports_and_closes_the_old_ones(box, client, s
     assert not reaches(client, 32765) and not reaches(client, 32803)
 
 
-def test_the_firewall_returns_when_the_box_loads_its_own_rules_again(box, client, strict_firewall):
+@pytest.mark.parametrize("action", ["restart", "reload"])
+def test_the_firewall_returns_when_the_box_loads_its_own_rules_again(box, client, strict_firewall, action):
     del strict_firewall
+    run("systemctl", "start", "nftables")
     box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
-    run("nft", "delete", "table", "inet", "vorn")  # as "flush ruleset" does
-    assert not reaches(client, 32765)
-    run("systemctl", "restart", "nftables")  # flushes all rules, the strict ones too
+    run("systemctl", action, "nftables")  # flushes all rules, the strict ones too
     run("nft", "-f", firewall.STRICT_RULES)
     assert reaches(client, 32765)
+    assert not reaches(client, 32766)

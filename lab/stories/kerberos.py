@@ -94,6 +94,7 @@ def test_the_id_map_decides_who_owns_a_file_and_changes_without_a_restart(box, k
 
 def test_a_keytab_that_is_replaced_while_mounted_serves_who_signs_in_anew(box, kerberos_client, keytab):
     """New keys take away the tickets that were made for the old ones: until a user has new tickets, access fails."""
+    box.foresees("rpc.svcgssd: ERROR: GSS-API: error in handle_nullreq")  # tickets for the old keys
     box.share("data")
     import_keytab(keytab)
     box.allow("data", rule(kerberos_client, "krb5"))
@@ -104,8 +105,6 @@ def test_a_keytab_that_is_replaced_while_mounted_serves_who_signs_in_anew(box, k
         kerberos.sign_out(users.ALICE)
         kerberos.sign_in(users.ALICE, "alice")
         wait_for(lambda: may_create(mounted, users.ALICE), "a user with a new ticket is not let in")
-    with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options="sec=krb5") as mounted:
-        assert owner_of_a_new_file(mounted, "again", users.ALICE) == users.ALICE.uid
 
 
 def may_create(mounted, user):

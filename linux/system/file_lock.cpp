@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <string>
 
+#include "deadline_timer.h"
 #include "files.h"
 
 namespace vorn {
@@ -19,14 +20,23 @@ Result<FileDescriptor> Open(const std::string& path) {
   return file;
 }
 
-Status WaitFor(const FileDescriptor& file, const std::string& path) {
+// flock(2) has no time limit of its own: the timer interrupts it.
+Status WaitFor(const FileDescriptor& file, const std::string& path, const DeadlineTimer& timer) {
   while (flock(file.get(), LOCK_EX) != 0) {
     if (errno != EINTR) return Status::System(errno, path);
+    if (timer.has_expired()) return Status::Failure(kLockTimeout, path + " is locked by another process for too long");
   }
   return {};
 }
 
-// Whether the locked file is the one that newcomers find: somebody may have removed it.
+Status Lock(const FileDescriptor& file, const std::string& path, std::chrono::milliseconds limit) {
+  if (flock(file.get(), LOCK_EX | LOCK_NB) == 0) return {};
+  if (errno != EWOULDBLOCK && errno != EINTR) return Status::System(errno, path);
+  const DeadlineTimer timer(limit);
+  return timer.status().ok() ? WaitFor(file, path, timer) : timer.status();
+}
+
+// Whether the locked file is still the one at `path`: another process may have removed it meanwhile.
 bool IsAt(const FileDescriptor& file, const std::string& path) {
   struct stat mine {};
   struct stat theirs {};
@@ -36,15 +46,15 @@ bool IsAt(const FileDescriptor& file, const std::string& path) {
 
 }  // namespace
 
-Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path) {
-  const Result<std::string> place = root.Locate(path);
-  if (!place.ok()) return place.status();
-  if (Status status = MakeFolders(std::filesystem::path(*place).parent_path()); !status.ok()) return status;
+Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path, std::chrono::milliseconds limit) {
+  const Result<std::string> location = root.Locate(path);
+  if (!location.ok()) return location.status();
+  if (Status status = MakeFolders(std::filesystem::path(*location).parent_path()); !status.ok()) return status;
   for (;;) {
-    Result<FileDescriptor> file = Open(*place);
+    Result<FileDescriptor> file = Open(*location);
     if (!file.ok()) return file;
-    if (Status status = WaitFor(*file, *place); !status.ok()) return status;
-    if (IsAt(*file, *place)) return file;
+    if (Status status = Lock(*file, *location, limit); !status.ok()) return status;
+    if (IsAt(*file, *location)) return file;
   }
 }
 

@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_SYSTEM_FILE_LOCK_H
 #define VORN_LINUX_SYSTEM_FILE_LOCK_H
 
+#include <chrono>
 #include <string_view>
 
 #include "file_descriptor.h"
@@ -10,9 +11,10 @@
 
 namespace vorn {
 
-// Waits for the lock on the file at the box's `path`, which is made if it is not there. Whoever has
-// the result has the lock; it ends with the open file (flock(2)), so also with its process.
-Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path);
+// Waits for the exclusive lock (flock(2)) on the file at `path` below the root; the file is created if
+// it is missing. The caller owns the lock until it closes the descriptor; the kernel releases it when
+// the process dies. Fails with kLockTimeout when another owner keeps the lock for longer than `limit`.
+Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path, std::chrono::milliseconds limit);
 
 }  // namespace vorn
 

@@ -19,7 +19,7 @@ constexpr std::size_t kLargestFile = std::size_t{64} << 20;
 
 constexpr char kUnique[] = "XXXXXX";  // as mkstemp(3)
 
-// Beside the target and hidden: readers of a folder such as nfs.conf.d pass it over.
+// A hidden file beside the target: the readers of a folder such as nfs.conf.d ignore it.
 fs::path TemporaryPath(const fs::path& path, const std::string& ending) {
   return path.parent_path() / ("." + path.filename().string() + ".vorn-" + ending);
 }
@@ -43,23 +43,13 @@ Result<std::string> ReadAll(int file, const std::string& path) {
   }
 }
 
-Status WriteAll(int file, std::string_view text, const std::string& path) {
-  while (!text.empty()) {
-    const ssize_t size = write(file, text.data(), text.size());
-    if (size < 0 && errno == EINTR) continue;
-    if (size < 0) return Status::System(errno, path);
-    text.remove_prefix(static_cast<std::size_t>(size));
-  }
-  return {};
-}
-
 Status SyncFolder(const fs::path& folder) {
   const FileDescriptor file(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!file || fsync(file.get()) != 0) return Status::System(errno, folder.string());
   return {};
 }
 
-// A file beside the target that takes its place, or disappears.
+// A temporary file beside the target. It replaces the target, or is removed with the object.
 class TemporaryFile {
  public:
   explicit TemporaryFile(const fs::path& target) : path_(TemporaryPath(target, kUnique)) {
@@ -81,8 +71,8 @@ class TemporaryFile {
     return {};
   }
 
-  // The owner before the mode: chown(2) clears the set-id bits.
-  Status TakeAfter(const struct stat& original) {
+  // The owner comes before the mode, because chown(2) clears the set-id bits.
+  Status CopyOwnerAndMode(const struct stat& original) {
     struct stat mine {};
     if (fstat(file_.get(), &mine) != 0) return Status::System(errno, path_);
     const bool same_owner = mine.st_uid == original.st_uid && mine.st_gid == original.st_gid;
@@ -95,15 +85,15 @@ class TemporaryFile {
     return {};
   }
 
-  // In one step, unless the target is no longer what was expected.
-  Status TakePlaceOf(const fs::path& target, const FileStamp& expected) {
+  // Atomic. Fails with kChangedBehind if the target is not in the expected state.
+  Status Replace(const fs::path& target, const FileStamp& expected) {
     if (renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, target.c_str(),
                   expected.exists ? RENAME_EXCHANGE : RENAME_NOREPLACE) == 0) {
-      return expected.exists ? PutAway(target, expected) : Done();
+      return expected.exists ? VerifyAndUnlink(target, expected) : Done();
     }
     if (errno == ENOENT || errno == EEXIST) return ChangedBehind(target.string());
     if (errno != EINVAL) return Status::System(errno, target.string());
-    // The file system can only replace: an edit since the last look is lost.
+    // The file system cannot exchange files: an edit since the last check would be lost.
     if (rename(path_.c_str(), target.c_str()) != 0) return Status::System(errno, target.string());
     return Done();
   }
@@ -114,9 +104,9 @@ class TemporaryFile {
     return {};
   }
 
-  // Looks at the old file once more, now that nobody finds it: an edit of the last moment goes back to its place. Its
-  // time of change is new by the move, and on some file systems its inode.
-  Status PutAway(const fs::path& target, const FileStamp& expected) {
+  // After the exchange, compares the old file with the expected state and exchanges back if it was edited. Its
+  // ctime, and on some file systems its inode, have changed by the exchange itself.
+  Status VerifyAndUnlink(const fs::path& target, const FileStamp& expected) {
     struct stat old {};
     if (lstat(path_.c_str(), &old) != 0) return Status::System(errno, path_);
     const FileStamp stamp = StampOf(old);
@@ -148,7 +138,7 @@ Result<Target> Examine(const fs::path& path) {
   return target;
 }
 
-// So that readers do not find for a moment what is not to stay.
+// Checked before the files are exchanged, so that a rejected version is never visible.
 Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
   const Result<Target> target = Examine(path);
   if (!target.ok()) return target.status();
@@ -158,9 +148,9 @@ Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
 
 Status Fill(TemporaryFile* temporary, const Target& target, std::string_view text, mode_t mode) {
   if (!temporary->status().ok()) return temporary->status();
-  // The mode comes last: a write takes special bits away.
+  // The mode is set last, because a write clears the set-id bits.
   if (Status status = temporary->Write(text); !status.ok()) return status;
-  Status status = target.exists ? temporary->TakeAfter(target.file) : temporary->SetMode(mode);
+  Status status = target.exists ? temporary->CopyOwnerAndMode(target.file) : temporary->SetMode(mode);
   return status.ok() ? temporary->Sync() : status;
 }
 
@@ -172,12 +162,29 @@ bool IsSameFile(const FileStamp& a, const FileStamp& b) {
          a.changed == b.changed;
 }
 
+Result<FileStamp> StampOfFile(const std::string& path) {
+  struct stat file {};
+  if (lstat(path.c_str(), &file) == 0) return StampOf(file);
+  if (errno == ENOENT || errno == ENOTDIR) return FileStamp{};
+  return Status::System(errno, path);
+}
+
+Status WriteAll(int file, std::string_view text, const std::string& name) {
+  while (!text.empty()) {
+    const ssize_t size = write(file, text.data(), text.size());
+    if (size < 0 && errno == EINTR) continue;
+    if (size < 0) return Status::System(errno, name);
+    text.remove_prefix(static_cast<std::size_t>(size));
+  }
+  return {};
+}
+
 Status ChangedBehind(const std::string& path, const char* file, int line) {
   return Status::Failure(kChangedBehind, path + " was changed by somebody else meanwhile", file, line);
 }
 
 Result<FileText> ReadFile(const std::string& path) {
-  // Not blocking: a FIFO or a device must not hold the caller before it is found out.
+  // O_NONBLOCK: opening a FIFO or a device must not block.
   const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY));
   struct stat stat {};
   if (!file || fstat(file.get(), &stat) != 0) return Status::System(errno, path);
@@ -191,6 +198,17 @@ Result<FileText> ReadFileOrNothing(const std::string& path) {
   Result<FileText> file = ReadFile(path);
   if (!file.ok() && file.status().code() == ENOENT) return FileText{};
   return file;
+}
+
+Result<std::vector<std::string>> ListFolder(const std::string& path) {
+  std::vector<std::string> names;
+  std::error_code failure;
+  for (const fs::directory_entry& entry : fs::directory_iterator(path, failure)) {
+    names.push_back(entry.path().filename().string());
+  }
+  const bool is_missing = failure == std::errc::no_such_file_or_directory || failure == std::errc::not_a_directory;
+  if (failure && !is_missing) return Status::System(failure.value(), path);
+  return names;
 }
 
 Status MakeFolders(const std::string& path) {
@@ -212,13 +230,20 @@ Status ReplaceFile(const std::string& path, std::string_view text, const FileSta
   TemporaryFile temporary(path);
   if (Status status = Fill(&temporary, *target, text, mode); !status.ok()) return status;
   if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
-  if (Status status = temporary.TakePlaceOf(path, expected); !status.ok()) return status;
+  if (Status status = temporary.Replace(path, expected); !status.ok()) return status;
   return SyncFolder(folder);
+}
+
+Status RemoveFile(const std::string& path, const FileStamp& expected) {
+  if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
+  RemoveLeftovers(path);
+  if (unlink(path.c_str()) != 0 && errno != ENOENT) return Status::System(errno, path);
+  return SyncFolder(fs::path(path).parent_path());
 }
 
 Status ConfirmFile(const std::string& path) {
   const fs::path folder = fs::path(path).parent_path();
-  if (access(folder.c_str(), F_OK) != 0) return {};  // nobody began anything
+  if (access(folder.c_str(), F_OK) != 0) return {};  // no writer ever began
   RemoveLeftovers(path);
   return SyncFolder(folder);
 }

@@ -1,4 +1,5 @@
-// Whole files: read at once, replaced at once.
+// Whole files: reading, and atomic durable replacement. Paths are those of this system, as Root::Locate
+// returns them: the last component is no symbolic link. All functions may be called from several threads.
 #ifndef VORN_LINUX_SYSTEM_FILES_H
 #define VORN_LINUX_SYSTEM_FILES_H
 
@@ -7,25 +8,30 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "status.h"
 
 namespace vorn {
 
-// What a file was when it was read, so that a later write notices somebody else's edit.
+// Identifies one state of a file. A write compares the state that it read with the present one, and so
+// notices an edit in between.
 struct FileStamp {
   bool exists = false;
   dev_t device = 0;
   ino_t inode = 0;
   off_t size = 0;
-  std::int64_t modified = 0;  // nanoseconds since the epoch
-  std::int64_t changed = 0;   // likewise, of the inode
+  std::int64_t modified = 0;  // mtime, nanoseconds since the epoch
+  std::int64_t changed = 0;   // ctime, nanoseconds since the epoch
 };
 
-// Whether both are of one file in one state.
+// Whether both stamps are of one file in one state.
 bool IsSameFile(const FileStamp& a, const FileStamp& b);
 
-// The failure of a write that would lose somebody's edit of the file at `path`.
+// The stamp of the file or folder at `path` (lstat(2)); one that does not exist has a stamp that says so.
+Result<FileStamp> StampOfFile(const std::string& path);
+
+// Returns the kChangedBehind failure for a file that was edited between reading and writing.
 Status ChangedBehind(const std::string& path, const char* file = __builtin_FILE(), int line = __builtin_LINE());
 
 struct FileText {
@@ -33,32 +39,40 @@ struct FileText {
   FileStamp stamp;
 };
 
-// The file at `path`, a path of this system as Root::Locate gives it: its last name is no link. A
-// regular file of at most 64 MiB. Fails with ENOENT when there is none.
+// Reads a regular file of at most 64 MiB. Fails with ENOENT if there is none.
 Result<FileText> ReadFile(const std::string& path);
 
-// Likewise; no file reads as an empty one, with a stamp that says so.
+// The same, but a missing file reads as an empty one whose stamp does not exist.
 Result<FileText> ReadFileOrNothing(const std::string& path);
 
-// Makes the folder at `path`, durably, and those above it; open to read for everybody, whatever
-// umask(2) says. One that is there stays as it is.
+// The names in a folder, unsorted, without "." and "..". A missing folder has none.
+Result<std::vector<std::string>> ListFolder(const std::string& path);
+
+// Writes all of `text` to an open file; `name` is for the failure.
+Status WriteAll(int file, std::string_view text, const std::string& name);
+
+// Creates the folder at `path` and those above it, durably and with mode 0755 whatever umask(2) is.
+// Existing folders are left alone.
 Status MakeFolders(const std::string& path);
 
-// Makes the file at `path` hold `text`, durably (fsync(2) of file and folder), in one step: a reader
-// sees the old file or the new one, whatever happens on the way. An existing file keeps its owner
-// and mode, a new one gets `mode`; neither depends on umask(2). Missing folders are made. Fails with
-// kChangedBehind, and leaves the file alone, when it is no longer the one that `expected` was taken
-// of: an edit by hand at any moment is noticed if it is over when the files change places
-// (renameat2(2)); a file system that cannot exchange files notices all but those of the last instant.
-// The caller holds the configuration lock: two writers of one file would disturb each other.
+// Makes the file at `path` contain `text`, atomically and durably: a reader sees the old file or the new
+// one, also after a crash (fsync(2) of file and folder). An existing file keeps its owner and mode, a new
+// one gets `mode`; missing folders are created. Fails with kChangedBehind, and leaves the file alone, if it
+// is no longer in the state `expected`. The two files are exchanged (renameat2(2)), so that even an edit
+// during the call is noticed; a file system without RENAME_EXCHANGE misses an edit of the last moment.
+// The caller holds the configuration lock: two calls for one file would disturb each other.
 Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);
 
-// For a file that holds already what it should: ends what a killed writer of it began. Its temporary
-// file goes, and what it put in place is made durable. The caller holds the configuration lock.
+// Removes the file at `path` durably. Fails with kChangedBehind if it is not in the state `expected`. The
+// caller holds the configuration lock.
+Status RemoveFile(const std::string& path, const FileStamp& expected);
+
+// Completes an interrupted ReplaceFile of a file that already has the wanted content: removes the temporary
+// files of killed writers and makes the folder durable. The caller holds the configuration lock.
 Status ConfirmFile(const std::string& path);
 
-// Removes the temporary files that killed writers of the file at `path` left beside it. The two
-// above do so themselves; the caller holds the configuration lock.
+// Removes the temporary files that killed writers left beside the file at `path`. ReplaceFile and
+// ConfirmFile do this themselves. The caller holds the configuration lock.
 void RemoveLeftovers(const std::string& path);
 
 }  // namespace vorn

@@ -12,7 +12,6 @@
 #include <cerrno>
 
 #include "file_descriptor.h"
-#include "root.h"
 
 namespace vorn {
 namespace {
@@ -24,7 +23,7 @@ constexpr std::size_t kLongestLine = 1024;  // a longer one is cut into several
 constexpr std::size_t kReadSize = 4096;
 constexpr int kMostReads = 16;  // pipe(7): a pipe holds 64 KiB
 
-// Hands on whole lines.
+// Collects output and passes it on line by line.
 class LineSplitter {
  public:
   explicit LineSplitter(const std::function<void(std::string_view)>& line) : line_(line) {}
@@ -48,7 +47,7 @@ class LineSplitter {
   std::string rest_;
 };
 
-// What posix_spawn(3) is to do in the child; freed with the object.
+// The file actions and attributes of a posix_spawn(3).
 class SpawnPlan {
  public:
   explicit SpawnPlan(int output) {
@@ -88,10 +87,11 @@ std::vector<char*> Pointers(std::vector<std::string>* texts) {
   return pointers;
 }
 
-// A started program and the end of the pipe that it writes to.
+// A running program and the read end of its output pipe.
 class Child {
  public:
-  static Result<Child> Start(const std::string& path, const std::vector<std::string>& arguments) {
+  static Result<Child> Start(const std::string& path, const std::vector<std::string>& arguments,
+                             const std::string& root) {
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0) return Status::System(errno, "pipe");
     FileDescriptor output(ends[0]);
@@ -99,7 +99,7 @@ class Child {
     std::vector<std::string> words{path};
     words.insert(words.end(), arguments.begin(), arguments.end());
     std::vector<std::string> environment{"PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin",
-                                         "LANG=C.UTF-8", "VORN_ROOT=" + Root::Current().directory()};
+                                         "LANG=C.UTF-8", "VORN_ROOT=" + root};
     const SpawnPlan plan(input.get());
     pid_t id = -1;
     const int error = posix_spawn(&id, path.c_str(), plan.actions(), plan.attributes(), Pointers(&words).data(),
@@ -115,13 +115,13 @@ class Child {
     return Status::System(process_error, path);
   }
 
-  // Takes output until the program has ended, or the time is over; true when it has ended.
+  // Reads output until the program has ended or the time is over. Returns whether it has ended.
   bool Follow(std::chrono::milliseconds limit, LineSplitter* lines) {
     const auto deadline = Clock::now() + limit;
     for (;;) {
       const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(deadline - Clock::now()).count();
-      // A program that has ended may have left as much as the pipe holds; one that it started and that goes on
-      // writing must not keep us.
+      // After the program's end the pipe may still be full. The number of reads is bounded, because a grandchild
+      // may go on writing.
       pollfd events[] = {{process_.get(), POLLIN, 0}, {output_.get(), POLLIN, 0}};
       poll(events, output_ ? 2 : 1, static_cast<int>(std::max<long long>(left, 0)));
       const bool ended = (events[0].revents & POLLIN) != 0;
@@ -134,7 +134,7 @@ class Child {
 
   void Signal(int number) const { kill(-id_, number); }
 
-  // Its status as waitpid(2) has it. The program has ended, or is about to.
+  // Waits for the program, which has ended or was killed. Returns its status as of waitpid(2).
   int Reap() const {
     int status = 0;
     while (waitpid(id_, &status, 0) < 0 && errno == EINTR) {
@@ -146,7 +146,7 @@ class Child {
   Child(pid_t id, FileDescriptor output, FileDescriptor process)
       : id_(id), output_(std::move(output)), process_(std::move(process)) {}
 
-  // Takes what one read(2) gives; false when there was nothing.
+  // Makes one read(2). Returns whether there was any output.
   bool Drain(LineSplitter* lines) {
     char buffer[kReadSize];
     const ssize_t size = read(output_.get(), buffer, sizeof buffer);
@@ -160,7 +160,7 @@ class Child {
   FileDescriptor process_;
 };
 
-Status Judge(const std::string& path, int status, bool in_time) {
+Status ResultOf(const std::string& path, int status, bool in_time) {
   if (!in_time) return Status::Failure(kProgramFailed, path + " took too long and was ended");
   if (WIFSIGNALED(status)) {
     return Status::Failure(kProgramFailed, path + " was ended by signal " + std::to_string(WTERMSIG(status)));
@@ -173,7 +173,7 @@ Status Judge(const std::string& path, int status, bool in_time) {
 
 Status RunProgram(const std::string& path, const std::vector<std::string>& arguments,
                   const std::function<void(std::string_view)>& line, const ProgramOptions& options) {
-  Result<Child> child = Child::Start(path, arguments);
+  Result<Child> child = Child::Start(path, arguments, options.root);
   if (!child.ok()) return child.status();
   LineSplitter lines(line);
   const bool in_time = child->Follow(options.limit, &lines);
@@ -182,7 +182,7 @@ Status RunProgram(const std::string& path, const std::vector<std::string>& argum
     child->Follow(options.patience, &lines);
     child->Signal(SIGKILL);
   }
-  return Judge(path, child->Reap(), in_time);
+  return ResultOf(path, child->Reap(), in_time);
 }
 
 }  // namespace vorn

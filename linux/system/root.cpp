@@ -1,9 +1,16 @@
 #include "root.h"
 
+#include <fcntl.h>
+#include <linux/openat2.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
 #include <vector>
+
+#include "file_descriptor.h"
 
 namespace vorn {
 namespace {
@@ -17,7 +24,30 @@ std::string WithoutTrailingSlashes(std::string directory) {
   return directory;
 }
 
-// Resolves a path name by name, below a folder that it never leaves.
+// Whether `path` names an existing file or folder below `top` without any symbolic link on the way:
+// openat2(2). False also where the kernel lacks that call.
+bool IsWithoutLinks(const std::string& top, const char* path) {
+  const FileDescriptor folder(open(top.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!folder) return false;
+  open_how how{};
+  how.flags = O_PATH | O_NOFOLLOW | O_CLOEXEC;
+  how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS;
+  const FileDescriptor file(static_cast<int>(syscall(SYS_openat2, folder.get(), path, &how, sizeof how)));
+  return static_cast<bool>(file);
+}
+
+// Whether every component of the absolute `path` is a name: none is empty, "." or "..".
+bool HasOnlyNames(std::string_view path) {
+  while (!path.empty()) {
+    path.remove_prefix(1);  // the slash
+    const std::string_view name = path.substr(0, path.find('/'));
+    if (name.empty() || name == "." || name == "..") return false;
+    path.remove_prefix(name.size());
+  }
+  return true;
+}
+
+// Resolves a path component by component, below a folder that it never leaves.
 class Resolver {
  public:
   Resolver(fs::path top, std::string_view path) : top_(std::move(top)) { Push(fs::path(path).relative_path()); }
@@ -32,7 +62,7 @@ class Resolver {
   }
 
  private:
-  // What is to be visited next comes last.
+  // The component to visit next is the last one of pending_.
   void Push(const fs::path& path) {
     const std::vector<fs::path> names(path.begin(), path.end());
     pending_.insert(pending_.end(), names.rbegin(), names.rend());
@@ -49,7 +79,7 @@ class Resolver {
     const fs::path target = fs::read_symlink(here, error);
     if (!error) return Follow(here, target);
     reached_ /= name;
-    // Not a link, not there, below something that is no folder: whoever opens the file finds out.
+    // Not a link, or nothing there: opening the file will tell.
     if (error.value() == EINVAL || error.value() == ENOENT || error.value() == ENOTDIR) return {};
     return Status::System(error.value(), here.string());
   }
@@ -83,6 +113,8 @@ Result<std::string> Root::Locate(std::string_view path) const {
   if (path.empty() || path.front() != '/') {
     return Status::Failure(EINVAL, "\"" + std::string(path) + "\" is no absolute path");
   }
+  const std::string top = is_box() ? "" : directory_;
+  if (HasOnlyNames(path) && IsWithoutLinks(directory_, std::string(path).c_str() + 1)) return top + std::string(path);
   return Resolver(directory_, path).Resolve();
 }
 

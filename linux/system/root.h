@@ -1,5 +1,5 @@
-// The directory under which everything lives that the platform reads or writes: "/" on a box, any
-// other folder for a trial or a test.
+// The root directory: every path that the platform reads or writes is below it. It is "/" on a box, and
+// any other folder for a trial or a test.
 #ifndef VORN_LINUX_SYSTEM_ROOT_H
 #define VORN_LINUX_SYSTEM_ROOT_H
 
@@ -15,19 +15,19 @@ class Root {
   // `directory` must be an absolute path; "" and "/" are the box itself.
   explicit Root(std::string directory);
 
-  // The root of this process: the environment variable VORN_ROOT, or "/". Read at each call, so that
-  // one test process can visit several roots; nobody changes it while requests run.
+  // The root of this process: the environment variable VORN_ROOT, or "/". It is read at each call, so
+  // that one test process can use several roots. It must not change while another thread calls this.
   static Root Current();
 
   bool is_box() const { return directory_ == "/"; }
   const std::string& directory() const { return directory_; }
 
-  // Where the box's `path` ("/etc/exports") is on this system. Symbolic links are followed as the
-  // box would see them: an absolute one, and "..", stay below the root. The last name (and so any
-  // folder above it) need not exist. Fails on a loop of links and on a relative path.
+  // The path on this system of the box's `path` ("/etc/exports"). Symbolic links are followed as the box
+  // would see them: the target of an absolute link, and "..", stay below the root. The file, and any
+  // folder above it, need not exist. Fails on a loop of links and on a relative path.
   Result<std::string> Locate(std::string_view path) const;
 
-  // What the box calls a place that Locate found: "/volume1/data", without links.
+  // The box's path of a path that Locate returned: "/volume1/data", without links.
   std::string OnBox(const std::string& located) const;
 
  private:

@@ -5,6 +5,7 @@
 
 #include <string>
 
+#include "current_box.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -174,7 +175,7 @@ TEST(SquashAccounts, AreThoseThatTheSettingsName) {
   const TemporaryRoot root;
   root.Write("/etc/vorn/platform.conf", "[platform]\nadmin_account = boss\nguest_account = visitor\n");
   root.Write("/etc/passwd", "root:x:0:0::/:/bin/sh\nboss:x:7:8::/:/bin/sh\nbroken\nvisitor:x:9:10:::\n");
-  const auto accounts = SquashAccounts::Load();
+  const auto accounts = SquashAccounts::Load(CurrentBox());
   ASSERT_TRUE(accounts.ok());
   ASSERT_TRUE(accounts->admin && accounts->guest);
   EXPECT_EQ(accounts->admin->user, 7);
@@ -185,7 +186,7 @@ TEST(SquashAccounts, AreThoseThatTheSettingsName) {
 
 TEST(SquashAccounts, AreNoneWithoutAUserDatabase) {
   const TemporaryRoot root;
-  const auto accounts = SquashAccounts::Load();
+  const auto accounts = SquashAccounts::Load(CurrentBox());
   ASSERT_TRUE(accounts.ok());
   EXPECT_FALSE(accounts->admin || accounts->guest);
 }

@@ -4,8 +4,9 @@
 #include <memory>
 
 #include "captured_log.h"
+#include "configuration_lock.h"
 #include "core.h"
-#include "lock.h"
+#include "current_box.h"
 #include "processes.h"
 #include "temporary_root.h"
 
@@ -33,7 +34,7 @@ TEST(VornConf, KeepsOtherProcessesOutWhileAnyOfItsObjectsLives) {
 TEST(VornConf, NestsWithTheLockOfThePlatform) {
   const TemporaryRoot root;
   const VornConf configuration;
-  const ConfigurationLock lock;
+  const ConfigurationLock lock(CurrentBox());
   EXPECT_TRUE(lock.status().ok());
 }
 

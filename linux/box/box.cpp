@@ -1,0 +1,88 @@
+#include "box.h"
+
+#include "configuration_lock.h"
+#include "write_access.h"
+
+namespace vorn {
+
+Box::Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine)
+    : root_(std::move(root)), store_(std::move(store)), choose_engine_(std::move(choose_engine)) {}
+
+Result<StoredFile> Box::Read(const std::string& path) {
+  Result<StoredFile> file = store_->Read(path);
+  if (file.ok()) FirstReads::Note(*this, path, file->version);
+  return file;
+}
+
+Result<std::shared_ptr<const StoredFolder>> Box::List(const std::string& folder) {
+  const Result<Version> version = store_->VersionOf(folder);
+  if (!version.ok()) return version.status();
+  const Key key{typeid(StoredFolder), folder};
+  Document document = Find(key, *version);
+  if (document == nullptr) {
+    Result<StoredFolder> listed = store_->List(folder);
+    if (!listed.ok()) return listed.status();
+    const bool is_settled = listed->is_settled;
+    const Version listed_version = listed->version;
+    document = std::make_shared<const StoredFolder>(std::move(*listed));
+    if (is_settled) Keep(key, listed_version, document);
+  }
+  return std::static_pointer_cast<const StoredFolder>(document);
+}
+
+Result<Box::Document> Box::LoadAny(std::type_index type, const std::string& path,
+                                   const std::function<Result<Document>(StoredFile file)>& parse) {
+  const Result<Version> version = store_->VersionOf(path);
+  if (!version.ok()) return version.status();
+  const Key key{type, path};
+  if (Document document = Find(key, *version)) {
+    FirstReads::Note(*this, path, *version);
+    return document;
+  }
+  Result<StoredFile> file = Read(path);
+  if (!file.ok()) return file.status();
+  const Version read = file->version;
+  const bool is_settled = file->is_settled;
+  Result<Document> document = parse(std::move(*file));
+  if (document.ok() && is_settled) Keep(key, read, *document);
+  return document;
+}
+
+Box::Document Box::Find(const Key& key, const Version& version) {
+  const std::lock_guard lock(mutex_);
+  const auto found = documents_.find(key);
+  return found != documents_.end() && found->second.version == version ? found->second.document : nullptr;
+}
+
+void Box::Keep(const Key& key, const Version& version, Document document) {
+  const std::lock_guard lock(mutex_);
+  documents_[key] = {version, std::move(document)};
+}
+
+Status Box::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
+  if (Status status = CheckMayWrite(path); !status.ok()) return status;
+  if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;
+  if (Status status = store_->Replace(path, text, expected, mode); !status.ok()) return status;
+  const Result<Version> written = store_->VersionOf(path);
+  if (written.ok()) FirstReads::Renew(*this, path, *written);
+  return written.status();
+}
+
+Status Box::Remove(const std::string& path, const Version& expected) {
+  if (Status status = CheckMayWrite(path); !status.ok()) return status;
+  if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;
+  Status status = store_->Remove(path, expected);
+  if (status.ok()) FirstReads::Renew(*this, path, Version{});
+  return status;
+}
+
+Status Box::Confirm(const std::string& path) {
+  const Status status = CheckMayWrite(path);
+  return status.ok() ? store_->Confirm(path) : status;
+}
+
+Result<std::unique_ptr<HeldLock>> Box::Lock(const std::string& name, std::chrono::milliseconds limit) {
+  return store_->Lock(name, limit);
+}
+
+}  // namespace vorn

@@ -1,0 +1,88 @@
+// The box that an operation works on.
+#ifndef VORN_LINUX_BOX_BOX_H
+#define VORN_LINUX_BOX_BOX_H
+
+#include <chrono>
+#include <functional>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <string_view>
+#include <typeindex>
+#include <utility>
+
+#include "engine.h"
+#include "root.h"
+#include "store.h"
+
+namespace vorn {
+
+// One box: its files, its service, its configuration lock. Objects may be used by several threads at once
+// and live as long as any thread uses them.
+//
+// Reading takes no lock. A parsed document is immutable, shared by its readers, and parsed again only
+// when the file has another version. Within a configuration context (see configuration_lock.h) the version
+// that is read first is remembered per path, and a write of a file with any other version is refused.
+//
+// Every operation that changes the box is refused with EROFS in a call that may not write (call.h).
+class Box {
+ public:
+  // Returns the engine that the box's settings ask for; it lives as long as the function.
+  using EngineChooser = std::function<Result<Engine*>(Box&)>;
+
+  Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine);
+
+  const Root& root() const { return root_; }
+
+  // The engine that the box's settings ask for. It lives as long as the box.
+  Result<Engine*> engine() { return choose_engine_(*this); }
+
+  Result<StoredFile> Read(const std::string& path);
+  Result<std::shared_ptr<const StoredFolder>> List(const std::string& folder);
+
+  // The document of type T that `parse` makes of the file at `path`.
+  template <typename T>
+  Result<std::shared_ptr<const T>> Load(const std::string& path,
+                                        const std::function<Result<T>(StoredFile file)>& parse) {
+    const auto parse_any = [&](StoredFile file) -> Result<std::shared_ptr<const void>> {
+      Result<T> document = parse(std::move(file));
+      if (!document.ok()) return document.status();
+      return std::shared_ptr<const void>(std::make_shared<const T>(std::move(*document)));
+    };
+    Result<std::shared_ptr<const void>> document = LoadAny(typeid(T), path, parse_any);
+    if (!document.ok()) return document.status();
+    return std::static_pointer_cast<const T>(std::move(*document));
+  }
+
+  // These change a file as Store says. The calling thread owns the configuration lock.
+  Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode = 0644);
+  Status Remove(const std::string& path, const Version& expected);
+  Status Confirm(const std::string& path);
+
+  // Takes a lock of the box.
+  Result<std::unique_ptr<HeldLock>> Lock(const std::string& name, std::chrono::milliseconds limit);
+
+ private:
+  using Document = std::shared_ptr<const void>;
+  struct Cached {
+    Version version;
+    Document document;
+  };
+  using Key = std::pair<std::type_index, std::string>;  // the document's type, the path
+
+  Result<Document> LoadAny(std::type_index type, const std::string& path,
+                           const std::function<Result<Document>(StoredFile file)>& parse);
+  Document Find(const Key& key, const Version& version);
+  void Keep(const Key& key, const Version& version, Document document);
+
+  const Root root_;
+  const std::unique_ptr<Store> store_;
+  const EngineChooser choose_engine_;
+  std::mutex mutex_;
+  std::map<Key, Cached> documents_;
+};
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_BOX_BOX_H

@@ -1,0 +1,29 @@
+// The NFS service of a box.
+#ifndef VORN_LINUX_BOX_ENGINE_H
+#define VORN_LINUX_BOX_ENGINE_H
+
+#include "status.h"
+
+namespace vorn {
+
+// Each operation returns when the service is in its new state, or has failed to reach it. IsEnabled may be
+// called at any time by any thread; the caller excludes two of the other operations at once.
+class Engine {
+ public:
+  virtual ~Engine() = default;
+
+  // Whether the service is started at boot.
+  virtual Result<bool> IsEnabled() = 0;
+
+  virtual Status Start() = 0;  // also enables the service for the next boot
+  virtual Status Stop() = 0;   // also disables it
+  virtual Status Restart() = 0;
+
+  // Applies the export rules that are stored now. A service that does not run has nothing to reload;
+  // that is a success.
+  virtual Status Reload() = 0;
+};
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_BOX_ENGINE_H

@@ -1,0 +1,138 @@
+#include "file_store.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cstring>
+#include <ctime>
+#include <utility>
+
+#include "file_lock.h"
+#include "files.h"
+
+namespace vorn {
+namespace {
+
+class HeldFileLock : public HeldLock {
+ public:
+  explicit HeldFileLock(FileDescriptor file) : file_(std::move(file)) {}
+
+ private:
+  const FileDescriptor file_;
+};
+
+std::uint64_t Word(std::int64_t number) { return static_cast<std::uint64_t>(number); }
+
+Version VersionFrom(const FileStamp& stamp) {
+  if (!stamp.exists) return {};
+  return {true, {stamp.device, stamp.inode, Word(stamp.size), Word(stamp.modified), Word(stamp.changed)}};
+}
+
+FileStamp StampFrom(const Version& version) {
+  if (!version.exists) return {};
+  FileStamp stamp{};
+  stamp.exists = true;
+  stamp.device = version.state[0];
+  stamp.inode = version.state[1];
+  stamp.size = static_cast<off_t>(version.state[2]);
+  stamp.modified = static_cast<std::int64_t>(version.state[3]);
+  stamp.changed = static_cast<std::int64_t>(version.state[4]);
+  return stamp;
+}
+
+// The clock of file timestamps, in nanoseconds since the epoch; it advances in ticks.
+std::int64_t FileClock() {
+  timespec now{};
+  clock_gettime(CLOCK_REALTIME_COARSE, &now);
+  return std::int64_t{now.tv_sec} * 1'000'000'000 + now.tv_nsec;
+}
+
+// Whether any change after the moment `now` gives another version. A missing file can only appear.
+bool IsSettled(const FileStamp& stamp, std::int64_t now) { return !stamp.exists || stamp.changed < now; }
+
+std::string PathBelow(const Root& root, const std::string& path) {
+  return root.is_box() ? path : root.directory() + path;
+}
+
+}  // namespace
+
+// Remembers which paths have no symbolic links.
+Result<std::string> FileStore::Locate(const std::string& path) const {
+  Result<std::string> location = root_.Locate(path);
+  if (!location.ok()) return location;
+  const std::lock_guard lock(mutex_);
+  if (*location == PathBelow(root_, path)) {
+    plain_paths_.insert(path);
+  } else {
+    plain_paths_.erase(path);
+  }
+  return location;
+}
+
+bool FileStore::IsPlain(const std::string& path) const {
+  const std::lock_guard lock(mutex_);
+  return plain_paths_.count(path) != 0;
+}
+
+Result<StoredFile> FileStore::Read(const std::string& path) const {
+  Result<std::string> location = Locate(path);
+  if (!location.ok()) return location.status();
+  const std::int64_t now = FileClock();
+  Result<FileText> file = ReadFileOrNothing(*location);
+  if (!file.ok()) return file.status();
+  return StoredFile{std::move(*location), std::move(file->text), VersionFrom(file->stamp), IsSettled(file->stamp, now)};
+}
+
+Result<Version> FileStore::VersionOf(const std::string& path) const {
+  if (IsPlain(path)) {
+    const Result<FileStamp> stamp = StampOfFile(PathBelow(root_, path));
+    if (!stamp.ok()) return stamp.status();
+    return VersionFrom(*stamp);
+  }
+  const Result<std::string> location = Locate(path);
+  if (!location.ok()) return location.status();
+  const Result<FileStamp> stamp = StampOfFile(*location);
+  if (!stamp.ok()) return stamp.status();
+  return VersionFrom(*stamp);
+}
+
+Result<StoredFolder> FileStore::List(const std::string& folder) const {
+  const Result<std::string> location = Locate(folder);
+  if (!location.ok()) return location.status();
+  const std::int64_t now = FileClock();
+  const Result<FileStamp> stamp = StampOfFile(*location);
+  if (!stamp.ok()) return stamp.status();
+  Result<std::vector<std::string>> names = ListFolder(*location);
+  if (!names.ok()) return names.status();
+  std::sort(names->begin(), names->end(),
+            [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; });
+  return StoredFolder{std::move(*names), VersionFrom(*stamp), IsSettled(*stamp, now)};
+}
+
+Status FileStore::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
+  const Result<std::string> location = Locate(path);
+  return location.ok() ? ReplaceFile(*location, text, StampFrom(expected), mode) : location.status();
+}
+
+Status FileStore::Remove(const std::string& path, const Version& expected) {
+  const Result<std::string> location = Locate(path);
+  return location.ok() ? RemoveFile(*location, StampFrom(expected)) : location.status();
+}
+
+Status FileStore::Confirm(const std::string& path) {
+  const Result<std::string> location = Locate(path);
+  return location.ok() ? ConfirmFile(*location) : location.status();
+}
+
+Status FileStore::MakeFolder(const std::string& path) {
+  const Result<std::string> location = Locate(path);
+  return location.ok() ? MakeFolders(*location) : location.status();
+}
+
+Result<std::unique_ptr<HeldLock>> FileStore::Lock(const std::string& name, std::chrono::milliseconds limit) {
+  Result<FileDescriptor> file = TakeFileLock(root_, name, limit);
+  if (!file.ok()) return file.status();
+  return std::unique_ptr<HeldLock>(std::make_unique<HeldFileLock>(std::move(*file)));
+}
+
+}  // namespace vorn

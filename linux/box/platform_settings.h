@@ -1,0 +1,34 @@
+// The platform's own settings: /etc/vorn/platform.conf.
+#ifndef VORN_LINUX_BOX_PLATFORM_SETTINGS_H
+#define VORN_LINUX_BOX_PLATFORM_SETTINGS_H
+
+#include <string>
+
+#include "box.h"
+#include "status.h"
+
+namespace vorn {
+
+// [platform]
+// service_engine = systemd | local | auto     default auto: systemd if it is PID 1 and the root is "/"
+// kerberos = auto | yes | no                  default auto: what the running kernel supports
+// admin_account = NAME                        the account of the squash modes; default "admin"
+// guest_account = NAME                        default "nobody"
+// firewall = yes | no                         default: yes if the root is "/"
+struct PlatformSettings {
+  enum class Kerberos { kAuto, kYes, kNo };
+  enum class EngineKind { kSystemd, kLocal };
+
+  EngineKind engine = EngineKind::kLocal;
+  Kerberos kerberos = Kerberos::kAuto;
+  std::string admin_account = "admin";
+  std::string guest_account = "nobody";
+  bool firewall = false;
+
+  // Reads the settings of the box. A value that is not in the list above is a failure that names it.
+  static Result<PlatformSettings> Load(Box& box);
+};
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_BOX_PLATFORM_SETTINGS_H

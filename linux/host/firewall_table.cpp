@@ -1,0 +1,68 @@
+#include "firewall_table.h"
+
+#include <nftables/libnftables.h>
+
+#include <cerrno>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "configuration_lock.h"
+#include "configured_ports.h"
+#include "platform_settings.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kFile[] = "/var/lib/vorn/firewall.nft";
+
+struct FreeContext {
+  void operator()(nft_ctx* context) const { nft_ctx_free(context); }
+};
+
+// One transaction: it deletes the old table and adds the new one, or fails and changes nothing.
+std::string Ruleset(const std::vector<ConfiguredPort>& ports) {
+  std::string rules =
+      "table inet vorn\n"
+      "delete table inet vorn\n"
+      "table inet vorn {\n"
+      "  chain nfs {\n"
+      "    type filter hook input priority filter - 1; policy accept;\n";
+  for (const ConfiguredPort& port : ports) {
+    const std::string number = std::to_string(port.port);
+    rules += "    meta l4proto { tcp, udp } th dport " + number + " meta mark set meta mark | 0x01000000 comment \"" +
+             port.service + "\"\n";
+  }
+  return rules + "  }\n}\n";
+}
+
+Status Load(const std::string& ruleset) {
+  const std::unique_ptr<nft_ctx, FreeContext> context(nft_ctx_new(NFT_CTX_DEFAULT));
+  if (!context) return Status::Failure(ENOMEM, "libnftables has no context");
+  nft_ctx_buffer_error(context.get());
+  nft_ctx_buffer_output(context.get());
+  if (nft_run_cmd_from_buffer(context.get(), ruleset.c_str()) == 0) return {};
+  return Status::Failure(kServiceFailed, std::string("nftables: ") + nft_ctx_get_error_buffer(context.get()));
+}
+
+Status Save(Box& box, const std::string& ruleset) {
+  const ConfigurationLock lock(box);
+  if (!lock.status().ok()) return lock.status();
+  const Result<StoredFile> before = box.Read(kFile);
+  return before.ok() ? box.Replace(kFile, ruleset, before->version) : before.status();
+}
+
+}  // namespace
+
+Status UpdateFirewall(Box& box) {
+  const Result<PlatformSettings> settings = PlatformSettings::Load(box);
+  if (!settings.ok()) return settings.status();
+  if (!settings->firewall) return {};
+  const auto ports = ReadConfiguredPorts(box);
+  if (!ports.ok()) return ports.status();
+  const std::string ruleset = Ruleset(*ports);
+  const Status saved = Save(box, ruleset);
+  return saved.ok() ? Load(ruleset) : saved;
+}
+
+}  // namespace vorn

@@ -1,0 +1,21 @@
+// The firewall table of the NFS service: "inet vorn" of nftables. Only this platform writes the table, and the
+// platform writes no other one.
+//
+// An accept verdict cannot override a drop in another table. This table therefore accepts and drops nothing: it
+// sets a mark on packets for the service's configured ports, before the box's own tables see them. A box whose
+// policy is to drop accepts these packets with "meta mark & 0x01000000 != 0 accept".
+#ifndef VORN_LINUX_HOST_FIREWALL_TABLE_H
+#define VORN_LINUX_HOST_FIREWALL_TABLE_H
+
+#include "box.h"
+#include "status.h"
+
+namespace vorn {
+
+// Makes the table match the configured ports, in one transaction, and saves it in /var/lib/vorn/firewall.nft,
+// which a unit of the package loads at boot. Does nothing if the box's settings switch the firewall off.
+Status UpdateFirewall(Box& box);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_HOST_FIREWALL_TABLE_H

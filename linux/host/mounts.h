@@ -1,0 +1,18 @@
+// The mounts of a box, through libmount on mountinfo (proc(5)).
+#ifndef VORN_LINUX_HOST_MOUNTS_H
+#define VORN_LINUX_HOST_MOUNTS_H
+
+#include <string>
+
+#include "box.h"
+#include "status.h"
+
+namespace vorn {
+
+// Whether `path`, or a folder below it, is a mount whose file system the kernel's NFS server cannot export:
+// a network file system, FUSE, one of the kernel's own, or one without file handles (exportfs support).
+Result<bool> HasUnexportableMount(Box& box, const std::string& path);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_HOST_MOUNTS_H

@@ -1,0 +1,76 @@
+#include "users.h"
+
+#include <pwd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <iterator>
+#include <sstream>
+
+namespace vorn {
+namespace {
+
+struct CloseFile {
+  void operator()(std::FILE* file) const { std::fclose(file); }
+};
+
+Result<Accounts> ParseAccounts(StoredFile file) {
+  Accounts accounts;
+  if (file.text.empty()) return accounts;
+  const std::unique_ptr<std::FILE, CloseFile> stream(fmemopen(file.text.data(), file.text.size(), "r"));
+  if (stream == nullptr) return Status::System(errno, file.location);
+  std::vector<char> line(file.text.size() + 1);  // long enough for any line
+  passwd account{};
+  passwd* found = nullptr;
+  while (fgetpwent_r(stream.get(), &account, line.data(), line.size(), &found) == 0) {
+    accounts.push_back({account.pw_name, account.pw_uid, account.pw_gid});
+  }
+  return accounts;
+}
+
+// The user ids of people: login.defs(5).
+struct UserIds {
+  unsigned long smallest = 1000;
+  unsigned long largest = 60000;
+};
+
+Result<UserIds> ParseUserIds(StoredFile file) {
+  UserIds ids;
+  std::istringstream lines(file.text);
+  for (std::string line; std::getline(lines, line);) {
+    std::istringstream words(line);
+    std::string name;
+    unsigned long number = 0;
+    if (!(words >> name >> number)) continue;
+    if (name == "UID_MIN") ids.smallest = number;
+    if (name == "UID_MAX") ids.largest = number;
+  }
+  return ids;
+}
+
+}  // namespace
+
+Result<std::shared_ptr<const Accounts>> ReadAccounts(Box& box) {
+  return box.Load<Accounts>("/etc/passwd", ParseAccounts);
+}
+
+Result<Accounts> ReadLocalUsers(Box& box) {
+  const auto accounts = ReadAccounts(box);
+  if (!accounts.ok()) return accounts.status();
+  const auto ids = box.Load<UserIds>("/etc/login.defs", ParseUserIds);
+  if (!ids.ok()) return ids.status();
+  Accounts users;
+  std::copy_if((*accounts)->begin(), (*accounts)->end(), std::back_inserter(users), [&](const Account& account) {
+    return account.user_id >= (*ids)->smallest && account.user_id <= (*ids)->largest;
+  });
+  return users;
+}
+
+std::optional<Account> FindAccount(const Accounts& accounts, const std::string& name) {
+  const auto found =
+      std::find_if(accounts.begin(), accounts.end(), [&](const Account& account) { return account.name == name; });
+  return found == accounts.end() ? std::nullopt : std::optional<Account>(*found);
+}
+
+}  // namespace vorn

@@ -1,0 +1,82 @@
+#include "keytab.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "configuration_lock.h"
+#include "files.h"
+#include "ini_text.h"
+#include "nfs_record.h"
+#include "nfsconf.h"
+#include "unicode.h"
+#include "write_access.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kKeytabFile[] = "/etc/nfs/krb5.keytab";
+constexpr std::size_t kLargest = std::size_t{1} << 20;
+constexpr mode_t kOwnerOnly = 0600;
+
+Result<std::string> ReadUpload(const std::string& path) {
+  struct stat info {};
+  if (lstat(path.c_str(), &info) != 0) return Status::System(errno, path);
+  if (!S_ISREG(info.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
+  Result<FileText> file = ReadFile(path);
+  if (!file.ok()) return file.status();
+  if (file->text.size() > kLargest) return Status::System(EFBIG, path);
+  return std::move(file->text);
+}
+
+// The server's own principal: the first one of the NFS service, else the first one.
+const std::string& OwnPrincipal(const std::vector<KeytabKey>& keys) {
+  const auto found = std::find_if(keys.begin(), keys.end(),
+                                  [](const KeytabKey& key) { return key.principal.compare(0, 4, "nfs/") == 0; });
+  return found == keys.end() ? keys.front().principal : found->principal;
+}
+
+// Checks that the NFS configuration record can represent the principal. This happens before the installation,
+// because the record must name the principal afterwards.
+Status CheckPrincipal(const std::string& principal) {
+  if (principal.size() < sizeof(KeytabEntry::principal) && IsPlainText(principal) && IniValue::From(principal))
+    return {};
+  return Status::Failure(kRefusedText, "nfs.conf(5) cannot represent the principal " + principal);
+}
+
+// Keys are readable by root only, whatever the mode of an older file is.
+Status Install(Box& box, const std::string& content) {
+  const Result<std::string> location = box.root().Locate(kKeytabFile);
+  if (!location.ok()) return location.status();
+  if (Status status = CheckMayWrite(kKeytabFile); !status.ok()) return status;
+  if (chmod(location->c_str(), kOwnerOnly) != 0 && errno != ENOENT) return Status::System(errno, *location);
+  const Result<StoredFile> before = box.Read(kKeytabFile);
+  if (!before.ok()) return before.status();
+  return box.Replace(kKeytabFile, content, before->version, kOwnerOnly);
+}
+
+}  // namespace
+
+Status ImportKeytab(Box& box, const std::string& path) {
+  const Result<std::string> content = ReadUpload(path);
+  if (!content.ok()) return content.status();
+  const Result<std::vector<KeytabKey>> keys = ReadKeytab(*content);
+  if (!keys.ok()) return keys.status();
+  if (keys->empty()) return Status::Failure(kNoKeytab, "the keytab has no key");
+  const std::string& principal = OwnPrincipal(*keys);
+  if (Status status = CheckPrincipal(principal); !status.ok()) return status;
+  const ConfigurationLock lock(box);
+  if (!lock.status().ok()) return lock.status();
+  const Status installed = Install(box, *content);
+  return installed.ok() ? StoreKerberosPrincipal(box, principal) : installed;
+}
+
+Result<std::vector<KeytabKey>> ListKeytab(Box& box, const std::string& path) {
+  const Result<StoredFile> file = box.Read(path);
+  if (!file.ok()) return file.status();
+  if (!file->version.exists) return std::vector<KeytabKey>();  // a box without Kerberos
+  return ReadKeytab(file->text);
+}
+
+}  // namespace vorn

@@ -1,0 +1,24 @@
+// The keytab of the NFS service: /etc/nfs/krb5.keytab.
+#ifndef VORN_LINUX_KERBEROS_KEYTAB_H
+#define VORN_LINUX_KERBEROS_KEYTAB_H
+
+#include <string>
+#include <vector>
+
+#include "box.h"
+#include "keytab_file.h"
+#include "status.h"
+
+namespace vorn {
+
+// Validates the keytab at `path`, a path of this system, and installs it atomically with mode 0600. The server's
+// own principal in the NFS settings becomes that of the keytab. Fails with kNoKeytab for a file that is not a
+// keytab or has no key; the file at `path` is left alone.
+Status ImportKeytab(Box& box, const std::string& path);
+
+// The keys of the keytab at the box's `path`, in file order; none if there is no file.
+Result<std::vector<KeytabKey>> ListKeytab(Box& box, const std::string& path);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_KERBEROS_KEYTAB_H

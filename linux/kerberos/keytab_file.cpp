@@ -1,0 +1,107 @@
+#include "keytab_file.h"
+
+#include <krb5/krb5.h>
+#include <profile.h>
+
+#include <cerrno>
+#include <memory>
+#include <utility>
+
+#include "keytab_frame.h"
+#include "memory_file.h"
+
+namespace vorn {
+namespace {
+
+struct Free {
+  void operator()(krb5_context context) const { krb5_free_context(context); }
+  void operator()(profile_t profile) const { profile_abandon(profile); }
+};
+using Context = std::unique_ptr<std::remove_pointer_t<krb5_context>, Free>;
+
+// The context ignores krb5.conf(5), which has no influence on the format of a keytab.
+Result<Context> NewContext() {
+  profile_t profile = nullptr;
+  if (profile_init_path("/dev/null", &profile) != 0) return Status::Failure(ENOMEM, "libkrb5 has no profile");
+  const std::unique_ptr<std::remove_pointer_t<profile_t>, Free> owned(profile);
+  krb5_context context = nullptr;
+  if (krb5_init_context_profile(profile, 0, &context) != 0) return Status::Failure(ENOMEM, "libkrb5 has no context");
+  return Context(context);
+}
+
+// An open keytab that is being read.
+class Reading {
+ public:
+  Reading(krb5_context context, const std::string& name) : context_(context) {
+    error_ = krb5_kt_resolve(context_, name.c_str(), &keytab_);
+    if (error_ != 0) return;
+    error_ = krb5_kt_start_seq_get(context_, keytab_, &cursor_);
+    begun_ = error_ == 0;
+  }
+  ~Reading() {
+    if (begun_) krb5_kt_end_seq_get(context_, keytab_, &cursor_);
+    if (keytab_ != nullptr) krb5_kt_close(context_, keytab_);
+  }
+  Reading(const Reading&) = delete;
+  Reading& operator=(const Reading&) = delete;
+
+  // False at the end, and at a failure.
+  bool Next(krb5_keytab_entry* entry) {
+    if (error_ == 0) error_ = krb5_kt_next_entry(context_, keytab_, entry, &cursor_);
+    return error_ == 0;
+  }
+  bool at_end() const { return error_ == KRB5_KT_END; }
+  krb5_error_code error() const { return error_; }
+
+ private:
+  krb5_context context_;
+  krb5_keytab keytab_ = nullptr;
+  krb5_kt_cursor cursor_{};
+  krb5_error_code error_ = 0;
+  bool begun_ = false;
+};
+
+std::string NameOf(krb5_context context, krb5_const_principal principal) {
+  char* text = nullptr;
+  if (krb5_unparse_name(context, principal, &text) != 0) return "";
+  std::string name = text;
+  krb5_free_unparsed_name(context, text);
+  return name;
+}
+
+std::string EncTypeName(krb5_enctype type) {
+  char name[64];
+  if (krb5_enctype_to_name(type, 0, name, sizeof name) == 0) return name;
+  return "etype " + std::to_string(type);
+}
+
+std::string ErrorText(krb5_context context, krb5_error_code error) {
+  const char* text = krb5_get_error_message(context, error);
+  std::string copy = text;
+  krb5_free_error_message(context, text);
+  return copy;
+}
+
+}  // namespace
+
+Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content) {
+  const Result<std::size_t> count = CountKeytabEntries(content);
+  if (!count.ok()) return count.status();
+  const Result<FileDescriptor> file = MakeMemoryFile("keytab", content);
+  if (!file.ok()) return file.status();
+  const Result<Context> context = NewContext();
+  if (!context.ok()) return context.status();
+
+  Reading reading(context->get(), "FILE:" + PathOf(*file));
+  std::vector<KeytabKey> keys;
+  for (krb5_keytab_entry entry{}; reading.Next(&entry);) {
+    keys.push_back(
+        {static_cast<int>(entry.vno), NameOf(context->get(), entry.principal), EncTypeName(entry.key.enctype)});
+    krb5_free_keytab_entry_contents(context->get(), &entry);
+  }
+  if (!reading.at_end()) return NoKeytab(ErrorText(context->get(), reading.error()));
+  if (keys.size() != *count) return NoKeytab("an entry cannot be read");
+  return keys;
+}
+
+}  // namespace vorn

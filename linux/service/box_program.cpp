@@ -1,0 +1,35 @@
+#include "box_program.h"
+
+#include <syslog.h>
+
+#include <string_view>
+
+#include "configuration_lock.h"
+#include "program.h"
+#include "write_access.h"
+
+namespace vorn {
+namespace {
+
+constexpr int kMostLines = 100;  // of a program's output in the log
+
+}  // namespace
+
+Status RunBoxProgram(Box& box, const std::string& program, const std::vector<std::string>& arguments) {
+  const Result<std::string> path = box.root().Locate(program);
+  if (!path.ok()) return path.status();
+  if (Status status = CheckMayWrite(program); !status.ok()) return status;
+  const LockPause pause;
+  ProgramOptions options;
+  options.root = box.root().directory();
+  int count = 0;
+  const auto log_line = [&](std::string_view line) {
+    if (count++ >= kMostLines) return;
+    syslog(LOG_INFO, "%s: %.*s", program.c_str(), static_cast<int>(line.size()), line.data());
+  };
+  Status status = RunProgram(*path, arguments, log_line, options);
+  if (count > kMostLines) syslog(LOG_INFO, "%s: %d more lines", program.c_str(), count - kMostLines);
+  return status;
+}
+
+}  // namespace vorn

@@ -1,0 +1,62 @@
+#include "service_control.h"
+
+#include <chrono>
+#include <functional>
+#include <memory>
+
+#include "configuration_lock.h"
+#include "live_settings.h"
+#include "write_access.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kQueue[] = "/run/vorn/service-nfsd.lock";
+
+// Longer than a restart may take with all its jobs.
+constexpr std::chrono::minutes kQueueLimit{10};
+
+Result<Engine*> EngineOf(Box& box, const std::string& service) {
+  if (service != "nfsd") return Status::Failure(kUnknownService, "there is no service \"" + service + "\"");
+  return box.engine();
+}
+
+Status Operate(Box& box, const std::string& service, const std::function<Status(Engine&)>& operation) {
+  const Result<Engine*> engine = EngineOf(box, service);
+  if (!engine.ok()) return engine.status();
+  if (Status status = CheckMayWrite("the service " + service); !status.ok()) return status;
+  const LockPause pause;
+  const Result<std::unique_ptr<HeldLock>> turn = box.Lock(kQueue, kQueueLimit);
+  return turn.ok() ? operation(**engine) : turn.status();
+}
+
+}  // namespace
+
+Result<bool> IsServiceEnabled(Box& box, const std::string& service) {
+  const Result<Engine*> engine = EngineOf(box, service);
+  return engine.ok() ? (*engine)->IsEnabled() : engine.status();
+}
+
+Status StartService(Box& box, const std::string& service) {
+  return Operate(box, service, [&box](Engine& engine) {
+    const Status prepared = PrepareTransferSizes(box);
+    return prepared.ok() ? engine.Start() : prepared;
+  });
+}
+
+Status StopService(Box& box, const std::string& service) {
+  return Operate(box, service, [](Engine& engine) { return engine.Stop(); });
+}
+
+Status RestartService(Box& box, const std::string& service) {
+  return Operate(box, service, [&box](Engine& engine) {
+    const Status prepared = PrepareTransferSizes(box);
+    return prepared.ok() ? engine.Restart() : prepared;
+  });
+}
+
+Status ReloadService(Box& box, const std::string& service) {
+  return Operate(box, service, [](Engine& engine) { return engine.Reload(); });
+}
+
+}  // namespace vorn

@@ -1,0 +1,178 @@
+// What a box promises to readers and writers: shared documents, and no lost edit.
+#include "box.h"
+
+#include <gmock/gmock.h>
+
+#include <cerrno>
+#include <memory>
+
+#include "call.h"
+#include "captured_log.h"
+#include "configuration_lock.h"
+#include "core.h"
+#include "current_box.h"
+#include "firewall.h"
+#include "nfsconf.h"
+#include "processes.h"
+#include "temporary_root.h"
+
+namespace vorn {
+namespace {
+
+using testing::Contains;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+constexpr char kFile[] = "/etc/nfs.conf";
+
+int parses = 0;
+
+Result<std::string> Parse(StoredFile file) {
+  ++parses;
+  return std::move(file.text);
+}
+
+std::string Load(Box& box) {
+  const auto text = box.Load<std::string>(kFile, Parse);
+  EXPECT_TRUE(text.ok()) << text.status().reason();
+  return text.ok() ? **text : "";
+}
+
+// Waits until the file is old enough to be kept.
+void Settle(Box& box) {
+  ASSERT_TRUE(Eventually([&] { return box.Read(kFile)->is_settled; }));
+}
+
+TEST(Box, ParsesAnUnchangedFileOnce) {
+  const TemporaryRoot root;
+  root.Write(kFile, "text");
+  Box& box = CurrentBox();
+  Settle(box);
+  parses = 0;
+  const auto first = box.Load<std::string>(kFile, Parse);
+  const auto second = box.Load<std::string>(kFile, Parse);
+  EXPECT_EQ(parses, 1);
+  EXPECT_EQ(first->get(), second->get()) << "readers share the document";
+}
+
+TEST(Box, ParsesAChangedFileAgain) {
+  const TemporaryRoot root;
+  root.Write(kFile, "one");
+  Box& box = CurrentBox();
+  Settle(box);
+  EXPECT_EQ(Load(box), "one");
+  root.Write(kFile, "three");
+  EXPECT_EQ(Load(box), "three");
+}
+
+TEST(Box, NeverKeepsAFileThatMayChangeWithoutANewVersion) {
+  const TemporaryRoot root;
+  Box& box = CurrentBox();
+  for (int i = 0; i < 1000; ++i) {
+    const std::string text = std::to_string(1000 + i);  // always of the same size
+    root.Write(kFile, text);
+    ASSERT_EQ(Load(box), text);
+  }
+}
+
+TEST(Box, RefusesAWriteIfTheFileChangedSinceTheContextReadIt) {
+  const TemporaryRoot root;
+  root.Write(kFile, "one");
+  Box& box = CurrentBox();
+  const ConfigurationLock lock(box);
+  Load(box);
+  root.Write(kFile, "by hand");
+  const Result<StoredFile> later = box.Read(kFile);
+  EXPECT_EQ(box.Replace(kFile, "two", later->version).code(), kChangedBehind);
+  EXPECT_EQ(root.Read(kFile), "by hand");
+}
+
+TEST(Box, AcceptsSeveralWritesOfOneContext) {
+  const TemporaryRoot root;
+  Box& box = CurrentBox();
+  const ConfigurationLock lock(box);
+  for (const char* text : {"one", "two", "three"}) {
+    const Result<StoredFile> file = box.Read(kFile);
+    EXPECT_TRUE(box.Replace(kFile, text, file->version).ok());
+  }
+  EXPECT_EQ(root.Read(kFile), "three");
+}
+
+TEST(Box, ForgetsWhatAContextReadWhenItEnds) {
+  const TemporaryRoot root;
+  root.Write(kFile, "one");
+  Box& box = CurrentBox();
+  {
+    const ConfigurationLock lock(box);
+    Load(box);
+  }
+  root.Write(kFile, "by hand");
+  const ConfigurationLock lock(box);
+  const Result<StoredFile> file = box.Read(kFile);
+  EXPECT_TRUE(box.Replace(kFile, "two", file->version).ok());
+}
+
+// A call that may only read.
+class ReadOnlyCall : public testing::Test {
+ protected:
+  ReadOnlyCall() {
+    VORN::CallDescription description;
+    description.method = "VORN.Core.FileServ.NFS/v1/get";
+    description.may_write = false;
+    call_ = std::make_unique<VORN::CallContext>(description);
+  }
+
+  const TemporaryRoot root_;
+  std::unique_ptr<VORN::CallContext> call_;
+};
+
+TEST_F(ReadOnlyCall, TakesNoLock) {
+  const VornConf configuration;
+  EXPECT_THAT(root_.Names(""), IsEmpty());
+  _tag_nfs_id_map_* map = VORNNFSIDMapGet();
+  EXPECT_NE(map, nullptr);
+  VORNNFSIDMapFree(map);
+  EXPECT_THAT(root_.Names(""), IsEmpty());
+}
+
+TEST_F(ReadOnlyCall, ChangesNothing) {
+  root_.Write("/bin/program", "#!/bin/sh\ntouch \"$VORN_ROOT/touched\"\n");
+  root_.Write("/etc/vorn/platform.conf", "[platform]\nfirewall = yes\n");
+  const auto before = root_.Names("/");
+  const NFSConfRecord record{};
+  const ExportRuleList rules{};
+  _tag_nfs_id_map_* map = VORNNFSIDMapGet();
+  ASSERT_NE(map, nullptr);
+  KLIBCSzHashSetValue(&map->table, "alice@LAB.TEST", "alice");
+  const struct {
+    const char* name;
+    int result;
+  } cases[] = {
+      {"the record", VORNNFSConfSet(&record)},
+      {"the ID map", VORNNFSIDMapSet("/etc/idmapd.conf", map)},
+      {"export rules", VORNNFSRuleExtSetAll("/volume1/data", &rules)},
+      {"transfer sizes", VORNNFSUDPPrefSizeSet(8192, 8192)},
+      {"UNIX permissions", VORNNFSUNIXPriEnableSet(1)},
+      {"a start", KLIBServiceStart("nfsd", 0)},
+      {"a stop", KLIBServiceStop("nfsd", 0)},
+      {"a restart", KLIBServiceRestart("nfsd")},
+      {"a reload", KLIBServiceReload("nfsd")},
+      {"the firewall", VORNFwRuleHup()},
+      {"a program", KLIBCExec("/bin/program", nullptr, nullptr, nullptr, nullptr)},
+  };
+  VORNNFSIDMapFree(map);
+  for (const auto& c : cases) EXPECT_LT(c.result, 0) << c.name;
+  EXPECT_EQ(KLIBCErrGet(), EROFS);
+  EXPECT_EQ(root_.Names("/"), before);
+  EXPECT_THAT(call_->reasons(), Contains(HasSubstr("VORN.Core.FileServ.NFS/v1/get, which may only read")));
+}
+
+TEST(CallContext, CollectsTheReasonOfAFailure) {
+  const TemporaryRoot root;
+  const VORN::CallContext call({});
+  EXPECT_LT(KLIBServiceStart("ftpd", 0), 0);
+  EXPECT_THAT(call.reasons(), testing::ElementsAre("there is no service \"ftpd\""));
+}
+
+}  // namespace
+}  // namespace vorn

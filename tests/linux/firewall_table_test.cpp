@@ -1,0 +1,119 @@
+// The firewall's table, in a network of the test's own. The judge is nft(8).
+#include <gmock/gmock.h>
+
+#include <cerrno>
+
+#include "core.h"
+#include "firewall.h"
+#include "injected_failures.h"
+#include "nfsconf.h"
+#include "processes.h"
+#include "status.h"
+#include "temporary_root.h"
+
+namespace {
+
+using testing::AllOf;
+using testing::HasSubstr;
+using testing::Not;
+
+std::string Ruleset() {
+  const ProgramResult result = RunProgram({"nft", "list", "ruleset"});
+  EXPECT_EQ(result.status, 0) << result.errors;
+  return result.output;
+}
+
+class Firewall : public testing::Test {
+ protected:
+  Firewall() {
+    EXPECT_EQ(RunProgram({"nft", "flush", "ruleset"}).status, 0);
+    Switch("yes");
+  }
+
+  void Switch(const std::string& state) const {
+    root_.Write("/etc/vorn/platform.conf", "[platform]\nfirewall = " + state + "\n");
+  }
+
+  static void SetPorts(int statd, int nlm) {
+    NFSConfRecord record{};
+    record.statd_port = statd;
+    record.nlm_port = nlm;
+    record.custom_port_enable = 1;
+    ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  }
+
+  const TemporaryRoot root_;
+};
+
+TEST_F(Firewall, MarksWhatComesForTheConfiguredPortsInATableOfItsOwn) {
+  SetPorts(4000, 4001);
+  root_.Write("/etc/nfs.conf", "[mountd]\nport = 20048\n");
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const auto mark = [](const std::string& port, const std::string& service) {
+    return "\t\tmeta l4proto { tcp, udp } th dport " + port + " meta mark set meta mark | 0x01000000 comment \"" +
+           service + "\"\n";
+  };
+  EXPECT_EQ(Ruleset(),
+            "table inet vorn {\n\tchain nfs {\n"
+            "\t\ttype filter hook input priority filter - 1; policy accept;\n" +
+                mark("111", "rpcbind") + mark("2049", "nfs") + mark("20048", "nfs_mountd") + mark("4000", "nfs_statd") +
+                mark("4001", "nfs_nlm") + "\t}\n}\n");
+}
+
+TEST_F(Firewall, IsKeptInAFileThatBringsItBack) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const std::string before = Ruleset();
+  ASSERT_EQ(RunProgram({"nft", "flush", "ruleset"}).status, 0);
+  for (const char* time : {"the first time", "over itself"}) {
+    EXPECT_EQ(RunProgram({"nft", "-f", root_.At("/var/lib/vorn/firewall.nft")}).status, 0) << time;
+    EXPECT_EQ(Ruleset(), before) << time;
+  }
+}
+
+TEST_F(Firewall, FollowsAChangeWithoutATraceOfTheOldPorts) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  SetPorts(5000, 5001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  EXPECT_THAT(Ruleset(), AllOf(HasSubstr("dport 5000"), HasSubstr("dport 5001"), Not(HasSubstr("dport 400"))));
+}
+
+TEST_F(Firewall, LeavesOtherTablesAlone) {
+  const std::string theirs = "table inet site { chain input { type filter hook input priority 0; policy drop; }; }";
+  ASSERT_EQ(RunProgram({"nft", theirs}).status, 0);
+  const std::string before = Ruleset();
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  EXPECT_THAT(Ruleset(), HasSubstr(before));
+}
+
+TEST_F(Firewall, IsLeftAloneWhileItIsSwitchedOff) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const std::string before = Ruleset();
+  Switch("no");
+  SetPorts(5000, 5001);
+  EXPECT_EQ(VORNFwRuleHup(), 0);
+  EXPECT_EQ(Ruleset(), before);
+}
+
+TEST_F(Firewall, KeepsTheOldRulesWhereThePortsCannotBeRead) {
+  SetPorts(4000, 4001);
+  ASSERT_EQ(VORNFwRuleHup(), 0);
+  const std::string before = Ruleset();
+  root_.Write("/etc/nfs.conf", "[mountd]\nport = many\n");
+  EXPECT_LT(VORNFwRuleHup(), 0);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+  EXPECT_EQ(Ruleset(), before);
+}
+
+TEST_F(Firewall, FailsWithTheReasonWhereTheKernelCannotBeAsked) {
+  ChildProcess child([] {
+    if (!FailSystemCall(SYS_sendmsg, EPERM)) return 1;
+    return VORNFwRuleHup() < 0 && KLIBCErrGet() == vorn::kServiceFailed ? 0 : 2;
+  });
+  EXPECT_EQ(child.Wait(), 0);
+  EXPECT_EQ(Ruleset(), "");
+}
+
+}  // namespace

@@ -1,0 +1,245 @@
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <string>
+
+#include "captured_log.h"
+#include "ini_judge.h"
+#include "nfsconf.h"
+#include "status.h"
+#include "temporary_root.h"
+
+namespace {
+
+constexpr char kFile[] = "/etc/nfs.conf.d/vorn.conf";
+
+NFSConfRecord Get() {
+  NFSConfRecord record;
+  std::memset(&record, 0x5a, sizeof record);
+  EXPECT_EQ(VORNNFSConfGet(&record), 0);
+  return record;
+}
+
+NFSConfRecord Full() {
+  NFSConfRecord record{};
+  record.read_size = 65536;
+  record.write_size = 32768;
+  std::strcpy(record.kerberos_principal, "nfs/box.example@EXAMPLE");
+  record.enable_nfs_v4 = 1;
+  record.unix_pri_enable = 1;
+  record.statd_port = 4000;
+  record.nlm_port = 4001;
+  record.custom_port_enable = 1;
+  return record;
+}
+
+bool Same(const NFSConfRecord& a, const NFSConfRecord& b) {
+  return a.read_size == b.read_size && a.write_size == b.write_size &&
+         std::strcmp(a.kerberos_principal, b.kerberos_principal) == 0 && a.enable_nfs_v4 == b.enable_nfs_v4 &&
+         a.unix_pri_enable == b.unix_pri_enable && a.statd_port == b.statd_port && a.nlm_port == b.nlm_port &&
+         a.custom_port_enable == b.custom_port_enable;
+}
+
+// The value that the services read.
+std::string Judged(const TemporaryRoot& root, const char* section, const char* key) {
+  return GetByNfsconf(root.At("/etc/nfs.conf"), section, key);
+}
+
+TEST(NFSConf, OfABoxWithoutFilesHasTheServicesDefaults) {
+  const TemporaryRoot root;
+  NFSConfRecord defaults{};
+  defaults.enable_nfs_v4 = 1;
+  EXPECT_TRUE(Same(Get(), defaults));
+}
+
+TEST(NFSConf, ComesBackAsItWasStored) {
+  const TemporaryRoot root;
+  const NFSConfRecord full = Full();
+  ASSERT_EQ(VORNNFSConfSet(&full), 0);
+  EXPECT_TRUE(Same(Get(), full));
+  const NFSConfRecord empty{};
+  ASSERT_EQ(VORNNFSConfSet(&empty), 0);
+  EXPECT_TRUE(Same(Get(), empty));
+}
+
+TEST(NFSConf, IsReadByTheServices) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[nfsd]\nvers4=n\nvers3=y\n[mountd]\nmanage-gids=n\n");
+  const NFSConfRecord record = Full();
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  const struct {
+    const char* section;
+    const char* key;
+    const char* value;
+  } cases[] = {{"nfsd", "vers4", "y"},        {"nfsd", "vers3", "y"},    {"nfsd", "vers4.1", ""},
+               {"statd", "port", "4000"},     {"lockd", "port", "4001"}, {"lockd", "udp-port", "4001"},
+               {"mountd", "manage-gids", "y"}};
+  for (const auto& c : cases) EXPECT_EQ(Judged(root, c.section, c.key), c.value) << c.section << " " << c.key;
+}
+
+TEST(NFSConf, TurnsVersion4OffWhateverMinorVersionsAreAskedFor) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[nfsd]\nvers4.1=y\nvers4.2=y\n");
+  NFSConfRecord record = Full();
+  record.enable_nfs_v4 = 0;
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  for (const char* key : {"vers4", "vers4.0", "vers4.1", "vers4.2"}) EXPECT_EQ(Judged(root, "nfsd", key), "n") << key;
+  record.enable_nfs_v4 = 1;
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  EXPECT_EQ(Judged(root, "nfsd", "vers4"), "y");
+  EXPECT_EQ(Judged(root, "nfsd", "vers4.0"), "");
+  EXPECT_EQ(Judged(root, "nfsd", "vers4.1"), "y");
+}
+
+TEST(NFSConf, RemembersPortsThatAreNotInUse) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "");  // nfsconf(8) reads nothing without it; the services do
+  NFSConfRecord record = Full();
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  record.custom_port_enable = 0;
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  for (const char* section : {"statd", "lockd"}) EXPECT_EQ(Judged(root, section, "port"), "") << section;
+  EXPECT_EQ(Judged(root, "lockd", "udp-port"), "");
+  EXPECT_TRUE(Same(Get(), record));
+  record.custom_port_enable = 1;
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  EXPECT_EQ(Judged(root, "statd", "port"), "4000");
+}
+
+TEST(NFSConf, FollowsTheAdministratorsOwnFiles) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf",
+             "[nfsd]\nvers4=off\n[mountd]\nmanage-gids = TRUE\n[statd]\nport=0x10\n[lockd]\nport=10\n");
+  root.Write("/etc/nfs.conf.d/2.conf", "[lockd]\nport=2\n");
+  root.Write("/etc/nfs.conf.d/10.conf", "[lockd]\nport=11\n");
+  root.Write("/etc/nfs.conf.d/.hidden.conf", "[lockd]\nport=12\n");
+  root.Write("/etc/nfs.conf.d/9.conf~", "[lockd]\nport=13\n");
+  const NFSConfRecord record = Get();
+  EXPECT_EQ(record.enable_nfs_v4, 0);
+  EXPECT_EQ(record.unix_pri_enable, 1);
+  EXPECT_EQ(record.statd_port, 16);
+  EXPECT_EQ(record.nlm_port, 11);
+  EXPECT_EQ(std::to_string(record.nlm_port), Judged(root, "lockd", "port"));
+  EXPECT_EQ(record.custom_port_enable, 1);
+}
+
+TEST(NFSConf, KeepsWhatIsNotItsOwn) {
+  const TemporaryRoot root;
+  root.Write(kFile, "# by hand\n[nfsd]\n threads = 16 ; many\nvers4 = y # keep\n\n[gssd]\nverbosity=1\n");
+  NFSConfRecord record = Get();
+  record.enable_nfs_v4 = 0;
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  const std::string text = root.Read(kFile).value_or("");
+  EXPECT_EQ(text.find("# by hand\n[nfsd]\n threads = 16 ; many\nvers4 = n # keep\n"), 0U) << text;
+  EXPECT_NE(text.find("\n\n[gssd]\nverbosity=1\n"), std::string::npos) << text;
+}
+
+TEST(NFSConf, WritesNothingThatIsThereAlready) {
+  const TemporaryRoot root;
+  const NFSConfRecord record = Full();
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  const std::string text = root.Read(kFile).value_or("");
+  ASSERT_EQ(std::rename(root.At(kFile).c_str(), root.At("/kept").c_str()), 0);
+  root.Write(kFile, text);
+  struct stat before {};
+  struct stat after {};
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &before), 0);
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &after), 0);
+  EXPECT_EQ(before.st_ino, after.st_ino);
+}
+
+TEST(NFSConf, RefusesToOverwriteAHandEdit) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[nfsd]\nvers4 = y\n");
+  NFSConfRecord record = Get();
+  record.read_size = 4096;
+  const std::string edited = "# switched off for the audit\n[nfsd]\nvers4 = n\n";
+  root.Write(kFile, edited);
+  for (int attempt = 0; attempt < 2; ++attempt) {
+    EXPECT_LT(VORNNFSConfSet(&record), 0) << attempt;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kChangedBehind);
+    EXPECT_EQ(root.Read(kFile), edited);
+  }
+  record = Get();
+  EXPECT_EQ(record.enable_nfs_v4, 0);
+  record.read_size = 4096;
+  EXPECT_EQ(VORNNFSConfSet(&record), 0);
+  root.Write(kFile, edited);
+  EXPECT_EQ(VORNNFSConfSet(&record), 0) << "a record that was not read is a record to store";
+}
+
+TEST(NFSConf, NamesTheLineThatIsNoValue) {
+  const struct {
+    const char* text;
+    const char* reason;
+  } cases[] = {
+      {"[vorn]\nread-size = big\n", "vorn.conf:2: read-size is no number"},
+      {"[vorn]\n\nread-size = -1\n", "vorn.conf:3: read-size is no number"},
+      {"[vorn]\nwrite-size = 99999999999\n", "vorn.conf:2: write-size is no number"},
+      {"[nfsd]\nvers4 = maybe\n", "vorn.conf:2: vers4 is neither yes nor no"},
+      {"[statd]\nport = 65536\n", "vorn.conf:2: port is no number from 0 to 65535"},
+      {"[vorn]\ncustom-ports = 5\n", "vorn.conf:2: custom-ports is neither"},
+  };
+  for (const auto& c : cases) {
+    const TemporaryRoot root;
+    root.Write(kFile, c.text);
+    TakeLog();
+    NFSConfRecord record = Full();
+    EXPECT_LT(VORNNFSConfGet(&record), 0) << c.text;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax) << c.text;
+    EXPECT_TRUE(Same(record, Full())) << c.text;
+    const std::vector<LogLine> log = TakeLog();
+    ASSERT_EQ(log.size(), 1U);
+    EXPECT_NE(log[0].text.find(c.reason), std::string::npos) << log[0].text;
+  }
+}
+
+TEST(NFSConf, TakesAPrincipalOfAnyLengthThatFits) {
+  const TemporaryRoot root;
+  NFSConfRecord record = Full();
+  std::memset(record.kerberos_principal, 'p', sizeof record.kerberos_principal);
+  record.kerberos_principal[515] = '\0';
+  ASSERT_EQ(VORNNFSConfSet(&record), 0);
+  EXPECT_TRUE(Same(Get(), record));
+  root.Write(kFile, "[vorn]\nkerberos-principal = " + std::string(516, 'p') + "\n");
+  EXPECT_LT(VORNNFSConfGet(&record), 0);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+}
+
+TEST(NFSConf, RefusesARecordThatNoFileCanCarry) {
+  const struct {
+    const char* name;
+    void (*spoil)(NFSConfRecord*);
+    int code;
+  } cases[] = {
+      {"negative read size", [](NFSConfRecord* r) { r->read_size = -1; }, EINVAL},
+      {"negative write size", [](NFSConfRecord* r) { r->write_size = -1; }, EINVAL},
+      {"negative port", [](NFSConfRecord* r) { r->statd_port = -1; }, EINVAL},
+      {"port out of range", [](NFSConfRecord* r) { r->nlm_port = 65536; }, EINVAL},
+      {"line feed", [](NFSConfRecord* r) { std::strcpy(r->kerberos_principal, "a\n[nfsd]\nvers4=n"); },
+       vorn::kRefusedText},
+      {"variable", [](NFSConfRecord* r) { std::strcpy(r->kerberos_principal, "$HOME"); }, vorn::kRefusedText},
+      {"principal without end", [](NFSConfRecord* r) { std::memset(r->kerberos_principal, 'p', 516); },
+       vorn::kRefusedText},
+  };
+  const TemporaryRoot root;
+  const NFSConfRecord full = Full();
+  ASSERT_EQ(VORNNFSConfSet(&full), 0);
+  const auto before = root.Read(kFile);
+  for (const auto& c : cases) {
+    NFSConfRecord record = Full();
+    c.spoil(&record);
+    record.enable_nfs_v4 = 0;
+    EXPECT_LT(VORNNFSConfSet(&record), 0) << c.name;
+    EXPECT_EQ(KLIBCErrGet(), c.code) << c.name;
+    EXPECT_EQ(root.Read(kFile), before) << c.name;
+  }
+  EXPECT_LT(VORNNFSConfSet(nullptr), 0);
+  EXPECT_LT(VORNNFSConfGet(nullptr), 0);
+}
+
+}  // namespace

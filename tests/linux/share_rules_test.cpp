@@ -1,0 +1,258 @@
+// The contract's operations on export rules, on a root of their own.
+#include "share_rules.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "captured_log.h"
+#include "core.h"
+#include "current_box.h"
+#include "exportfs_judge.h"
+#include "nfsconf.h"
+#include "status.h"
+#include "temporary_root.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+constexpr const char* kFile = "/etc/exports";
+
+struct FreeList {
+  void operator()(ExportRuleList* list) const { VORNNFSRuleExtFree(list); }
+};
+using List = std::unique_ptr<ExportRuleList, FreeList>;
+
+class Exports : public testing::Test {
+ protected:
+  Exports() {
+    root.Write("/etc/passwd", "admin:x:1024:100::/:/bin/sh\nnobody:x:65534:65534:::\n");
+    TakeLog();
+  }
+
+  std::string File() const { return root.Read(kFile).value_or("(none)"); }
+
+  TemporaryRoot root;
+};
+
+// A list of rules as the module makes one: each from malloc(3).
+List MakeList(const std::vector<std::string>& clients) {
+  List list(static_cast<ExportRuleList*>(std::calloc(1, sizeof(ExportRuleList))));
+  ExportRule** last = &list->first;
+  for (const std::string& client : clients) {
+    *last = static_cast<ExportRule*>(std::calloc(1, sizeof(ExportRule)));
+    client.copy((*last)->client, sizeof(*last)->client);
+    (*last)->privilege = 1;
+    (*last)->write_mode = VORNNFS_WRITE_SYNC;
+    (*last)->squash = VORNNFS_SQUASH_ROOT;
+    (*last)->sys = 1;
+    last = &(*last)->next;
+  }
+  return list;
+}
+
+List Get(const char* path, int expected) {
+  ExportRuleList* list = nullptr;
+  EXPECT_EQ(VORNNFSRuleExtGet(kFile, path, &list), expected);
+  return List(list);
+}
+
+std::vector<std::string> Clients(const List& list) {
+  std::vector<std::string> clients;
+  for (const ExportRule* rule = list ? list->first : nullptr; rule != nullptr; rule = rule->next) {
+    clients.emplace_back(rule->client);
+  }
+  return clients;
+}
+
+TEST_F(Exports, OfAShareWithoutALineAreNone) {
+  EXPECT_EQ(Get("/volume1/data", 0), nullptr);
+  root.Write(kFile, "/volume1/other *(rw)\n");
+  EXPECT_EQ(Get("/volume1/data", 0), nullptr);
+}
+
+TEST_F(Exports, AreReadFromAllLinesInOrder) {
+  root.Write(kFile, "/volume1/data b(rw) \\\n a\n/volume1/other x\n\"/volume1/data/\" -async c(no_root_squash)\n");
+  const List list = Get("/volume1/data", 3);
+  EXPECT_THAT(Clients(list), ElementsAre("b", "a", "c"));
+  EXPECT_STREQ(list->path, "/volume1/data");
+  EXPECT_EQ(list->first->privilege, 1);
+  EXPECT_EQ(list->first->next->privilege, 0);
+  EXPECT_EQ(list->first->next->next->write_mode, VORNNFS_WRITE_ASYNC);
+  EXPECT_EQ(list->first->next->next->squash, VORNNFS_SQUASH_ROOT);
+}
+
+TEST_F(Exports, AreReadAlsoAfterAFaultyLine) {
+  root.Write(kFile, "/x y(foo)\n/volume1/data b\n");
+  EXPECT_THAT(Clients(Get("/volume1/data", 1)), ElementsAre("b"));
+}
+
+TEST_F(Exports, CannotBeReadFromAFileThatIsNone) {
+  ASSERT_EQ(mkdir(root.At("/etc/exports").c_str(), 0755), 0);
+  Get("/volume1/data", -1);
+  EXPECT_NE(KLIBCErrGet(), 0);
+}
+
+TEST_F(Exports, BecomeOneLineAmongTheOthers) {
+  root.Write(kFile, "# ours\n/volume1/a x(rw) # one\n/volume1/data y\n\n/volume1/b z(ro)\n/volume1/data w\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"10.0.0.1", "*.example", "@farm"}).get()), 0);
+  EXPECT_EQ(File(),
+            "# ours\n/volume1/a x(rw) # one\n"
+            "/volume1/data 10.0.0.1(rw,sync,no_subtree_check,no_root_squash,sec=sys)"
+            " *.example(rw,sync,no_subtree_check,no_root_squash,sec=sys)"
+            " @farm(rw,sync,no_subtree_check,no_root_squash,sec=sys)\n"
+            "\n/volume1/b z(ro)\n");
+  EXPECT_THAT(Clients(Get("/volume1/data", 3)), ElementsAre("10.0.0.1", "*.example", "@farm"));
+}
+
+TEST_F(Exports, MakeAFileWhereThereIsNone) {
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/my data", MakeList({"*"}).get()), 0);
+  EXPECT_EQ(File(), "/volume1/my\\040data *(rw,sync,no_subtree_check,no_root_squash,sec=sys)\n");
+}
+
+TEST_F(Exports, GoWithTheirLines) {
+  root.Write(kFile, "/volume1/a x\n/volume1/data y\n/volume1/data z\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", nullptr), 0);
+  EXPECT_EQ(File(), "/volume1/a x\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/a", MakeList({}).get()), 0);
+  EXPECT_EQ(File(), "");
+}
+
+TEST_F(Exports, KeepWhatTheRecordCannotCarry) {
+  root.Write(kFile, "/volume1/data a(ro,fsid=5,no_root_squash) \"b\"(rw,no_wdelay,no_root_squash)\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"b", "a"}).get()), 0);
+  EXPECT_EQ(File(), "/volume1/data \"b\"(rw,no_wdelay,no_root_squash) a(rw,sync,fsid=5,no_root_squash,sec=sys)\n");
+}
+
+TEST_F(Exports, ThatDoNotChangeAreNotWritten) {
+  root.Write(kFile, "/volume1/data -rw a(fsid=5) gss/krb5(sec=krb5,ro)\n# c\n/volume1/data b");
+  const List list = Get("/volume1/data", 3);
+  struct stat before {};
+  struct stat after {};
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &before), 0);
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &after), 0);
+  EXPECT_EQ(before.st_ino, after.st_ino);
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/none", nullptr), 0);
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &after), 0);
+  EXPECT_EQ(before.st_ino, after.st_ino);
+}
+
+TEST_F(Exports, KeepAnOddClientThatTheFileHas) {
+  root.Write(kFile, "/volume1/data gss/krb5(ro) 10.0.0.0/255.0.255.0(ro) 10.0.0.1 10.0.0.1/32\n");
+  const List list = Get("/volume1/data", 4);
+  list->first->privilege = 1;
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  EXPECT_THAT(Clients(Get("/volume1/data", 4)),
+              ElementsAre("gss/krb5", "10.0.0.0/255.0.255.0", "10.0.0.1", "10.0.0.1/32"));
+}
+
+TEST_F(Exports, AreRefusedWithAReasonAndNothingIsWritten) {
+  const std::string before = "/volume1/data kept(rw)\n";
+  const std::vector<std::string> refused[] = {{""},
+                                              {"a", "b\n/etc *(rw)"},
+                                              {"a\t"},
+                                              {"#a"},
+                                              {"a\\"},
+                                              {"a\n"},
+                                              {"10.0.0.0/210"},
+                                              {"host["},
+                                              {"gss/krb5"},
+                                              {"a", "A"},
+                                              {"10.0.0.1", "10.0.0.1/32"},
+                                              {"10.0.0.0/8", "10.9.9.9/255.0.0.0"},
+                                              {std::string(1024, 'x')},
+                                              {std::string(600, '*')}};
+  for (const auto& clients : refused) {
+    root.Write(kFile, before);
+    EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList(clients).get()), -1) << clients.back();
+    EXPECT_EQ(KLIBCErrGet(), vorn::kRefusedText) << clients.back();
+    EXPECT_EQ(File(), before) << clients.back();
+    EXPECT_EQ(TakeLog().size(), 1U) << clients.back();
+  }
+}
+
+TEST_F(Exports, OfAListWithoutAnEndAreRefused) {
+  const List list = MakeList({"a", "b"});
+  list->first->next->next = list->first;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  list->first->next->next = nullptr;
+  EXPECT_EQ(File(), "(none)");
+}
+
+TEST_F(Exports, OfAPathThatIsNotAbsoluteAreRefused) {
+  EXPECT_EQ(VORNNFSRuleExtSetAll("volume1", MakeList({"*"}).get()), -1);
+  EXPECT_EQ(VORNNFSRuleExtSetAll(nullptr, nullptr), -1);
+  EXPECT_EQ(VORNNFSRuleExtSetAll(("/" + std::string(2000, 'x')).c_str(), MakeList({"*"}).get()), -1);
+  EXPECT_EQ(File(), "(none)");
+}
+
+TEST_F(Exports, NeedTheAccountOfTheirSquashMode) {
+  root.Write("/etc/passwd", "root:x:0:0::/:/bin/sh\n");
+  const List list = MakeList({"*"});
+  list->first->squash = VORNNFS_SQUASH_ADMIN;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  EXPECT_EQ(File(), "(none)");
+}
+
+TEST_F(Exports, AreWrittenWhateverIsWrongWithOtherLines) {
+  root.Write(kFile, "/x y(foo)\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"a"}).get()), 0);
+  EXPECT_THAT(File(), HasSubstr("/x y(foo)\n/volume1/data a("));
+}
+
+// Compares the table with the file, as the platform does after a reload.
+vorn::Status CheckTable() {
+  const auto reloaded = vorn::ReadExportsVersion(vorn::CurrentBox());
+  return reloaded.ok() ? vorn::CheckExportTable(vorn::CurrentBox(), *reloaded) : reloaded.status();
+}
+
+TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
+  const vorn::ExportfsJudge judge;
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  const List list = MakeList({"10.0.0.1", "*.example", "10.1.0.0/16"});
+  list->first->squash = VORNNFS_SQUASH_ALL_ADMIN;
+  list->first->next->privilege = 0;
+  list->first->next->krb5p = 1;
+  list->first->next->next->insecure = 1;
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/mnt/a b", list.get()), 0);
+  const auto verdict = judge.Judge({File()}).front();
+  EXPECT_EQ(verdict.status, 0);
+  EXPECT_EQ(verdict.messages, "");
+  root.Write("/var/lib/nfs/etab", verdict.table);
+  EXPECT_TRUE(CheckTable().ok());
+  EXPECT_THAT(verdict.table, HasSubstr("10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,all_squash,"));
+  EXPECT_THAT(verdict.table, HasSubstr("anonuid=1024,anongid=100"));
+  EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,no_root_squash"));
+}
+
+TEST_F(Exports, AreComparedWithTheExportTable) {
+  root.Write(kFile, "/volume1/data *(rw)\n/volume1/link *(ro)\n");
+  root.Write("/volume1/data/file", "");
+  ASSERT_EQ(symlink("/volume1/data/..", root.At("/volume1/link").c_str()), 0);
+  root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n/volume1\t*(ro)\n");
+  EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
+  root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n");
+  EXPECT_THAT(CheckTable().reason(), HasSubstr("line 2 (/volume1/link)"));
+}
+
+TEST_F(Exports, AreNotComparedWithATableThatIsOlderThanTheirNextSave) {
+  root.Write(kFile, "/volume1/data *(rw)\n");
+  root.Write("/var/lib/nfs/etab", "");
+  const auto reloaded = vorn::ReadExportsVersion(vorn::CurrentBox());
+  ASSERT_TRUE(reloaded.ok());
+  EXPECT_FALSE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"10.0.0.1"}).get()), 0);
+  EXPECT_TRUE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
+}
+
+TEST(VORNNFSRuleExtFree, TakesNull) { VORNNFSRuleExtFree(nullptr); }
+
+}  // namespace

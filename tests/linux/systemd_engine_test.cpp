@@ -1,0 +1,168 @@
+#include <gmock/gmock.h>
+
+#include "current_box.h"
+#include "engines.h"
+#include "stand_in_manager.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::HasSubstr;
+using vorn::Status;
+
+class SystemdEngine : public testing::Test {
+ protected:
+  SystemdEngine() { SetThreads("8\n"); }
+
+  void SetThreads(const char* text) { folder_.Write("/threads", text); }
+
+  std::unique_ptr<vorn::Engine> Engine() {
+    vorn::SystemdOptions options;
+    options.bus_address = manager_.address();
+    options.threads_file = folder_.At("/threads");
+    options.job_limit = std::chrono::seconds(limit_);
+    return vorn::MakeSystemdEngine(vorn::CurrentBox(), options);
+  }
+
+  StandInManager manager_;
+  TemporaryRoot folder_;
+  int limit_ = 60;
+};
+
+const std::vector<std::string> kBringUp = {"Reload",
+                                           "ResetFailedUnit nfs-idmapd.service",
+                                           "ResetFailedUnit nfs-mountd.service",
+                                           "ResetFailedUnit nfs-server.service",
+                                           "Subscribe",
+                                           "TryRestartUnit rpc-statd.service replace"};
+
+// An export table in the format of exportfs(8).
+constexpr char kTable[] =
+    "/volume1/data\t10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,no_all_squash,no_subtree_check,"
+    "secure_locks,acl,no_pnfs,anonuid=65534,anongid=65534,sec=sys,rw,secure,root_squash,no_all_squash)\n";
+
+std::vector<std::string> Joined(std::vector<std::string> a, const std::vector<std::string>& b) {
+  a.insert(a.end(), b.begin(), b.end());
+  return a;
+}
+
+TEST_F(SystemdEngine, CountsAnEnabledUnitAsEnabled) {
+  for (const auto& [state, enabled] : std::vector<std::pair<const char*, bool>>{
+           {"enabled", true}, {"enabled-runtime", true}, {"disabled", false}, {"masked", false}, {"static", false}}) {
+    manager_.SetUnitFileState(state);
+    const auto answer = Engine()->IsEnabled();
+    ASSERT_TRUE(answer.ok()) << answer.status().reason();
+    EXPECT_EQ(*answer, enabled) << state;
+  }
+}
+
+TEST_F(SystemdEngine, StartsAndThenEnables) {
+  const Status status = Engine()->Start();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"StartUnit nfs-server.service replace",
+                                                                       "EnableUnitFiles nfs-server.service"})));
+}
+
+TEST_F(SystemdEngine, DoesNotEnableWhatDoesNotStart) {
+  manager_.End("StartUnit nfs-server.service", "failed");
+  EXPECT_FALSE(Engine()->Start().ok());
+  EXPECT_THAT(manager_.TakeCalls(), testing::Not(testing::Contains("EnableUnitFiles nfs-server.service")));
+}
+
+TEST_F(SystemdEngine, StopsAndDisables) {
+  EXPECT_TRUE(Engine()->Stop().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "StopUnit nfs-server.service replace",
+                                                "DisableUnitFiles nfs-server.service", "Reload"));
+}
+
+TEST_F(SystemdEngine, ForgetsOldFailuresAndMovesTheStatusDaemonBeforeARestart) {
+  EXPECT_TRUE(Engine()->Restart().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"RestartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, NeedsNoStatusDaemon) {
+  for (const char* error : {"NoSuchUnit", "UnitMasked"}) {
+    manager_.Refuse("TryRestartUnit rpc-statd.service", error);
+    const Status status = Engine()->Start();
+    EXPECT_TRUE(status.ok()) << error << ": " << status.reason();
+  }
+}
+
+TEST_F(SystemdEngine, FailsWithoutTheServersUnit) {
+  manager_.Refuse("RestartUnit nfs-server.service", "NoSuchUnit");
+  EXPECT_THAT(Engine()->Restart().reason(), HasSubstr("RestartUnit nfs-server.service is refused"));
+}
+
+TEST_F(SystemdEngine, ReloadsAndFindsTheTableThatTheFileAsksFor) {
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n");
+  folder_.Write("/var/lib/nfs/etab", kTable);
+  const Status status = Engine()->Reload();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "ReloadUnit nfs-server.service replace"));
+}
+
+TEST_F(SystemdEngine, NamesTheLineThatAReloadDidNotTake) {
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n\n/volume1/media 10.0.0.2(ro)\n");
+  folder_.Write("/var/lib/nfs/etab", kTable);
+  const Status status = Engine()->Reload();
+  EXPECT_EQ(status.code(), vorn::kServiceFailed);
+  EXPECT_THAT(status.reason(), HasSubstr("line 3 (/volume1/media)"));
+}
+
+TEST_F(SystemdEngine, HasNothingToReloadWhereTheKernelServesNobody) {
+  SetThreads("0\n");
+  EXPECT_TRUE(Engine()->Reload().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre());
+}
+
+TEST_F(SystemdEngine, FailsWhenTheUnitStartsButTheKernelServesNobody) {
+  SetThreads("0\n");
+  const Status status = Engine()->Start();
+  EXPECT_EQ(status.code(), vorn::kServiceFailed);
+  EXPECT_THAT(status.reason(), HasSubstr("no threads"));
+}
+
+TEST_F(SystemdEngine, FailsWithTheNameOfTheJobAndItsOutcome) {
+  for (const char* outcome : {"failed", "timeout", "dependency", "canceled"}) {
+    manager_.End("RestartUnit nfs-server.service", outcome);
+    const Status status = Engine()->Restart();
+    EXPECT_EQ(status.code(), vorn::kServiceFailed);
+    EXPECT_THAT(status.reason(), HasSubstr(std::string("RestartUnit nfs-server.service: the job ended as ") + outcome));
+  }
+}
+
+TEST_F(SystemdEngine, DoesNotWaitForEverForAJob) {
+  limit_ = 0;
+  manager_.End("StopUnit nfs-server.service", "never");
+  EXPECT_THAT(Engine()->Stop().reason(), HasSubstr("no end in sight"));
+}
+
+TEST_F(SystemdEngine, StopsWhereACallIsRefused) {
+  for (const char* call : {"EnableUnitFiles nfs-server.service", "StartUnit nfs-server.service",
+                           "TryRestartUnit rpc-statd.service", "Reload", "Subscribe"}) {
+    StandInManager manager;
+    manager.Refuse(call);
+    vorn::SystemdOptions options;
+    options.bus_address = manager.address();
+    options.threads_file = folder_.At("/threads");
+    const Status status = vorn::MakeSystemdEngine(vorn::CurrentBox(), options)->Start();
+    EXPECT_EQ(status.code(), vorn::kServiceFailed) << call;
+    EXPECT_THAT(status.reason(), HasSubstr("is refused")) << call;
+    EXPECT_THAT(manager.TakeCalls().back(), HasSubstr(call)) << call;
+  }
+}
+
+TEST_F(SystemdEngine, IsNotStoppedByAnOldFailureThatCannotBeForgotten) {
+  manager_.Refuse("ResetFailedUnit nfs-idmapd.service");
+  EXPECT_TRUE(Engine()->Start().ok());
+}
+
+TEST_F(SystemdEngine, SaysThatThereIsNoBus) {
+  vorn::SystemdOptions options;
+  options.bus_address = "unix:path=" + folder_.At("/nobody");
+  EXPECT_THAT(vorn::MakeSystemdEngine(vorn::CurrentBox(), options)->IsEnabled().status().reason(),
+              HasSubstr("the system bus"));
+}
+
+}  // namespace

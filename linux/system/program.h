@@ -13,9 +13,9 @@
 namespace vorn {
 
 struct ProgramOptions {
-  std::string root = "/";                     // the value of VORN_ROOT in its environment
   std::chrono::milliseconds limit{60'000};    // its process group is terminated after this time
   std::chrono::milliseconds patience{2'000};  // from SIGTERM to SIGKILL
+  std::string root = "/";                     // the value of VORN_ROOT in its environment
 };
 
 // Runs the program at `path` (on this system) with these arguments and waits for it. No shell is involved. The

@@ -30,7 +30,7 @@ bool IsWithoutLinks(const std::string& top, const char* path) {
   const FileDescriptor folder(open(top.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!folder) return false;
   open_how how{};
-  how.flags = O_PATH | O_NOFOLLOW | O_CLOEXEC;
+  how.flags = O_PATH | O_CLOEXEC;
   how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS;
   const FileDescriptor file(static_cast<int>(syscall(SYS_openat2, folder.get(), path, &how, sizeof how)));
   return static_cast<bool>(file);

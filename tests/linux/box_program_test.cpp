@@ -67,7 +67,9 @@ TEST(RunProgram, FailsWithTheSystemsReasonWhenThereIsNoSuchProgram) {
 TEST(RunProgram, GivesNothingOfOursButTheEnvironmentThatIsSaid) {
   const TemporaryRoot root;
   setenv("SECRET", "x", 1);
-  const Outcome outcome = RunScript("cat; ls /proc/self/fd | wc -l; echo $VORN_ROOT; echo \"[$SECRET]\"");
+  ProgramOptions options;
+  options.root = root.directory();
+  const Outcome outcome = RunScript("cat; ls /proc/self/fd | wc -l; echo $VORN_ROOT; echo \"[$SECRET]\"", options);
   // Standard input, output and error, and the folder that ls reads.
   EXPECT_THAT(outcome.lines, ElementsAre("4", root.directory(), "[]"));
 }

@@ -4,10 +4,12 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <memory>
 #include <string>
 
 #include "captured_log.h"
 #include "ini_judge.h"
+#include "core.h"
 #include "nfsconf.h"
 #include "status.h"
 #include "temporary_root.h"
@@ -152,9 +154,10 @@ TEST(NFSConf, WritesNothingThatIsThereAlready) {
   EXPECT_EQ(before.st_ino, after.st_ino);
 }
 
-TEST(NFSConf, RefusesToOverwriteAHandEdit) {
+TEST(NFSConf, RefusesToOverwriteAHandEditOfTheContext) {
   const TemporaryRoot root;
   root.Write(kFile, "[nfsd]\nvers4 = y\n");
+  auto configuration = std::make_unique<VornConf>();
   NFSConfRecord record = Get();
   record.read_size = 4096;
   const std::string edited = "# switched off for the audit\n[nfsd]\nvers4 = n\n";
@@ -164,12 +167,21 @@ TEST(NFSConf, RefusesToOverwriteAHandEdit) {
     EXPECT_EQ(KLIBCErrGet(), vorn::kChangedBehind);
     EXPECT_EQ(root.Read(kFile), edited);
   }
+  configuration.reset();
+  configuration = std::make_unique<VornConf>();
   record = Get();
   EXPECT_EQ(record.enable_nfs_v4, 0);
   record.read_size = 4096;
   EXPECT_EQ(VORNNFSConfSet(&record), 0);
-  root.Write(kFile, edited);
-  EXPECT_EQ(VORNNFSConfSet(&record), 0) << "a record that was not read is a record to store";
+}
+
+TEST(NFSConf, StoresARecordThatNoContextRead) {
+  const TemporaryRoot root;
+  const NFSConfRecord record = Get();
+  root.Write(kFile, "# by hand\n[nfsd]\nvers4 = n\n");
+  EXPECT_EQ(VORNNFSConfSet(&record), 0);
+  EXPECT_EQ(Get().enable_nfs_v4, 1);
+  EXPECT_THAT(root.Read(kFile).value_or(""), testing::StartsWith("# by hand\n"));
 }
 
 TEST(NFSConf, NamesTheLineThatIsNoValue) {

@@ -135,7 +135,7 @@ TEST_F(SystemdEngine, FailsWithTheNameOfTheJobAndItsOutcome) {
 TEST_F(SystemdEngine, DoesNotWaitForEverForAJob) {
   limit_ = 0;
   manager_.End("StopUnit nfs-server.service", "never");
-  EXPECT_THAT(Engine()->Stop().reason(), HasSubstr("no end in sight"));
+  EXPECT_THAT(Engine()->Stop().reason(), HasSubstr("it did not end in time"));
 }
 
 TEST_F(SystemdEngine, StopsWhereACallIsRefused) {

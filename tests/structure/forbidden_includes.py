@@ -38,13 +38,16 @@ def is_within(path, folder):
 
 
 def compiler_of(folder, commands):
-    """The command that compiles one source of a folder, without its input and output."""
+    """The command that compiles a source of the folder's widest target, without its input and output."""
+    compilers = []
     for command in commands:
         if is_within(command["file"], folder):
             words = shlex.split(command["command"])
             words = words[: words.index("-o")]
-            return words[1:] if words[0].endswith("ccache") else words
-    sys.exit(f"forbidden_includes: no source of {folder} is compiled")
+            compilers.append(words[1:] if words[0].endswith("ccache") else words)
+    if not compilers:
+        sys.exit(f"forbidden_includes: no source of {folder} is compiled")
+    return max(compilers, key=len)
 
 
 def header_of(folder):

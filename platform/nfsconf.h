@@ -43,8 +43,8 @@ static_assert(offsetof(NFSConfRecord, custom_port_enable) == 540, "record layout
 // Fills the whole record. Settings that are not configured have the default of the service.
 int VORNNFSConfGet(NFSConfRecord* record);
 
-// Stores the whole record. Fails if the settings were edited by hand after this thread read the record, because the
-// edit would be lost. A running service adopts the settings at its next start, or by one of the two operations below.
+// Stores the whole record. Within a configuration context (VornConf) it fails if the settings were edited by hand after
+// the context read them, because the edit would be lost. A running service adopts the settings at its next start, or by one of the two operations below.
 int VORNNFSConfSet(const NFSConfRecord* record);
 
 // Applies the transfer sizes, in bytes, to the running service without interrupting its clients. Sizes that cannot be

@@ -8,8 +8,8 @@
 #include <string>
 
 #include "captured_log.h"
-#include "ini_judge.h"
 #include "core.h"
+#include "ini_judge.h"
 #include "nfsconf.h"
 #include "status.h"
 #include "temporary_root.h"

@@ -34,10 +34,6 @@ class NFSServiceHandler : public ServiceHandler {
   bool GetDataV2(Json::Value& result);
   bool CheckDataV2(const Json::Value& params);
   bool SetDataV2(const Json::Value& params);
-
- private:
-  // CheckData, then SetData if the check succeeded, with one look at each parameter.
-  bool CheckAndSet(const Json::Value& params);
 };
 
 #endif  // VORN_NFS_H

@@ -141,7 +141,7 @@ void NFSServiceHandler::Get() {
 }
 
 void NFSServiceHandler::Set() {
-  AnswerTo(HERE, [this](const Json::Value& params) { return CheckAndSet(params); });
+  AnswerTo(HERE, [this](const Json::Value& params) { return CheckData(params) && SetData(params); });
 }
 
 // Version 2 runs the data functions of version 1: docs/decisions/0015.
@@ -150,7 +150,7 @@ void NFSServiceHandler::GetV2() {
 }
 
 void NFSServiceHandler::SetV2() {
-  AnswerTo(HERE, [this](const Json::Value& params) { return CheckAndSet(params); });
+  AnswerTo(HERE, [this](const Json::Value& params) { return CheckData(params) && SetData(params); });
 }
 
 bool NFSServiceHandler::GetData(Json::Value& result) {
@@ -169,12 +169,6 @@ bool NFSServiceHandler::CheckData(const Json::Value& params) {
 
 bool NFSServiceHandler::SetData(const Json::Value& params) {
   return ApplyParameters(ServiceParameters(params)) || Fail(kPlatformFailure);
-}
-
-bool NFSServiceHandler::CheckAndSet(const Json::Value& params) {
-  const ServiceParameters given(params);
-  if (!CheckParameters(given)) return Fail(kBadParameter);
-  return ApplyParameters(given) || Fail(kPlatformFailure);
 }
 
 bool NFSServiceHandler::GetDataV2(Json::Value& result) {

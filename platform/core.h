@@ -121,8 +121,8 @@ int KLIBCFileGetSectionValue(const char* path, const char* section, const char* 
 // length in bytes. Text that is not valid UTF-8, or does not fit with its NUL, is an error.
 int KLIBCUnicodeUTF8StrUpper(const char* text, char* buffer, int size);
 
-// Returns a non-zero value if a file of any type exists at `path`. The path of an upload, which the web server chose,
-// is already below the root and used as it is.
+// Returns a non-zero value if a file of any type exists at `path`. The path of a file that was uploaded with the call
+// (call.h) is one of this system; every other path is below the root.
 int KLIBCFileExist(const char* path);
 
 // Runs `program` with up to four arguments and waits until it ends. The first null argument ends the list. No shell is

@@ -44,7 +44,8 @@ static_assert(offsetof(NFSConfRecord, custom_port_enable) == 540, "record layout
 int VORNNFSConfGet(NFSConfRecord* record);
 
 // Stores the whole record. Within a configuration context (VornConf) it fails if the settings were edited by hand after
-// the context read them, because the edit would be lost. A running service adopts the settings at its next start, or by one of the two operations below.
+// the context read them, because the edit would be lost. A running service adopts the settings at its next start, or by
+// one of the two operations below.
 int VORNNFSConfSet(const NFSConfRecord* record);
 
 // Applies the transfer sizes, in bytes, to the running service without interrupting its clients. Sizes that cannot be
@@ -105,8 +106,9 @@ enum {
 };
 
 // Checks all entries of the keytab at `path` and installs the file atomically as the keytab of the NFS service. Sets
-// the principal of the NFS configuration record to that of the keytab. The file at `path` stays. `path` is not resolved
-// below the root: the web server chose it. Returns one of the values above on failure, and a non-negative value on
+// the principal of the NFS configuration record to that of the keytab. The file at `path` stays. `path` is one of
+// this system: without a call context (call.h) any path, with one that of an upload of the call; every other path is
+// below the root. Returns one of the values above on failure, and a non-negative value on
 // success.
 int VORNNFSKeytabImport(const char* path);
 

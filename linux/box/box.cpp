@@ -1,7 +1,7 @@
 #include "box.h"
 
+#include "call_rights.h"
 #include "configuration_lock.h"
-#include "write_access.h"
 
 namespace vorn {
 

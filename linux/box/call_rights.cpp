@@ -1,10 +1,14 @@
-#include "write_access.h"
+#include "call_rights.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <vector>
 
 #include "call.h"
 
 namespace vorn {
+
+bool HasCallContext() { return VORN::CallContext::Current() != nullptr; }
 
 bool MayWrite() {
   const VORN::CallContext* call = VORN::CallContext::Current();
@@ -15,6 +19,13 @@ Status CheckMayWrite(const std::string& what) {
   if (MayWrite()) return {};
   return Status::Failure(EROFS, what + " is not changed by " + VORN::CallContext::Current()->description().method +
                                     ", which may only read");
+}
+
+bool IsUpload(const std::string& path) {
+  const VORN::CallContext* call = VORN::CallContext::Current();
+  if (call == nullptr) return false;
+  const std::vector<std::string>& uploads = call->description().uploads;
+  return std::find(uploads.begin(), uploads.end(), path) != uploads.end();
 }
 
 }  // namespace vorn

@@ -1,6 +1,6 @@
-// Whether the call that this thread runs may change the box (platform/call.h).
-#ifndef VORN_LINUX_BOX_WRITE_ACCESS_H
-#define VORN_LINUX_BOX_WRITE_ACCESS_H
+// What the call that this thread runs may do (platform/call.h).
+#ifndef VORN_LINUX_BOX_CALL_RIGHTS_H
+#define VORN_LINUX_BOX_CALL_RIGHTS_H
 
 #include <string>
 
@@ -8,12 +8,18 @@
 
 namespace vorn {
 
-// True without a call context.
+// Whether the thread has a call context.
+bool HasCallContext();
+
+// Whether the call may change the box. True without a call context.
 bool MayWrite();
 
 // Fails with EROFS in a call that may not write; `what` is what it would have changed.
 Status CheckMayWrite(const std::string& what);
 
+// Whether `path` is a file of this system that was uploaded with the call. False without a call context.
+bool IsUpload(const std::string& path);
+
 }  // namespace vorn
 
-#endif  // VORN_LINUX_BOX_WRITE_ACCESS_H
+#endif  // VORN_LINUX_BOX_CALL_RIGHTS_H

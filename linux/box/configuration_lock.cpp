@@ -6,8 +6,8 @@
 #include <memory>
 #include <vector>
 
+#include "call_rights.h"
 #include "files.h"
-#include "write_access.h"
 
 namespace vorn {
 namespace {

@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "box_program.h"
-#include "call.h"
+#include "call_rights.h"
 #include "configuration_lock.h"
 #include "current_box.h"
 #include "error.h"
@@ -72,18 +72,10 @@ int ToLength(const Result<int>& length) { return length.ok() ? *length : ToResul
 
 std::string Text(const char* text) { return text == nullptr ? "" : text; }
 
-// An upload of the call is a file of this system; a server that names its uploads by their location below a trial
-// root is understood, too. Every other path is below the root.
+// An upload of the call is a file of this system; every other path is below the root.
 Result<std::string> LocateFile(const std::string& path) {
-  const VORN::CallContext* call = VORN::CallContext::Current();
-  if (call != nullptr) {
-    const std::vector<std::string>& uploads = call->description().uploads;
-    if (std::find(uploads.begin(), uploads.end(), path) != uploads.end()) return path;
-  }
-  const Root& root = CurrentBox().root();
-  const std::string below = root.directory() + "/";
-  const bool is_located = !root.is_box() && path.compare(0, below.size(), below) == 0;
-  return root.Locate(is_located ? path.substr(below.size() - 1) : path);
+  if (IsUpload(path)) return path;
+  return CurrentBox().root().Locate(path);
 }
 
 }  // namespace

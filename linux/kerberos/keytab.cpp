@@ -5,13 +5,13 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "call_rights.h"
 #include "configuration_lock.h"
 #include "files.h"
 #include "ini_text.h"
 #include "nfs_record.h"
 #include "nfsconf.h"
 #include "unicode.h"
-#include "write_access.h"
 
 namespace vorn {
 namespace {
@@ -20,14 +20,27 @@ constexpr char kKeytabFile[] = "/etc/nfs/krb5.keytab";
 constexpr std::size_t kLargest = std::size_t{1} << 20;
 constexpr mode_t kOwnerOnly = 0600;
 
-Result<std::string> ReadUpload(const std::string& path) {
+// A file of this system.
+Result<std::string> ReadLocalFile(const std::string& path) {
   struct stat info {};
   if (lstat(path.c_str(), &info) != 0) return Status::System(errno, path);
   if (!S_ISREG(info.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
   Result<FileText> file = ReadFile(path);
   if (!file.ok()) return file.status();
-  if (file->text.size() > kLargest) return Status::System(EFBIG, path);
   return std::move(file->text);
+}
+
+Result<std::string> ReadFileOfBox(Box& box, const std::string& path) {
+  Result<StoredFile> file = box.Read(path);
+  if (!file.ok()) return file.status();
+  if (!file->version.exists) return Status::System(ENOENT, file->location);
+  return std::move(file->text);
+}
+
+Result<std::string> ReadNewKeytab(Box& box, const std::string& path) {
+  Result<std::string> content = !HasCallContext() || IsUpload(path) ? ReadLocalFile(path) : ReadFileOfBox(box, path);
+  if (content.ok() && content->size() > kLargest) return Status::System(EFBIG, path);
+  return content;
 }
 
 // The server's own principal: the first one of the NFS service, else the first one.
@@ -59,7 +72,7 @@ Status Install(Box& box, const std::string& content) {
 }  // namespace
 
 Status ImportKeytab(Box& box, const std::string& path) {
-  const Result<std::string> content = ReadUpload(path);
+  const Result<std::string> content = ReadNewKeytab(box, path);
   if (!content.ok()) return content.status();
   const Result<std::vector<KeytabKey>> keys = ReadKeytab(*content);
   if (!keys.ok()) return keys.status();

@@ -6,7 +6,7 @@
 
 #include "configuration_lock.h"
 #include "program.h"
-#include "write_access.h"
+#include "call_rights.h"
 
 namespace vorn {
 namespace {

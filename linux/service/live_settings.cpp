@@ -6,7 +6,7 @@
 #include <cerrno>
 
 #include "configuration_lock.h"
-#include "write_access.h"
+#include "call_rights.h"
 
 namespace vorn {
 namespace {

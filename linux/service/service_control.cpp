@@ -6,7 +6,7 @@
 
 #include "configuration_lock.h"
 #include "live_settings.h"
-#include "write_access.h"
+#include "call_rights.h"
 
 namespace vorn {
 namespace {

@@ -7,6 +7,7 @@
 #include <cstring>
 #include <memory>
 
+#include "call.h"
 #include "core.h"
 #include "keytab_maker.h"
 #include "nfsconf.h"
@@ -48,6 +49,20 @@ TEST_F(KeytabImport, InstallsTheFileAsItIsForRootAlone) {
   EXPECT_EQ(InstalledMode(), 0600U);
   EXPECT_EQ(root_.Read(kUpload), content) << "the caller's file is the caller's to remove";
   EXPECT_THAT(root_.Names("/etc/nfs"), ElementsAre("krb5.keytab"));
+}
+
+TEST_F(KeytabImport, OfACallReadsItsUploadsOnThisSystemAndAllElseBelowTheRoot) {
+  root_.Write(kUpload, good_);
+  VORN::CallDescription description;
+  {
+    const VORN::CallContext call(description);
+    EXPECT_LT(VORNNFSKeytabImport(root_.At(kUpload).c_str()), 0) << "no upload of the call";
+    EXPECT_EQ(KLIBCErrGet(), ENOENT);
+    EXPECT_EQ(VORNNFSKeytabImport(kUpload), 0) << "a file of the box";
+  }
+  description.uploads = {root_.At(kUpload)};
+  const VORN::CallContext call(description);
+  EXPECT_EQ(VORNNFSKeytabImport(root_.At(kUpload).c_str()), 0);
 }
 
 TEST_F(KeytabImport, StoresTheNfsServicesPrincipal) {

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <optional>
 
+#include "call.h"
 #include "core.h"
 #include "temporary_root.h"
 
@@ -118,10 +119,16 @@ TEST(FileExist, LooksBelowTheRoot) {
   EXPECT_EQ(KLIBCFileExist(nullptr), 0);
 }
 
-TEST(FileExist, KnowsAFileOfTheRootByItsPlaceOnThisSystem) {
+TEST(FileExist, KnowsAnUploadOfTheCallByItsPathOnThisSystem) {
   const TemporaryRoot root;
   root.Write("/run/upload", "");
+  root.Write("/run/other", "");
+  EXPECT_EQ(KLIBCFileExist(root.At("/run/upload").c_str()), 0);
+  VORN::CallDescription description;
+  description.uploads = {root.At("/run/upload"), root.At("/run/gone")};
+  const VORN::CallContext call(description);
   EXPECT_NE(KLIBCFileExist(root.At("/run/upload").c_str()), 0);
+  EXPECT_EQ(KLIBCFileExist(root.At("/run/gone").c_str()), 0);
   EXPECT_EQ(KLIBCFileExist(root.At("/run/other").c_str()), 0);
 }
 

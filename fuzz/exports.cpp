@@ -1,5 +1,5 @@
-// The exports document, fed with anything: it reads, and what it writes reads back and changes nothing
-// else.
+// Reads and edits any text as an exports document: what it writes reads back, and nothing else changes.
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -12,24 +12,29 @@
 
 namespace {
 
+const vorn::ExportPaths kPaths;
+
 std::size_t Faults(const vorn::ExportsDocument& document) {
   std::size_t faults = 0;
-  for (const vorn::ExportLine& line : document.Lines()) faults += line.fault.empty() ? 0 : 1;
+  for (const vorn::ExportLine& line : document.Lines()) faults += line.fault ? 1 : 0;
   return faults;
+}
+
+bool HasFault(const vorn::ExportsDocument& document, const std::string& path) {
+  const auto lines = document.LinesOf(path, kPaths);
+  return std::any_of(lines.begin(), lines.end(), [](const vorn::ExportLine& line) { return line.fault.has_value(); });
 }
 
 void TryEdit(const vorn::ExportsDocument& document, const std::string& path,
              const std::vector<vorn::ExportEntry>& entries) {
-  vorn::ExportsDocument edited = document;
-  if (!edited.Replace(path, entries).ok()) {
-    Require(edited.text() == document.text());
-    return;
-  }
-  Require(edited.Entries(path) == entries);
+  const auto text = document.Replace(path, entries, kPaths);
+  if (!text.ok()) return;
+  Require(entries.empty() || !HasFault(document, path));
+  const vorn::ExportsDocument edited(*text);
+  Require(edited.Entries(path, kPaths) == entries);
   Require(Faults(edited) <= Faults(document));
-  vorn::ExportsDocument again(edited.text());
-  Require(again.Replace(path, again.Entries(path)).ok());
-  Require(again.Entries(path) == entries);
+  const auto again = edited.Replace(path, edited.Entries(path, kPaths), kPaths);
+  Require(again.ok() && vorn::ExportsDocument(*again).Entries(path, kPaths) == entries);
 }
 
 }  // namespace
@@ -42,10 +47,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   std::vector<std::string> paths = {"/new"};
   for (const vorn::ExportLine& line : document.Lines()) {
     Require(line.span.begin <= line.span.path && line.span.path < line.span.end);
+    if (line.fault) Require(line.fault->position >= line.span.path && line.fault->position <= line.span.end);
     if (!line.path.empty() && paths.size() < 4) paths.push_back(line.path);
   }
   for (const std::string& path : paths) {
-    std::vector<vorn::ExportEntry> entries = document.Entries(path);
+    std::vector<vorn::ExportEntry> entries = document.Entries(path, kPaths);
     TryEdit(document, path, {});
     TryEdit(document, path, entries);
     if (!vorn::CheckExportClient(client).ok()) continue;

@@ -8,8 +8,9 @@ extern "C" {
 typedef struct VORNSHARE VORNSHARE;
 
 // Looks up a share by its exact name and stores its handle in `*share`. The handle belongs to the caller, who releases
-// it with VORNShareFree. Returns a negative value if there is no such share or it cannot be read; `*share` is then
-// unchanged and the reason is in the error facility (core.h).
+// it with VORNShareFree. Returns a negative value if there is no such share, if it cannot be read, or if its path does
+// not fit into the path of an ExportRuleList (507 bytes, nfsconf.h); `*share` is then unchanged and the reason is in
+// the error facility (core.h).
 int VORNShareGet(const char* name, VORNSHARE** share);
 
 // Releases a handle. Accepts null.

@@ -177,6 +177,12 @@ Record* Allocate() {
   return static_cast<Record*>(std::calloc(1, sizeof(Record)));
 }
 
+// A path that does not fit into a list's field is refused: cut, it would be the path of another share.
+Status CheckSharePath(const std::string& path) {
+  if (path.empty() || path[0] != '/') return Status::Failure(EINVAL, "the path of an export is not absolute");
+  return path.size() < sizeof ExportRuleList::path ? Status() : Status::System(ENAMETOOLONG, "export of " + path);
+}
+
 Result<RuleList> ToRuleList(const std::string& path, const std::vector<ExportRule>& rules) {
   RuleList list(Allocate<ExportRuleList>());
   if (!list) return Status::System(ENOMEM, "export rules");
@@ -194,6 +200,7 @@ Result<RuleList> ToRuleList(const std::string& path, const std::vector<ExportRul
 // The number of rules.
 Result<int> GetRules(const char* file, const char* path, ExportRuleList** list) {
   if (file == nullptr || path == nullptr || list == nullptr) return Status::Failure(EINVAL, "no file, path or list");
+  if (Status status = CheckSharePath(path); !status.ok()) return status;
   const Result<std::vector<ExportRule>> rules = ReadShareRules(CurrentBox(), file, path);
   if (!rules.ok()) return rules.status();
   if (rules->empty()) return 0;
@@ -204,7 +211,8 @@ Result<int> GetRules(const char* file, const char* path, ExportRuleList** list) 
 }
 
 Status SetRules(const char* path, const ExportRuleList* list) {
-  if (path == nullptr || path[0] != '/') return Status::Failure(EINVAL, "the path of an export is not absolute");
+  if (path == nullptr) return Status::Failure(EINVAL, "no path");
+  if (Status status = CheckSharePath(path); !status.ok()) return status;
   return WriteShareRules(CurrentBox(), path, list);
 }
 

@@ -1,11 +1,13 @@
 #include "exports_client.h"
 
 #include <arpa/inet.h>
+#include <netdb.h>
 #include <netinet/in.h>
 
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <memory>
 #include <optional>
 
 #include "exports_text.h"
@@ -21,7 +23,7 @@ constexpr std::size_t kLongestClient = kLongestName + 1;
 
 bool IsDigit(char c) { return c >= '0' && c <= '9'; }
 bool IsLetter(char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z'); }
-// The underscore is no host name's by RFC 1123, but common.
+// RFC 1123 does not allow the underscore in a host name, but it is common.
 bool IsNameCharacter(char c) { return IsLetter(c) || IsDigit(c) || c == '-' || c == '_'; }
 
 Status Refuse(std::string_view client, const std::string& why) {
@@ -46,7 +48,7 @@ std::optional<Address> ReadAddress(std::string_view text) {
   return std::nullopt;
 }
 
-// The length of a prefix given as a number, or as a mask without gaps.
+// Reads the length of a prefix, which is given as a number or as a mask without gaps.
 std::optional<int> ReadPrefixLength(std::string_view text, const Address& network) {
   if (const auto mask = ReadAddress(text)) {
     int length = 0;
@@ -79,7 +81,7 @@ Status CheckNetgroup(std::string_view client) {
   return {};
 }
 
-// The length of a set of characters, "[a-z0]", at the beginning of `text`; 0 when it is none.
+// Returns the length of a set of characters such as "[a-z0]" at the beginning of `text`; 0 if it is not well formed.
 std::size_t SetLength(std::string_view text) {
   std::size_t at = 1;
   if (at < text.size() && (text[at] == '!' || text[at] == '^')) ++at;
@@ -99,9 +101,13 @@ Status CheckPattern(std::string_view client) {
   return {};
 }
 
-Status CheckHostName(std::string_view client) {
-  std::string_view name = client;
+std::string_view WithoutFinalDot(std::string_view name) {
   if (name.size() > 1 && name.back() == '.') name.remove_suffix(1);
+  return name;
+}
+
+Status CheckHostName(std::string_view client) {
+  const std::string_view name = WithoutFinalDot(client);
   if (name.size() > kLongestName) return Refuse(client, "too long");
   std::string_view label;
   for (std::size_t begin = 0; begin <= name.size(); begin += label.size() + 1) {
@@ -133,6 +139,26 @@ std::string AddressText(const Address& address) {
   return inet_ntop(address.family, address.bytes.data(), text.data(), text.size());
 }
 
+struct FreeAddresses {
+  void operator()(addrinfo* list) const { freeaddrinfo(list); }
+};
+
+// The address that getaddrinfo(3), which exportfs(8) asks, sees in a text without any look-up: also "10.1",
+// "0xa.0.0.1", "fe80::1%lo". nullopt for a name.
+std::optional<std::string> NumericHost(std::string_view client) {
+  const bool may_be_number = !client.empty() && (IsDigit(client[0]) || client.find(':') != std::string_view::npos);
+  if (!may_be_number || client.find('\0') != std::string_view::npos) return std::nullopt;
+  addrinfo hints{};
+  hints.ai_flags = AI_NUMERICHOST;
+  addrinfo* found = nullptr;
+  if (getaddrinfo(std::string(client).c_str(), nullptr, &hints, &found) != 0) return std::nullopt;
+  const std::unique_ptr<addrinfo, FreeAddresses> owner(found);
+  std::array<char, NI_MAXHOST> text{};
+  const int error =
+      getnameinfo(found->ai_addr, found->ai_addrlen, text.data(), text.size(), nullptr, 0, NI_NUMERICHOST);
+  return error == 0 ? std::optional<std::string>(text.data()) : std::nullopt;
+}
+
 }  // namespace
 
 Status CheckExportClient(std::string_view client) {
@@ -142,25 +168,23 @@ Status CheckExportClient(std::string_view client) {
   if (client.substr(0, 4) == "gss/") return Refuse(client, "obsolete; name the security flavours instead");
   if (client.find('/') != std::string_view::npos) return CheckNetwork(client);
   if (ReadAddress(client)) return {};
-  // A word that begins with a hyphen is no client but the defaults for those that follow.
+  // A word beginning with "-" sets default options for the clients after it.
   if (client.front() == '-') return Refuse(client, "begins with a hyphen");
   return IsPattern(client) ? CheckPattern(client) : CheckHostName(client);
 }
 
 std::string ExportClientKey(std::string_view client) {
-  const std::size_t slash = std::min(client.find('/'), client.size());
-  const auto address = ReadAddress(client.substr(0, slash));
-  if (!address) return LowerCase(client);
-  return AddressText(*address) + LowerCase(client.substr(slash));
+  if (const auto address = NumericHost(client)) return *address;
+  return LowerCase(IsExportHostName(client) ? WithoutFinalDot(client) : client);
 }
 
 std::string ExportNetworkKey(std::string_view client) {
   const std::size_t slash = client.find('/');
   auto address = ReadAddress(client.substr(0, slash));
-  if (!address) return LowerCase(client);
+  if (!address) return ExportClientKey(client);
   const auto length =
       slash == std::string_view::npos ? address->bits() : ReadPrefixLength(client.substr(slash + 1), *address);
-  if (!length) return LowerCase(client);
+  if (!length) return ExportClientKey(client);
   for (int bit = *length; bit < address->bits(); ++bit) {
     auto& byte = address->bytes[static_cast<std::size_t>(bit / 8)];
     byte = static_cast<std::uint8_t>(byte & ~(0x80 >> (bit % 8)));

@@ -1,4 +1,4 @@
-// Who a client of an export is: the forms that exports(5) knows.
+// The clients of an export, in the forms that exports(5) knows.
 #ifndef VORN_LINUX_EXPORTS_EXPORTS_CLIENT_H
 #define VORN_LINUX_EXPORTS_EXPORTS_CLIENT_H
 
@@ -9,17 +9,19 @@
 
 namespace vorn {
 
-// Whether `client` is a host name, a pattern of host names, an IPv4 or IPv6 address, a network with
-// a prefix length or a mask, a "@netgroup" or "*". Fails with kRefusedText and the reason: for all
-// else that exportfs(8) would stop at or pass over, and for what it takes and hardly anybody means
-// ("10" is 0.0.0.10, "10.0.0.0/" the whole Internet, "gss/krb5" an old spelling of sec=).
+// Accepts a host name, a pattern of host names, an IPv4 or IPv6 address, a network with a prefix length or a
+// mask, a "@netgroup" and "*". Fails with kRefusedText and the reason for everything else: text at which
+// exportfs(8) would stop or which it would skip, and forms that it accepts with a meaning that hardly anyone
+// intends ("10" is 0.0.0.10, "10.0.0.0/" is the whole Internet, "gss/krb5" is an old spelling of sec=).
 Status CheckExportClient(std::string_view client);
 
-// The same text for two clients that exportfs(8) takes for one: it ignores the case of names and
-// the spelling of IPv6 addresses.
+// Returns the same text for two clients that exportfs(8) takes for one. It ignores the case of names, and it
+// compares single hosts by their address: "10.1" is "10.0.0.1", "::1" is "0:0::1". The final dot of a host name
+// has no meaning to the resolver. Names are not resolved here, so two names of one host have two keys.
 std::string ExportClientKey(std::string_view client);
 
-// Likewise, for two networks that hold the same addresses: "10.0.0.0/8", "10.1.0.0/255.0.0.0".
+// Returns the same text for two networks with the same addresses, which exportfs(8) keeps as two clients:
+// "10.0.0.0/8" and "10.1.0.0/255.0.0.0". For any other client it is ExportClientKey().
 std::string ExportNetworkKey(std::string_view client);
 
 // Whether exportfs(8) asks the resolver for `client`, and may keep it under another name.

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <mutex>
 #include <set>
 #include <utility>
 
@@ -13,7 +14,7 @@ namespace {
 
 using Found = ExportsReader::Found;
 
-// The end of the line at `position`, which a backslash continues.
+// Returns the end of the line at `position`. A backslash before the line break continues it.
 std::size_t LineEnd(std::string_view text, std::size_t position) {
   for (;;) {
     const std::size_t newline = text.find('\n', position);
@@ -23,7 +24,8 @@ std::size_t LineEnd(std::string_view text, std::size_t position) {
   }
 }
 
-// Reads one line, from its path on. After a fault the line ends where it does to the eye.
+// Reads one line, from its path on. After a fault that ends the file, reading resumes at the next line break
+// without a backslash, even in a quotation.
 class LineReader {
  public:
   LineReader(std::string_view text, const ExportSpan& span) : text_(text), reader_(text, span.path) {
@@ -32,21 +34,23 @@ class LineReader {
 
   ExportLine Read() {
     if (ReadPath()) ReadClients();
-    if (line_.fault.empty()) FinishLine();
-    if (!line_.fault.empty()) line_.span.end = LineEnd(text_, word_begin_);
+    if (!HasEnd()) FinishLine();
+    if (HasEnd()) line_.span.end = LineEnd(text_, word_begin_);
     return std::move(line_);
   }
 
  private:
-  bool Fail(std::string fault) {
-    line_.fault = std::move(fault);
+  bool HasEnd() const { return line_.fault && line_.fault->ends_file; }
+
+  bool Fail(std::string reason) {
+    line_.fault = {word_begin_, std::move(reason), true};
     return false;
   }
 
   bool ReadPath() {
     word_begin_ = reader_.position();
     const Found found = reader_.ReadWord(kLongestExportPath, &word_);
-    if (found == Found::kNothing) return Fail("the line begins with something that is no path");
+    if (found == Found::kNothing) return Fail("the line does not begin with a path");
     if (found == Found::kTooLong) return Fail("the path is too long, or a quotation mark has no partner");
     line_.path_end = reader_.word_end();
     line_.path = NormalExportPath(word_);
@@ -69,9 +73,17 @@ class LineReader {
         has_defaults_ = true;
         found = ReadClientWord();
       }
-      if (found == Found::kTooLong) Fail("a client with its options is too long, or a quotation mark has no partner");
-      if (found == Found::kTooLong || !AddEntry(found)) return;
+      if (!CheckWord(found) || !AddEntry(found)) return;
     }
+  }
+
+  // exportfs cannot resolve a client that contains the rest of the file.
+  bool CheckWord(Found found) {
+    if (found == Found::kTooLong) {
+      return Fail("a client with its options is too long, or a quotation mark has no partner");
+    }
+    const bool is_open = reader_.in_quotation() && word_.find('\n') != std::string::npos;
+    return !is_open || Fail("a quotation mark has no partner");
   }
 
   bool Apply(ExportOptionReader* options, std::string_view list) {
@@ -79,7 +91,7 @@ class LineReader {
     return status.ok() || Fail(status.reason());
   }
 
-  // The entry of the word just read, or that of everybody, where there is none.
+  // Adds the entry of the word that was read last, or of everybody if the line has no client.
   bool AddEntry(Found found) {
     if (found == Found::kNothing) word_.clear();
     ExportOptionReader options = defaults_;
@@ -88,6 +100,9 @@ class LineReader {
       if (word_.find(')', open) != word_.size() - 1) return Fail("the options of a client do not end with \")\"");
       const std::string_view list = std::string_view{word_}.substr(open + 1, word_.size() - open - 2);
       if (!Apply(&options, list)) return false;
+    }
+    if (word_.substr(0, 1) == "/" && !line_.fault) {
+      line_.fault = {word_begin_, "a path among the clients; the line before may end with a backslash", false};
     }
     ExportEntry entry{open == 0 ? "*" : word_.substr(0, open), options.Options(), {}};
     if (!has_defaults_ && open > 0) entry.word = text_.substr(word_begin_, reader_.word_end() - word_begin_);
@@ -100,7 +115,8 @@ class LineReader {
     if (comment != std::string_view::npos) line_.comment = text_.substr(comment, reader_.position() - comment);
     line_.span.end = reader_.position();
     if (reader_.at_end()) return;
-    if (text_[line_.span.end] != '\n') Fail("a word after the last client would be taken for a path");
+    word_begin_ = reader_.position();
+    if (text_[line_.span.end] != '\n') Fail("exportfs would take the word after the last client for a path");
     ++line_.span.end;
   }
 
@@ -113,14 +129,14 @@ class LineReader {
   ExportLine line_;
 };
 
-// Finds one line after the other. Lines without quotation marks and backslashes, nearly all, end at
-// the next line break, whatever they say.
+// Finds one line after the other. Nearly all lines have no quotation mark and no backslash; those end at the
+// next line break and need not be read for that.
 class LineFinder {
  public:
   explicit LineFinder(std::string_view text) : text_(text) {}
 
-  // The next line that begins at or after `position`, which never goes back; at the end of the text
-  // its path begins there.
+  // Returns the next line that begins at or after `position`, which must not decrease from call to call. After the
+  // last line it returns an empty span at the end of the text.
   ExportSpan Next(std::size_t position) {
     ExportsReader reader(text_, position);
     ExportSpan span{position, position, position};
@@ -134,7 +150,8 @@ class LineFinder {
   }
 
  private:
-  // Where `c` follows `position`; `last` remembers it, so that the whole text is searched but once.
+  // Returns where `c` is next at or after `position`. `last` keeps the result of the last search, so that the whole
+  // text is searched only once.
   std::size_t Following(char c, std::size_t position, std::size_t* last) const {
     if (*last < position || position == 0) *last = std::min(text_.find(c, position), text_.size());
     return *last;
@@ -145,26 +162,7 @@ class LineFinder {
   std::size_t backslash_ = 0;
 };
 
-bool IsPlain(char c) { return c != '"' && c != '\\' && !ExportsReader::EndsWord(c); }
-
-// Whether a line is one of `path`, which is in normal form. Only a path that is not written as it is
-// has to be decoded.
-bool Names(std::string_view text, const ExportSpan& span, std::string_view path) {
-  std::size_t end = span.path;
-  char last = '\0';
-  bool normal = true;
-  for (; end < span.end && IsPlain(text[end]); last = text[end++]) {
-    normal = normal && (last != '/' || (text[end] != '/' && text[end] != '.'));
-  }
-  const std::string_view plain = text.substr(span.path, end - span.path);
-  const bool whole = end == span.end || ExportsReader::EndsWord(text[end]);
-  if (whole && normal && (last != '/' || plain.size() == 1)) return plain == path;
-  ExportsReader reader(text, span.path);
-  std::string word;
-  return reader.ReadWord(kLongestExportPath, &word) == Found::kWord && NormalExportPath(word) == path;
-}
-
-// What must stand before a line that is put at the end of `text`, so that it becomes a line of its own.
+// Returns the separator to insert before a line that is appended to `text`.
 std::string_view Separator(std::string_view text) {
   if (text.empty()) return "";
   const std::size_t last = text.size() - 1;
@@ -186,118 +184,160 @@ std::string_view Text(std::string_view text, const ExportSpan& line) {
 
 std::string_view WithoutEnd(std::string_view line) { return line.substr(0, line.find_last_not_of("\\\n") + 1); }
 
-// The last line of a file may need a line break before another can follow. That must not make a
-// fault of it, as it would of an open quotation.
+// Whether exportfs(8) stops at a fault of the line.
+bool EndsFile(std::string_view text, const ExportSpan& line) {
+  const ExportLine read = LineReader(text, line).Read();
+  return read.fault && read.fault->ends_file;
+}
+
+// Whether `same` is the line `line`, the last one of its text, in another text. It may need a line break before
+// another line can follow. That must not make a fault of it, as it would of an open quotation.
 bool SameLastLine(std::string_view text, const ExportSpan& line, std::string_view other, const ExportSpan& same) {
   if (WithoutEnd(Text(text, line)) != WithoutEnd(Text(other, same))) return false;
-  return LineReader(other, same).Read().fault.empty() || !LineReader(text, line).Read().fault.empty();
+  return !EndsFile(other, same) || EndsFile(text, line);
 }
 
 }  // namespace
 
 bool operator==(const ExportEntry& a, const ExportEntry& b) { return a.client == b.client && a.options == b.options; }
 
-ExportsDocument::ExportsDocument(std::string text) : text_(std::move(text)) {
-  lines_.reserve(text_.size() / 64 + 1);
-  LineFinder finder(text_);
-  for (ExportSpan line = finder.Next(0); line.path < text_.size(); line = finder.Next(line.end)) {
-    lines_.push_back(line);
-  }
-}
-
-std::vector<ExportLine> ExportsDocument::Lines() const {
-  std::vector<ExportLine> lines;
-  lines.reserve(lines_.size());
-  for (const ExportSpan& line : lines_) lines.push_back(LineReader(text_, line).Read());
-  return lines;
-}
-
-ExportsDocument::Spans ExportsDocument::LinesOf(std::string_view path) const {
-  Spans own;
-  std::copy_if(lines_.begin(), lines_.end(), std::back_inserter(own),
-               [&](const ExportSpan& line) { return Names(text_, line, path); });
-  return own;
-}
-
-std::vector<ExportEntry> ExportsDocument::Entries(std::string_view path) const {
-  return EntriesIn(LinesOf(NormalExportPath(path)));
-}
-
-std::vector<ExportEntry> ExportsDocument::EntriesIn(const Spans& own) const {
+std::vector<ExportEntry> EntriesOf(const std::vector<ExportLine>& lines) {
   std::vector<ExportEntry> entries;
   std::set<std::string> seen;
-  for (const ExportSpan& line : own) {
-    for (ExportEntry& entry : LineReader(text_, line).Read().entries) {
-      if (seen.insert(ExportClientKey(entry.client)).second) entries.push_back(std::move(entry));
+  for (const ExportLine& line : lines) {
+    for (const ExportEntry& entry : line.entries) {
+      if (seen.insert(ExportClientKey(entry.client)).second) entries.push_back(entry);
     }
   }
   return entries;
 }
 
-Status ExportsDocument::Replace(std::string_view path, const std::vector<ExportEntry>& entries) {
-  const std::string normal = NormalExportPath(path);
-  const std::string where = "the exports of " + normal + " cannot be written: ";
-  const Spans own = LinesOf(normal);
-  ExportsDocument edited(Rendered(own, normal, entries));
-  const auto added = Added(own, edited);
-  if (!added) return Status::Failure(kRefusedText, where + "the file's other lines would change");
-  const auto is_own = [&](const ExportSpan& line) { return Names(edited.text_, line, normal); };
-  if (!std::all_of(added->begin(), added->end(), is_own) || !(edited.EntriesIn(*added) == entries)) {
-    return Status::Failure(kRefusedText, where + "they do not read back");
+struct ExportsDocument::Content {
+  explicit Content(std::string file_text) : text(std::move(file_text)) {
+    lines.reserve(text.size() / 64 + 1);
+    LineFinder finder(text);
+    for (ExportSpan line = finder.Next(0); line.path < text.size(); line = finder.Next(line.end)) lines.push_back(line);
   }
-  *this = std::move(edited);
-  return {};
+
+  const ExportsIndex& Index() const {
+    std::call_once(has_index, [this] { index.emplace(text, lines); });
+    return *index;
+  }
+
+  const std::string text;
+  ExportSpans lines;
+
+ private:
+  mutable std::once_flag has_index;
+  mutable std::optional<ExportsIndex> index;
+};
+
+ExportsDocument::ExportsDocument(std::string text) : content_(std::make_shared<const Content>(std::move(text))) {}
+
+const std::string& ExportsDocument::text() const { return content_->text; }
+
+std::vector<ExportLine> ExportsDocument::Lines() const { return Read(content_->lines); }
+
+std::vector<ExportLine> ExportsDocument::Read(const ExportSpans& spans) const {
+  std::vector<ExportLine> lines;
+  lines.reserve(spans.size());
+  for (const ExportSpan& line : spans) lines.push_back(LineReader(text(), line).Read());
+  return lines;
 }
 
-// The lines that the edited file has beside all those that are not `own`; none when one is missing.
-std::optional<ExportsDocument::Spans> ExportsDocument::Added(const Spans& own, const ExportsDocument& edited) const {
-  Spans added;
+ExportSpans ExportsDocument::SpansOf(const std::string& path, const ExportPaths& paths) const {
+  ExportSpans own;
+  for (const std::size_t line : content_->Index().Find(path, paths)) own.push_back(content_->lines[line]);
+  return own;
+}
+
+std::vector<ExportLine> ExportsDocument::LinesOf(const std::string& path, const ExportPaths& paths) const {
+  return Read(SpansOf(path, paths));
+}
+
+std::vector<ExportEntry> ExportsDocument::Entries(const std::string& path, const ExportPaths& paths) const {
+  return EntriesOf(LinesOf(path, paths));
+}
+
+Result<std::string> ExportsDocument::Replace(const std::string& path, const std::vector<ExportEntry>& entries,
+                                             const ExportPaths& paths) const {
+  const std::string normal = NormalExportPath(path);
+  const std::string where = "the exports of " + normal + " cannot be written: ";
+  const ExportSpans own = SpansOf(normal, paths);
+  Result<std::string> rendered = Rendered(own, normal, entries);
+  if (!rendered.ok()) return rendered;
+  const ExportsDocument edited(std::move(*rendered));
+  const auto added = Added(own, edited);
+  if (!added) return Status::Failure(kRefusedText, where + "the file's other lines would change");
+  const std::vector<ExportLine> lines = edited.Read(*added);
+  const auto is_own = [&](const ExportLine& line) { return line.path == normal; };
+  if (!std::all_of(lines.begin(), lines.end(), is_own) || !(EntriesOf(lines) == entries)) {
+    return Status::Failure(kRefusedText, where + "they do not read back");
+  }
+  return edited.text();
+}
+
+// Returns the lines that the edited file has beside those of this file that are not `own`, or nullopt if one of
+// those is missing.
+std::optional<ExportSpans> ExportsDocument::Added(const ExportSpans& own, const ExportsDocument& edited) const {
+  ExportSpans added;
   auto mine = own.begin();
-  auto next = edited.lines_.begin();
-  for (const ExportSpan& line : lines_) {
+  auto next = edited.content_->lines.begin();
+  const auto end = edited.content_->lines.end();
+  for (const ExportSpan& line : content_->lines) {
     if (mine != own.end() && mine->begin == line.begin) {
       ++mine;
       continue;
     }
-    const bool last = line.end == text_.size();
+    const bool last = line.end == text().size();
     const auto same = [&](const ExportSpan& other) {
-      if (last) return SameLastLine(text_, line, edited.text_, other);
-      return Text(text_, line) == Text(edited.text_, other);
+      if (last) return SameLastLine(text(), line, edited.text(), other);
+      return Text(text(), line) == Text(edited.text(), other);
     };
-    while (next != edited.lines_.end() && !same(*next)) added.push_back(*next++);
-    if (next == edited.lines_.end()) return std::nullopt;
+    while (next != end && !same(*next)) added.push_back(*next++);
+    if (next == end) return std::nullopt;
     ++next;
   }
-  added.insert(added.end(), next, edited.lines_.end());
+  added.insert(added.end(), next, end);
   return added;
 }
 
-std::string ExportsDocument::Rendered(const Spans& own, const std::string& path,
-                                      const std::vector<ExportEntry>& entries) const {
+Result<std::string> ExportsDocument::Rendered(const ExportSpans& own, const std::string& path,
+                                              const std::vector<ExportEntry>& entries) const {
+  std::string line;
+  std::string comments;
+  for (const ExportLine& present : entries.empty() ? std::vector<ExportLine>() : Read(own)) {
+    if (present.fault)
+      return Status::Failure(kRefusedText, Place(present.fault->position) + ": " + present.fault->reason);
+    // The spelling of the path stays, unless it leads to the directory by a link, which could change.
+    if (line.empty() && present.path == path) {
+      line = text().substr(present.span.begin, present.path_end - present.span.begin);
+    }
+    if (!present.comment.empty()) comments += " " + present.comment;
+  }
+  if (line.empty()) line = EncodeExportsWord(path);
+  AppendEntries(&line, entries);
+  line += comments + "\n";
+
   std::string out;
-  out.reserve(text_.size() + 512);
+  out.reserve(text().size() + line.size() + 2);
   std::size_t copied = 0;
   bool missing = !entries.empty();
   for (const ExportSpan& span : own) {
-    out.append(text_, copied, span.begin - copied);
+    out.append(text(), copied, span.begin - copied);
     copied = span.end;
-    if (!missing) continue;
-    const ExportLine line = LineReader(text_, span).Read();
-    out.append(text_, span.begin, line.path_end - span.begin);
-    AppendEntries(&out, entries);
-    out.append(line.comment.empty() ? "" : " ").append(line.comment).append("\n");
-    missing = false;
+    if (std::exchange(missing, false)) out += line;
   }
-  out.append(text_, copied);
-  if (!missing) return out;
-  out.append(Separator(out)).append(EncodeExportsWord(path));
-  AppendEntries(&out, entries);
-  return out.append("\n");
+  out.append(text(), copied);
+  if (missing) out.append(Separator(out)).append(line);
+  return out;
 }
 
-std::size_t ExportsDocument::LineNumber(std::size_t position) const {
-  const auto end = text_.begin() + static_cast<std::ptrdiff_t>(std::min(position, text_.size()));
-  return 1 + static_cast<std::size_t>(std::count(text_.begin(), end, '\n'));
+std::string ExportsDocument::Place(std::size_t position) const {
+  const std::size_t end = std::min(position, text().size());
+  const auto stop = text().begin() + static_cast<std::ptrdiff_t>(end);
+  const std::size_t begin = end == 0 ? 0 : text().rfind('\n', end - 1) + 1;  // npos + 1 is 0
+  return std::to_string(1 + std::count(text().begin(), stop, '\n')) + ":" + std::to_string(end - begin + 1);
 }
 
 }  // namespace vorn

@@ -3,11 +3,14 @@
 #define VORN_LINUX_EXPORTS_EXPORTS_DOCUMENT_H
 
 #include <cstddef>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "export_paths.h"
+#include "exports_index.h"
 #include "exports_options.h"
 #include "status.h"
 
@@ -17,65 +20,73 @@ namespace vorn {
 struct ExportEntry {
   std::string client;  // "*" also where the line names no client: it is exported to everybody
   ExportOptions options;
-  // The entry as it stands in the file, where that alone tells its options; else empty, and it is
-  // written from `client` and `options`.
+  // The entry's text in the file, if that alone tells its options; it is written back unchanged. Otherwise
+  // empty, and the entry is written from `client` and `options`.
   std::string word;
 };
 
-// The same client with the same options, however the two are written.
+// Whether both are the same client with the same options. The spelling in the file does not matter.
 bool operator==(const ExportEntry& a, const ExportEntry& b);
 
-// Where a line is: with its continuations and its line break.
-struct ExportSpan {
-  std::size_t begin = 0;
-  std::size_t path = 0;  // its first word, after blanks
-  std::size_t end = 0;
+// A part of a line that is not understood.
+struct ExportFault {
+  std::size_t position = 0;  // in the text of the file
+  std::string reason;
+  // Whether exportfs(8) stops here: it exports the entries before the fault, and nothing after it in the file.
+  // Otherwise it reads on, but the line hardly means what its author intended.
+  bool ends_file = false;
 };
 
-// What one line says.
+// The meaning of one line.
 struct ExportLine {
   ExportSpan span;
   std::size_t path_end = 0;  // the end of its first word
   std::string path;          // in normal form
   std::vector<ExportEntry> entries;
   std::string comment;  // with its "#", or empty
-  // Where exportfs(8) gives up: it takes the entries before, but nothing of what follows in the
-  // file. Empty: nowhere.
-  std::string fault;
+  std::optional<ExportFault> fault;
 };
 
+// The entries of several lines in order. If two have clients that are one client to exportfs(8), only the first
+// is returned, as exportfs ignores the second.
+std::vector<ExportEntry> EntriesOf(const std::vector<ExportLine>& lines);
+
+// One text of a file. Immutable: copies share it, and any number of threads may use it.
 class ExportsDocument {
  public:
   explicit ExportsDocument(std::string text);
 
-  const std::string& text() const { return text_; }
+  const std::string& text() const;
 
-  // Every line, in order; lines after a fault are read as if there were none.
+  // Returns every line in order. Lines after a fault are read as if there were no fault.
   std::vector<ExportLine> Lines() const;
 
-  // The clients of `path` from all its lines, in order. Of two that are one to exportfs(8) the
-  // first, as there.
-  std::vector<ExportEntry> Entries(std::string_view path) const;
+  // Returns the lines whose path leads to the directory `path`, in order.
+  std::vector<ExportLine> LinesOf(const std::string& path, const ExportPaths& paths) const;
 
-  // Makes `entries` the only ones of `path`: one line, where its first one was, with that line's
-  // comment, or at the end; none, when there are no entries. Every other byte stays. The outcome is
-  // read back before it is taken: fails with kRefusedText, and changes nothing, when it would say
-  // anything but that.
-  Status Replace(std::string_view path, const std::vector<ExportEntry>& entries);
+  // Returns EntriesOf(LinesOf(path, paths)).
+  std::vector<ExportEntry> Entries(const std::string& path, const ExportPaths& paths) const;
 
-  // The number of the line, from 1, at a position of the text.
-  std::size_t LineNumber(std::size_t position) const;
+  // Returns the text in which `entries` are the only ones of `path`. They are one line, in place of the first
+  // line of `path` or at the end, with the comments of all its lines. Without entries all its lines are removed.
+  // Every other byte stays. Fails with kRefusedText if the new text would not read back as exactly that, and if
+  // a line of `path` has a fault, unless it is removed.
+  Result<std::string> Replace(const std::string& path, const std::vector<ExportEntry>& entries,
+                              const ExportPaths& paths) const;
+
+  // Returns the line and column of a position, from 1: "12:7". A column is a byte of the line.
+  std::string Place(std::size_t position) const;
 
  private:
-  using Spans = std::vector<ExportSpan>;
+  struct Content;
 
-  Spans LinesOf(std::string_view path) const;
-  std::vector<ExportEntry> EntriesIn(const Spans& own) const;
-  std::string Rendered(const Spans& own, const std::string& path, const std::vector<ExportEntry>& entries) const;
-  std::optional<Spans> Added(const Spans& own, const ExportsDocument& edited) const;
+  ExportSpans SpansOf(const std::string& path, const ExportPaths& paths) const;
+  std::vector<ExportLine> Read(const ExportSpans& spans) const;
+  Result<std::string> Rendered(const ExportSpans& own, const std::string& path,
+                               const std::vector<ExportEntry>& entries) const;
+  std::optional<ExportSpans> Added(const ExportSpans& own, const ExportsDocument& edited) const;
 
-  std::string text_;
-  Spans lines_;
+  std::shared_ptr<const Content> content_;
 };
 
 }  // namespace vorn

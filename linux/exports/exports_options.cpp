@@ -17,12 +17,14 @@ struct AccessSwitch {
   bool value;
 };
 
-constexpr std::array<AccessSwitch, 6> kAccessSwitches = {{{"ro", &ExportAccess::read_only, true},
+constexpr std::array<AccessSwitch, 8> kAccessSwitches = {{{"ro", &ExportAccess::read_only, true},
                                                           {"rw", &ExportAccess::read_only, false},
                                                           {"root_squash", &ExportAccess::root_squash, true},
                                                           {"no_root_squash", &ExportAccess::root_squash, false},
                                                           {"all_squash", &ExportAccess::all_squash, true},
-                                                          {"no_all_squash", &ExportAccess::all_squash, false}}};
+                                                          {"no_all_squash", &ExportAccess::all_squash, false},
+                                                          {"secure", &ExportAccess::insecure, false},
+                                                          {"insecure", &ExportAccess::insecure, true}}};
 
 struct OptionSwitch {
   std::string_view word;
@@ -30,10 +32,8 @@ struct OptionSwitch {
   bool value;
 };
 
-constexpr std::array<OptionSwitch, 6> kOptionSwitches = {{{"sync", &ExportOptions::async, false},
+constexpr std::array<OptionSwitch, 4> kOptionSwitches = {{{"sync", &ExportOptions::async, false},
                                                           {"async", &ExportOptions::async, true},
-                                                          {"secure", &ExportOptions::insecure, false},
-                                                          {"insecure", &ExportOptions::insecure, true},
                                                           {"crossmnt", &ExportOptions::crossmnt, true},
                                                           {"nocrossmnt", &ExportOptions::crossmnt, false}}};
 
@@ -45,6 +45,10 @@ constexpr std::array<std::string_view, 19> kOtherWords = {
 
 constexpr std::array<std::string_view, 4> kFreePrefixes = {"mountpoint=", "mp=", "refer=", "replicas="};
 
+// Names whose value exportfs(8) checks.
+constexpr std::array<std::string_view, 6> kCheckedNames = {"anonuid", "anongid",     "sec",
+                                                           "fsid",    "squash_uids", "squash_gids"};
+
 constexpr std::array<std::pair<std::string_view, std::string_view>, 7> kFlavors = {{{"sys", "sys"},
                                                                                     {"unix", "sys"},
                                                                                     {"krb5", "krb5"},
@@ -55,21 +59,21 @@ constexpr std::array<std::pair<std::string_view, std::string_view>, 7> kFlavors 
 
 bool StartsWith(std::string_view text, std::string_view prefix) { return text.substr(0, prefix.size()) == prefix; }
 
-// A number as strtol(3) takes it, to the end of the text.
+// Reads a number as strtol(3) does. Returns whether all of `text` is the number.
 bool ReadNumber(const std::string& text, int base, int* number) {
   char* end = nullptr;
   *number = static_cast<int>(std::strtol(text.c_str(), &end, base));
   return !text.empty() && *end == '\0';
 }
 
-// A file system's number, or its UUID: 32 hexadecimal digits, whatever stands between them.
+// Whether `text` is a file system's number, or a UUID: 32 hexadecimal digits with any other characters between them.
 bool IsFileSystemID(const std::string& text) {
   int number = 0;
   const auto is_hex = [](unsigned char c) { return std::isxdigit(c) != 0; };
   return ReadNumber(text, 0, &number) || std::count_if(text.begin(), text.end(), is_hex) == 32;
 }
 
-// One id or a range; either number may be missing, and begin with a minus sign.
+// Whether `text` is an id or a range of ids. Either number may be missing, and may begin with a minus sign.
 bool IsIDRange(std::string_view text) {
   for (int part = 0; part < 2; ++part) {
     if (!text.empty() && text[0] == '-') text.remove_prefix(1);
@@ -78,8 +82,27 @@ bool IsIDRange(std::string_view text) {
   return text.empty();
 }
 
+template <typename Table>
+bool Contains(const Table& table, std::string_view name) {
+  return std::find(table.begin(), table.end(), name) != table.end();
+}
+
+template <typename Switches>
+bool HasSwitch(const Switches& switches, std::string_view name) {
+  return std::any_of(switches.begin(), switches.end(), [name](const auto& s) { return s.word == name; });
+}
+
+// Whether `word` is "name=value" with a name that this version does not know.
+bool IsUnknownSetting(std::string_view word) {
+  const std::string_view name = word.substr(0, std::min(word.find('='), word.size()));
+  const auto in_name = [](unsigned char c) { return std::isalnum(c) != 0 || c == '_' || c == '-'; };
+  if (name.empty() || name.size() == word.size() || !std::all_of(name.begin(), name.end(), in_name)) return false;
+  return !Contains(kCheckedNames, name) && !Contains(kOtherWords, name) && !HasSwitch(kAccessSwitches, name) &&
+         !HasSwitch(kOptionSwitches, name);
+}
+
 bool IsOtherWord(const std::string& word) {
-  if (std::find(kOtherWords.begin(), kOtherWords.end(), word) != kOtherWords.end()) return true;
+  if (Contains(kOtherWords, word) || IsUnknownSetting(word)) return true;
   const auto begins = [&word](std::string_view prefix) { return StartsWith(word, prefix); };
   if (std::any_of(kFreePrefixes.begin(), kFreePrefixes.end(), begins)) return true;
   if (begins("fsid=")) return IsFileSystemID(word.substr(5));
@@ -95,9 +118,10 @@ void AppendAccess(std::string* list, const ExportAccess& access) {
   AppendWord(list, access.read_only ? "ro" : "rw");
   AppendWord(list, access.root_squash ? "root_squash" : "no_root_squash");
   AppendWord(list, access.all_squash ? "all_squash" : "no_all_squash");
+  AppendWord(list, access.insecure ? "insecure" : "secure");
 }
 
-// Flavours that differ, each with what it may do: "sec=krb5:krb5i,rw,...,sec=sys,ro,...".
+// Appends flavours that differ, each with its access: "sec=krb5:krb5i,rw,...,sec=sys,ro,...".
 void AppendFlavors(std::string* list, const std::vector<ExportFlavor>& flavors) {
   for (std::size_t i = 0; i < flavors.size(); ++i) {
     const bool last_of_its_kind = i + 1 == flavors.size() || !(flavors[i].access == flavors[i + 1].access);
@@ -113,14 +137,15 @@ void AppendFlavors(std::string* list, const std::vector<ExportFlavor>& flavors) 
 }  // namespace
 
 bool operator==(const ExportAccess& a, const ExportAccess& b) {
-  return a.read_only == b.read_only && a.root_squash == b.root_squash && a.all_squash == b.all_squash;
+  return a.read_only == b.read_only && a.root_squash == b.root_squash && a.all_squash == b.all_squash &&
+         a.insecure == b.insecure;
 }
 
 bool operator==(const ExportFlavor& a, const ExportFlavor& b) { return a.name == b.name && a.access == b.access; }
 
 bool operator==(const ExportOptions& a, const ExportOptions& b) {
-  return a.flavors == b.flavors && a.async == b.async && a.insecure == b.insecure && a.crossmnt == b.crossmnt &&
-         a.anon_uid == b.anon_uid && a.anon_gid == b.anon_gid && a.others == b.others;
+  return a.flavors == b.flavors && a.async == b.async && a.crossmnt == b.crossmnt && a.anon_uid == b.anon_uid &&
+         a.anon_gid == b.anon_gid && a.others == b.others;
 }
 
 bool ExportOptions::HasOneAccess() const {
@@ -131,7 +156,7 @@ std::string ExportOptions::Text() const {
   std::string list;
   if (HasOneAccess()) AppendWord(&list, flavors[0].access.read_only ? "ro" : "rw");
   AppendWord(&list, async ? "async" : "sync");
-  if (insecure) AppendWord(&list, "insecure");
+  if (HasOneAccess() && flavors[0].access.insecure) AppendWord(&list, "insecure");
   if (crossmnt) AppendWord(&list, "crossmnt");
   for (const std::string& word : others) AppendWord(&list, word);
   if (HasOneAccess()) {
@@ -150,15 +175,15 @@ std::string ExportOptions::Text() const {
 
 Status ExportOptionReader::Apply(std::string_view list) {
   current_.clear();
-  list.remove_prefix(std::min(list.find_first_not_of(" \t"), list.size()));
-  while (!list.empty()) {
+  for (;;) {
+    list.remove_prefix(std::min(list.find_first_not_of(" \t"), list.size()));
+    if (list.empty()) return {};
     const std::size_t end = std::min(list.find(','), list.size());
     const std::string word(list.substr(0, end));
     Status status = ApplyWord(word);
     if (!status.ok()) return status;
     list.remove_prefix(std::min(end + 1, list.size()));
   }
-  return {};
 }
 
 Status ExportOptionReader::ApplyWord(const std::string& word) {

@@ -10,11 +10,13 @@
 
 namespace vorn {
 
-// What a security flavour may do: the only options that "sec=" makes differ.
+// What a client may do with one security flavour: the options that the kernel keeps per flavour
+// (NFSEXP_SECINFO_FLAGS of <linux/nfsd/export.h>).
 struct ExportAccess {
   bool read_only = true;
   bool root_squash = true;
   bool all_squash = false;
+  bool insecure = false;
 };
 
 struct ExportFlavor {
@@ -22,20 +24,19 @@ struct ExportFlavor {
   ExportAccess access;
 };
 
-// As built, what exports(5) says of a client without options.
+// The default values are those that exports(5) gives a client without options.
 struct ExportOptions {
   std::vector<ExportFlavor> flavors = {{"sys", {}}};  // never empty, no name twice, in the server's order
   bool async = false;
-  bool insecure = false;
   bool crossmnt = false;
   int anon_uid = 65534;
   int anon_gid = 65534;
-  std::vector<std::string> others;  // every other word, in order: "fsid=0", "no_wdelay"
+  std::vector<std::string> others;  // every other word, in order: "fsid=0", "no_wdelay", "xprtsec=tls"
 
-  // Whether every flavour may do the same.
+  // Whether every flavour has the same access.
   bool HasOneAccess() const;
 
-  // An option list of the same meaning, without parentheses.
+  // Returns an option list of the same meaning, without parentheses.
   std::string Text() const;
 };
 
@@ -43,13 +44,14 @@ bool operator==(const ExportAccess& a, const ExportAccess& b);
 bool operator==(const ExportFlavor& a, const ExportFlavor& b);
 bool operator==(const ExportOptions& a, const ExportOptions& b);
 
-// Reads option lists one after the other: the defaults that stand before a client, then its own.
+// Reads option lists one after the other: the defaults before a client ("-rw"), then its own list.
 class ExportOptionReader {
  public:
-  // "rw,sec=krb5:krb5i". Fails with kSyntax, naming the word, where exportfs(8) gives up.
+  // Reads a list such as "rw,sec=krb5:krb5i". Fails with kSyntax and the word at which exportfs(8) stops
+  // reading the file. An unknown word of the form "name=value" is kept: newer versions know more of them.
   Status Apply(std::string_view list);
 
-  // What the lists read so far mean.
+  // Returns the meaning of the lists read so far.
   ExportOptions Options() const;
 
  private:
@@ -57,8 +59,8 @@ class ExportOptionReader {
   Status ApplyFlavors(const std::string& names);
   bool ApplySwitch(std::string_view word);
 
-  ExportOptions options_ = {{}, false, false, false, 65534, 65534, {}};
-  ExportAccess access_;               // for flavours that are named later, or when none is
+  ExportOptions options_ = {{}, false, false, 65534, 65534, {}};
+  ExportAccess access_;               // of flavours that are named later, or of "sys" if none is named
   std::vector<std::size_t> current_;  // indices of the flavours that the last "sec=" named
 };
 

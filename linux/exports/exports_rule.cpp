@@ -24,13 +24,14 @@ std::optional<AccountIDs> FindIDs(const Accounts& accounts, const std::string& n
   return AccountIDs{static_cast<int>(account->user_id), static_cast<int>(account->group_id)};
 }
 
-// The most that one of the flavours may do.
+// Returns the widest access that any flavour has, option by option. all_squash squashes root, too.
 ExportAccess WidestAccess(const ExportOptions& options) {
-  ExportAccess widest = options.flavors.front().access;
-  for (const ExportFlavor& flavor : options.flavors) {
-    widest.read_only = widest.read_only && flavor.access.read_only;
-    widest.root_squash = widest.root_squash && flavor.access.root_squash;
-    widest.all_squash = widest.all_squash && flavor.access.all_squash;
+  ExportAccess widest{true, true, true, false};
+  for (const auto& [name, access] : options.flavors) {
+    widest.read_only = widest.read_only && access.read_only;
+    widest.root_squash = widest.root_squash && (access.root_squash || access.all_squash);
+    widest.all_squash = widest.all_squash && access.all_squash;
+    widest.insecure = widest.insecure || access.insecure;
   }
   return widest;
 }
@@ -66,9 +67,21 @@ Status CheckFields(const ExportRule& rule) {
   return {};
 }
 
-Status SetSquash(const ExportRule& rule, const SquashAccounts& accounts, ExportOptions* options, ExportAccess* access) {
-  access->root_squash = rule.squash != VORNNFS_SQUASH_ROOT;
-  access->all_squash = rule.squash == VORNNFS_SQUASH_ALL_ADMIN;
+bool IsSquashedAlike(const std::vector<ExportFlavor>& flavors) {
+  const ExportAccess& first = flavors.front().access;
+  return std::all_of(flavors.begin(), flavors.end(), [&first](const ExportFlavor& flavor) {
+    return flavor.access.root_squash == first.root_squash && flavor.access.all_squash == first.all_squash;
+  });
+}
+
+Status SetSquash(const ExportRule& rule, const SquashAccounts& accounts, ExportOptions* options) {
+  if (!IsSquashedAlike(options->flavors)) {
+    return Refuse(rule, "its security flavours have different squash options; only the exports file can change them");
+  }
+  for (ExportFlavor& flavor : options->flavors) {
+    flavor.access.root_squash = rule.squash != VORNNFS_SQUASH_ROOT;
+    flavor.access.all_squash = rule.squash == VORNNFS_SQUASH_ALL_ADMIN;
+  }
   const ExportOptions defaults;
   options->anon_uid = defaults.anon_uid;
   options->anon_gid = defaults.anon_gid;
@@ -80,24 +93,59 @@ Status SetSquash(const ExportRule& rule, const SquashAccounts& accounts, ExportO
   return {};
 }
 
-// The flavours of the rule, and those it has no field for. The ones that stay keep their order, in
-// which the server offers them; new ones follow.
-std::vector<ExportFlavor> FlavorsOf(const ExportRule& rule, const std::vector<ExportFlavor>& present,
-                                    const ExportAccess& access) {
+bool HasFlavor(const std::vector<ExportFlavor>& flavors, const std::string& name) {
+  return std::any_of(flavors.begin(), flavors.end(),
+                     [&name](const ExportFlavor& flavor) { return flavor.name == name; });
+}
+
+// Makes the flavours those of the rule, and those that the rule has no field for. Flavours that stay keep their
+// order, in which the server offers them; new ones follow.
+Status SetFlavors(const ExportRule& rule, ExportOptions* options) {
   std::vector<ExportFlavor> flavors;
-  const auto wanted = [&rule](const std::string& name) {
-    const auto field =
-        std::find_if(kRuleFlavors.begin(), kRuleFlavors.end(), [&](const auto& f) { return f.first == name; });
-    return field == kRuleFlavors.end() || rule.*field->second != 0;
-  };
-  for (const ExportFlavor& flavor : present) {
-    if (wanted(flavor.name)) flavors.push_back({flavor.name, access});
+  for (const ExportFlavor& flavor : options->flavors) {
+    const auto field = std::find_if(kRuleFlavors.begin(), kRuleFlavors.end(),
+                                    [&flavor](const auto& known) { return known.first == flavor.name; });
+    if (field == kRuleFlavors.end() || rule.*field->second != 0) flavors.push_back(flavor);
   }
   for (const auto& [name, field] : kRuleFlavors) {
-    const auto same = [n = name](const ExportFlavor& flavor) { return flavor.name == n; };
-    if (rule.*field != 0 && std::none_of(flavors.begin(), flavors.end(), same)) flavors.push_back({name, access});
+    if (rule.*field == 0 || HasFlavor(flavors, name)) continue;
+    if (!options->HasOneAccess()) {
+      return Refuse(rule, "the access of its security flavours differs; only the exports file can add \"" +
+                              std::string(name) + "\"");
+    }
+    flavors.push_back({name, options->flavors.front().access});
   }
-  return flavors;
+  if (flavors.empty()) return Refuse(rule, "it accepts no security flavour");
+  options->flavors = std::move(flavors);
+  return {};
+}
+
+// Applies the fields in which `rule` differs from `before`.
+Status ApplyChanges(const ExportRule& before, const ExportRule& rule, const SquashAccounts& accounts,
+                    ExportOptions* options) {
+  options->async = rule.write_mode == VORNNFS_WRITE_ASYNC;
+  options->crossmnt = rule.crossmnt != 0;
+  for (ExportFlavor& flavor : options->flavors) {
+    if (before.privilege != rule.privilege) flavor.access.read_only = rule.privilege == 0;
+    if (before.insecure != rule.insecure) flavor.access.insecure = rule.insecure != 0;
+  }
+  if (before.squash != rule.squash) {
+    if (Status status = SetSquash(rule, accounts, options); !status.ok()) return status;
+  }
+  return SetFlavors(rule, options);
+}
+
+Result<ExportEntry> NewEntry(const ExportRule& rule, const SquashAccounts& accounts) {
+  ExportEntry entry{rule.client, {}, {}};
+  // exportfs prints a warning unless this default is written out.
+  entry.options.others = {"no_subtree_check"};
+  entry.options.async = rule.write_mode == VORNNFS_WRITE_ASYNC;
+  entry.options.crossmnt = rule.crossmnt != 0;
+  entry.options.flavors = {{"sys", {rule.privilege == 0, true, false, rule.insecure != 0}}};
+  Status status = SetSquash(rule, accounts, &entry.options);
+  if (status.ok()) status = SetFlavors(rule, &entry.options);
+  if (!status.ok()) return status;
+  return entry;
 }
 
 }  // namespace
@@ -116,12 +164,10 @@ ExportRule RuleOf(const ExportEntry& entry, const SquashAccounts& accounts) {
   rule.privilege = WidestAccess(entry.options).read_only ? 0 : 1;
   rule.squash = SquashOf(entry.options, accounts);
   rule.write_mode = entry.options.async ? VORNNFS_WRITE_ASYNC : VORNNFS_WRITE_SYNC;
-  rule.insecure = entry.options.insecure ? 1 : 0;
+  rule.insecure = WidestAccess(entry.options).insecure ? 1 : 0;
   rule.crossmnt = entry.options.crossmnt ? 1 : 0;
   for (const auto& [name, field] : kRuleFlavors) {
-    const auto same = [n = name](const ExportFlavor& flavor) { return flavor.name == n; };
-    const auto& flavors = entry.options.flavors;
-    rule.*field = std::any_of(flavors.begin(), flavors.end(), same) ? 1 : 0;
+    rule.*field = HasFlavor(entry.options.flavors, name) ? 1 : 0;
   }
   return rule;
 }
@@ -129,24 +175,16 @@ ExportRule RuleOf(const ExportEntry& entry, const SquashAccounts& accounts) {
 Result<ExportEntry> EntryOf(const ExportRule& rule, const ExportEntry* present, const SquashAccounts& accounts) {
   Status status = CheckFields(rule);
   if (!status.ok()) return status;
-  std::optional<ExportRule> before;
-  if (present != nullptr) before = RuleOf(*present, accounts);
-  if (before && SameRule(*before, rule)) return *present;
-
-  ExportEntry entry{rule.client, {}, {}};
-  if (present != nullptr) entry.options = present->options;
-  // What exportfs(8) takes as the default anyway, but asks to be told.
-  if (present == nullptr) entry.options.others = {"no_subtree_check"};
-  ExportAccess access = WidestAccess(entry.options);
-  access.read_only = rule.privilege == 0;
-  entry.options.async = rule.write_mode == VORNNFS_WRITE_ASYNC;
-  entry.options.insecure = rule.insecure != 0;
-  entry.options.crossmnt = rule.crossmnt != 0;
-  if (!before || before->squash != rule.squash) status = SetSquash(rule, accounts, &entry.options, &access);
+  if (present == nullptr) return NewEntry(rule, accounts);
+  const ExportRule before = RuleOf(*present, accounts);
+  if (SameRule(before, rule)) return *present;
+  ExportEntry entry{rule.client, present->options, {}};
+  status = ApplyChanges(before, rule, accounts, &entry.options);
   if (!status.ok()) return status;
-  const std::vector<ExportFlavor> flavors = present != nullptr ? present->options.flavors : std::vector<ExportFlavor>{};
-  entry.options.flavors = FlavorsOf(rule, flavors, access);
-  if (entry.options.flavors.empty()) return Refuse(rule, "it accepts no security flavour");
+  // Otherwise saving the same rule once more would be another change.
+  if (!present->options.HasOneAccess() && !SameRule(RuleOf(entry, accounts), rule)) {
+    return Refuse(rule, "its security flavours would not have the access that it asks for");
+  }
   return entry;
 }
 

@@ -1,15 +1,16 @@
 #include "exports_table.h"
 
 #include <map>
-#include <optional>
 #include <set>
+#include <string>
+#include <utility>
 
 #include "exports_client.h"
 
 namespace vorn {
 namespace {
 
-// The clients of one path, by their keys.
+// The clients of one path by their keys (ExportClientKey).
 using Clients = std::map<std::string, ExportOptions>;
 
 std::map<std::string, Clients> ReadTable(const ExportsDocument& table) {
@@ -30,29 +31,31 @@ bool SameAccess(ExportOptions a, ExportOptions b) {
 
 class Comparison {
  public:
-  Comparison(const ExportsDocument& file, const ExportsDocument& table, const PathResolver& resolve)
-      : file_(file), exported_(ReadTable(table)), resolve_(resolve) {}
+  Comparison(const ExportsDocument& table, const ExportPaths& paths) : exported_(ReadTable(table)), paths_(paths) {}
 
-  Status Compare() {
-    const auto lines = file_.Lines();
+  Status Compare(const ExportsFile& file) {
+    const std::vector<ExportLine> lines = file.document.Lines();
     for (const ExportLine& line : lines) {
-      if (!line.fault.empty()) return Difference(line, line.fault + "; nothing that follows is exported");
+      if (line.fault && line.fault->ends_file) {
+        return Failure(file.Place(line.fault->position), line.fault->reason + "; nothing that follows is exported");
+      }
     }
     for (const ExportLine& line : lines) {
-      Status status = CompareLine(line);
+      Status status = CompareLine(file, line);
       if (!status.ok()) return status;
     }
     return {};
   }
 
  private:
-  Status CompareLine(const ExportLine& line) {
-    const std::string path = exported_.count(line.path) != 0 ? line.path : resolve_(line.path);
+  Status CompareLine(const ExportsFile& file, const ExportLine& line) {
+    // exportfs keeps a path that does not exist as it is written.
+    const std::string path = exported_.count(line.path) != 0 ? line.path : paths_.Resolve(line.path);
     for (const ExportEntry& entry : line.entries) {
       const std::string key = ExportClientKey(entry.client);
-      if (!seen_.emplace(path, key).second) continue;  // of two lines for one client the first counts
+      if (!seen_.emplace(path, key).second) continue;  // of two rules for one client the first counts
       const std::string why = WhyNot(exported_[path], key, entry);
-      if (!why.empty()) return Difference(line, entry.client + " " + why);
+      if (!why.empty()) return Failure(file.Place(line.span.path), line.path + ": " + entry.client + " " + why);
     }
     return {};
   }
@@ -63,28 +66,32 @@ class Comparison {
       return SameAccess(found->second, entry.options) ? "" : "is exported with another access";
     const Status form = CheckExportClient(entry.client);
     if (!form.ok()) return "is not exported: " + form.reason();
-    // The table has a host's own name, whatever it is called in the file.
+    // etab lists a host by its canonical name, which may differ from the name in the file.
     for (const auto& [name, options] : exported) {
       if (IsExportHostName(entry.client) && IsExportHostName(name) && SameAccess(options, entry.options)) return "";
     }
     return IsExportHostName(entry.client) ? "is not exported: no such host is known" : "is not exported";
   }
 
-  Status Difference(const ExportLine& line, const std::string& what) const {
-    return Status::Failure(kServiceFailed, "exports file, line " + std::to_string(file_.LineNumber(line.span.begin)) +
-                                               " (" + line.path + "): " + what);
+  static Status Failure(const std::string& place, const std::string& what) {
+    return Status::Failure(kServiceFailed, place + ": " + what);
   }
 
-  const ExportsDocument& file_;
   std::map<std::string, Clients> exported_;
-  const PathResolver& resolve_;
+  const ExportPaths& paths_;
   std::set<std::pair<std::string, std::string>> seen_;
 };
 
 }  // namespace
 
-Status CompareExportTable(const ExportsDocument& file, const ExportsDocument& table, const PathResolver& resolve) {
-  return Comparison(file, table, resolve).Compare();
+Status CompareExportTable(const std::vector<SharedExportsFile>& files, const ExportsDocument& table,
+                          const ExportPaths& paths) {
+  Comparison comparison(table, paths);
+  for (const SharedExportsFile& file : files) {
+    Status status = comparison.Compare(*file);
+    if (!status.ok()) return status;
+  }
+  return {};
 }
 
 }  // namespace vorn

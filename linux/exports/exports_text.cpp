@@ -9,13 +9,13 @@ constexpr int kEnd = -1;
 
 bool IsOctal(char c) { return c >= '0' && c <= '7'; }
 
-// Makes one byte of an escape that has just been completed. As in exportfs(8), the backslash may
-// itself be the outcome of an escape.
+// Decodes an escape that the last four bytes of `word` complete. As in exportfs(8), its backslash may
+// be the result of another escape, and a number above \377 is no escape.
 void DecodeTail(std::string* word) {
   const std::size_t size = word->size();
   if (size < 4) return;
   const char* tail = word->data() + size - 4;
-  if (tail[0] != '\\' || !std::all_of(tail + 1, tail + 4, IsOctal)) return;
+  if (tail[0] != '\\' || tail[1] > '3' || !std::all_of(tail + 1, tail + 4, IsOctal)) return;
   const int byte = ((tail[1] & 7) << 6) | ((tail[2] & 7) << 3) | (tail[3] & 7);
   word->resize(size - 4);
   word->push_back(static_cast<char>(byte));
@@ -63,10 +63,14 @@ std::size_t ExportsReader::SkipToClient() {
 ExportsReader::Found ExportsReader::ReadWord(std::size_t longest, std::string* word) {
   word->clear();
   bool quoted = false;
+  in_quotation_ = false;
   while (word->size() <= longest) {
     word_end_ = position_;
     const int c = Next();
-    if (c == kEnd) break;
+    if (c == kEnd) {
+      in_quotation_ = quoted;
+      break;
+    }
     if (!quoted && EndsWord(c)) {
       if (c == '\n') position_ = word_end_;
       break;

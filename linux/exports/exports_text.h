@@ -8,13 +8,15 @@
 
 namespace vorn {
 
-// The longest words that exportfs(8) takes, in bytes. A longer one ends its reading of the file.
+// The longest words that exportfs(8) accepts, in bytes. It stops reading the file at a longer one.
 constexpr std::size_t kLongestExportPath = 1024;
 constexpr std::size_t kLongestExportClient = 511;  // with its options
 
-// Reads on from a position. A backslash before a line break makes one blank of the break and the
-// blanks that follow it, '"' begins and ends a part in which blanks and line breaks are ordinary,
-// '\' and three octal digits are one byte, and '#' begins a comment where a word could begin.
+// Reads words from a position on. The syntax of exportfs(8):
+//  - A backslash, the line break after it, and the blanks after that are one blank.
+//  - '"' begins and ends a quotation, in which blanks and line breaks are ordinary characters.
+//  - '\' and three octal digits up to \377 are one byte.
+//  - '#' begins a comment where a word could begin.
 class ExportsReader {
  public:
   enum class Found { kWord, kNothing, kTooLong };
@@ -27,22 +29,25 @@ class ExportsReader {
   std::size_t position() const { return position_; }
   bool at_end() const { return position_ == text_.size(); }
 
-  // Skips blanks, comments and line breaks up to the next path. Where the line of that path begins;
-  // the text's end when there is no further one.
+  // Skips blanks, comments and line breaks up to the next path. Returns where the line of that path
+  // begins, or the end of the text if there is no further path.
   std::size_t SkipToPath();
 
-  // Skips blanks, and a comment, but no line break. Where the comment begins, or npos.
+  // Skips blanks and a comment, but no line break. Returns where the comment begins, or npos.
   std::size_t SkipToClient();
 
-  // Reads the word that begins here, of at most `longest` bytes, and the blank that ends it.
-  // Nothing: there is none, and what is no line break has been passed over.
+  // Reads the word that begins here, of at most `longest` bytes, and the blank that ends it. kNothing:
+  // there is no word; a separator other than a line break has been consumed.
   Found ReadWord(std::size_t longest, std::string* word);
 
-  // Where the word just read ends, without that blank.
+  // Whether the word that was read last ends with the text, in a quotation.
+  bool in_quotation() const { return in_quotation_; }
+
+  // The end of the word that was read last, without that blank.
   std::size_t word_end() const { return word_end_; }
 
  private:
-  // A NUL is a blank to exportfs(8), which looks it up in a C string of blanks.
+  // exportfs(8) takes a NUL for a blank, because it searches a C string of blanks, which ends with a NUL.
   static bool IsBlank(int c) { return c == ' ' || c == '\t' || c == '\0'; }
 
   int Next();
@@ -51,13 +56,13 @@ class ExportsReader {
   std::string_view text_;
   std::size_t position_;
   std::size_t word_end_ = 0;
+  bool in_quotation_ = false;
 };
 
-// `text` as one word that reads back as `text`: octal escapes for what would end it, or mean
-// something else.
+// Returns one word that reads back as `text`: bytes with another meaning are written as octal escapes.
 std::string EncodeExportsWord(std::string_view text);
 
-// `path` without empty and "." components and without a trailing "/". Links are not followed.
+// Returns `path` without empty and "." components and without a trailing "/". Symbolic links are not followed.
 std::string NormalExportPath(std::string_view path);
 
 }  // namespace vorn

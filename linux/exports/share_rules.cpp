@@ -1,11 +1,12 @@
 #include "share_rules.h"
 
-#include <cerrno>
 #include <cstring>
 #include <map>
+#include <memory>
 #include <set>
 #include <utility>
 
+#include "box_paths.h"
 #include "configuration_lock.h"
 #include "exports_client.h"
 #include "exports_document.h"
@@ -15,36 +16,99 @@
 namespace vorn {
 namespace {
 
-constexpr char kExportsFile[] = "/etc/exports";
 constexpr char kExportTable[] = "/var/lib/nfs/etab";
 
-// Turns the rules of a list into entries, beside the share's present ones.
+// The rule of a client in a file of /etc/exports.d.
+struct ForeignEntry {
+  ExportEntry entry;
+  std::string place;  // of its line
+};
+
+// What the files say of one share. The foreign entries include those that an own entry overrides.
+struct ShareExports {
+  std::vector<ExportLine> own_lines;
+  std::vector<ExportEntry> own;
+  std::vector<ForeignEntry> foreign;  // in order, each client once
+
+  // The rules in force.
+  std::vector<ExportEntry> Entries() const;
+};
+
+std::vector<ExportEntry> ShareExports::Entries() const {
+  std::vector<ExportEntry> entries = own;
+  std::set<std::string> clients;
+  for (const ExportEntry& entry : own) clients.insert(ExportClientKey(entry.client));
+  for (const ForeignEntry& foreign_entry : foreign) {
+    if (clients.count(ExportClientKey(foreign_entry.entry.client)) == 0) entries.push_back(foreign_entry.entry);
+  }
+  return entries;
+}
+
+// The first of `files` is the one that may be written.
+ShareExports ExportsOf(const std::vector<SharedExportsFile>& files, const std::string& path, const ExportPaths& paths) {
+  ShareExports share;
+  share.own_lines = files.front()->document.LinesOf(path, paths);
+  share.own = EntriesOf(share.own_lines);
+  std::set<std::string> clients;
+  for (auto file = files.begin() + 1; file != files.end(); ++file) {
+    for (const ExportLine& line : (*file)->document.LinesOf(path, paths)) {
+      for (const ExportEntry& entry : line.entries) {
+        if (!clients.insert(ExportClientKey(entry.client)).second) continue;
+        share.foreign.push_back({entry, (*file)->Place(line.span.path)});
+      }
+    }
+  }
+  return share;
+}
+
+// Turns the rules of a list into the entries that /etc/exports must have.
 class RuleWriter {
  public:
-  RuleWriter(const std::vector<ExportEntry>& present, const SquashAccounts& accounts) : accounts_(accounts) {
-    for (const ExportEntry& entry : present) present_.emplace(ExportClientKey(entry.client), &entry);
+  RuleWriter(const ShareExports& share, const SquashAccounts& accounts) : accounts_(accounts) {
+    for (const ExportEntry& entry : share.own) own_.emplace(ExportClientKey(entry.client), &entry);
+    for (const ForeignEntry& entry : share.foreign) foreign_.emplace(ExportClientKey(entry.entry.client), &entry);
   }
 
   // A cyclic list ends with a refusal at the first client that is repeated.
   Status Add(const ExportRule& rule) {
     const std::string client(rule.client, strnlen(rule.client, sizeof rule.client));
     if (client.size() == sizeof rule.client) return Status::Failure(kRefusedText, "an export client without an end");
-    const auto found = present_.find(ExportClientKey(client));
-    const ExportEntry* present = found == present_.end() ? nullptr : found->second;
-    // A client that the file has already is not validated again, so that an old rule can be saved unchanged.
+    const std::string key = ExportClientKey(client);
+    const auto own = own_.find(key);
+    const auto foreign = foreign_.find(key);
+    const ExportEntry* present = own != own_.end() ? own->second : nullptr;
+    if (present == nullptr && foreign != foreign_.end()) present = &foreign->second->entry;
+    // A client that a file has already is not validated again, so that an old rule can be saved unchanged.
     Status status = present != nullptr ? Status() : CheckExportClient(client);
     if (status.ok()) status = CheckDouble(client, present != nullptr);
     if (!status.ok()) return status;
-    auto entry = EntryOf(rule, present, accounts_);
+    Result<ExportEntry> entry = EntryOf(rule, present, accounts_);
     if (!entry.ok()) return entry.status();
-    entries_.push_back(std::move(*entry));
+    if (present == nullptr || own != own_.end()) {
+      entries_.push_back(std::move(*entry));
+    } else if (!(*entry == *present)) {
+      return RefuseForeign(*foreign->second, "changed");
+    }
+    return {};
+  }
+
+  // To be called after the last rule.
+  Status CheckForeign() const {
+    for (const auto& [key, entry] : foreign_) {
+      if (clients_.count(key) == 0) return RefuseForeign(*entry, "removed");
+    }
     return {};
   }
 
   const std::vector<ExportEntry>& entries() const { return entries_; }
 
  private:
-  // Two spellings of one network are a mistake, unless the file had both.
+  static Status RefuseForeign(const ForeignEntry& entry, const std::string& how) {
+    return Status::Failure(kRefusedText, "the export rule of \"" + entry.entry.client + "\" is in another file, " +
+                                             entry.place + ", and can only be " + how + " there");
+  }
+
+  // Two spellings of one network are a mistake, unless the files had both.
   Status CheckDouble(const std::string& client, bool present) {
     const bool new_client = clients_.insert(ExportClientKey(client)).second;
     const auto [network, new_network] = networks_.emplace(ExportNetworkKey(client), present);
@@ -53,29 +117,48 @@ class RuleWriter {
   }
 
   const SquashAccounts& accounts_;
-  std::map<std::string, const ExportEntry*> present_;
+  std::map<std::string, const ExportEntry*> own_;
+  std::map<std::string, const ForeignEntry*> foreign_;
   std::set<std::string> clients_;
-  std::map<std::string, bool> networks_;  // whether the file had the first of each
+  std::map<std::string, bool> networks_;  // whether a file had the first client of each
   std::vector<ExportEntry> entries_;
 };
 
-// The path of a line of the table, without links.
-PathResolver ResolverOf(const Root& root) {
-  return [root](const std::string& path) {
-    const auto located = root.Locate(path);
-    return located.ok() ? root.OnBox(*located) : path;
-  };
+// Faults are named with the file's location here, which a document does not know.
+Status CheckUnderstood(const ExportsFile& file, const std::vector<ExportLine>& lines) {
+  for (const ExportLine& line : lines) {
+    if (!line.fault) continue;
+    return Status::Failure(kRefusedText, file.Place(line.fault->position) + ": " + line.fault->reason +
+                                             "; this line must be mended before it can be changed");
+  }
+  return {};
+}
+
+Status WriteEntries(Box& box, const ExportsFile& file, const std::string& path, const ShareExports& share,
+                    const std::vector<ExportEntry>& entries) {
+  const bool removes_nothing = !entries.empty() || share.own_lines.empty();
+  if (share.own == entries && removes_nothing) return box.Confirm(kExportsFile);
+  if (Status status = entries.empty() ? Status() : CheckUnderstood(file, share.own_lines); !status.ok()) return status;
+  const Result<std::string> text = file.document.Replace(path, entries, BoxPaths(box.root()));
+  return text.ok() ? box.Replace(kExportsFile, *text, file.version) : text.status();
+}
+
+Result<std::vector<SharedExportsFile>> OpenExports(Box& box, const std::string& path) {
+  if (path == kExportsFile) return OpenAllExports(box);
+  Result<SharedExportsFile> file = OpenExportsFile(box, path);
+  if (!file.ok()) return file.status();
+  return std::vector<SharedExportsFile>{std::move(*file)};
 }
 
 }  // namespace
 
 Result<std::vector<ExportRule>> ReadShareRules(Box& box, const std::string& file, const std::string& path) {
-  auto exports = box.Read(file);
-  if (!exports.ok()) return exports.status();
-  const auto entries = ExportsDocument(std::move(exports->text)).Entries(path);
+  const Result<std::vector<SharedExportsFile>> files = OpenExports(box, file);
+  if (!files.ok()) return files.status();
+  const std::vector<ExportEntry> entries = ExportsOf(*files, path, BoxPaths(box.root())).Entries();
   std::vector<ExportRule> rules;
   if (entries.empty()) return rules;
-  const auto accounts = SquashAccounts::Load(box);
+  const Result<SquashAccounts> accounts = SquashAccounts::Load(box);
   if (!accounts.ok()) return accounts.status();
   for (const ExportEntry& entry : entries) rules.push_back(RuleOf(entry, *accounts));
   return rules;
@@ -84,35 +167,32 @@ Result<std::vector<ExportRule>> ReadShareRules(Box& box, const std::string& file
 Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* list) {
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
-  auto file = box.Read(kExportsFile);
-  if (!file.ok()) return file.status();
-  const auto accounts = SquashAccounts::Load(box);
+  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
+  if (!files.ok()) return files.status();
+  const Result<SquashAccounts> accounts = SquashAccounts::Load(box);
   if (!accounts.ok()) return accounts.status();
-  ExportsDocument exports(std::move(file->text));
-  const auto present = exports.Entries(path);
-  RuleWriter writer(present, *accounts);
+  const ShareExports share = ExportsOf(*files, path, BoxPaths(box.root()));
+  RuleWriter writer(share, *accounts);
   for (const ExportRule* rule = list == nullptr ? nullptr : list->first; rule != nullptr; rule = rule->next) {
     if (Status status = writer.Add(*rule); !status.ok()) return status;
   }
-  if (present == writer.entries()) return box.Confirm(kExportsFile);
-  const Status status = exports.Replace(path, writer.entries());
-  return status.ok() ? box.Replace(kExportsFile, exports.text(), file->version) : status;
+  if (Status status = writer.CheckForeign(); !status.ok()) return status;
+  return WriteEntries(box, *files->front(), path, share, writer.entries());
 }
 
-Result<Version> ReadExportsVersion(Box& box) {
-  const auto file = box.Read(kExportsFile);
-  if (!file.ok()) return file.status();
-  return file->version;
+Result<ExportsVersion> ReadExportsVersion(Box& box) {
+  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
+  if (!files.ok()) return files.status();
+  return VersionOf(*files);
 }
 
-Status CheckExportTable(Box& box, const Version& reloaded) {
-  auto file = box.Read(kExportsFile);
-  if (!file.ok()) return file.status();
-  if (file->version != reloaded) return {};
-  auto table = box.Read(kExportTable);
+Status CheckExportTable(Box& box, const ExportsVersion& reloaded) {
+  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
+  if (!files.ok()) return files.status();
+  if (VersionOf(*files) != reloaded) return {};
+  Result<StoredFile> table = box.Read(kExportTable);
   if (!table.ok()) return table.status();
-  return CompareExportTable(ExportsDocument(std::move(file->text)), ExportsDocument(std::move(table->text)),
-                            ResolverOf(box.root()));
+  return CompareExportTable(*files, ExportsDocument(std::move(table->text)), BoxPaths(box.root()));
 }
 
 }  // namespace vorn

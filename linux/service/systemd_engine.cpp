@@ -213,7 +213,7 @@ class SystemdEngine : public Engine {
 
   Status Reload() override {
     if (!HasThreads()) return {};
-    const Result<Version> reloaded = ReadExportsVersion(box_);
+    const Result<ExportsVersion> reloaded = ReadExportsVersion(box_);
     if (!reloaded.ok()) return reloaded.status();
     const Status status = With([](Manager& manager) { return manager.RunJob("ReloadUnit", kUnit); });
     return status.ok() ? CheckExportTable(box_, *reloaded) : status;

@@ -167,12 +167,50 @@ TEST(CheckExportClient, RefusesANULByte) {
   }
 }
 
+struct ClientPair {
+  const char* first;
+  const char* second;
+  bool is_one;
+};
+
+const ClientPair kPairs[] = {{"Alpha", "alpha", true},
+                             {"@Group", "@group", true},
+                             {"*.EX", "*.ex", true},
+                             {"2001:0DB8:0::1", "2001:db8::1", true},
+                             {"0::1", "::0.0.0.1", true},
+                             {"10.0.0.1", "10.1", true},
+                             {"10.0.0.1", "012.0.0.1", true},
+                             {"10.0.0.1", "0xa.0.0.1", true},
+                             {"10.0.0.1", "167772161", true},
+                             {"10.0.0.1", "::ffff:10.0.0.1", false},
+                             {"fe80::1%lo", "fe80::1", false},
+                             {"10.0.0.1", "10.0.0.1/32", false},
+                             {"10.0.0.0/8", "10.1.0.0/8", false},
+                             {"10.0.0.0/8", "10.0.0.0/255.0.0.0", false},
+                             {"FE80::/16", "fe80::/16", true},
+                             {"fe80:0::/16", "fe80::/16", false},
+                             {"*", "**", false}};
+
 TEST(ExportClientKey, IsOneForWhatExportfsTakesForOne) {
-  EXPECT_EQ(ExportClientKey("Host.Example"), ExportClientKey("host.example"));
-  EXPECT_EQ(ExportClientKey("@Group"), ExportClientKey("@group"));
-  EXPECT_EQ(ExportClientKey("2001:0DB8:0::1"), ExportClientKey("2001:db8::1"));
-  EXPECT_NE(ExportClientKey("10.0.0.1"), ExportClientKey("10.0.0.1/32"));
-  EXPECT_NE(ExportClientKey("10.0.0.0/8"), ExportClientKey("10.1.0.0/8"));
+  for (const ClientPair& pair : kPairs) {
+    EXPECT_EQ(ExportClientKey(pair.first) == ExportClientKey(pair.second), pair.is_one) << pair.first << pair.second;
+  }
+  EXPECT_EQ(ExportClientKey("host.example."), ExportClientKey("Host.Example"));
+  EXPECT_NE(ExportClientKey("*.example."), ExportClientKey("*.example"));
+}
+
+TEST(ExportClientKey, AgreesWithExportfs) {
+  const ExportfsJudge judge;
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  std::vector<std::string> files;
+  for (const ClientPair& pair : kPairs) {
+    files.push_back(std::string("/mnt/a ") + pair.first + "(rw) " + pair.second + "(ro)\n");
+  }
+  const auto verdicts = judge.Judge(files, {"alpha"});
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    const auto clients = std::count(verdicts[i].table.begin(), verdicts[i].table.end(), '\n');
+    EXPECT_EQ(clients, kPairs[i].is_one ? 1 : 2) << files[i] << verdicts[i].messages;
+  }
 }
 
 TEST(ExportNetworkKey, IsOneForTheSameAddresses) {

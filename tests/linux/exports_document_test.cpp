@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <map>
+#include <memory>
 #include <random>
 #include <set>
 #include <string>
@@ -19,26 +20,26 @@ using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it
 using testing::ElementsAre;
 using testing::HasSubstr;
 
-// The exports that exportfs(8) understands: path and client, with the options.
+// The access of each client to each path, up to the fault at which exportfs(8) stops.
 using Table = std::map<std::pair<std::string, std::string>, std::string>;
 
 Table TableOf(const std::string& text) {
   Table table;
   for (const ExportLine& line : ExportsDocument(text).Lines()) {
     for (ExportEntry entry : line.entries) {
-      // Whom the resolver does not know has no place in the table.
+      // The table has no client that exportfs(8) cannot resolve.
       if (!CheckExportClient(entry.client).ok()) continue;
       entry.options.others.clear();
       table.insert({{line.path, ExportClientKey(entry.client)}, entry.options.Text()});
     }
-    if (!line.fault.empty()) break;
+    if (line.fault && line.fault->ends_file) break;
   }
   return table;
 }
 
 std::vector<std::string> Clients(const ExportsDocument& document, const std::string& path) {
   std::vector<std::string> clients;
-  for (const ExportEntry& entry : document.Entries(path)) clients.push_back(entry.client);
+  for (const ExportEntry& entry : document.Entries(path, ExportPaths())) clients.push_back(entry.client);
   return clients;
 }
 
@@ -92,6 +93,17 @@ const std::vector<std::string> kFiles = {
     "/a \"alpha(rw\n,async)\"" + kLast,
     "/a alpha(rw, async)" + kLast,
     "/a \"alpha( rw,async)\"" + kLast,
+    "/a \"alpha(rw, async)\" gamma" + kLast,
+    "/a \"alpha(rw,\t async, )\" gamma" + kLast,
+    "/a \"alpha( )\" gamma" + kLast,
+    "/a \"alpha(rw,async )\" gamma" + kLast,
+    "/a \"alpha(rw,\nasync)\" gamma" + kLast,
+    "/a alpha(sec=krb5,insecure,sec=sys,secure)" + kLast,
+    "/a alpha(insecure,sec=krb5,ro,sec=sys,secure,rw) gamma(sec=sys:krb5,insecure)" + kLast,
+    "/a \\\n/b alpha(rw)" + kLast,
+    "/\\541 alpha(rw)" + kLast,
+    "/a\\401\\377 alpha(rw)" + kLast,
+    "/a 10.0.0.1(rw) 10.1(ro) 012.0.0.1(ro) fe80::/16 fe80:0::/16(rw)" + kLast,
     "/a alpha\"(rw)\"" + kLast,
     "/a \"alpha\"(rw)" + kLast,
     "/a -\"rw,async\" alpha" + kLast,
@@ -137,7 +149,7 @@ TEST(ExportsDocument, ReadsEveryFileAsExportfsDoes) {
   }
 }
 
-// Files of random words, most of them right.
+// Makes files of random words, most of which are valid.
 class FileMaker {
  public:
   explicit FileMaker(unsigned seed) : random_(seed) {}
@@ -206,23 +218,22 @@ TEST(ExportsDocument, ReadsRandomFilesAsExportfsDoes) {
 // Rewriting one path keeps every other line, and what exportfs makes of it.
 TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
   const ExportfsJudge judge;
+  const ExportPaths paths;
   std::vector<std::string> edited;
   for (unsigned seed = 0; seed < 200; ++seed) {
-    FileMaker maker(seed);
-    ExportsDocument document(maker.Make());
-    const std::string before = document.text();
-    std::vector<ExportEntry> entries = document.Entries("/mnt/b");
+    const ExportsDocument document(FileMaker(seed).Make());
+    std::vector<ExportEntry> entries = document.Entries("/mnt/b", paths);
     entries.push_back(Entry("fresh-" + std::to_string(seed), "rw,sec=krb5:sys,anonuid=5"));
-    if (!document.Replace("/mnt/b", entries).ok()) {
-      EXPECT_EQ(document.text(), before) << "seed " << seed;
-      continue;
-    }
-    ExportsDocument again(document.text());
-    ASSERT_TRUE(again.Replace("/mnt/b", again.Entries("/mnt/b")).ok()) << "seed " << seed;
-    EXPECT_EQ(again.text(), document.text()) << "seed " << seed;
-    ASSERT_TRUE(again.Replace("/mnt/b", {}).ok()) << "seed " << seed;
-    EXPECT_THAT(again.Entries("/mnt/b"), testing::IsEmpty()) << "seed " << seed;
-    edited.push_back(document.text());
+    const auto text = document.Replace("/mnt/b", entries, paths);
+    if (!text.ok()) continue;
+    const ExportsDocument again(*text);
+    const auto same = again.Replace("/mnt/b", again.Entries("/mnt/b", paths), paths);
+    ASSERT_TRUE(same.ok()) << "seed " << seed;
+    EXPECT_EQ(*same, *text) << "seed " << seed;
+    const auto without = again.Replace("/mnt/b", {}, paths);
+    ASSERT_TRUE(without.ok()) << "seed " << seed;
+    EXPECT_THAT(Clients(ExportsDocument(*without), "/mnt/b"), testing::IsEmpty()) << "seed " << seed;
+    edited.push_back(*text);
   }
   EXPECT_GT(edited.size(), 150U);
   if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
@@ -238,11 +249,46 @@ TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
 }
 
 TEST(ExportsDocument, FindsTheClientsOfAPathInAllItsLines) {
-  const ExportsDocument document("/a b(rw)\n/b x\n\"/a\" c d # more\n/a/ e b(ro)\n/a/c y\n");
-  EXPECT_THAT(Clients(document, "/a"), ElementsAre("b", "c", "d", "e"));
-  EXPECT_FALSE(document.Entries("/a").front().options.flavors.front().access.read_only);
-  EXPECT_THAT(Clients(document, "/a/"), ElementsAre("b", "c", "d", "e"));
+  const ExportsDocument document("/a b(rw)\n/b x\n\"/a\" c d # more\n/a/ e b(ro)\n/a/c y\n//./a f\n");
+  EXPECT_THAT(Clients(document, "/a"), ElementsAre("b", "c", "d", "e", "f"));
+  EXPECT_FALSE(document.Entries("/a", ExportPaths()).front().options.flavors.front().access.read_only);
+  EXPECT_THAT(Clients(document, "/a/"), ElementsAre("b", "c", "d", "e", "f"));
   EXPECT_THAT(Clients(document, "/"), ElementsAre());
+}
+
+// The links /link -> /a and /home -> /volume1/home, and everything below.
+class LinkedPaths : public ExportPaths {
+ public:
+  std::string Resolve(const std::string& path) const override {
+    const std::string normal = NormalExportPath(path);
+    if (normal == "/link") return "/a";
+    return normal.rfind("/home", 0) == 0 ? "/volume1" + normal : normal;
+  }
+  Folder FolderAt(const std::string& path) const override {
+    if (path != "/") return {Resolve(path), nullptr};
+    return {path, std::make_shared<const Names>(Names{"link", "home"})};
+  }
+};
+
+TEST(ExportsDocument, FindsTheLinesWhosePathIsALink) {
+  const ExportsDocument document("/link b\n/a c\n\"/link/\" d\n/home/x e\n/volume1/home/x f\n/home g\n/links h\n");
+  const auto clients = [&document](const std::string& path) {
+    std::vector<std::string> found;
+    for (const ExportEntry& entry : document.Entries(path, LinkedPaths())) found.push_back(entry.client);
+    return found;
+  };
+  EXPECT_THAT(clients("/a"), ElementsAre("b", "c", "d"));
+  EXPECT_THAT(clients("/link"), ElementsAre("b", "c", "d"));
+  EXPECT_THAT(clients("/volume1/home/x"), ElementsAre("e", "f"));
+  EXPECT_THAT(clients("/home/x"), ElementsAre("e", "f"));
+  EXPECT_THAT(clients("/volume1/home"), ElementsAre("g"));
+}
+
+TEST(ExportsDocument, WritesThePathOfTheDirectoryInPlaceOfALink) {
+  const ExportsDocument document("/link b # one\n/b x\n/a c # two\n");
+  const auto text = document.Replace("/a", {Entry("h", "rw")}, LinkedPaths());
+  ASSERT_TRUE(text.ok()) << text.status().reason();
+  EXPECT_EQ(*text, "/a h(rw,sync,root_squash,sec=sys) # one # two\n/b x\n");
 }
 
 struct EditCase {
@@ -264,38 +310,38 @@ TEST(ExportsDocument, ReplacesTheLinesOfAPathByOne) {
       {"continued to nothing", "/b x \\\n", one, "/b x \\\n\n" + line},
       {"in its place", "/b x\n/a y(ro)\n/c z\n", one, "/b x\n" + line + "/c z\n"},
       {"comment kept", "/a y(ro)   # mine\n/c z\n", one, "/a h(rw,sync,root_squash,sec=sys) # mine\n/c z\n"},
-      {"several lines become one", "/a x\n/b y\n/a z # gone\n# stays\n", one, line + "/b y\n# stays\n"},
+      {"several lines become one", "/a x\n/b y\n/a z # kept\n# stays\n", one,
+       "/a h(rw,sync,root_squash,sec=sys) # kept\n/b y\n# stays\n"},
       {"spelling of the path kept", "  \"/a\"\tx\n", one, "  \"/a\" h(rw,sync,root_squash,sec=sys)\n"},
       {"continuations go", "/a \\\n x \\\n y\n/b z\n", one, line + "/b z\n"},
       {"no entries, no line", "/b x\n/a y # c\n/c z\n", {}, "/b x\n/c z\n"},
       {"no entries and no line", "/b x\n", {}, "/b x\n"},
-      {"faulty line of its own", "/a x(foo)\n/b y\n", one, line + "/b y\n"},
+      {"faulty line of its own removed", "/c z\n/a x(foo) w\n/b y\n", {}, "/c z\n/b y\n"},
       {"faulty lines of others", "/b x(foo)\n/a y\n/c z(\n", one, "/b x(foo)\n" + line + "/c z(\n"},
   };
   for (const EditCase& c : cases) {
-    ExportsDocument document(c.before);
-    const Status status = document.Replace("/a", c.entries);
-    EXPECT_TRUE(status.ok()) << c.name << ": " << status.reason();
-    EXPECT_EQ(document.text(), c.after) << c.name;
+    const auto text = ExportsDocument(c.before).Replace("/a", c.entries, ExportPaths());
+    ASSERT_TRUE(text.ok()) << c.name << ": " << text.status().reason();
+    EXPECT_EQ(*text, c.after) << c.name;
   }
 }
 
 TEST(ExportsDocument, KeepsTheWordsOfEntriesThatStay) {
-  ExportsDocument document("/a \"b\"(rw,async) -no_wdelay c\n");
-  ASSERT_TRUE(document.Replace("/a", document.Entries("/a")).ok());
-  EXPECT_EQ(document.text(), "/a \"b\"(rw,async) c(ro,sync,no_wdelay,root_squash,sec=sys)\n");
+  const ExportsDocument document("/a \"b\"(rw,async) -no_wdelay c\n");
+  const auto text = document.Replace("/a", document.Entries("/a", ExportPaths()), ExportPaths());
+  ASSERT_TRUE(text.ok());
+  EXPECT_EQ(*text, "/a \"b\"(rw,async) c(ro,sync,no_wdelay,root_squash,sec=sys)\n");
 }
 
 TEST(ExportsDocument, EscapesWhatThePathNeeds) {
-  ExportsDocument document("");
-  for (const char* path : {"/a b", "/new\nline", "/qu\"ote", "/back\\101slash", "/#"}) {
-    ASSERT_TRUE(document.Replace(path, {Entry("h", "")}).ok()) << path;
-    EXPECT_THAT(Clients(document, path), ElementsAre("h")) << path;
+  for (const char* path : {"/a b", "/new\nline", "/qu\"ote", "/back\\101slash", "/back\\541slash", "/#"}) {
+    const auto text = ExportsDocument("").Replace(path, {Entry("h", "")}, ExportPaths());
+    ASSERT_TRUE(text.ok()) << path;
+    EXPECT_THAT(Clients(ExportsDocument(*text), path), ElementsAre("h")) << path;
   }
 }
 
 TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
-  const std::string before = "/b x\n";
   const std::vector<ExportEntry> refused[] = {{Entry("a(rw) b", "")},
                                               {Entry("", "")},
                                               {Entry("-x", "")},
@@ -305,37 +351,69 @@ TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
                                               {{"h", {}, "h(ro) # "}, Entry("i", "")},
                                               {{"h", {}, "h(ro)\n/b z"}}};
   for (const auto& entries : refused) {
-    ExportsDocument document(before);
-    EXPECT_EQ(document.Replace("/a", entries).code(), kRefusedText) << entries.front().client;
-    EXPECT_EQ(document.text(), before) << entries.front().client;
+    const auto text = ExportsDocument("/b x\n").Replace("/a", entries, ExportPaths());
+    EXPECT_EQ(text.status().code(), kRefusedText) << entries.front().client;
+  }
+}
+
+TEST(ExportsDocument, RefusesToRewriteALineThatItDoesNotUnderstand) {
+  for (const char* text :
+       {"/a h1(rw) h2(rw, sync) h3(ro)\n", "/a x\n/a \"y\n", "/a x \\\n/b y(rw)\n", "/a x(sec=)\n"}) {
+    const ExportsDocument document(text);
+    EXPECT_EQ(document.Replace("/a", {Entry("h", "")}, ExportPaths()).status().code(), kRefusedText) << text;
+    const auto removed = document.Replace("/a", {}, ExportPaths());
+    ASSERT_TRUE(removed.ok()) << text;
+    EXPECT_EQ(*removed, "") << text;
   }
 }
 
 TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
-  for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)", "/b \"x)\n"}) {
-    ExportsDocument document(text);
-    EXPECT_EQ(document.Replace("/a", {Entry("h", "")}).code(), kRefusedText) << text;
-    EXPECT_EQ(document.text(), text);
+  for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)"}) {
+    const auto edited = ExportsDocument(text).Replace("/a", {Entry("h", "")}, ExportPaths());
+    EXPECT_EQ(edited.status().code(), kRefusedText) << text;
   }
 }
 
-TEST(ExportsDocument, TellsWhereExportfsGivesUpAndWhy) {
-  const ExportsDocument document("# c\n/a x \\\n y\n/b z(rw,foo) w\n/c v\n");
-  const auto lines = document.Lines();
-  ASSERT_EQ(lines.size(), 3U);
-  EXPECT_EQ(lines[0].fault, "");
-  EXPECT_THAT(lines[1].fault, HasSubstr("\"foo\""));
-  EXPECT_EQ(document.LineNumber(lines[1].span.begin), 4U);
-  EXPECT_EQ(lines[2].path, "/c");
+struct FaultCase {
+  const char* text;
+  const char* place;
+  const char* reason;
+  bool ends_file;
+};
+
+TEST(ExportsDocument, TellsWhereALineIsNotUnderstoodAndWhy) {
+  const FaultCase cases[] = {{"# c\n/a x \\\n y\n/b z(rw,foo) w\n", "4:4", "\"foo\"", true},
+                             {"/a x \\\n y(rw\n", "2:2", "\")\"", true},
+                             {"/a h1(rw) h2(rw, sync) h3(ro)\n", "1:11", "\")\"", true},
+                             {"/a x\n\r\n", "2:1", "path", true},
+                             {"/a x \\\n/b y(rw)\n", "2:1", "backslash", false}};
+  for (const FaultCase& c : cases) {
+    const ExportsDocument document(c.text);
+    std::vector<ExportFault> faults;
+    for (const ExportLine& line : document.Lines()) {
+      if (line.fault) faults.push_back(*line.fault);
+    }
+    ASSERT_EQ(faults.size(), 1U) << c.text;
+    EXPECT_EQ(document.Place(faults[0].position), c.place) << c.text;
+    EXPECT_THAT(faults[0].reason, HasSubstr(c.reason)) << c.text;
+    EXPECT_EQ(faults[0].ends_file, c.ends_file) << c.text;
+  }
+}
+
+TEST(ExportsDocument, ReadsTheLinesAfterAFault) {
+  const auto lines = ExportsDocument("/b z(rw,foo) w\n/c v\n").Lines();
+  ASSERT_EQ(lines.size(), 2U);
+  EXPECT_EQ(lines[1].path, "/c");
 }
 
 TEST(ExportsDocument, HoldsTenThousandPathsInLinearTime) {
   std::string text;
   for (int i = 0; i < 10000; ++i) text += "/volume1/share" + std::to_string(i) + " 10.0.0.1(rw) 10.0.0.2(ro)\n";
-  ExportsDocument document(text);
+  const ExportsDocument document(text);
   EXPECT_EQ(document.Lines().size(), 10000U);
-  ASSERT_TRUE(document.Replace("/volume1/share5000", {}).ok());
-  EXPECT_EQ(document.Lines().size(), 9999U);
+  const auto without = document.Replace("/volume1/share5000", {}, ExportPaths());
+  ASSERT_TRUE(without.ok());
+  EXPECT_EQ(ExportsDocument(*without).Lines().size(), 9999U);
 }
 
 }  // namespace

@@ -37,9 +37,14 @@ TEST(ExportOptionReader, MeansWhatExportfsMakesOfTheLists) {
       {{"anonuid=-2,anongid= +7"}, "ro,sync,root_squash,anonuid=-2,anongid=7,sec=sys"},
       {{"sec=unix:null:sys"}, "ro,sync,root_squash,sec=sys:none"},
       {{"sec=krb5:krb5i,sec=krb5p,rw"},
-       "sync,sec=krb5:krb5i,ro,root_squash,no_all_squash,sec=krb5p,rw,root_squash,no_all_squash"},
+       "sync,sec=krb5:krb5i,ro,root_squash,no_all_squash,secure,sec=krb5p,rw,root_squash,no_all_squash,secure"},
       {{"sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i"},
-       "sync,sec=krb5,rw,root_squash,no_all_squash,sec=sys:krb5i,ro,no_root_squash,no_all_squash"},
+       "sync,sec=krb5,rw,root_squash,no_all_squash,secure,sec=sys:krb5i,ro,no_root_squash,no_all_squash,secure"},
+      {{"sec=krb5,insecure,sec=sys,secure"},
+       "sync,sec=krb5,ro,root_squash,no_all_squash,insecure,sec=sys,ro,root_squash,no_all_squash,secure"},
+      {{"rw, async,\t insecure, "}, "rw,async,insecure,root_squash,sec=sys"},
+      {{"rw,xprtsec=none:tls", "reexport=auto-fsidnum"},
+       "rw,sync,xprtsec=none:tls,reexport=auto-fsidnum,root_squash,sec=sys"},
       {{"sec=krb5,rw", "ro"}, "rw,sync,root_squash,sec=krb5"},
       {{"sec=krb5,rw", "sec=sys"}, "rw,sync,root_squash,sec=krb5:sys"},
       {{"rw", "sec=krb5"}, "rw,sync,root_squash,sec=krb5"},
@@ -49,7 +54,8 @@ TEST(ExportOptionReader, MeansWhatExportfsMakesOfTheLists) {
 }
 
 TEST(ExportOptions, TextHasTheSameMeaning) {
-  for (const char* list : {"", "rw,async", "sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i,all_squash", "sec=none",
+  for (const char* list : {"", "rw,async", "sec=krb5,insecure,sec=sys,secure", "insecure,sec=krb5:sys",
+                           "sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i,all_squash", "sec=none",
                            "sec=krb5p:sys,rw,anonuid=7,mp,refer=/a@b", "all_squash,sec=krb5,no_all_squash"}) {
     const ExportOptions options = Read({list});
     EXPECT_EQ(Read({options.Text()}), options) << list << " -> " << options.Text();
@@ -89,7 +95,11 @@ TEST(ExportOptionReader, KeepsWhatItHasNoFieldFor) {
                            "squash_uids=",
                            "squash_gids=5-",
                            "squash_uids=-5",
-                           "squash_gids=0-99"}) {
+                           "squash_gids=0-99",
+                           "xprtsec=tls:mtls",
+                           "reexport=auto-fsidnum",
+                           "new-option=",
+                           "some_thing=a b"}) {
     EXPECT_THAT(Read({word}).others, testing::ElementsAre(word));
   }
 }
@@ -98,8 +108,9 @@ TEST(ExportOptionReader, RefusesWhatExportfsStopsAt) {
   for (const char* word : {"foo",
                            "RW",
                            "",
-                           " rw",
                            "rw ",
+                           "=x",
+                           "a b=x",
                            "rw\t",
                            "sync=1",
                            "anonuid=",

@@ -70,10 +70,11 @@ TEST(RuleOf, ReadsTheOtherOptions) {
   EXPECT_EQ(flavors.krb5p, 1);
 }
 
-TEST(RuleOf, ShowsTheMostThatOneFlavourMayDo) {
+TEST(RuleOf, ShowsTheWidestAccessOfAnyFlavour) {
   EXPECT_EQ(Rule("ro,sec=sys,sec=krb5,rw").privilege, 1);
   EXPECT_EQ(Rule("rw,sec=sys,sec=krb5,ro").privilege, 1);
   EXPECT_EQ(Rule("sec=sys,all_squash,sec=krb5,no_all_squash,no_root_squash").squash, VORNNFS_SQUASH_ROOT);
+  EXPECT_EQ(Rule("sec=sys,insecure,sec=krb5,secure").insecure, 1);
 }
 
 struct ChangeCase {
@@ -97,8 +98,6 @@ TEST(EntryOf, KeepsWhatTheRuleDoesNotSay) {
       {"order of flavours", "sec=krb5p:sys", "sec=sys:krb5:krb5p", "ro,sync,root_squash,sec=krb5p:sys:krb5"},
       {"flavour gone", "sec=krb5:sys", "sec=sys", "ro,sync,root_squash,sec=sys"},
       {"flavour without a field", "sec=none:sys", "sec=krb5", "ro,sync,root_squash,sec=none:krb5"},
-      {"flavours that differ become one", "sec=krb5,rw,sec=sys,ro", "async,sec=krb5:sys,rw",
-       "rw,async,root_squash,sec=krb5:sys"},
       {"switches", "ro", "async,insecure,crossmnt", "ro,async,insecure,crossmnt,root_squash,sec=sys"},
   };
   for (const ChangeCase& c : cases) {
@@ -108,6 +107,50 @@ TEST(EntryOf, KeepsWhatTheRuleDoesNotSay) {
     EXPECT_EQ(entry->options.Text(), c.after) << c.name;
     EXPECT_EQ(entry->word, "") << c.name;
     EXPECT_EQ(entry->client, "host") << c.name;
+  }
+}
+
+// A client that is root with write by Kerberos from any port, and squashed and read-only by AUTH_SYS.
+const char* const kMixed = "sec=krb5,rw,no_root_squash,insecure,sec=sys,ro,root_squash,all_squash,secure,anonuid=7";
+
+struct FieldChange {
+  const char* name;
+  const char* present;
+  std::int32_t ExportRule::*field;
+  std::int32_t value;
+  const char* after;  // the whole entry, or null if the change is refused
+};
+
+TEST(EntryOf, ChangesOneFieldAndNothingElseOfAnyFlavour) {
+  const FieldChange cases[] = {
+      {"write mode", kMixed, &ExportRule::write_mode, VORNNFS_WRITE_ASYNC,
+       "async,anonuid=7,sec=krb5,rw,no_root_squash,no_all_squash,insecure,sec=sys,ro,root_squash,all_squash,secure"},
+      {"crossmnt", kMixed, &ExportRule::crossmnt, 1,
+       "sync,crossmnt,anonuid=7,sec=krb5,rw,no_root_squash,no_all_squash,insecure,"
+       "sec=sys,ro,root_squash,all_squash,secure"},
+      {"insecure ports closed", kMixed, &ExportRule::insecure, 0,
+       "sync,anonuid=7,sec=krb5,rw,no_root_squash,no_all_squash,secure,sec=sys,ro,root_squash,all_squash,secure"},
+      {"read-only", kMixed, &ExportRule::privilege, 0,
+       "sync,anonuid=7,sec=krb5,ro,no_root_squash,no_all_squash,insecure,sec=sys,ro,root_squash,all_squash,secure"},
+      {"the narrower flavour goes", kMixed, &ExportRule::sys, 0, "rw,sync,insecure,no_root_squash,anonuid=7,sec=krb5"},
+      {"the wider flavour goes", kMixed, &ExportRule::krb5, 0, nullptr},
+      {"another flavour", kMixed, &ExportRule::krb5p, 1, nullptr},
+      {"squash mode guest", kMixed, &ExportRule::squash, VORNNFS_SQUASH_GUEST, nullptr},
+      {"squash mode of all", kMixed, &ExportRule::squash, VORNNFS_SQUASH_ALL_ADMIN, nullptr},
+      {"flavours differ in privilege only", "sec=krb5,rw,sec=sys,ro", &ExportRule::squash, VORNNFS_SQUASH_ROOT,
+       "sync,sec=krb5,rw,no_root_squash,no_all_squash,secure,sec=sys,ro,no_root_squash,no_all_squash,secure"},
+      {"insecure", "sec=krb5,rw,sec=sys,ro", &ExportRule::insecure, 1,
+       "sync,sec=krb5,rw,root_squash,no_all_squash,insecure,sec=sys,ro,root_squash,no_all_squash,insecure"},
+      {"the field that differs becomes one", "sec=krb5,rw,sec=sys,ro", &ExportRule::privilege, 0,
+       "ro,sync,root_squash,sec=krb5:sys"}};
+  for (const FieldChange& c : cases) {
+    const ExportEntry present = Entry(c.present);
+    ExportRule rule = RuleOf(present, kAccounts);
+    rule.*c.field = c.value;
+    const auto entry = EntryOf(rule, &present, kAccounts);
+    ASSERT_EQ(entry.ok(), c.after != nullptr) << c.name;
+    EXPECT_EQ(entry.ok() ? 0 : entry.status().code(), c.after != nullptr ? 0 : kRefusedText) << c.name;
+    EXPECT_EQ(entry.ok() ? entry->options.Text() : "", c.after != nullptr ? c.after : "") << c.name;
   }
 }
 

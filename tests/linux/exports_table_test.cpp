@@ -3,7 +3,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "exportfs_judge.h"
 
@@ -12,11 +15,22 @@ namespace {
 
 using testing::HasSubstr;
 
-std::string Resolve(const std::string& path) { return path == "/link" ? "/mnt/a" : path; }
+// There is one link, /link -> /mnt/a.
+class OneLink : public ExportPaths {
+ public:
+  std::string Resolve(const std::string& path) const override { return path == "/link" ? "/mnt/a" : path; }
+};
 
-Status Compare(const std::string& file, const std::string& table) {
-  return CompareExportTable(ExportsDocument(file), ExportsDocument(table), Resolve);
+Status CompareAll(const std::vector<std::string>& texts, const std::string& table) {
+  std::vector<SharedExportsFile> files;
+  for (const std::string& text : texts) {
+    const std::string name = "/" + std::to_string(files.size()) + ".exports";
+    files.push_back(std::make_shared<const ExportsFile>(ExportsFile{name, name, {}, ExportsDocument(text)}));
+  }
+  return CompareExportTable(files, ExportsDocument(table), OneLink());
 }
+
+Status Compare(const std::string& file, const std::string& table) { return CompareAll({file}, table); }
 
 TEST(CompareExportTable, FindsTheTableOfExportfsToBeTheFiles) {
   const ExportfsJudge judge;
@@ -45,11 +59,11 @@ TEST(CompareExportTable, NamesTheLineThatExportfsDidNotTake) {
   const ExportfsJudge judge;
   if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
   const DifferenceCase cases[] = {
-      {"option", "# c\n/mnt/a *(rw)\n/mnt/b *(rw,foo)\n/mnt/c *\n", "line 3", "\"foo\""},
-      {"parenthesis", "/mnt/a *(rw\n/mnt/b *\n", "line 1", "\")\""},
-      {"address", "/mnt/a *\n/mnt/b 10.0.0.0/33\n", "line 2", "prefix"},
-      {"host", "/mnt/a \\\n *\n/mnt/b nowhere(rw)\n", "line 3", "no such host"},
-      {"path", "/mnt/a *\n\r\n/mnt/b *\n", "line 2", "no path"},
+      {"option", "# c\n/mnt/a *(rw)\n/mnt/b *(rw,foo)\n/mnt/c *\n", ".exports:3:", "\"foo\""},
+      {"parenthesis", "/mnt/a *(rw\n/mnt/b *\n", ".exports:1:", "\")\""},
+      {"address", "/mnt/a *\n/mnt/b 10.0.0.0/33\n", ".exports:2:", "prefix"},
+      {"host", "/mnt/a \\\n *\n/mnt/b nowhere(rw)\n", ".exports:3:", "no such host"},
+      {"path", "/mnt/a *\n\r\n/mnt/b *\n", ".exports:2:", "path"},
   };
   std::vector<std::string> files;
   for (const DifferenceCase& c : cases) files.push_back(c.file);
@@ -67,11 +81,19 @@ TEST(CompareExportTable, NoticesATableThatIsNotTheFiles) {
   EXPECT_TRUE(Compare(file, "/a\tx(rw,hide)\n/b\t*(ro)\n").ok());
   EXPECT_TRUE(Compare(file, "/a\tx(rw)\n/b\t*(ro)\n/other\t*(ro)\n").ok());
   EXPECT_TRUE(Compare(file, "/a\tx.example(rw)\n/b\t*(ro)\n").ok()) << "a host by its own name";
-  EXPECT_THAT(Compare(file, "").reason(), HasSubstr("line 1"));
-  EXPECT_THAT(Compare(file, "/a\tx(rw)\n").reason(), HasSubstr("line 2"));
+  EXPECT_THAT(Compare(file, "").reason(), HasSubstr(".exports:1:"));
+  EXPECT_THAT(Compare(file, "/a\tx(rw)\n").reason(), HasSubstr(".exports:2:"));
   EXPECT_THAT(Compare(file, "/a\tx(ro)\n/b\t*(ro)\n").reason(), HasSubstr("another access"));
-  EXPECT_THAT(Compare(file, "/a\tx.example(ro)\n/b\t*(ro)\n").reason(), HasSubstr("line 1"));
+  EXPECT_THAT(Compare(file, "/a\tx.example(ro)\n/b\t*(ro)\n").reason(), HasSubstr(".exports:1:"));
   EXPECT_THAT(Compare(file, "/a\tx(rw)\n/b\t*(ro,sec=krb5)\n").reason(), HasSubstr("another access"));
+}
+
+TEST(CompareExportTable, ReadsSeveralFilesInOrder) {
+  EXPECT_TRUE(CompareAll({"/a x(rw)\n", "/a x(ro)\n/b *\n"}, "/a\tx(rw)\n/b\t*(ro)\n").ok());
+  EXPECT_THAT(CompareAll({"/a x(rw)\n", "/a x(ro)\n\n/b *\n"}, "/a\tx(rw)\n").reason(), HasSubstr("/1.exports:3:"));
+  EXPECT_THAT(CompareAll({"/a x(rw)\n", "/a y(foo)\n"}, "/a\tx(rw)\n").reason(), HasSubstr("/1.exports:1:4"));
+  EXPECT_THAT(CompareAll({"/a x(sec=krb5,insecure,sec=sys,secure)\n"}, "/a\tx(insecure,sec=krb5:sys)\n").reason(),
+              HasSubstr("another access"));
 }
 
 TEST(CompareExportTable, FollowsLinksOfTheFile) {

@@ -34,6 +34,8 @@ TEST(ExportsReader, ReadsAWordAsExportfsDoes) {
       {"backslash that escapes nothing", "/a\\b\\09", "/a\\b\\09", ""},
       {"escape made by an escape", "/\\134101", "/A", ""},
       {"escaped digits stay", "/\\134\\061\\060\\061", "/\\101", ""},
+      {"octal escape of a whole byte", "/a\\377b c", "/a\377b", "c"},
+      {"octal number above a byte", "/a\\541\\401 c", "/a\\541\\401", "c"},
       {"number sign inside", "/a#b c", "/a#b", "c"},
       {"continued line ends it", "/a\\\n   b", "/a", "b"},
       {"continued line in quotation marks", "\"/a\\\n \tb\"", "/a b", ""},

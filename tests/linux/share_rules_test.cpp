@@ -1,10 +1,12 @@
-// The contract's operations on export rules, on a root of their own.
+// The contract's operations on export rules, each on a root of its own.
 #include "share_rules.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <cstring>
 #include <memory>
 #include <string>
@@ -42,7 +44,7 @@ class Exports : public testing::Test {
   TemporaryRoot root;
 };
 
-// A list of rules as the module makes one: each from malloc(3).
+// Makes a list of rules as the module does: each is allocated by malloc(3).
 List MakeList(const std::vector<std::string>& clients) {
   List list(static_cast<ExportRuleList*>(std::calloc(1, sizeof(ExportRuleList))));
   ExportRule** last = &list->first;
@@ -208,7 +210,150 @@ TEST_F(Exports, AreWrittenWhateverIsWrongWithOtherLines) {
   EXPECT_THAT(File(), HasSubstr("/x y(foo)\n/volume1/data a("));
 }
 
-// Compares the table with the file, as the platform does after a reload.
+std::string Reason() {
+  const auto log = TakeLog();
+  return log.empty() ? "" : log.back().text;
+}
+
+// One file of /etc/exports.d has a rule for the share, and one that its file overrides.
+class ForeignExports : public Exports {
+ protected:
+  ForeignExports() {
+    root.Write("/etc/exports.d/b.exports", "# zfs\n/volume1/data zebra(ro) own(rw)\n/volume1/zfs *(rw)\n");
+    root.Write("/etc/exports.d/c.exports", "/volume1/data zebra(rw)\n");
+    root.Write("/etc/exports.d/ignored", "/volume1/data x(rw)\n");
+    root.Write("/etc/exports.d/.hidden.exports", "/volume1/data x(rw)\n");
+    root.Write(kFile, "/volume1/data own(ro)\n");
+  }
+};
+
+TEST_F(ForeignExports, AreLoadedAfterThoseOfTheFile) {
+  EXPECT_THAT(Clients(Get("/volume1/data", 2)), ElementsAre("own", "zebra"));
+  EXPECT_THAT(Clients(Get("/volume1/zfs", 1)), ElementsAre("*"));
+}
+
+TEST_F(ForeignExports, StayWhereTheyAreIfTheyDoNotChange) {
+  const List list = Get("/volume1/data", 2);
+  list->first->privilege = 1;
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  EXPECT_EQ(File(), "/volume1/data own(rw,sync,root_squash,sec=sys)\n");
+  EXPECT_THAT(Clients(Get("/volume1/data", 2)), ElementsAre("own", "zebra"));
+  const List zfs = Get("/volume1/zfs", 1);
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/zfs", zfs.get()), 0);
+  EXPECT_EQ(File(), "/volume1/data own(rw,sync,root_squash,sec=sys)\n");
+}
+
+TEST_F(ForeignExports, CannotBeChangedOrRemoved) {
+  const List list = Get("/volume1/data", 2);
+  list->first->next->privilege = 1;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  EXPECT_THAT(Reason(), HasSubstr("/etc/exports.d/b.exports:2:1"));
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"zebra"}).get()), -1);
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/zfs", nullptr), -1);
+  EXPECT_THAT(Reason(), HasSubstr("/etc/exports.d/b.exports:3:1"));
+  EXPECT_EQ(File(), "/volume1/data own(ro)\n");
+}
+
+TEST_F(ForeignExports, AreNotUncoveredByRemovingTheRuleThatOverridesThem) {
+  const List list = Get("/volume1/data", 2);
+  const std::unique_ptr<ExportRule, decltype(&std::free)> own(list->first, std::free);
+  list->first = own->next;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  EXPECT_THAT(Reason(), HasSubstr("\"own\""));
+  EXPECT_EQ(File(), "/volume1/data own(ro)\n");
+}
+
+TEST_F(ForeignExports, AreNotReadFromWhatIsNoRegularFile) {
+  ASSERT_EQ(mkdir(root.At("/etc/exports.d/d.exports").c_str(), 0755), 0);
+  ASSERT_EQ(mkfifo(root.At("/etc/exports.d/f.exports").c_str(), 0600), 0);
+  ASSERT_EQ(symlink("nowhere", root.At("/etc/exports.d/g.exports").c_str()), 0);
+  EXPECT_THAT(Clients(Get("/volume1/data", 2)), ElementsAre("own", "zebra"));
+}
+
+TEST_F(Exports, OfALinkToTheShareAreTheShares) {
+  root.Write("/volume1/data/file", "");
+  ASSERT_EQ(symlink("/volume1/data", root.At("/link").c_str()), 0);
+  root.Write(kFile, "/link everybody(rw)\n/volume1/other x\n//volume1/./data/ b(ro)\n");
+  EXPECT_THAT(Clients(Get("/volume1/data", 2)), ElementsAre("everybody", "b"));
+  EXPECT_THAT(Clients(Get("/link", 2)), ElementsAre("everybody", "b"));
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"a"}).get()), 0);
+  EXPECT_EQ(File(), "//volume1/./data/ a(rw,sync,no_subtree_check,no_root_squash,sec=sys)\n/volume1/other x\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", nullptr), 0);
+  EXPECT_EQ(File(), "/volume1/other x\n");
+}
+
+TEST_F(Exports, NoticeANewLinkWithoutANewFile) {
+  root.Write("/volume1/data/file", "");
+  root.Write("/volume1/other/file", "");
+  root.Write(kFile, "/volume1/link x\n");
+  Get("/volume1/data", 0);
+  ASSERT_EQ(symlink("data", root.At("/volume1/link").c_str()), 0);
+  EXPECT_THAT(Clients(Get("/volume1/data", 1)), ElementsAre("x"));
+  ASSERT_EQ(unlink(root.At("/volume1/link").c_str()), 0);
+  ASSERT_EQ(symlink("other", root.At("/volume1/link").c_str()), 0);
+  Get("/volume1/data", 0);
+}
+
+TEST_F(Exports, OfAPathThatTheListWouldCutAreRefused) {
+  const std::string cut = "/" + std::string(250, 'a') + "/" + std::string(255, 'b');
+  root.Write(kFile, cut + " x(ro)\n" + cut + "c y(rw)\n");
+  EXPECT_THAT(Clients(Get(cut.c_str(), 1)), ElementsAre("x"));
+  Get((cut + "c").c_str(), -1);
+  EXPECT_EQ(KLIBCErrGet(), ENAMETOOLONG);
+  EXPECT_EQ(VORNNFSRuleExtSetAll((cut + "c").c_str(), nullptr), -1);
+  EXPECT_EQ(File(), cut + " x(ro)\n" + cut + "c y(rw)\n");
+}
+
+TEST_F(Exports, WithAFaultAreNotRewrittenButRemoved) {
+  const std::string faulty = "/volume1/a x\n/volume1/data h1(rw) h2(rw, sync) h3(ro)\n/volume1/b y\n";
+  root.Write(kFile, faulty);
+  const List list = Get("/volume1/data", 1);
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0) << "unchanged";
+  list->first->privilege = 0;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kRefusedText);
+  EXPECT_THAT(Reason(), HasSubstr("/etc/exports:2:22: "));
+  EXPECT_EQ(File(), faulty);
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", nullptr), 0);
+  EXPECT_EQ(File(), "/volume1/a x\n/volume1/b y\n");
+}
+
+TEST_F(Exports, AreRemovedEvenIfNothingOfTheLineIsUnderstood) {
+  root.Write(kFile, "/volume1/data x(foo)\n/volume1/b y\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", nullptr), 0);
+  EXPECT_EQ(File(), "/volume1/b y\n");
+}
+
+TEST_F(Exports, KeepOptionsOfNewerVersions) {
+  root.Write(kFile, "/volume1/data a(ro,no_root_squash,xprtsec=none:tls,reexport=auto-fsidnum)\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"a"}).get()), 0);
+  EXPECT_EQ(File(), "/volume1/data a(rw,sync,xprtsec=none:tls,reexport=auto-fsidnum,no_root_squash,sec=sys)\n");
+}
+
+TEST_F(Exports, OfAHostWithAndWithoutTheFinalDotAreOne) {
+  root.Write(kFile, "/volume1/data host.example(ro,fsid=5) 10.1(ro)\n");
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"host.example", "host.example."}).get()), -1);
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"HOST.example.", "10.0.0.1"}).get()), 0);
+  EXPECT_THAT(File(), HasSubstr(" HOST.example.(rw,sync,fsid=5,"));
+}
+
+TEST_F(Exports, HaveFaultsThatNameFileLineAndColumn) {
+  root.Write(kFile, "# c\n/volume1/a x(rw)\n/volume1/b y(foo)\n/volume1/c \\\n/volume1/d z(rw)\n");
+  root.Write("/etc/exports.d/a.exports", "/volume1/e z(rw\n");
+  const auto files = vorn::OpenAllExports(vorn::CurrentBox());
+  ASSERT_TRUE(files.ok());
+  const auto faults = vorn::FindExportFaults(*files);
+  ASSERT_EQ(faults.size(), 3U);
+  EXPECT_THAT(faults[0].sentence, HasSubstr("/etc/exports:3:12: "));
+  EXPECT_EQ(faults[0].path, "/volume1/b");
+  EXPECT_TRUE(faults[0].ends_file);
+  EXPECT_THAT(faults[1].sentence, HasSubstr("/etc/exports:5:1: a path among the clients"));
+  EXPECT_FALSE(faults[1].ends_file);
+  EXPECT_EQ(File().substr(faults[1].begin, faults[1].end - faults[1].begin), "/volume1/c \\\n/volume1/d z(rw)\n");
+  EXPECT_EQ(faults[2].file, root.At("/etc/exports.d/a.exports"));
+}
+
+// Checks the table as after a reload of the present files.
 vorn::Status CheckTable() {
   const auto reloaded = vorn::ReadExportsVersion(vorn::CurrentBox());
   return reloaded.ok() ? vorn::CheckExportTable(vorn::CurrentBox(), *reloaded) : reloaded.status();
@@ -230,7 +375,7 @@ TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   EXPECT_TRUE(CheckTable().ok());
   EXPECT_THAT(verdict.table, HasSubstr("10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,all_squash,"));
   EXPECT_THAT(verdict.table, HasSubstr("anonuid=1024,anongid=100"));
-  EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,no_root_squash"));
+  EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,secure,no_root_squash"));
 }
 
 TEST_F(Exports, AreComparedWithTheExportTable) {
@@ -240,7 +385,7 @@ TEST_F(Exports, AreComparedWithTheExportTable) {
   root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n/volume1\t*(ro)\n");
   EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
   root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n");
-  EXPECT_THAT(CheckTable().reason(), HasSubstr("line 2 (/volume1/link)"));
+  EXPECT_THAT(CheckTable().reason(), HasSubstr("/etc/exports:2:1: /volume1/link"));
 }
 
 TEST_F(Exports, AreNotComparedWithATableThatIsOlderThanTheirNextSave) {
@@ -251,6 +396,13 @@ TEST_F(Exports, AreNotComparedWithATableThatIsOlderThanTheirNextSave) {
   EXPECT_FALSE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
   ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"10.0.0.1"}).get()), 0);
   EXPECT_TRUE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
+}
+
+TEST_F(ForeignExports, AreComparedWithTheExportTable) {
+  root.Write("/var/lib/nfs/etab", "/volume1/data\town(ro)\n/volume1/data\tzebra(ro)\n/volume1/zfs\t*(rw)\n");
+  EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
+  root.Write("/var/lib/nfs/etab", "/volume1/data\town(ro)\n/volume1/data\tzebra(ro)\n");
+  EXPECT_THAT(CheckTable().reason(), HasSubstr("/etc/exports.d/b.exports:3:1: /volume1/zfs"));
 }
 
 TEST(VORNNFSRuleExtFree, TakesNull) { VORNNFSRuleExtFree(nullptr); }

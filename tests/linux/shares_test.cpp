@@ -56,6 +56,14 @@ TEST(VORNShareGet, RefusesAPathThatIsNotAbsolute) {
   EXPECT_NE(PathOf("a"), "volume1");
 }
 
+TEST(VORNShareGet, RefusesAPathThatAnExportRuleListWouldCut) {
+  const TemporaryRoot root;
+  const std::string longest = "/" + std::string(250, 'a') + "/" + std::string(255, 'b');
+  root.Write("/etc/vorn/shares.conf", "[shares]\nfits = " + longest + "\nlong = " + longest + "c\n");
+  EXPECT_EQ(PathOf("fits"), longest);
+  EXPECT_EQ(PathOf("long"), std::to_string(ENAMETOOLONG));
+}
+
 TEST(VORNShareFree, TakesNull) { VORNShareFree(nullptr); }
 
 }  // namespace

@@ -107,7 +107,7 @@ TEST_F(SystemdEngine, NamesTheLineThatAReloadDidNotTake) {
   folder_.Write("/var/lib/nfs/etab", kTable);
   const Status status = Engine()->Reload();
   EXPECT_EQ(status.code(), vorn::kServiceFailed);
-  EXPECT_THAT(status.reason(), HasSubstr("line 3 (/volume1/media)"));
+  EXPECT_THAT(status.reason(), HasSubstr("/etc/exports:3:1: /volume1/media"));
 }
 
 TEST_F(SystemdEngine, HasNothingToReloadWhereTheKernelServesNobody) {

@@ -1,0 +1,68 @@
+#include "exports_files.h"
+
+#include <sys/stat.h>
+
+#include <string_view>
+
+namespace vorn {
+namespace {
+
+constexpr char kFolder[] = "/etc/exports.d";
+constexpr std::string_view kEnding = ".exports";
+
+bool IsExportsName(std::string_view name) {
+  return name.size() > kEnding.size() && name[0] != '.' && name.substr(name.size() - kEnding.size()) == kEnding;
+}
+
+bool IsRegularFile(Box& box, const std::string& path) {
+  const Result<std::string> location = box.root().Locate(path);
+  struct stat stat {};
+  return location.ok() && lstat(location->c_str(), &stat) == 0 && S_ISREG(stat.st_mode);
+}
+
+}  // namespace
+
+Result<SharedExportsFile> OpenExportsFile(Box& box, const std::string& path) {
+  return box.Load<ExportsFile>(path, [&path](StoredFile file) -> Result<ExportsFile> {
+    return ExportsFile{path, std::move(file.location), file.version, ExportsDocument(std::move(file.text))};
+  });
+}
+
+Result<std::vector<SharedExportsFile>> OpenAllExports(Box& box) {
+  Result<SharedExportsFile> own = OpenExportsFile(box, kExportsFile);
+  if (!own.ok()) return own.status();
+  std::vector<SharedExportsFile> files = {std::move(*own)};
+  const Result<std::shared_ptr<const StoredFolder>> folder = box.List(kFolder);
+  if (!folder.ok()) return folder.status();
+  for (const std::string& name : (*folder)->names) {
+    if (!IsExportsName(name)) continue;
+    const std::string path = std::string(kFolder) + "/" + name;
+    Result<SharedExportsFile> file = OpenExportsFile(box, path);
+    if (file.ok()) {
+      files.push_back(std::move(*file));
+    } else if (IsRegularFile(box, path)) {
+      return file.status();
+    }
+  }
+  return files;
+}
+
+ExportsVersion VersionOf(const std::vector<SharedExportsFile>& files) {
+  ExportsVersion version;
+  for (const SharedExportsFile& file : files) version.emplace_back(file->path, file->version);
+  return version;
+}
+
+std::vector<ExportsFileFault> FindExportFaults(const std::vector<SharedExportsFile>& files) {
+  std::vector<ExportsFileFault> faults;
+  for (const SharedExportsFile& file : files) {
+    for (const ExportLine& line : file->document.Lines()) {
+      if (!line.fault) continue;
+      faults.push_back({file->location, line.path, line.span.begin, line.span.end,
+                        file->Place(line.fault->position) + ": " + line.fault->reason, line.fault->ends_file});
+    }
+  }
+  return faults;
+}
+
+}  // namespace vorn

@@ -29,13 +29,6 @@ Status WaitFor(const FileDescriptor& file, const std::string& path, const Deadli
   return {};
 }
 
-Status Lock(const FileDescriptor& file, const std::string& path, std::chrono::milliseconds limit) {
-  if (flock(file.get(), LOCK_EX | LOCK_NB) == 0) return {};
-  if (errno != EWOULDBLOCK && errno != EINTR) return Status::System(errno, path);
-  const DeadlineTimer timer(limit);
-  return timer.status().ok() ? WaitFor(file, path, timer) : timer.status();
-}
-
 // Whether the locked file is still the one at `path`: another process may have removed it meanwhile.
 bool IsAt(const FileDescriptor& file, const std::string& path) {
   struct stat mine {};
@@ -46,6 +39,13 @@ bool IsAt(const FileDescriptor& file, const std::string& path) {
 
 }  // namespace
 
+Status LockFile(const FileDescriptor& file, const std::string& name, std::chrono::milliseconds limit) {
+  if (flock(file.get(), LOCK_EX | LOCK_NB) == 0) return {};
+  if (errno != EWOULDBLOCK && errno != EINTR) return Status::System(errno, name);
+  const DeadlineTimer timer(limit);
+  return timer.status().ok() ? WaitFor(file, name, timer) : timer.status();
+}
+
 Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path, std::chrono::milliseconds limit) {
   const Result<std::string> location = root.Locate(path);
   if (!location.ok()) return location.status();
@@ -53,7 +53,7 @@ Result<FileDescriptor> TakeFileLock(const Root& root, std::string_view path, std
   for (;;) {
     Result<FileDescriptor> file = Open(*location);
     if (!file.ok()) return file;
-    if (Status status = Lock(*file, *location, limit); !status.ok()) return status;
+    if (Status status = LockFile(*file, *location, limit); !status.ok()) return status;
     if (IsAt(*file, *location)) return file;
   }
 }

@@ -4,11 +4,14 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 
+#include "extended_attributes.h"
 #include "file_descriptor.h"
+#include "file_lock.h"
 
 namespace vorn {
 namespace {
@@ -18,6 +21,9 @@ namespace fs = std::filesystem;
 constexpr std::size_t kLargestFile = std::size_t{64} << 20;
 
 constexpr char kUnique[] = "XXXXXX";  // as mkstemp(3)
+
+// For another program that has locked a file while it changes it.
+constexpr std::chrono::seconds kOtherWritersLimit{5};
 
 // A hidden file beside the target: the readers of a folder such as nfs.conf.d ignore it.
 fs::path TemporaryPath(const fs::path& path, const std::string& ending) {
@@ -71,13 +77,17 @@ class TemporaryFile {
     return {};
   }
 
-  // The owner comes before the mode, because chown(2) clears the set-id bits.
-  Status CopyOwnerAndMode(const struct stat& original) {
+  // Copies owner, mode and extended attributes. The owner comes before the mode, because chown(2) clears the set-id
+  // bits, and the mode before an access control list, which chmod(2) would change.
+  Status CopyAttributes(const FileDescriptor& original, const std::string& name) {
+    struct stat theirs {};
     struct stat mine {};
+    if (fstat(original.get(), &theirs) != 0) return Status::System(errno, name);
     if (fstat(file_.get(), &mine) != 0) return Status::System(errno, path_);
-    const bool same_owner = mine.st_uid == original.st_uid && mine.st_gid == original.st_gid;
-    if (!same_owner && fchown(file_.get(), original.st_uid, original.st_gid) != 0) return Status::System(errno, path_);
-    return SetMode(original.st_mode & 07777);
+    const bool same_owner = mine.st_uid == theirs.st_uid && mine.st_gid == theirs.st_gid;
+    if (!same_owner && fchown(file_.get(), theirs.st_uid, theirs.st_gid) != 0) return Status::System(errno, path_);
+    if (Status status = SetMode(theirs.st_mode & 07777); !status.ok()) return status;
+    return CopyExtendedAttributes(original, file_, name);
   }
 
   Status SetMode(mode_t mode) {
@@ -92,6 +102,11 @@ class TemporaryFile {
       return expected.exists ? VerifyAndUnlink(target, expected) : Done();
     }
     if (errno == ENOENT || errno == EEXIST) return ChangedBehind(target.string());
+    if (errno == EBUSY) {
+      return Status::Failure(EBUSY, target.string() +
+                                        " is a mount point (a bind mount?) and cannot be replaced in one "
+                                        "step; mount the folder that contains it instead");
+    }
     if (errno != EINVAL) return Status::System(errno, target.string());
     // The file system cannot exchange files: an edit since the last check would be lost.
     if (rename(path_.c_str(), target.c_str()) != 0) return Status::System(errno, target.string());
@@ -123,34 +138,32 @@ class TemporaryFile {
   Status status_;
 };
 
-struct Target {
-  bool exists = false;
-  struct stat file {};
-};
-
-Result<Target> Examine(const fs::path& path) {
-  Target target;
-  target.exists = lstat(path.c_str(), &target.file) == 0;
-  if (!target.exists && errno != ENOENT) return Status::System(errno, path.string());
-  if (target.exists && !S_ISREG(target.file.st_mode)) {
-    return Status::Failure(EINVAL, path.string() + " is no regular file");
-  }
-  return target;
-}
-
 // Checked before the files are exchanged, so that a rejected version is never visible.
 Status CheckUnchanged(const fs::path& path, const FileStamp& expected) {
-  const Result<Target> target = Examine(path);
-  if (!target.ok()) return target.status();
-  const bool same = IsSameFile(target->exists ? StampOf(target->file) : FileStamp{}, expected);
-  return same ? Status() : ChangedBehind(path.string());
+  const Result<FileStamp> stamp = StampOfFile(path);
+  if (!stamp.ok()) return stamp.status();
+  return IsSameFile(*stamp, expected) ? Status() : ChangedBehind(path.string());
 }
 
-Status Fill(TemporaryFile* temporary, const Target& target, std::string_view text, mode_t mode) {
+// Opens the file that is to be replaced, and locks it, because nfsconf(8) does so while it changes a file. The
+// result is no open file if there is none to replace.
+Result<FileDescriptor> OpenOriginal(const std::string& path) {
+  FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY));
+  struct stat stat {};
+  if (!file && errno == ENOENT) return file;
+  if (!file && errno == ELOOP) return Status::Failure(EINVAL, path + " is no regular file");
+  if (!file || fstat(file.get(), &stat) != 0) return Status::System(errno, path);
+  if (!S_ISREG(stat.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
+  if (Status status = LockFile(file, path, kOtherWritersLimit); !status.ok()) return status;
+  return file;
+}
+
+Status Fill(TemporaryFile* temporary, const FileDescriptor& original, const std::string& path, std::string_view text,
+            mode_t mode) {
   if (!temporary->status().ok()) return temporary->status();
   // The mode is set last, because a write clears the set-id bits.
   if (Status status = temporary->Write(text); !status.ok()) return status;
-  Status status = target.exists ? temporary->CopyOwnerAndMode(target.file) : temporary->SetMode(mode);
+  Status status = original ? temporary->CopyAttributes(original, path) : temporary->SetMode(mode);
   return status.ok() ? temporary->Sync() : status;
 }
 
@@ -223,12 +236,12 @@ Status MakeFolders(const std::string& path) {
 Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode) {
   const fs::path folder = fs::path(path).parent_path();
   if (Status status = MakeFolders(folder); !status.ok()) return status;
-  const Result<Target> target = Examine(path);
-  if (!target.ok()) return target.status();
+  const Result<FileDescriptor> original = OpenOriginal(path);
+  if (!original.ok()) return original.status();
 
   RemoveLeftovers(path);
   TemporaryFile temporary(path);
-  if (Status status = Fill(&temporary, *target, text, mode); !status.ok()) return status;
+  if (Status status = Fill(&temporary, *original, path, text, mode); !status.ok()) return status;
   if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
   if (Status status = temporary.Replace(path, expected); !status.ok()) return status;
   return SyncFolder(folder);

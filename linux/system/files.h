@@ -56,9 +56,11 @@ Status WriteAll(int file, std::string_view text, const std::string& name);
 Status MakeFolders(const std::string& path);
 
 // Makes the file at `path` contain `text`, atomically and durably: a reader sees the old file or the new
-// one, also after a crash (fsync(2) of file and folder). An existing file keeps its owner and mode, a new
-// one gets `mode`; missing folders are created. Fails with kChangedBehind, and leaves the file alone, if it
-// is no longer in the state `expected`. The two files are exchanged (renameat2(2)), so that even an edit
+// one, also after a crash (fsync(2) of file and folder). An existing file keeps owner, mode, access control
+// list, security label and other extended attributes; a new one gets `mode`. Missing folders are created. The
+// existing file is locked (flock(2)) meanwhile, and one that another program keeps locked fails with kLockTimeout.
+// A file that is a mount point cannot be replaced and fails with EBUSY. Fails with kChangedBehind, and leaves the file
+// alone, if it is no longer in the state `expected`. The two files are exchanged (renameat2(2)), so that even an edit
 // during the call is noticed; a file system without RENAME_EXCHANGE misses an edit of the last moment.
 // The caller holds the configuration lock: two calls for one file would disturb each other.
 Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);

@@ -1,13 +1,18 @@
 #include "files.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/file.h>
 #include <sys/resource.h>
+#include <sys/xattr.h>
 
 #include <cerrno>
 #include <csignal>
+#include <cstdint>
 #include <filesystem>
 #include <fstream>
 
+#include "file_descriptor.h"
 #include "injected_failures.h"
 #include "processes.h"
 #include "temporary_root.h"
@@ -101,6 +106,62 @@ TEST(ReplaceFile, KeepsModeAndOwner) {
   EXPECT_EQ(file.st_gid, privileged ? 34U : getegid());
   EXPECT_EQ(file.st_mode & 07777, 04604U);
   EXPECT_EQ(root.Read(kFile), "new");
+}
+
+std::string AttributeOf(const std::string& path, const char* name) {
+  char value[256];
+  const ssize_t size = getxattr(path.c_str(), name, value, sizeof value);
+  return size < 0 ? "none" : std::string(value, static_cast<std::size_t>(size));
+}
+
+TEST(ReplaceFile, KeepsExtendedAttributesAndTheAccessControlList) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  // acl(5) in the kernel's form: version 2, then tag, permissions and id of each entry. User 1234 may read.
+  const std::uint32_t acl[] = {2,          0x00060001, 0xFFFFFFFF, 0x00040002, 1234,      0x00000004,
+                               0xFFFFFFFF, 0x00040010, 0xFFFFFFFF, 0x00000020, 0xFFFFFFFF};
+  const std::pair<const char*, std::string> attributes[] = {
+      {"user.note", "kept by hand"},
+      {"system.posix_acl_access", std::string(reinterpret_cast<const char*>(acl), sizeof acl)}};
+  for (const auto& [name, value] : attributes) {
+    if (setxattr(root.At(kFile).c_str(), name, value.data(), value.size(), 0) != 0) {
+      GTEST_SKIP() << "the file system of " << root.directory() << " has no " << name;
+    }
+  }
+  const mode_t mode = ModeOf(root.At(kFile));
+  ASSERT_TRUE(Replace(root, "new").ok());
+  EXPECT_EQ(root.Read(kFile), "new");
+  EXPECT_EQ(ModeOf(root.At(kFile)), mode);
+  for (const auto& [name, value] : attributes) EXPECT_EQ(AttributeOf(root.At(kFile), name), value) << name;
+}
+
+// Whether a process is blocked until the lock of this file is free: proc(5), /proc/locks.
+bool SomebodyWaitsFor(const std::string& path) {
+  struct stat file {};
+  if (stat(path.c_str(), &file) != 0) return false;
+  std::ifstream locks("/proc/locks");
+  for (std::string line; std::getline(locks, line);) {
+    const bool waits = line.find("-> FLOCK") != std::string::npos;
+    if (waits && line.find(":" + std::to_string(file.st_ino) + " ") != std::string::npos) return true;
+  }
+  return false;
+}
+
+TEST(ReplaceFile, WaitsForAProgramThatHasLockedTheFile) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  const FileStamp expected = ReadFile(root.At(kFile))->stamp;
+  ChildProcess program([&] {
+    const FileDescriptor file(open(root.At(kFile).c_str(), O_RDWR | O_CLOEXEC));
+    if (!file || flock(file.get(), LOCK_EX) != 0) return 1;
+    root.Write("/locked", "");
+    if (!Eventually([&] { return SomebodyWaitsFor(root.At(kFile)); })) return 2;
+    return write(file.get(), "edited", 6) == 6 ? 0 : 3;
+  });
+  ASSERT_TRUE(Eventually([&] { return root.Read("/locked").has_value(); }));
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", expected).code(), kChangedBehind);
+  EXPECT_EQ(program.Wait(), 0);
+  EXPECT_EQ(root.Read(kFile), "edited");
 }
 
 TEST(ReplaceFile, LeavesTheOldFileToThoseWhoHaveItOpen) {

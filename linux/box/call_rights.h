@@ -1,4 +1,4 @@
-// What the call that this thread runs may do (platform/call.h).
+// The rights of the call that this thread runs (platform/call.h).
 #ifndef VORN_LINUX_BOX_CALL_RIGHTS_H
 #define VORN_LINUX_BOX_CALL_RIGHTS_H
 

@@ -24,7 +24,7 @@ using Accounts = std::vector<Account>;
 // The accounts of the box, shared by all who read the same version of the file.
 Result<std::shared_ptr<const Accounts>> ReadAccounts(Box& box);
 
-// Those of people: their user ids are from UID_MIN to UID_MAX of login.defs(5).
+// The accounts of people: their user ids are from UID_MIN to UID_MAX of login.defs(5).
 Result<Accounts> ReadLocalUsers(Box& box);
 
 // The account of this name; nullopt if there is none.

@@ -30,7 +30,7 @@ std::string DefaultDomain();
 // The static mappings, in file order.
 Result<IDMappings> ReadIDMappings(Box& box);
 
-// What a change stores: nullopt leaves a part as it is.
+// The parts of the ID map that a change stores; nullopt leaves a part as it is.
 struct IDMapChange {
   std::optional<std::string> domain;  // "" removes the configured domain
   std::optional<IDMappings> mappings;

@@ -4,9 +4,9 @@
 
 #include <string_view>
 
+#include "call_rights.h"
 #include "configuration_lock.h"
 #include "program.h"
-#include "call_rights.h"
 
 namespace vorn {
 namespace {

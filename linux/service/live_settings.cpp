@@ -5,8 +5,8 @@
 #include <algorithm>
 #include <cerrno>
 
-#include "configuration_lock.h"
 #include "call_rights.h"
+#include "configuration_lock.h"
 
 namespace vorn {
 namespace {

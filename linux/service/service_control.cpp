@@ -4,9 +4,9 @@
 #include <functional>
 #include <memory>
 
+#include "call_rights.h"
 #include "configuration_lock.h"
 #include "live_settings.h"
-#include "call_rights.h"
 
 namespace vorn {
 namespace {

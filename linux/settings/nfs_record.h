@@ -10,7 +10,7 @@
 
 namespace vorn {
 
-// What is configured, over all files of nfs.conf(5).
+// The record that the files of nfs.conf(5) together configure.
 Result<NFSConfRecord> ReadNFSRecord(Box& box);
 
 // Stores the record in /etc/nfs.conf.d/vorn.conf, the only file that is written. Fails with kChangedBehind

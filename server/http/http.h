@@ -43,7 +43,7 @@ struct HttpLimits {
 // The limits with as many connections as `descriptors` leaves room for, beside a reserve for the server's own files.
 HttpLimits FitToDescriptors(HttpLimits limits, const std::vector<Listener>& listeners, rlim_t descriptors);
 
-// What a server shares with the rest of the program. Must outlive it.
+// The objects that a server shares with the rest of the program. They must outlive the server.
 struct HttpParts {
   Budget* bodies = nullptr;  // null: bodies are not charged
   AccessLog* log = nullptr;  // null: no access log

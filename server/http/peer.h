@@ -1,4 +1,4 @@
-// Who is at the other end of a connection.
+// The other end of a connection.
 #ifndef VORN_SERVER_PEER_H
 #define VORN_SERVER_PEER_H
 
@@ -11,7 +11,8 @@ namespace vorn::server {
 
 // The other end of a connection.
 struct Peer {
-  // Of the process that connected to a Unix socket, at the time of its connect(2) (SO_PEERCRED, unix(7)).
+  // The credentials of the process that connected to a Unix socket, at the time of its connect(2) (SO_PEERCRED,
+  // unix(7)).
   struct Credentials {
     pid_t pid;
     uid_t uid;

@@ -13,7 +13,7 @@ namespace vorn::server {
 // Bodies of up to this size are not compressed: the headers would be most of the answer.
 constexpr std::size_t kCompressedFrom = 1024;
 
-// What a request says about the form of its answer.
+// The properties of a request that decide the form of its answer.
 struct AnswerForm {
   bool accepts_gzip = false;
   bool is_head = false;          // the headers alone are asked for

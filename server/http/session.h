@@ -22,7 +22,7 @@ namespace vorn::server {
 
 class Session;
 
-// What all sessions share. Used on the network thread.
+// The services that all sessions share. They are used on the network thread only.
 class SessionHost {
  public:
   virtual ~SessionHost() = default;

@@ -9,7 +9,7 @@
 
 namespace vorn::server {
 
-// What a connection is doing, in the order in which connections are given up.
+// The activity of a connection, in the order in which connections are given up.
 enum class Activity {
   kEnding,   // answered for the last time
   kIdle,     // between two requests, or before the first

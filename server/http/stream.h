@@ -23,7 +23,7 @@ class Stream {
 
   virtual ~Stream() = default;
 
-  // What comes before the first byte of HTTP; nothing here. `done` may be called immediately.
+  // The handshake before the first byte of HTTP; a plain stream has none. `done` may be called immediately.
   virtual void Begin(Done done) { done({}, 0); }
 
   virtual void ReadSome(boost::asio::mutable_buffer buffer, Done done) = 0;

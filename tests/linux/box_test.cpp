@@ -1,4 +1,4 @@
-// What a box promises to readers and writers: shared documents, and no lost edit.
+// The promises of a box to readers and writers: shared documents, and no lost edit.
 #include "box.h"
 
 #include <gmock/gmock.h>

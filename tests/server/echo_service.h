@@ -26,7 +26,7 @@ namespace vorn::server {
 // A body with "stop" in it is refused with 413 as soon as that arrives. Thread-safe.
 class EchoService : public Service {
  public:
-  // What a head said, beyond the life of the head.
+  // A copy of a head's contents, which outlives the head.
   struct Seen {
     std::string target;
     std::string query;

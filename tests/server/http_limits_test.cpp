@@ -1,4 +1,4 @@
-// What the transport spends on clients, and what bad clients cannot take from good ones.
+// The transport's limits: bad clients cannot take the resources of good ones.
 #include <gmock/gmock.h>
 #include <sys/resource.h>
 

@@ -71,6 +71,28 @@ void PageOf50(benchmark::State& state, long mappings) {
   for (auto step : state) Answer(NFSIDMapList, params);
 }
 
+// The file does not change between the pages.
+void FilteredPageOf50(benchmark::State& state, long mappings) {
+  const Box box(mappings, 1);
+  Json::Value params;
+  params["limit"] = 50;
+  params["filter"] = "pal9";
+  for (auto step : state) Answer(NFSIDMapList, params);
+}
+
+// The file is new for each page.
+void FirstPageOf50(benchmark::State& state, long mappings) {
+  const Box box(mappings, 1);
+  Json::Value params;
+  params["limit"] = 50;
+  for (auto step : state) {
+    state.PauseTiming();
+    box.root.Write(kMapFile, box.map);
+    state.ResumeTiming();
+    Answer(NFSIDMapList, params);
+  }
+}
+
 void PageFloor(benchmark::State& state, long mappings) {
   const Box box(mappings, 1);
   for (auto step : state) {
@@ -146,7 +168,10 @@ void Register(const std::string& name, void (*measured)(benchmark::State&, Sizes
 
 int main(int argc, char** argv) {
   for (const long mappings : {100L, 1'000L, 10'000L, 100'000L}) {
-    Register("page of 50 out of " + std::to_string(mappings) + " mappings", PageOf50, PageFloor, mappings);
+    const std::string name = "page of 50 out of " + std::to_string(mappings) + " mappings";
+    Register("first " + name, FirstPageOf50, PageFloor, mappings);
+    Register(name, PageOf50, PageFloor, mappings);
+    Register("filtered " + name, FilteredPageOf50, PageFloor, mappings);
   }
   for (const long users : {10'000L, 100'000L}) {
     for (const long items : {1L, 100L, 1'000L}) {

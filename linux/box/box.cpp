@@ -59,6 +59,17 @@ void Box::Keep(const Key& key, const Version& version, Document document) {
   documents_[key] = {version, std::move(document)};
 }
 
+Box::Document Box::FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources) {
+  const std::lock_guard lock(mutex_);
+  const auto found = derived_.find(key);
+  return found != derived_.end() && found->second.sources == sources ? found->second.document : nullptr;
+}
+
+void Box::KeepDerived(const Key& key, Derived derived) {
+  const std::lock_guard lock(mutex_);
+  derived_[key] = std::move(derived);
+}
+
 Status Box::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
   if (Status status = CheckMayWrite(path); !status.ok()) return status;
   if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;

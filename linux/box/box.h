@@ -11,6 +11,7 @@
 #include <string_view>
 #include <typeindex>
 #include <utility>
+#include <vector>
 
 #include "engine.h"
 #include "root.h"
@@ -55,6 +56,20 @@ class Box {
     return std::static_pointer_cast<const T>(std::move(*document));
   }
 
+  // The document of type T that `make` makes of several documents. It is shared and made again when `sources` has
+  // other objects. `name` distinguishes documents of one type.
+  template <typename T>
+  Result<std::shared_ptr<const T>> Derive(const std::string& name, std::vector<std::shared_ptr<const void>> sources,
+                                          const std::function<Result<T>()>& make) {
+    const Key key{typeid(T), name};
+    if (Document document = FindDerived(key, sources)) return std::static_pointer_cast<const T>(std::move(document));
+    Result<T> made = make();
+    if (!made.ok()) return made.status();
+    auto document = std::make_shared<const T>(std::move(*made));
+    KeepDerived(key, {std::move(sources), document});
+    return document;
+  }
+
   // These change a file as Store says. The calling thread owns the configuration lock.
   Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode = 0644);
   Status Remove(const std::string& path, const Version& expected);
@@ -69,18 +84,25 @@ class Box {
     Version version;
     Document document;
   };
+  struct Derived {
+    std::vector<std::shared_ptr<const void>> sources;
+    Document document;
+  };
   using Key = std::pair<std::type_index, std::string>;  // the document's type, the path
 
   Result<Document> LoadAny(std::type_index type, const std::string& path,
                            const std::function<Result<Document>(StoredFile file)>& parse);
   Document Find(const Key& key, const Version& version);
   void Keep(const Key& key, const Version& version, Document document);
+  Document FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources);
+  void KeepDerived(const Key& key, Derived derived);
 
   const Root root_;
   const std::unique_ptr<Store> store_;
   const EngineChooser choose_engine_;
   std::mutex mutex_;
   std::map<Key, Cached> documents_;
+  std::map<Key, Derived> derived_;
 };
 
 }  // namespace vorn

@@ -2,7 +2,6 @@
 #ifndef VORN_LINUX_BOX_INI_FILE_H
 #define VORN_LINUX_BOX_INI_FILE_H
 
-#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
@@ -24,16 +23,13 @@ class IniFile {
   // The file at the box's `path`. A file that does not exist reads as an empty one.
   static Result<SharedIniFile> Open(Box& box, const std::string& path);
 
+  // A file that has not been written yet. Its version is that of a missing file.
+  static SharedIniFile FromText(std::string location, std::string_view text);
+
   bool exists() const { return version_.exists; }
   const std::string& location() const { return location_; }  // its path on this system, for messages
   const Version& version() const { return version_; }
   const IniDocument& document() const { return document_; }
-
-  // The value of a key as a number from 0 to `largest`, in C's notation, or as a switch by the words of
-  // nfs.conf(5). nullopt if the key has no value. A value of another form is a failure that names its line.
-  Result<std::optional<int>> Number(std::string_view section, std::string_view key,
-                                    int largest = std::numeric_limits<int>::max()) const;
-  Result<std::optional<bool>> Switch(std::string_view section, std::string_view key) const;
 
   // A kSyntax failure that names the line of a key and says what is wrong with its value.
   Status Refuse(std::string_view section, std::string_view key, const std::string& why) const;

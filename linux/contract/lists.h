@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <deque>
 #include <list>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -12,25 +13,35 @@
 
 #include "core.h"
 #include "status.h"
+#include "text_pairs.h"
 
 namespace vorn {
 
 // The object behind a KLIBSZLIST. The first Find builds an index; insertions at either end keep it, so that a list
 // can be built and searched in turn.
+//
+// A list of the keys of a shared table refers to the table until the first insertion copies them. Such a list costs
+// nothing to make and to sort.
 class TextList : public KLIBSZLIST {
  public:
   TextList() : KLIBSZLIST{0} {}
 
-  const std::string& at(int index) const { return items_[static_cast<std::size_t>(index)]; }
+  const std::string& at(int index) const;
   void Insert(int index, const char* text);
-  int Find(std::string_view text) const;  // negative: none
+  int Find(std::string_view text) const;  // negative: the list has no such item
   void Sort();
 
+  // Makes an empty list the list of the table's keys.
+  void ReferTo(std::shared_ptr<const TextPairs> table);
+
  private:
+  void Own();
   void MakeIndex() const;
 
-  std::deque<std::string> items_;  // never moved by growth at the ends: the index points into them
-  // The first place of each text, counted from where the list's front was when the index was made.
+  std::shared_ptr<const TextPairs> table_;  // nullptr once the list has items of its own
+  bool is_sorted_ = false;                  // the order in which the table's keys are listed
+  std::deque<std::string> items_;           // insertions at the ends do not move items: the index refers to them
+  // The first index of each text, relative to the front of the list when the index was made.
   mutable std::unordered_map<std::string_view, std::int64_t> index_;
   mutable std::int64_t front_ = 0;
   mutable bool has_index_ = false;
@@ -38,10 +49,14 @@ class TextList : public KLIBSZLIST {
 
 }  // namespace vorn
 
+// The object behind a KLIBSZHASH: a copy of a shared table is made only when it is changed.
 struct KLIBSZHASH {
   using Pair = std::pair<const std::string, std::string>;
 
-  std::list<Pair> pairs;  // in the order in which the keys came
+  // nullptr if the hash has pairs of its own.
+  std::shared_ptr<const vorn::TextPairs> table;
+
+  std::list<Pair> pairs;  // in the order in which the keys were added
   std::unordered_map<std::string_view, std::list<Pair>::iterator> index;
 };
 
@@ -51,6 +66,12 @@ namespace vorn {
 // returned and not logged.
 Status Append(KLIBSZLIST** list, const char* text);
 Status SetValue(KLIBSZHASH* hash, const char* key, const char* value);
+
+// Adds the pairs of a table to a hash. An empty hash refers to the table from then on.
+Status AddAll(const std::shared_ptr<const TextPairs>& table, KLIBSZHASH* hash);
+
+// The pairs of a hash.
+std::shared_ptr<const TextPairs> TableOf(const KLIBSZHASH& hash);
 
 }  // namespace vorn
 

@@ -1,6 +1,5 @@
 #include "nfsconf.h"
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -14,6 +13,7 @@
 #include "configuration_lock.h"
 #include "current_box.h"
 #include "error.h"
+#include "host_domain.h"
 #include "idmap.h"
 #include "kerberos_support.h"
 #include "keytab.h"
@@ -59,37 +59,18 @@ struct FreeRecord {
 };
 using IDMapRecord = std::unique_ptr<_tag_nfs_id_map_, FreeRecord>;
 
-Status FillTable(const IDMappings& mappings, KLIBSZHASH* table) {
-  for (const IDMapping& mapping : mappings) {
-    Status status = SetValue(table, mapping.principal.c_str(), mapping.local_name.c_str());
-    if (!status.ok()) return status;
-  }
-  return {};
-}
-
-// Finding the default domain may wait for a name server, so it is done before the lock is taken.
-Result<std::string> DomainBeforeLocking(Box& box) {
-  const Result<std::optional<std::string>> configured = ReadConfiguredDomain(box);
-  if (!configured.ok()) return configured.status();
-  return *configured ? **configured : DefaultDomain();
-}
-
 Result<IDMapRecord> GetIDMap(Box& box) {
-  const Result<std::string> domain_before = DomainBeforeLocking(box);
-  if (!domain_before.ok()) return domain_before.status();
   IDMapRecord record(new _tag_nfs_id_map_{});
   auto* state = new IDMapState(box);
   record->platform[0] = state;
   if (!state->lock.status().ok()) return state->lock.status();
-  const Result<std::optional<std::string>> domain = ReadConfiguredDomain(box);
-  if (!domain.ok()) return domain.status();
-  const Result<IDMappings> mappings = ReadIDMappings(box);
-  if (!mappings.ok()) return mappings.status();
-  state->domain = domain->value_or(*domain_before);
+  const Result<std::shared_ptr<const IDMap>> map = ReadIDMap(box);
+  if (!map.ok()) return map.status();
+  state->domain = (*map)->domain() ? *(*map)->domain() : HostDomain::OfThisHost().Get();
   record->domain = strdup(state->domain.c_str());
   record->table = KLIBCSzHashAlloc(0);
   if (record->domain == nullptr || record->table == nullptr) return Status::System(ENOMEM, kIDMapFile);
-  if (Status status = FillTable(*mappings, record->table); !status.ok()) return status;
+  if (Status status = AddAll((*map)->mappings(), record->table); !status.ok()) return status;
   return record;
 }
 
@@ -99,18 +80,12 @@ std::optional<std::string> ChangedDomain(const _tag_nfs_id_map_& record, const I
   return record.domain;
 }
 
-IDMappings MappingsOf(const KLIBSZHASH& table) {
-  IDMappings mappings;
-  for (const auto& [principal, local_name] : table.pairs) mappings.push_back({principal, local_name});
-  return mappings;
-}
-
 Status SetIDMap(const char* path, const _tag_nfs_id_map_* record) {
   if (path == nullptr || record == nullptr) return Status::Failure(EINVAL, "no path, or no record");
   IDMapState* state = StateOf(*record);
   IDMapChange change;
   change.domain = ChangedDomain(*record, state);
-  if (record->table != nullptr) change.mappings = MappingsOf(*record->table);
+  if (record->table != nullptr) change.mappings = TableOf(*record->table);
   Status status = WriteIDMap(CurrentBox(), path, change);
   if (status.ok() && state != nullptr && record->domain != nullptr) state->domain = record->domain;
   return status;
@@ -118,19 +93,16 @@ Status SetIDMap(const char* path, const _tag_nfs_id_map_* record) {
 
 Status GetStaticMappings(KLIBSZHASH** hash, const char* filter) {
   if (hash == nullptr || *hash == nullptr) return Status::Failure(EINVAL, "no hash");
-  const Result<IDMappings> mappings = ReadIDMappings(CurrentBox());
-  if (!mappings.ok()) return mappings.status();
-  const CaselessSubstring wanted(filter == nullptr ? "" : filter);
-  IDMappings found;
-  std::copy_if(mappings->begin(), mappings->end(), std::back_inserter(found), [&](const IDMapping& mapping) {
-    return wanted.IsIn(mapping.principal) || wanted.IsIn(mapping.local_name);
-  });
-  return FillTable(found, *hash);
+  const Result<std::shared_ptr<const IDMap>> map = ReadIDMap(CurrentBox());
+  if (!map.ok()) return map.status();
+  return AddAll((*map)->Matching(filter == nullptr ? "" : filter), *hash);
 }
 
 Status AppendPairs(KLIBSZHASH** table, const KLIBSZHASH* pairs) {
-  if (table == nullptr || pairs == nullptr) return Status::Failure(EINVAL, "no table, or no pairs");
-  return FillTable(MappingsOf(*pairs), *table);
+  if (table == nullptr || *table == nullptr || pairs == nullptr) {
+    return Status::Failure(EINVAL, "no table, or no pairs");
+  }
+  return AddAll(TableOf(*pairs), *table);
 }
 
 Status RemovePrincipals(KLIBSZHASH* table, const KLIBSZLIST* principals) {
@@ -155,7 +127,7 @@ Status ListKeys(const char* path, KeytabEntry** list) {
   for (auto key = keys->rbegin(); key != keys->rend(); ++key) {
     Entries entry(new KeytabEntry{});
     entry->version = key->version;
-    snprintf(entry->principal, sizeof entry->principal, "%s", key->principal.c_str());
+    snprintf(entry->principal, sizeof entry->principal, "%s", ToValidUtf8(key->principal).c_str());
     snprintf(entry->enc_type, sizeof entry->enc_type, "%s", key->enc_type.c_str());
     entry->next = entries.release();
     entries = std::move(entry);

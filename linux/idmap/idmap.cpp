@@ -1,82 +1,110 @@
 #include "idmap.h"
 
-#include <netdb.h>
-#include <unistd.h>
+#include <algorithm>
+#include <mutex>
+#include <unordered_set>
+#include <utility>
 
-#include <cerrno>
-#include <climits>
-#include <memory>
-
-#include "configuration_lock.h"
-#include "idmap_mappings.h"
-#include "ini_file.h"
+#include "notice.h"
+#include "translation_methods.h"
 #include "unicode.h"
 
 namespace vorn {
 namespace {
 
-// In bytes: libnfsidmap has room for NFS4_MAX_DOMAIN_LEN (nfsidmap.h) with the terminating NUL.
-constexpr std::size_t kLongestDomain = 511;
+constexpr char kReplacement[] = "\xef\xbf\xbd";
 
-std::string CanonicalHostName() {
-  char name[HOST_NAME_MAX + 1] = "";
-  if (gethostname(name, sizeof name - 1) != 0) return "";
-  addrinfo hints{};
-  hints.ai_flags = AI_CANONNAME;
-  addrinfo* found = nullptr;
-  if (getaddrinfo(name, nullptr, &hints, &found) != 0) return name;
-  const std::unique_ptr<addrinfo, void (*)(addrinfo*)> owner(found, &freeaddrinfo);
-  return found->ai_canonname == nullptr ? name : found->ai_canonname;
-}
-
-Status StoreDomain(const std::string& domain, IniDocument* document) {
-  if (domain.empty()) {
-    document->Remove("General", "Domain");
-    return {};
+// Shows each principal under a string of its own. Principals that are valid UTF-8 are shown as they are.
+class UniqueNames {
+ public:
+  explicit UniqueNames(const std::vector<IniFound>& stored) {
+    for (const IniFound& mapping : stored) {
+      const std::string shown = ToValidUtf8(mapping.key);
+      if (shown == mapping.key) valid_.insert(mapping.key);
+    }
   }
-  const std::optional<IniValue> value = IniValue::From(domain);
-  if (!value || domain.size() > kLongestDomain || !IsPlainText(domain))
-    return Status::Failure(kRefusedText, "idmapd.conf(5) cannot represent the domain");
-  document->Set(*IniSection::From("General"), *IniKey::From("Domain"), *value);
-  return {};
+
+  std::string NameOf(std::string_view principal) {
+    std::string shown = ToValidUtf8(principal);
+    if (shown == principal) return shown;
+    while (valid_.count(shown) != 0 || !repaired_.insert(shown).second) shown += kReplacement;
+    return shown;
+  }
+
+ private:
+  std::unordered_set<std::string_view> valid_;
+  std::unordered_set<std::string> repaired_;
+};
+
+std::shared_ptr<const TextPairs> Shown(const std::vector<IniFound>& stored) {
+  UniqueNames names(stored);
+  std::vector<TextPairs::Pair> pairs;
+  pairs.reserve(stored.size());
+  for (const IniFound& mapping : stored) pairs.emplace_back(names.NameOf(mapping.key), ToValidUtf8(mapping.value));
+  return std::make_shared<const TextPairs>(std::move(pairs));
 }
 
 }  // namespace
 
-Result<std::optional<std::string>> ReadConfiguredDomain(Box& box) {
-  const Result<SharedIniFile> file = IniFile::Open(box, kIDMapFile);
-  if (!file.ok()) return file.status();
-  return (*file)->document().Get("General", "Domain");
+// A search over all mappings at once: their strings in upper case, one below the other.
+class IDMap::Search {
+ public:
+  std::shared_ptr<const TextPairs> Find(const TextPairs& mappings, std::string_view filter) {
+    const std::lock_guard lock(mutex_);
+    if (last_result_ != nullptr && last_filter_ == filter) return last_result_;
+    if (ends_.size() != mappings.size()) Prepare(mappings);
+    last_result_ = Matching(mappings, UpperCaseOrSame(filter));
+    last_filter_ = filter;
+    return last_result_;
+  }
+
+ private:
+  void Prepare(const TextPairs& mappings) {
+    for (const auto& [principal, local_name] : mappings.pairs()) {
+      text_ += UpperCaseOrSame(principal) + "\n" + UpperCaseOrSame(local_name) + "\n";
+      ends_.push_back(text_.size());
+    }
+  }
+
+  std::shared_ptr<const TextPairs> Matching(const TextPairs& mappings, const std::string& filter) const {
+    std::vector<TextPairs::Pair> found;
+    const bool can_match = filter.find('\n') == std::string::npos;  // no mapping has a line feed
+    for (std::size_t at = 0; can_match && (at = text_.find(filter, at)) != std::string::npos && at < text_.size();) {
+      const auto end = std::upper_bound(ends_.begin(), ends_.end(), at);
+      found.push_back(mappings.pairs()[static_cast<std::size_t>(end - ends_.begin())]);
+      at = *end;
+    }
+    return std::make_shared<const TextPairs>(std::move(found));
+  }
+
+  std::mutex mutex_;
+  std::string text_;
+  std::vector<std::size_t> ends_;  // of each mapping in text_
+  std::string last_filter_;
+  std::shared_ptr<const TextPairs> last_result_;
+};
+
+IDMap::IDMap(IniFiles files)
+    : files_(std::move(files)),
+      stored_(files_.Settings("Static")),
+      mappings_(Shown(stored_)),
+      search_(std::make_shared<Search>()) {
+  const std::optional<IniFound> domain = files_.Find("General", "Domain");
+  if (domain) domain_ = ToValidUtf8(domain->value);
 }
 
-std::string DefaultDomain() {
-  const std::string host = CanonicalHostName();
-  const std::size_t dot = host.find('.');
-  return dot == std::string::npos || dot + 1 == host.size() ? "localdomain" : host.substr(dot + 1);
+std::shared_ptr<const TextPairs> IDMap::Matching(std::string_view filter) const {
+  return filter.empty() ? mappings_ : search_->Find(*mappings_, filter);
 }
 
-Result<IDMappings> ReadIDMappings(Box& box) {
-  const Result<SharedIniFile> file = IniFile::Open(box, kIDMapFile);
-  if (!file.ok()) return file.status();
-  IDMappings mappings;
-  for (IniEntry& entry : (*file)->document().Entries("Static")) {
-    mappings.push_back({std::move(entry.key), std::move(entry.value)});
-  }
-  return mappings;
-}
-
-Status WriteIDMap(Box& box, const std::string& path, const IDMapChange& change) {
-  const ConfigurationLock lock(box);
-  if (!lock.status().ok()) return lock.status();
-  Result<IniEditor> file = IniEditor::Open(box, path);
-  if (!file.ok()) return file.status();
-  if (change.domain) {
-    if (Status status = StoreDomain(*change.domain, &file->document()); !status.ok()) return status;
-  }
-  if (change.mappings) {
-    if (Status status = StoreMappings(*change.mappings, &file->document()); !status.ok()) return status;
-  }
-  return file->Save();
+Result<std::shared_ptr<const IDMap>> ReadIDMap(Box& box, const std::string& path) {
+  Result<IniFiles> files = IniFiles::Open(box, path);
+  if (!files.ok()) return files.status();
+  const std::vector<std::shared_ptr<const void>> sources = files->sources();
+  return box.Derive<IDMap>(path, sources, [&]() -> Result<IDMap> {
+    for (const std::string& sentence : MissingPlugins(box, *files)) Notice(sentence);
+    return IDMap(std::move(*files));
+  });
 }
 
 }  // namespace vorn

@@ -53,7 +53,8 @@ const std::string& OwnPrincipal(const std::vector<KeytabKey>& keys) {
 // Checks that the NFS configuration record can represent the principal. This happens before the installation,
 // because the record must name the principal afterwards.
 Status CheckPrincipal(const std::string& principal) {
-  if (principal.size() < sizeof(KeytabEntry::principal) && IsPlainText(principal) && IniValue::From(principal))
+  if (principal.size() < sizeof(KeytabEntry::principal) && IsPlainText(principal) &&
+      IniValue::From(principal).has_value())
     return {};
   return Status::Failure(kRefusedText, "nfs.conf(5) cannot represent the principal " + principal);
 }

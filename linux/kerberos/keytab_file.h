@@ -16,9 +16,9 @@ struct KeytabKey {
   std::string enc_type;  // RFC 3961 name; "etype 99" for one that the library does not know
 };
 
-// The keys of a keytab with this content, in file order. Fails with kNoKeytab unless the library reads it to
-// its last byte. The library takes a file that was cut off for one that ends there, reads beyond a damaged entry, and
-// loses memory over it, so it gets to see only a file whose frame is whole.
+// Returns the keys of a keytab with this content, in file order. Fails with kNoKeytab unless the library reads the
+// content to its last byte, except for zeros at the end. The library accepts a truncated file, reads beyond a damaged
+// entry, and leaks memory over it; therefore the frame is validated first (keytab_frame.h).
 Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content);
 
 }  // namespace vorn

@@ -10,8 +10,8 @@
 
 namespace vorn {
 
-// How many entries a keytab with this content has. Fails with kNoKeytab unless they end with the content, and
-// every field of each within it.
+// Returns the number of entries of a keytab with this content, of version 0x0501 or 0x0502. Zeros after the last entry
+// are padding. Fails with kNoKeytab unless the entries fill the content, and the fields of each entry lie within it.
 Result<std::size_t> CountKeytabEntries(std::string_view content);
 
 // A failure with kNoKeytab.

@@ -10,11 +10,8 @@ Result<std::vector<ConfiguredPort>> ReadConfiguredPorts(Box& box) {
   if (!record.ok()) return record.status();
   const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
   if (!configuration.ok()) return configuration.status();
-  int nfsd = 2049;
-  int mountd = 0;
-  if (Status s = configuration->Read("nfsd", "port", kLargestPort, &nfsd); !s.ok()) return s;
-  if (Status s = configuration->Read("mountd", "port", kLargestPort, &mountd); !s.ok()) return s;
-  std::vector<ConfiguredPort> ports{{"rpcbind", 111}, {"nfs", nfsd}};
+  std::vector<ConfiguredPort> ports{{"rpcbind", 111}, {"nfs", configuration->Port("nfsd", "port", 2049)}};
+  const int mountd = configuration->Port("mountd", "port", 0);
   if (mountd > 0) ports.push_back({"nfs_mountd", mountd});
   if (record->custom_port_enable == 0) return ports;
   if (record->statd_port > 0) ports.push_back({"nfs_statd", record->statd_port});

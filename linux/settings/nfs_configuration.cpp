@@ -1,67 +1,86 @@
 #include "nfs_configuration.h"
 
 #include <algorithm>
-#include <cstring>
-#include <optional>
-#include <string_view>
+#include <cerrno>
+#include <cstdlib>
+#include <limits>
+
+#include "ascii.h"
+#include "notice.h"
+#include "unicode.h"
 
 namespace vorn {
 namespace {
 
-constexpr char kFile[] = "/etc/nfs.conf";
-constexpr char kFolder[] = "/etc/nfs.conf.d";
+constexpr const char* kYes[] = {"1", "t", "true", "y", "yes", "on"};
+constexpr const char* kNo[] = {"0", "f", "false", "n", "no", "off"};
 
-// The names that nfs.conf(5) reads in the folder.
-bool IsConfigurationFile(std::string_view name) {
-  constexpr std::string_view kEnding = ".conf";
-  return name.front() != '.' && name.size() > kEnding.size() && name.substr(name.size() - kEnding.size()) == kEnding;
+template <std::size_t kSize>
+bool IsOneOf(std::string_view word, const char* const (&words)[kSize]) {
+  return std::find(std::begin(words), std::end(words), LowerAscii(word)) != std::end(words);
+}
+
+// The number at the beginning of the text in the given base (strtol(3)), if it is in the range, and where it ends.
+std::optional<int> LeadingNumber(const std::string& text, int base, int largest, bool* is_whole) {
+  char* end = nullptr;
+  errno = 0;
+  const long number = std::strtol(text.c_str(), &end, base);
+  *is_whole = end != text.c_str() && *end == '\0';
+  if (errno != 0 || number < 0 || number > largest) return std::nullopt;
+  return static_cast<int>(number);
 }
 
 }  // namespace
 
-Result<NFSConfiguration> NFSConfiguration::Open(Box& box) {
-  NFSConfiguration configuration;
-  if (Status status = configuration.Add(box, kFile); !status.ok()) return status;
-  const Result<std::shared_ptr<const StoredFolder>> folder = box.List(kFolder);
-  if (!folder.ok()) return folder.status();
-  for (const std::string& name : (*folder)->names) {
-    if (!IsConfigurationFile(name)) continue;
-    if (Status status = configuration.Add(box, std::string(kFolder) + "/" + name); !status.ok()) return status;
-  }
-  return configuration;
+Result<NFSConfiguration> NFSConfiguration::Open(Box& box, const std::optional<IniFiles::Draft>& draft) {
+  Result<IniFiles> files = IniFiles::Open(box, kNFSConfigurationFile, draft);
+  if (!files.ok()) return files.status();
+  return NFSConfiguration(std::move(*files), draft.has_value());
 }
 
-Status NFSConfiguration::Read(const char* section, const char* key, int largest, std::int32_t* value) const {
-  const Result<std::optional<int>> number = Deciding(section, key).Number(section, key, largest);
-  if (number.ok() && *number) *value = **number;
-  return number.status();
+int NFSConfiguration::Port(const char* section, const char* key, int fallback) const {
+  const std::optional<IniFound> setting = files_.Find(section, key);
+  if (!setting) return fallback;
+  bool is_whole = false;
+  const std::optional<int> port = LeadingNumber(std::string(setting->value), 10, kLargestPort, &is_whole);
+  if (!port) Remark(*setting, "is not a port and is ignored");
+  if (port && !is_whole) Remark(*setting, "is read as " + std::to_string(*port) + " by its daemon");
+  return port.value_or(fallback);
 }
 
-Status NFSConfiguration::Read(const char* section, const char* key, std::int32_t* value) const {
-  const Result<std::optional<bool>> on = Deciding(section, key).Switch(section, key);
-  if (on.ok() && *on) *value = **on ? 1 : 0;
-  return on.status();
+bool NFSConfiguration::Switch(const char* section, const char* key, bool fallback) const {
+  const std::optional<IniFound> setting = files_.Find(section, key);
+  if (!setting) return fallback;
+  if (IsOneOf(setting->value, kYes)) return true;
+  if (IsOneOf(setting->value, kNo)) return false;
+  Remark(*setting, "is neither yes nor no and is ignored");
+  return fallback;
 }
 
-Status NFSConfiguration::Read(const char* section, const char* key, char* text, std::size_t size) const {
-  const IniFile& file = Deciding(section, key);
-  const std::string value = file.document().Get(section, key).value_or("");
-  if (value.size() >= size) return file.Refuse(section, key, "is longer than " + std::to_string(size - 1) + " bytes");
-  std::memcpy(text, value.c_str(), value.size() + 1);
-  return {};
+int NFSConfiguration::Number(const char* section, const char* key, int fallback) const {
+  const std::optional<IniFound> setting = files_.Find(section, key);
+  if (!setting) return fallback;
+  bool is_whole = false;
+  constexpr int kLargest = std::numeric_limits<int>::max();
+  const std::optional<int> number = LeadingNumber(std::string(setting->value), 0, kLargest, &is_whole);
+  if (number && is_whole) return *number;
+  Remark(*setting, "is not a number from 0 to " + std::to_string(kLargest) + " and is ignored");
+  return fallback;
 }
 
-Status NFSConfiguration::Add(Box& box, const std::string& path) {
-  Result<SharedIniFile> file = IniFile::Open(box, path);
-  if (file.ok()) files_.push_back(std::move(*file));
-  return file.status();
+std::string NFSConfiguration::Text(const char* section, const char* key, std::size_t size) const {
+  const std::optional<IniFound> setting = files_.Find(section, key);
+  if (!setting) return "";
+  std::string text = ToValidUtf8(setting->value);
+  if (text.size() < size) return text;
+  Remark(*setting, "is longer than " + std::to_string(size - 1) + " bytes and is ignored");
+  return "";
 }
 
-// The last file that gives the key a value, or any file if none does.
-const IniFile& NFSConfiguration::Deciding(const char* section, const char* key) const {
-  const auto has_value = [&](const SharedIniFile& file) { return file->document().Get(section, key).has_value(); };
-  const auto last = std::find_if(files_.rbegin(), files_.rend(), has_value);
-  return last == files_.rend() ? *files_.front() : **last;
+void NFSConfiguration::Remark(const IniFound& setting, const std::string& why) const {
+  if (is_draft_) return;
+  const std::string sentence = setting.Where() + ": the value of " + std::string(setting.key) + " " + why;
+  NoticeOnce(setting.file->location(), setting.file->version(), sentence);
 }
 
 }  // namespace vorn

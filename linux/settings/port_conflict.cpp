@@ -23,9 +23,16 @@ namespace {
 constexpr unsigned long kStatusProgram = 100024;
 constexpr unsigned long kLockProgram = 100021;
 
-unsigned long ProgramOf(const std::string& service) {
-  if (service == "nfs_statd") return kStatusProgram;
-  return service == "nfs_nlm" ? kLockProgram : 0;
+// The two services whose ports are changed together by one request. Their ports can be exchanged, because both
+// services are restarted afterwards; equal ports are refused when they are stored.
+bool IsExchangeable(const std::string& service) { return service == "nfs_statd" || service == "nfs_nlm"; }
+
+bool IsOwnProgram(const std::string& service, unsigned long program) {
+  return IsExchangeable(service) && (program == kStatusProgram || program == kLockProgram);
+}
+
+bool IsOwnPort(const std::string& service, const ConfiguredPort& port) {
+  return port.service == service || (IsExchangeable(service) && IsExchangeable(port.service));
 }
 
 // A protocol ("tcp", "udp"; IPv4 and IPv6 alike) and a port of it.
@@ -45,14 +52,15 @@ int PortOf(const std::string& address) {
   return bytes ? most * 256 + least : 0;
 }
 
-// The sockets that are registered for the service with rpcbind(8); none if rpcbind does not answer.
+// The sockets that rpcbind(8) knows as those of the service, and of the service with which it may exchange ports; none
+// if rpcbind does not answer.
 std::set<Socket> OwnSockets(const std::string& service) {
   std::set<Socket> own;
   const std::unique_ptr<netconfig, decltype(&freenetconfigent)> local(getnetconfigent("local"), freenetconfigent);
   rpcblist* registered = local ? rpcb_getmaps(local.get(), "localhost") : nullptr;
   for (const rpcblist* entry = registered; entry != nullptr; entry = entry->rpcb_next) {
     const rpcb& map = entry->rpcb_map;
-    if (map.r_prog == ProgramOf(service)) own.emplace(std::string(map.r_netid).substr(0, 3), PortOf(map.r_addr));
+    if (IsOwnProgram(service, map.r_prog)) own.emplace(std::string(map.r_netid).substr(0, 3), PortOf(map.r_addr));
   }
   xdr_free(reinterpret_cast<xdrproc_t>(xdr_rpcblist_ptr), &registered);
   return own;
@@ -94,7 +102,7 @@ Result<bool> IsPortTaken(Box& box, const std::string& service, int first, int la
   const auto configured = ReadConfiguredPorts(box);
   if (!configured.ok()) return configured.status();
   const bool taken = std::any_of(configured->begin(), configured->end(), [&](const ConfiguredPort& port) {
-    return port.service != service && within(port.port);
+    return !IsOwnPort(service, port) && within(port.port);
   });
   if (taken) return true;
   const std::set<Socket> own = OwnSockets(service);

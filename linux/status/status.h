@@ -21,6 +21,7 @@ enum ErrorCode : int {
   kNoKeytab = 0x1007,        // the file is not a keytab
   kUnsupported = 0x1008,     // this box cannot do it
   kLockTimeout = 0x1009,     // another process kept a lock for too long
+  kOverridden = 0x100a,      // another file decides over the value
 };
 
 // The outcome of an operation: success, or a failure with an ErrorCode or an errno(3) value.

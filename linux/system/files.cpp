@@ -202,9 +202,16 @@ Result<FileText> ReadFile(const std::string& path) {
   struct stat stat {};
   if (!file || fstat(file.get(), &stat) != 0) return Status::System(errno, path);
   if (!S_ISREG(stat.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
-  Result<std::string> text = ReadAll(file.get(), path);
-  if (!text.ok()) return text.status();
-  return FileText{std::move(*text), StampOf(stat)};
+  constexpr int kMostReads = 10;
+  for (int reads = 1;; ++reads) {
+    Result<std::string> text = ReadAll(file.get(), path);
+    if (!text.ok()) return text.status();
+    // A file that is written in place while it is read can give parts of two contents.
+    const FileStamp before = StampOf(stat);
+    if (fstat(file.get(), &stat) != 0) return Status::System(errno, path);
+    if (IsSameFile(StampOf(stat), before) || reads == kMostReads) return FileText{std::move(*text), before};
+    if (lseek(file.get(), 0, SEEK_SET) != 0) return Status::System(errno, path);
+  }
 }
 
 Result<FileText> ReadFileOrNothing(const std::string& path) {

@@ -3,159 +3,224 @@
 #include <algorithm>
 #include <iterator>
 
+#include "ascii.h"
+
 namespace vorn {
 namespace {
 
-// Sections and keys meet in one index. A section without a name is none: "[]" is kept apart by the
-// bracket.
-std::string SectionId(std::string_view name) { return "[" + FoldIniName(name); }
-
-std::string SectionId(const IniLine& line) {
-  return SectionId(line.name) + (line.argument ? "\"" + FoldIniName(*line.argument) : "");
+bool IsSame(std::string_view a, std::string_view b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](char x, char y) { return LowerAscii(x) == LowerAscii(y); });
 }
 
-std::string KeyId(const std::string& section, std::string_view key) { return section + "\n" + FoldIniName(key); }
+bool HasMeaning(IniLine::Kind kind) { return kind == IniLine::Kind::kAssignment || kind == IniLine::Kind::kInclude; }
 
 }  // namespace
 
-std::optional<IniDocument> IniDocument::Parse(std::string_view text) {
-  if (text.find('\0') != std::string_view::npos) return std::nullopt;
+// FNV-1a over the key in lower case.
+std::size_t IniDocument::HashKeyId::operator()(const KeyId& id) const {
+  std::uint64_t hash = 14695981039346656037U ^ id.section;
+  for (const char c : id.key) hash = (hash ^ static_cast<unsigned char>(LowerAscii(c))) * 1099511628211U;
+  return static_cast<std::size_t>(hash ^ hash >> 32);
+}
+
+bool IniDocument::SameKeyId::operator()(const KeyId& a, const KeyId& b) const {
+  return a.section == b.section && IsSame(a.key, b.key);
+}
+
+IniDocument IniDocument::Parse(std::string_view text) {
   IniDocument document;
-  const std::size_t first_end = text.find('\n');
-  if (first_end != std::string_view::npos && first_end > 0 && text[first_end - 1] == '\r') document.line_end_ = "\r\n";
-  while (!text.empty()) {
-    const std::size_t length = IniLineLength(text);
-    document.Append(text.substr(0, length));
-    text.remove_prefix(length);
+  document.current_ = document.NumberOf(kInherited);
+  std::string_view rest = document.texts_.emplace_back(text);
+  const std::string_view read = rest.substr(0, rest.find('\0'));
+  const std::size_t first_end = read.find('\n');
+  if (first_end != std::string_view::npos && first_end > 0 && read[first_end - 1] == '\r') document.line_end_ = "\r\n";
+  std::size_t at = 0;
+  while (const std::size_t length = IniLineLength(read.substr(at))) {
+    document.Append(read.substr(at, length));
+    at += length;
   }
+  document.tail_ = rest.substr(at);
   return document;
 }
 
+// Appends a line to those that the reader reads.
 void IniDocument::Append(std::string_view text) {
-  lines_.push_back({std::string(text), {}, {}});
-  if (IsEndedIniLine(text)) Register(std::prev(lines_.end()));
+  Line line = MakeLine(text, kNoSection);
+  line.number = line_number_;
+  line_number_ += static_cast<int>(std::count(text.begin(), text.end(), '\n'));
+  const IniLine& content = line.content;
+  if (content.kind == IniLine::Kind::kBadSection) current_ = kNoSection;
+  if (content.kind == IniLine::Kind::kSection) {
+    current_ = NumberOf(content.name);
+    current_has_argument_ = content.argument.has_value();
+  }
+  if (content.kind == IniLine::Kind::kSection || HasMeaning(content.kind)) line.section = current_;
+  line.has_argument = current_has_argument_;
+  lines_.push_back(std::move(line));
+  if (lines_.back().section != kNoSection) Index(std::prev(lines_.end()));
 }
 
-// Takes the document's new last line into the index.
-void IniDocument::Register(Place line) {
-  line->content = ReadIniLine(line->text);
-  const IniLine& content = line->content;
-  if (content.kind == IniLine::Kind::kNoSection) current_.clear();
-  if (content.kind == IniLine::Kind::kSection) current_ = SectionId(content);
-  if (content.kind != IniLine::Kind::kSection && content.kind != IniLine::Kind::kAssignment) return;
-  if (current_.empty()) return;
-  line->section = current_;
-  last_of_[current_] = line;
-  if (content.kind == IniLine::Kind::kAssignment) assignments_[KeyId(current_, content.name)].push_back(line);
+IniDocument::Line IniDocument::MakeLine(std::string_view text, SectionNumber section) {
+  std::string_view joined = text;
+  if (text.find("\\\n") != std::string_view::npos) joined = texts_.emplace_back(JoinIniLine(text));
+  return {text, ReadIniLine(joined), 0, section, false, {}};
 }
 
-void IniDocument::EndLastLine() {
-  if (lines_.empty() || IsEndedIniLine(lines_.back().text)) return;
-  Line& last = lines_.back();
-  last.text += line_end_;
-  if (!IsEndedIniLine(last.text)) last.text += line_end_;  // the first one was escaped
-  Register(std::prev(lines_.end()));
+void IniDocument::Index(Place line) {
+  if (!line->has_argument) sections_[line->section].last = line;
+  if (line->content.kind != IniLine::Kind::kAssignment || line->content.value.empty()) return;
+  const auto [found, is_new] = deciding_.try_emplace(KeyId{line->section, line->content.name}, line);
+  if (is_new) return;
+  line->earlier = found->second;
+  found->second = line;
+}
+
+IniDocument::SectionNumber IniDocument::NumberOf(std::string_view name) {
+  const std::string lower = LowerAscii(name);
+  const auto [found, is_new] = section_numbers_.try_emplace(lower, static_cast<SectionNumber>(sections_.size()));
+  if (is_new) sections_.push_back({lower, {}});
+  return found->second;
+}
+
+IniDocument::SectionNumber IniDocument::Known(std::string_view name) const {
+  const auto found = section_numbers_.find(LowerAscii(name));
+  return found == section_numbers_.end() ? kNoSection : found->second;
 }
 
 std::string IniDocument::Text() const {
   std::string text;
   for (const Line& line : lines_) text += line.text;
-  return text;
+  return text.append(tail_);
 }
 
-const IniDocument::Line* IniDocument::Find(std::string_view section, std::string_view key) const {
-  const auto found = assignments_.find(KeyId(SectionId(section), key));
-  if (found == assignments_.end()) return nullptr;
-  const std::vector<Place>& places = found->second;
-  const auto last =
-      std::find_if(places.rbegin(), places.rend(), [](Place line) { return !line->content.value.empty(); });
-  return last == places.rend() ? nullptr : &**last;
+const IniDocument::Line* IniDocument::FindLine(std::string_view section, std::string_view key) const {
+  const auto found = deciding_.find(KeyId{Known(section), key});
+  return found == deciding_.end() ? nullptr : &*found->second;
+}
+
+std::optional<IniSetting> IniDocument::FindLast(std::string_view section, std::string_view key) const {
+  const Line* line = FindLine(section, key);
+  if (line == nullptr) return std::nullopt;
+  return IniSetting{line->content.name, line->content.value, line->number, line->has_argument};
+}
+
+std::optional<IniSetting> IniDocument::Find(std::string_view section, std::string_view key) const {
+  const std::optional<IniSetting> last = FindLast(section, key);
+  return last && !last->is_hidden ? last : std::nullopt;
 }
 
 std::optional<std::string> IniDocument::Get(std::string_view section, std::string_view key) const {
-  const Line* line = Find(section, key);
-  if (line == nullptr) return std::nullopt;
-  return line->content.value;
+  const std::optional<IniSetting> setting = Find(section, key);
+  if (!setting) return std::nullopt;
+  return std::string(setting->value);
+}
+
+std::vector<IniSetting> IniDocument::Settings(std::string_view section) const {
+  std::vector<IniSetting> settings;
+  const SectionNumber number = Known(section);
+  if (number == kNoSection) return settings;
+  for (const Line& line : lines_) {
+    if (line.section != number || line.content.kind != IniLine::Kind::kAssignment) continue;
+    const auto found = deciding_.find(KeyId{number, line.content.name});
+    if (found == deciding_.end() || &*found->second != &line || line.has_argument) continue;
+    settings.push_back({line.content.name, line.content.value, line.number});
+  }
+  return settings;
 }
 
 std::vector<IniEntry> IniDocument::Entries(std::string_view section) const {
   std::vector<IniEntry> entries;
-  const std::string id = SectionId(section);
-  for (const Line& line : lines_) {
-    if (line.content.kind != IniLine::Kind::kAssignment || line.section != id) continue;
-    if (Find(section, line.content.name) == &line) entries.push_back({line.content.name, line.content.value});
+  for (const IniSetting& setting : Settings(section)) {
+    entries.push_back({std::string(setting.key), std::string(setting.value)});
   }
   return entries;
 }
 
-int IniDocument::LineOf(std::string_view section, std::string_view key) const {
-  const Line* wanted = Find(section, key);
-  int number = 1;
+std::vector<IniInclude> IniDocument::Includes() const {
+  std::vector<IniInclude> includes;
   for (const Line& line : lines_) {
-    if (&line == wanted) return number;
-    number += static_cast<int>(std::count(line.text.begin(), line.text.end(), '\n'));
+    if (line.content.kind != IniLine::Kind::kInclude || line.content.value.empty()) continue;
+    if (line.section == kNoSection) continue;
+    includes.push_back({std::nullopt, std::string(line.content.value), line.number});
+    if (!line.has_argument) includes.back().section = sections_[line.section].name;
   }
-  return 0;
+  return includes;
 }
 
 void IniDocument::Set(const IniSection& section, const IniKey& key, const IniValue& value) {
-  if (Get(section.text(), key.text()) == value.text()) return;
-  EndLastLine();
-  const auto found = assignments_.find(KeyId(SectionId(section.text()), key.text()));
-  if (found == assignments_.end()) return Insert(section, key, value);
-  std::vector<Place>& places = found->second;
-  // The last line of all: whatever others say before it, it counts.
-  Replace(places.back(), value);
+  const auto found = deciding_.find(KeyId{Known(section.text()), key.text()});
+  if (found != deciding_.end() && found->second->has_argument) return;
+  if (found != deciding_.end()) return Replace(found->second, value);
+  const SectionNumber known = Known(section.text());
+  Insert(known == kNoSection || !sections_[known].last ? AddSection(section) : known, key, value);
 }
 
 void IniDocument::Replace(Place line, const IniValue& value) {
-  const IniLine& old = line->content;
-  const std::string head = line->text.substr(0, old.value_begin);
-  std::string text = head + value.Rendered() + line->text.substr(old.value_end);
-  // What stood after the old value's quotes may be no comment: then it goes.
-  if (ReadIniLine(text).value != value.text()) text = old.name + " = " + value.Rendered() + line_end_;
-  line->text = std::move(text);
-  line->content = ReadIniLine(line->text);
+  const IniLine old = line->content;
+  if (old.value == value.text()) return;
+  const std::string head(line->text.substr(0, old.value_begin));
+  std::string text = head + Rendered(value) + std::string(line->text.substr(old.value_end));
+  // What follows the quotes of the old value is dropped if it is not a comment.
+  const bool is_read = ReadIniLine(JoinIniLine(text)).value == value.text();
+  if (!is_read) text = std::string(old.name) + " = " + Rendered(value) + line_end_;
+  const KeyId id{line->section, old.name};
+  auto entry = deciding_.extract(id);  // its key is a view of the old text
+  Line changed = MakeLine(texts_.emplace_back(std::move(text)), line->section);
+  changed.number = line->number;
+  changed.earlier = line->earlier;
+  *line = std::move(changed);
+  entry.key() = KeyId{line->section, line->content.name};
+  deciding_.insert(std::move(entry));
 }
 
-void IniDocument::Insert(const IniSection& section, const IniKey& key, const IniValue& value) {
-  const std::string id = SectionId(section.text());
-  const auto known = last_of_.find(id);
-  const Place after = known == last_of_.end() ? AddSection(section) : known->second;
-  std::string text = key.text() + " = " + value.Rendered() + line_end_;
-  IniLine content = ReadIniLine(text);
-  const Place line = lines_.insert(std::next(after), {std::move(text), std::move(content), id});
-  last_of_[id] = line;
-  assignments_[KeyId(id, key.text())].push_back(line);
+void IniDocument::Insert(SectionNumber section, const IniKey& key, const IniValue& value) {
+  const Place after = *sections_[section].last;
+  const std::string& text = texts_.emplace_back(key.text() + " = " + Rendered(value) + line_end_);
+  const Place line = lines_.insert(std::next(after), MakeLine(text, section));
+  line->number = after->number;
+  Index(line);
 }
 
-IniDocument::Place IniDocument::AddSection(const IniSection& section) {
+IniDocument::SectionNumber IniDocument::AddSection(const IniSection& section) {
   const bool below_text = !lines_.empty() && lines_.back().text.find_first_not_of(" \t\r\n") != std::string::npos;
   if (below_text) Append(line_end_);
-  Append("[" + section.text() + "]" + line_end_);
-  return std::prev(lines_.end());
+  Append(texts_.emplace_back("[" + section.text() + "]" + line_end_));
+  return current_;
 }
 
 bool IniDocument::Remove(std::string_view section, std::string_view key) {
-  const auto found = assignments_.find(KeyId(SectionId(section), key));
-  if (found == assignments_.end()) return false;
-  EndLastLine();
-  for (const Place line : found->second) {
-    Place& last = last_of_[line->section];
-    if (last == line) last = LastBefore(line);
-    lines_.erase(line);
+  const auto found = deciding_.find(KeyId{Known(section), key});
+  if (found == deciding_.end() || found->second->has_argument) return false;
+  std::vector<Place> hidden;  // the last one first
+  std::optional<Place> line = found->second;
+  deciding_.erase(found);
+  while (line) {
+    const std::optional<Place> earlier = (*line)->earlier;
+    if ((*line)->has_argument) {
+      hidden.push_back(*line);
+    } else {
+      Erase(*line);
+    }
+    line = earlier;
   }
-  assignments_.erase(found);
+  for (auto place = hidden.rbegin(); place != hidden.rend(); ++place) {
+    (*place)->earlier = std::nullopt;
+    Index(*place);
+  }
   return true;
 }
 
-// The assignment or the section line before one of a section's assignments.
-IniDocument::Place IniDocument::LastBefore(Place line) {
-  const std::string& section = line->section;
-  do {
-    --line;
-  } while (line->section != section);
-  return line;
+// Erases an assignment. The header of the section precedes it and becomes the section's last line if no other is left.
+void IniDocument::Erase(Place line) {
+  std::optional<Place>& last = sections_[line->section].last;
+  if (last == line) {
+    Place before = line;
+    const auto is_own = [&](Place other) { return other->section == line->section && !other->has_argument; };
+    while (before != lines_.begin() && !is_own(--before)) continue;
+    last = is_own(before) && before != line ? std::optional<Place>(before) : std::nullopt;
+  }
+  lines_.erase(line);
 }
 
 }  // namespace vorn

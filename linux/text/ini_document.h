@@ -1,7 +1,9 @@
-// An INI file as nfs-utils reads it, edited in place: what no edit concerns comes back byte for byte.
+// An INI file as nfs-utils reads it, edited in place: every byte that an edit does not concern is preserved.
 #ifndef VORN_LINUX_TEXT_INI_DOCUMENT_H
 #define VORN_LINUX_TEXT_INI_DOCUMENT_H
 
+#include <cstdint>
+#include <deque>
 #include <list>
 #include <optional>
 #include <string>
@@ -14,68 +16,128 @@
 
 namespace vorn {
 
+// A value and the line that gives it. The views are valid until the document is edited or destroyed.
+struct IniSetting {
+  std::string_view key;  // as it is spelled in the file
+  std::string_view value;
+  int line = 0;  // counted from 1
+  bool is_hidden = false;
+};
+
 struct IniEntry {
   std::string key;  // as it is spelled in the file
   std::string value;
 };
 
-// Of several lines for one key the last that has a value counts, over all blocks of a section.
-// Include lines are kept and not followed. A last line without line feed has no effect, as for the
-// reader, until an edit ends it. Sections with an argument are kept apart and cannot be asked for.
+// A line "include = file" with a value. The reader reads the file as if it were in the place of the line.
+struct IniInclude {
+  std::optional<std::string> section;  // in which the file begins; nullopt if no section name can ask for it
+  std::string file;
+  int line = 0;
+};
+
+// If several lines give a key a value, the last one counts, over all blocks of a section. Lines without a value are
+// ignored, as by the reader. A line in a section with an argument, [name "argument"], hides what an earlier line gives
+// the same key in [name], because the reader keeps one value for both; such values cannot be asked for here.
+//
+// The reader ignores a last line without line feed, and everything from a NUL byte on. An edit leaves that tail at
+// the end of the file, without effect.
+//
+// Parsing takes time in proportion to the text, and every other operation but Settings, Entries and Includes takes
+// constant time plus the time for the lines of its key. Reading is thread-safe; editing is not.
 class IniDocument {
  public:
-  // None when the text has a NUL byte: the reader would take it for the end.
-  static std::optional<IniDocument> Parse(std::string_view text);
+  static IniDocument Parse(std::string_view text);
 
-  IniDocument(IniDocument&&) = default;  // the index points into the lines: moved, never copied
+  IniDocument(IniDocument&&) = default;  // the index refers to the lines: a document is moved, never copied
   IniDocument& operator=(IniDocument&&) = default;
 
   std::string Text() const;
 
-  // The value that counts; a reference "$name" is given as it stands.
+  // The section name under which the lines before the first section header are found. In a file that is included
+  // they belong to the section of the include line; elsewhere the reader ignores them.
+  static constexpr std::string_view kInherited = "]";
+
+  // The setting that counts; nullopt if the key has no value. A reference "$name" is not resolved.
+  std::optional<IniSetting> Find(std::string_view section, std::string_view key) const;
+
+  // The last line that gives the key a value, also if it is in a section with an argument and so hides the key.
+  std::optional<IniSetting> FindLast(std::string_view section, std::string_view key) const;
+
+  bool HasSection(std::string_view section) const { return Known(section) != kNoSection; }
+
   std::optional<std::string> Get(std::string_view section, std::string_view key) const;
 
-  // The keys of a section that have a value, in the order of the lines that give it.
+  // The settings of a section that count, in file order.
+  std::vector<IniSetting> Settings(std::string_view section) const;
   std::vector<IniEntry> Entries(std::string_view section) const;
 
-  // The number of the line, from 1, that gives the value; 0 when none does.
-  int LineOf(std::string_view section, std::string_view key) const;
+  std::vector<IniInclude> Includes() const;
 
-  // Ends a last line without line feed, which gives it effect.
-  void EndLastLine();
-
-  // Changes the value where it stands. A new key comes after the section's last one, a new section
-  // at the end. What has the value already is not touched.
+  // Replaces the value on the line that counts. A new key is inserted after the last assignment of the section, a
+  // new section at the end. Nothing is changed if the key has the value already, or if it is hidden.
   void Set(const IniSection& section, const IniKey& key, const IniValue& value);
 
-  // Removes every line for the key. False when there was none.
+  // Removes every line that gives the key a value, except in sections with an argument. Returns false if the key has
+  // no value.
   bool Remove(std::string_view section, std::string_view key);
 
  private:
   IniDocument() = default;
 
-  struct Line {
-    std::string text;
-    IniLine content;
-    std::string section;  // folded; of an assignment that counts, and of a section line
-  };
+  struct Line;
   using Lines = std::list<Line>;
   using Place = Lines::iterator;
 
-  void Append(std::string_view text);
-  void Register(Place line);
-  const Line* Find(std::string_view section, std::string_view key) const;
-  void Replace(Place line, const IniValue& value);
-  void Insert(const IniSection& section, const IniKey& key, const IniValue& value);
-  Place AddSection(const IniSection& section);
-  Place LastBefore(Place line);
+  using SectionNumber = std::uint32_t;
+  static constexpr SectionNumber kNoSection = 0;  // assignments are ignored
 
-  Lines lines_;
-  std::string current_;  // the folded section at the end, or empty
-  // By folded section and key, in file order: all assignments, also those without a value.
-  std::unordered_map<std::string, std::vector<Place>> assignments_;
-  // By folded section: its last assignment, or its line when it has none.
-  std::unordered_map<std::string, Place> last_of_;
+  struct Line {
+    std::string_view text;
+    IniLine content;
+    int number = 0;
+    SectionNumber section = kNoSection;  // of a line with meaning
+    bool has_argument = false;           // whether its section has one
+    std::optional<Place> earlier;        // the line before that gives the same key a value
+  };
+
+  struct Section {
+    std::string name;           // lower case; without an argument
+    std::optional<Place> last;  // its last assignment without an argument, or its header if it has no assignment
+  };
+
+  // A key of a section; compared without regard to case.
+  struct KeyId {
+    SectionNumber section;
+    std::string_view key;
+  };
+  struct HashKeyId {
+    std::size_t operator()(const KeyId& id) const;
+  };
+  struct SameKeyId {
+    bool operator()(const KeyId& a, const KeyId& b) const;
+  };
+
+  void Append(std::string_view text);
+  Line MakeLine(std::string_view text, SectionNumber section);
+  void Index(Place line);
+  SectionNumber NumberOf(std::string_view name);
+  SectionNumber Known(std::string_view name) const;
+  const Line* FindLine(std::string_view section, std::string_view key) const;
+  void Replace(Place line, const IniValue& value);
+  void Insert(SectionNumber section, const IniKey& key, const IniValue& value);
+  SectionNumber AddSection(const IniSection& section);
+  void Erase(Place line);
+
+  std::deque<std::string> texts_;  // the file, and the lines that were joined or changed; the views point into them
+  Lines lines_;                    // all complete lines
+  std::string_view tail_;          // the rest of the file, which the reader ignores
+  int line_number_ = 1;            // of the next line
+  std::vector<Section> sections_{{"", {}}};  // by number; the first one is kNoSection
+  std::unordered_map<std::string, SectionNumber> section_numbers_;
+  SectionNumber current_ = kNoSection;  // the section at the end
+  bool current_has_argument_ = false;
+  std::unordered_map<KeyId, Place, HashKeyId, SameKeyId> deciding_;  // the line that gives a key its value
   const char* line_end_ = "\n";
 };
 

@@ -2,12 +2,12 @@
 
 #include <algorithm>
 
-#include "ini_text.h"
+#include "ascii.h"
 
 namespace vorn {
 namespace {
 
-// The reader tells blanks (isblank(3)) from white space (isspace(3)).
+// The reader distinguishes blanks (isblank(3)) from white space (isspace(3)).
 constexpr std::string_view kBlank = " \t";
 constexpr std::string_view kSpace = " \t\n\v\f\r";
 
@@ -22,17 +22,10 @@ std::string_view TrimRight(std::string_view text, std::string_view characters) {
   return text.substr(0, text.find_last_not_of(characters) + 1);
 }
 
-// An escaped line feed is two blanks; the last one is not the line's.
-std::string Joined(std::string_view line) {
-  std::string joined(IsEndedIniLine(line) ? line.substr(0, line.size() - 1) : line);
-  for (std::size_t at = 0; (at = joined.find("\\\n", at)) != kNone;) joined.replace(at, 2, "  ");
-  return joined;
-}
-
 IniLine ReadSection(std::string_view line) {
   IniLine result;
   const std::size_t end = line.find(']');
-  result.kind = end == kNone ? IniLine::Kind::kNoSection : IniLine::Kind::kSection;
+  result.kind = end == kNone ? IniLine::Kind::kBadSection : IniLine::Kind::kSection;
   std::string_view name = TrimLeft(line.substr(1, end == kNone ? kNone : end - 1), kBlank);
   const std::size_t quote = name.find('"');
   if (quote != kNone) {
@@ -45,7 +38,7 @@ IniLine ReadSection(std::string_view line) {
   return result;
 }
 
-// The value's place in the line, with its quotes.
+// Finds the value that begins at or behind `begin`.
 void ReadValue(std::string_view line, std::size_t begin, IniLine* result) {
   const std::string_view text = TrimLeft(line.substr(begin), kBlank);
   result->value_begin = result->value_end = line.size() - text.size();
@@ -58,7 +51,7 @@ void ReadValue(std::string_view line, std::size_t begin, IniLine* result) {
     return;
   }
   const std::string_view value = text.substr(0, text.find_first_of("#;"));
-  // The reader never trims the first character: where lines end by "\r\n", an empty value is "\r".
+  // The reader never trims the first character: where lines end by "\r\n", an empty value reads as "\r".
   result->value = value.substr(0, std::max(TrimRight(value, kSpace).size(), std::min(value.size(), std::size_t{1})));
   result->value_end += result->value.size();
 }
@@ -68,8 +61,8 @@ IniLine ReadAssignment(std::string_view line, std::size_t begin) {
   const std::size_t equals = line.find('=', begin);
   if (equals == kNone) return result;
   result.name = TrimRight(line.substr(begin, equals - begin), kBlank);
-  if (result.name.empty() || FoldIniName(result.name) == "include") return result;
-  result.kind = IniLine::Kind::kAssignment;
+  if (result.name.empty()) return result;
+  result.kind = LowerAscii(result.name) == "include" ? IniLine::Kind::kInclude : IniLine::Kind::kAssignment;
   ReadValue(line, equals + 1, &result);
   return result;
 }
@@ -80,21 +73,21 @@ std::size_t IniLineLength(std::string_view text) {
   for (std::size_t at = 0; (at = text.find('\n', at)) != kNone; ++at) {
     if (at == 0 || text[at - 1] != '\\') return at + 1;
   }
-  return text.size();
+  return 0;
 }
 
-bool IsEndedIniLine(std::string_view line) {
-  const std::size_t size = line.size();
-  return size > 0 && line[size - 1] == '\n' && (size == 1 || line[size - 2] != '\\');
+std::string JoinIniLine(std::string_view line) {
+  std::string joined(line);
+  for (std::size_t at = 0; (at = joined.find("\\\n", at)) != kNone;) joined.replace(at, 2, "  ");
+  return joined;
 }
 
 IniLine ReadIniLine(std::string_view line) {
-  const std::string joined = Joined(line);
-  const std::string_view text = joined;
-  const std::size_t begin = text.find_first_not_of(kSpace);
-  if (begin == kNone || text[begin] == '#' || text[begin] == ';') return {};
-  if (text[begin] == '[') return ReadSection(text.substr(begin));
-  return ReadAssignment(text, begin);
+  line.remove_suffix(1);  // its line feed
+  const std::size_t begin = line.find_first_not_of(kSpace);
+  if (begin == kNone || line[begin] == '#' || line[begin] == ';') return {};
+  if (line[begin] == '[') return ReadSection(line.substr(begin));
+  return ReadAssignment(line, begin);
 }
 
 }  // namespace vorn

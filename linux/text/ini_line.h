@@ -9,32 +9,34 @@
 
 namespace vorn {
 
+// What a line means. The views point into the line.
 struct IniLine {
   enum class Kind {
-    kOther,       // blank, comment, include, or nothing that the reader knows
+    kOther,       // blank, a comment, or nothing that the reader understands
     kSection,     // [name] or [name "argument"]
-    kNoSection,   // a section line that is none: assignments below it count for nothing
+    kBadSection,  // a malformed section header; the assignments below it are ignored
     kAssignment,  // key = value
+    kInclude,     // include = file
   };
 
   Kind kind = Kind::kOther;
-  std::string name;                     // the section's, or the key
-  std::optional<std::string> argument;  // the section's
-  std::string value;                    // empty: none that counts
-  // Where the value, with its quotes, stands in the line.
+  std::string_view name;                     // the name of the section, or the key
+  std::optional<std::string_view> argument;  // of the section
+  std::string_view value;                    // empty if the reader finds none
+  // The range of the value in the line, including its quotes.
   std::size_t value_begin = 0;
   std::size_t value_end = 0;
 };
 
-// The length of the first line of `text`: to its line feed and with it, past every line feed that a
-// backslash escapes. All of `text` when it does not end its line, or only by an escaped line feed:
-// the reader ignores such a line.
+// The length of the first line of `text`, including the line feed that ends it and every line feed before that one
+// that a backslash escapes. 0 if the text does not end its first line: the reader ignores such a line.
 std::size_t IniLineLength(std::string_view text);
 
-// Whether the line is ended.
-bool IsEndedIniLine(std::string_view line);
+// The line with each escaped line feed replaced by two blanks, which is how the reader joins its parts. The result
+// has the length of `line`.
+std::string JoinIniLine(std::string_view line);
 
-// Reads one line.
+// Reads one complete line in which no line feed is escaped.
 IniLine ReadIniLine(std::string_view line);
 
 }  // namespace vorn

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "ascii.h"
+
 namespace vorn {
 namespace {
 
@@ -17,7 +19,7 @@ bool HasBlankEnds(std::string_view text) {
   return Has(kBlanks, text.substr(0, 1)) || Has(kBlanks, text.substr(text.size() - 1));
 }
 
-// What no name and no value may be or have.
+// Neither a name nor a value may be empty or contain a control character.
 bool IsUnusable(std::string_view text) { return text.empty() || std::any_of(text.begin(), text.end(), IsControl); }
 
 bool NeedsQuotes(std::string_view value) {
@@ -26,35 +28,29 @@ bool NeedsQuotes(std::string_view value) {
 
 }  // namespace
 
-std::optional<IniSection> IniSection::From(std::string_view text) {
-  if (IsUnusable(text) || HasBlankEnds(text) || Has(text, "]\"")) return std::nullopt;
-  return IniSection(std::string(text));
+bool IniSectionRules::Accepts(std::string_view text) {
+  return !IsUnusable(text) && !HasBlankEnds(text) && !Has(text, "]\"");
 }
 
-std::optional<IniKey> IniKey::From(std::string_view text) {
-  if (IsUnusable(text) || HasBlankEnds(text) || Has(text, "=") || Has(text.substr(0, 1), "#;[")) return std::nullopt;
-  if (FoldIniName(text) == "include") return std::nullopt;  // the reader's own word
-  return IniKey(std::string(text));
+bool IniKeyRules::Accepts(std::string_view text) {
+  if (IsUnusable(text) || HasBlankEnds(text) || Has(text, "=") || Has(text.substr(0, 1), "#;[")) return false;
+  return LowerAscii(text) != "include";
 }
 
-std::optional<IniValue> IniValue::From(std::string_view text) {
-  if (IsUnusable(text) || text.front() == '$') return std::nullopt;
-  if (NeedsQuotes(text) && Has(text, "\"") && Has(text, "'")) return std::nullopt;
-  return IniValue(std::string(text));
+bool IniValueRules::Accepts(std::string_view text) {
+  if (IsUnusable(text) || text.front() == '$') return false;
+  return !(NeedsQuotes(text) && Has(text, "\"") && Has(text, "'"));
 }
 
-std::string IniValue::Rendered() const {
-  if (!NeedsQuotes(text_)) return text_;
-  const char quote = Has(text_, "\"") ? '\'' : '"';
-  return quote + text_ + quote;
-}
+IniValue NumberValue(int number) { return *IniValue::From(std::to_string(number)); }
 
-std::string FoldIniName(std::string_view name) {
-  std::string folded(name);
-  // ASCII only, whatever the locale: as the reader has it.
-  const auto lower = [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; };
-  std::transform(folded.begin(), folded.end(), folded.begin(), lower);
-  return folded;
+IniValue SwitchValue(bool on) { return *IniValue::From(on ? "y" : "n"); }
+
+std::string Rendered(const IniValue& value) {
+  const std::string& text = value.text();
+  if (!NeedsQuotes(text)) return text;
+  const char quote = Has(text, "\"") ? '\'' : '"';
+  return quote + text + quote;
 }
 
 }  // namespace vorn

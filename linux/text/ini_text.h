@@ -1,58 +1,38 @@
-// Texts that an INI file of nfs-utils can carry: whoever has one of these types cannot break a file.
+// The strings that an INI file of nfs-utils can represent. Only these types are written to a file, so that no string
+// of a caller can change the meaning of the rest of the file.
 //
-// The reader (nfs.conf(5), idmapd.conf(5)) takes "[section]" and "key = value" lines. Names are the
-// same in upper and lower case. In a value "#" and ";" begin a comment unless it is quoted, either
-// way; there is no escape for a quote, "$" at the beginning asks for a variable even when quoted,
-// and an empty value counts as none.
+// The reader (nfs.conf(5), idmapd.conf(5)) accepts "[section]" and "key = value" lines. Names are compared without
+// regard to ASCII case. In a value "#" and ";" begin a comment unless the value is quoted by " or '; a quote cannot
+// be escaped; a leading "$" refers to a variable, also within quotes; an empty value counts as no value.
 #ifndef VORN_LINUX_TEXT_INI_TEXT_H
 #define VORN_LINUX_TEXT_INI_TEXT_H
 
-#include <optional>
 #include <string>
 #include <string_view>
-#include <utility>
+
+#include "checked_text.h"
 
 namespace vorn {
 
-// A section's name.
-class IniSection {
- public:
-  static std::optional<IniSection> From(std::string_view text);
-  const std::string& text() const { return text_; }
-
- private:
-  explicit IniSection(std::string text) : text_(std::move(text)) {}
-  std::string text_;
+struct IniSectionRules {
+  static bool Accepts(std::string_view text);
+};
+struct IniKeyRules {
+  static bool Accepts(std::string_view text);
+};
+struct IniValueRules {
+  static bool Accepts(std::string_view text);
 };
 
-// A key.
-class IniKey {
- public:
-  static std::optional<IniKey> From(std::string_view text);
-  const std::string& text() const { return text_; }
+using IniSection = CheckedText<IniSectionRules>;  // the name of a section
+using IniKey = CheckedText<IniKeyRules>;          // the name of a key; "include" is the reader's own word
+using IniValue = CheckedText<IniValueRules>;
 
- private:
-  explicit IniKey(std::string text) : text_(std::move(text)) {}
-  std::string text_;
-};
+IniValue NumberValue(int number);
+IniValue SwitchValue(bool on);  // "y" or "n"
 
-// A value.
-class IniValue {
- public:
-  static std::optional<IniValue> From(std::string_view text);
-  static IniValue From(int number) { return IniValue(std::to_string(number)); }
-  const std::string& text() const { return text_; }
-
-  // As it stands in a file: in quotes where it needs them.
-  std::string Rendered() const;
-
- private:
-  explicit IniValue(std::string text) : text_(std::move(text)) {}
-  std::string text_;
-};
-
-// A name as the reader compares it.
-std::string FoldIniName(std::string_view name);
+// The value as it is written to a file: quoted if necessary.
+std::string Rendered(const IniValue& value);
 
 }  // namespace vorn
 

@@ -20,13 +20,13 @@ const std::uint8_t* Bytes(std::string_view text) { return reinterpret_cast<const
 
 bool IsHidden(ucs4_t character) {
   constexpr ucs4_t kObjectReplacement = 0xFFFC;
-  constexpr ucs4_t kReplacement = 0xFFFD;  // of what could not be converted
+  constexpr ucs4_t kReplacement = 0xFFFD;  // stands for a malformed part of a text
   if (character == kObjectReplacement || character == kReplacement) return true;
   constexpr std::uint32_t kHidden = UC_CATEGORY_MASK_C | UC_CATEGORY_MASK_Zl | UC_CATEGORY_MASK_Zp;
   return uc_is_general_category_withtable(character, kHidden) || uc_is_property_default_ignorable_code_point(character);
 }
 
-// Null for what belongs to no alphabet, or to many.
+// Returns nullptr for a character that belongs to no alphabet or to several.
 const uc_script_t* AlphabetOf(ucs4_t letter) {
   constexpr std::string_view kNone[] = {"Common", "Inherited", "Han", "Hiragana", "Katakana", "Hangul", "Bopomofo"};
   const uc_script_t* script = uc_script(letter);
@@ -46,7 +46,7 @@ bool MixesAlphabets(const std::u32string& text) {
   return false;
 }
 
-// Of valid UTF-8.
+// Decodes valid UTF-8.
 std::u32string Characters(std::string_view text) {
   std::u32string characters;
   for (std::size_t at = 0; at < text.size();) {
@@ -57,27 +57,37 @@ std::u32string Characters(std::string_view text) {
   return characters;
 }
 
-// NFKC: letters with their accents, and nothing that stands for another character.
+// Whether the text is in NFKC: accents are composed with their letters, and there are no compatibility forms.
 bool IsNormal(std::string_view text) {
   std::size_t size = 0;
   const Utf8 normal(u8_normalize(UNINORM_NFKC, Bytes(text), text.size(), nullptr, &size), &std::free);
   return normal != nullptr && text == std::string_view(reinterpret_cast<const char*>(normal.get()), size);
 }
 
-std::string UpperCaseOrSame(std::string_view text) {
-  Result<std::string> upper = UpperCase(text);
-  return upper.ok() ? std::move(*upper) : std::string(text);
+bool IsAscii(std::string_view text) {
+  return std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; });
 }
+
+char UpperAscii(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
 
 }  // namespace
 
 Result<std::string> UpperCase(std::string_view text) {
-  if (u8_check(Bytes(text), text.size()) != nullptr) return Status::Failure(EILSEQ, "the text is no UTF-8");
-  if (text.empty()) return std::string();
+  if (IsAscii(text)) {
+    std::string upper(text);
+    std::transform(upper.begin(), upper.end(), upper.begin(), UpperAscii);
+    return upper;
+  }
+  if (u8_check(Bytes(text), text.size()) != nullptr) return Status::Failure(EILSEQ, "the text is not UTF-8");
   std::size_t size = 0;
   const Utf8 upper(u8_toupper(Bytes(text), text.size(), "", nullptr, nullptr, &size), &std::free);
   if (upper == nullptr) return Status::System(errno, "upper case");
   return std::string(reinterpret_cast<const char*>(upper.get()), size);
+}
+
+std::string UpperCaseOrSame(std::string_view text) {
+  Result<std::string> upper = UpperCase(text);
+  return upper.ok() ? std::move(*upper) : std::string(text);
 }
 
 CaselessSubstring::CaselessSubstring(std::string_view substring) : substring_(UpperCaseOrSame(substring)) {}
@@ -86,8 +96,20 @@ bool CaselessSubstring::IsIn(std::string_view text) const {
   return UpperCaseOrSame(text).find(substring_) != std::string::npos;
 }
 
+std::string ToValidUtf8(std::string_view text) {
+  std::string valid;
+  while (const std::uint8_t* bad = u8_check(Bytes(text), text.size())) {
+    const auto good = static_cast<std::size_t>(bad - Bytes(text));
+    valid.append(text.substr(0, good)).append("\xef\xbf\xbd");
+    text.remove_prefix(good);
+    ucs4_t character = 0;
+    text.remove_prefix(static_cast<std::size_t>(std::max(u8_mbtouc(&character, Bytes(text), text.size()), 1)));
+  }
+  return valid.append(text);
+}
+
 bool IsPlainText(std::string_view text) {
-  // Most texts are of these alone.
+  // Most texts consist of printable ASCII only.
   if (std::all_of(text.begin(), text.end(), [](char c) { return c >= ' ' && c <= '~'; })) return true;
   if (u8_check(Bytes(text), text.size()) != nullptr) return false;
   const std::u32string characters = Characters(text);

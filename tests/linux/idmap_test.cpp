@@ -8,6 +8,7 @@
 #include <memory>
 #include <thread>
 
+#include "call.h"
 #include "captured_log.h"
 #include "idmap_judge.h"
 #include "nfsconf.h"
@@ -226,12 +227,86 @@ TEST(IDMap, RefusesWhatNobodySeesOrReadsToItsEnd) {
   EXPECT_EQ(DomainByLibrary(root.At(kFile)), std::string(511, 'a'));
 }
 
-TEST(IDMap, KeepsAMappingThatItWouldNotTake) {
+// ISO 8859-1 in the file.
+TEST(IDMap, ShowsAPrincipalThatIsNotUtf8WithReplacementCharacters) {
   const TemporaryRoot root;
-  root.Write(kFile, "[Static]\nj\xf6rg@X = daemon\n");  // ISO 8859-1
+  root.Write(kFile, "[Translation]\nGSS-Methods = static\n[Static]\nj\xf6rg@X = daemon\nj\xe4rg@X = nobody\n");
+  EXPECT_EQ(Stored(), (Pairs{{"j\xef\xbf\xbdrg@X", "daemon"}, {"j\xef\xbf\xbdrg@X\xef\xbf\xbd", "nobody"}}));
   ASSERT_EQ(Store({{"alice@X", "nobody"}}), 0);
-  EXPECT_EQ(Stored(), (Pairs{{"j\xf6rg@X", "daemon"}, {"alice@X", "nobody"}}));
-  EXPECT_LT(Store({{"j\xf6rg@X", "nobody"}}), 0) << "another mapping of that principal is a new one";
+  EXPECT_THAT(MapByLibrary(root.At(kFile), {"j\xf6rg@X", "j\xe4rg@X", "alice@X"}), ElementsAre(1U, 65534U, 65534U));
+}
+
+TEST(IDMap, DeletesAndChangesAMappingByThePrincipalThatIsShown) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[Translation]\nGSS-Methods = static\n[Static]\nj\xf6rg@X = daemon\nj\xe4rg@X = nobody\n");
+  ASSERT_EQ(Store({}, {"j\xef\xbf\xbdrg@X\xef\xbf\xbd"}), 0);
+  EXPECT_THAT(MapByLibrary(root.At(kFile), {"j\xf6rg@X", "j\xe4rg@X"}), ElementsAre(1U, std::nullopt));
+  ASSERT_EQ(Store({}, {"j\xef\xbf\xbdrg@X"}), 0);
+  EXPECT_EQ(root.Read(kFile), "[Translation]\nGSS-Methods = static\n[Static]\n");
+}
+
+TEST(IDMap, DoesNotSwitchMappingsOnUnlessOneIsCreatedOrChanged) {
+  const TemporaryRoot root;
+  const std::string text = "[Translation]\nMethod = nsswitch\n[Static]\nmallory@EVIL = root\n";
+  root.Write(kFile, text);
+  ASSERT_EQ(Store({}, {"unknown@X"}), 0);
+  EXPECT_EQ(root.Read(kFile), text);
+  ASSERT_EQ(StoreDomain("example.com"), 0);
+  EXPECT_THAT(MapByLibrary(root.At(kFile), {"mallory@EVIL"}), ElementsAre(std::nullopt));
+}
+
+bool IsLogged(const std::string& part) {
+  for (const LogLine& line : TakeLog()) {
+    if (line.text.find(part) != std::string::npos) return true;
+  }
+  return false;
+}
+
+TEST(IDMap, NamesEachMappingThatAChangeSwitchesOn) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[Static]\nmallory@EVIL = root\n");
+  VORN::CallContext call({});
+  TakeLog();
+  ASSERT_EQ(Store({{"alice@X", "nobody"}}), 0);
+  EXPECT_TRUE(IsLogged("idmapd.conf:2: the mapping mallory@EVIL = root takes effect"));
+  ASSERT_EQ(call.warnings().size(), 1U);
+  ASSERT_EQ(Store({{"bob@X", "nobody"}}), 0);
+  EXPECT_FALSE(IsLogged("takes effect"));
+}
+
+TEST(IDMap, ReadsTheFilesOfTheFolderAndIncludes) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[General]\nDomain = a.example\n[Static]\na@X = nobody\nb@X = nobody\ninclude = more\n");
+  root.Write("/etc/more", "b@X = daemon\nc@X = daemon\n");
+  root.Write("/etc/idmapd.conf.d/site.conf", "[General]\nDomain = b.example\n[Static]\nA@x = daemon\n");
+  EXPECT_EQ(DomainNow(), "b.example");
+  EXPECT_EQ(DomainByLibrary(root.At(kFile)), "b.example");
+  EXPECT_EQ(Stored(), (Pairs{{"b@X", "daemon"}, {"c@X", "daemon"}, {"A@x", "daemon"}}));
+}
+
+TEST(IDMap, RefusesAChangeThatAnotherFileOverrides) {
+  const TemporaryRoot root;
+  const std::string text = "[Translation]\nGSS-Methods = static\n[Static]\na@X = nobody\n";
+  root.Write(kFile, text);
+  root.Write("/etc/idmapd.conf.d/site.conf", "[General]\nDomain = b.example\n[Static]\nb@X = daemon\n");
+  TakeLog();
+  EXPECT_LT(StoreDomain("c.example"), 0);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kOverridden);
+  EXPECT_TRUE(IsLogged("site.conf:2: Domain overrides"));
+  EXPECT_LT(Store({}, {"b@X"}), 0);
+  EXPECT_TRUE(IsLogged("site.conf:4: b@X overrides"));
+  EXPECT_LT(Store({{"b@X", "nobody"}}), 0);
+  EXPECT_EQ(root.Read(kFile), text);
+  EXPECT_EQ(Store({{"c@X", "nobody"}}, {"a@X"}), 0);
+}
+
+TEST(IDMap, SaysThatAPluginIsMissing) {
+  const TemporaryRoot root;
+  root.Write("/usr/lib/libnfsidmap/static.so", "");
+  root.Write(kFile, "[Translation]\nMethod = gone,static\n");
+  TakeLog();
+  DomainNow();
+  EXPECT_TRUE(IsLogged("idmapd.conf:2: Method names \"gone\""));
 }
 
 TEST(IDMap, RefusesToOverwriteAHandEdit) {

@@ -2,7 +2,7 @@
 
 #include <sstream>
 
-#include "ini_text.h"
+#include "ascii.h"
 #include "processes.h"
 #include "requirements.h"
 #include "temporary_root.h"
@@ -28,9 +28,9 @@ IniContent ReadByNfsconf(std::string_view text) {
   for (std::string line; std::getline(dump, line);) {
     const std::size_t equals = line.find(" = ");
     if (!line.empty() && line[0] == '[') {
-      section = vorn::FoldIniName(line.substr(1, line.size() - 2));
+      section = vorn::LowerAscii(line.substr(1, line.size() - 2));
     } else if (equals != std::string::npos) {
-      content[section][vorn::FoldIniName(line.substr(1, equals - 1))] = Unquoted(line.substr(equals + 3));
+      content[section][vorn::LowerAscii(line.substr(1, equals - 1))] = Unquoted(line.substr(equals + 3));
     }
   }
   return content;

@@ -23,13 +23,13 @@ TEST(IniValue, ReadsBackAsItWasWritten) {
     const std::optional<IniValue> value = IniValue::From(text);
     ASSERT_TRUE(value.has_value()) << text;
     const TemporaryRoot root;
-    root.Write("/file", "[a]\nk = " + value->Rendered() + "\nj = 1\n");
+    root.Write("/file", "[a]\nk = " + Rendered(*value) + "\nj = 1\n");
     EXPECT_EQ(GetByNfsconf(root.At("/file"), "a", "k"), text);
     EXPECT_EQ(GetByNfsconf(root.At("/file"), "a", "j"), "1") << text;
   }
 }
 
-TEST(IniValue, IsMadeOfANumber) { EXPECT_EQ(IniValue::From(-5).Rendered(), "-5"); }
+TEST(IniValue, IsMadeOfANumber) { EXPECT_EQ(Rendered(NumberValue(-5)), "-5"); }
 
 TEST(IniKey, RefusesWhatAFileCannotCarry) {
   const char* const refused[] = {"", " a", "a ", "a\t", "a=b", "#a", ";a", "[a", "a\nb", "\x01", "include", "Include"};

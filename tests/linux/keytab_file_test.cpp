@@ -2,6 +2,8 @@
 
 #include <gmock/gmock.h>
 
+#include <set>
+
 #include "keytab_maker.h"
 
 namespace {
@@ -56,20 +58,39 @@ TEST(Keytab, QuotesWhatAPrincipalMustNotHold) {
               ElementsAre("1 a\\/b\\@c\\n@R (aes128-cts-hmac-sha1-96)"));
 }
 
-// The library itself takes every one of these for a keytab that ends there.
-TEST(Keytab, IsNoneWhenItIsCutOffButBetweenTwoEntries) {
+// The library itself accepts every one of these.
+TEST(Keytab, IsNoneWhenItIsCutOffExceptBetweenTwoEntries) {
   const std::string& whole = ThreeKeys();
-  int accepted = 0;
+  std::set<std::size_t> counts;
   for (std::size_t size = 0; size < whole.size(); ++size) {
-    const auto keys = ReadKeytab(whole.substr(0, size));
+    const std::string cut = whole.substr(0, size);
+    const auto keys = ReadKeytab(cut);
     if (!keys.ok()) {
       EXPECT_EQ(keys.status().code(), vorn::kNoKeytab) << size;
       continue;
     }
-    EXPECT_THAT(*keys, SizeIs(accepted)) << size;
-    ++accepted;
+    EXPECT_THAT(Keys(cut), ElementsAreArray(ListedByKlist(cut))) << size;
+    counts.insert(keys->size());
   }
-  EXPECT_EQ(accepted, 3) << "after the version, and behind the first and the second entry";
+  EXPECT_THAT(counts, ElementsAre(0U, 1U, 2U)) << "after the version, and behind the first and the second entry";
+}
+
+TEST(Keytab, MayEndInZeros) {
+  for (const std::size_t zeros : {1U, 3U, 4U, 5U, 4096U}) {
+    const std::string content = ThreeKeys() + std::string(zeros, '\0');
+    EXPECT_THAT(Keys(content), ElementsAreArray(ListedByKlist(content))) << zeros;
+    EXPECT_THAT(Keys(content), SizeIs(3)) << zeros;
+    EXPECT_FALSE(ReadKeytab(content + "x").ok()) << zeros;
+  }
+}
+
+TEST(Keytab, MayBeOfTheFirstVersion) {
+  const std::string content = EncodeFirstVersion("nfs", "LAB.TEST", 18);
+  EXPECT_THAT(Keys(content), ElementsAre("1 nfs@LAB.TEST (aes256-cts-hmac-sha1-96)"));
+  EXPECT_THAT(Keys(content), ElementsAreArray(ListedByKlist(content)));
+  for (std::size_t size = 3; size < content.size(); ++size) {
+    EXPECT_FALSE(ReadKeytab(content.substr(0, size)).ok()) << size;
+  }
 }
 
 // An entry in which `size` bytes at `at` are others.
@@ -93,7 +114,7 @@ TEST(Keytab, IsNoneWhenItIsDamaged) {
       {"text", "nfs/box.example@LAB.TEST\n"},
       {"another version", "\x05\x03" + good.substr(2)},
       {"a byte too many", good + "x"},
-      {"an entry without a size", good + std::string(4, '\0')},
+      {"an entry without a size", good + std::string(4, '\0') + "x"},
       {"an entry that is larger than the file", good + std::string("\0\0\1\0abc", 7)},
       {"a hole that is larger than the file", good + "\xFF\xFF\xFF\x00 abc"},
       {"the largest hole", good + std::string("\x80\0\0\0", 4)},

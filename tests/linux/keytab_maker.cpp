@@ -93,6 +93,34 @@ std::string EncodeFile(const std::vector<std::string>& entries) {
   return bytes;
 }
 
+namespace {
+
+template <typename Number>
+void AppendNative(std::string* bytes, Number number) {
+  bytes->append(reinterpret_cast<const char*>(&number), sizeof number);
+}
+
+void AppendNativeText(std::string* bytes, const std::string& text) {
+  AppendNative(bytes, static_cast<std::uint16_t>(text.size()));
+  *bytes += text;
+}
+
+}  // namespace
+
+std::string EncodeFirstVersion(const std::string& component, const std::string& realm, int enc_type) {
+  std::string entry;
+  AppendNative(&entry, std::uint16_t{2});  // the realm and the component
+  AppendNativeText(&entry, realm);
+  AppendNativeText(&entry, component);
+  AppendNative(&entry, std::uint32_t{1});  // the time
+  entry.push_back(1);                      // the version of the key
+  AppendNative(&entry, static_cast<std::uint16_t>(enc_type));
+  AppendNativeText(&entry, std::string(32, 'k'));
+  std::string bytes("\x05\x01");
+  AppendNative(&bytes, static_cast<std::int32_t>(entry.size()));
+  return bytes + entry;
+}
+
 std::vector<std::string> ListedByKlist(const std::string& content) {
   const TemporaryRoot folder;
   folder.Write("/keytab", content);

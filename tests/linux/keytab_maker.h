@@ -22,6 +22,9 @@ std::string MakeKeytabOfARealm();
 std::string EncodeEntry(const std::string& component, const std::string& realm, int enc_type);
 std::string EncodeFile(const std::vector<std::string>& entries);
 
+// A file of version 0x0501 with one entry, in the byte order of this machine.
+std::string EncodeFirstVersion(const std::string& component, const std::string& realm, int enc_type);
+
 // Returns the entries that "klist -k -e" prints for a keytab: "3 nfs/box.example@LAB.TEST (aes256-cts-hmac-sha1-96)".
 std::vector<std::string> ListedByKlist(const std::string& content);
 

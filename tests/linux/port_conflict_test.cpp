@@ -4,11 +4,12 @@
 #include <netinet/in.h>
 #include <sys/socket.h>
 
+#include <cerrno>
+
 #include "core.h"
 #include "file_descriptor.h"
 #include "nfsconf.h"
 #include "stand_in_rpcbind.h"
-#include "status.h"
 #include "temporary_root.h"
 #include "webapi.h"
 
@@ -77,9 +78,10 @@ TEST(PortConflict, IsNotTheServicesOwnSocket) {
                                           Listen(AF_INET, SOCK_DGRAM, 4001), Listen(AF_INET, SOCK_STREAM, 4002)};
   EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 0);
   EXPECT_EQ(IsPortConflict("nfs_statd", 4001, 4001), 0);
-  EXPECT_EQ(IsPortConflict("nfs_statd", 4002, 4002), 1) << "the lock manager's";
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4002, 4002), 0) << "the lock manager's: ports can be exchanged";
   EXPECT_EQ(IsPortConflict("nfs_nlm", 4002, 4002), 0);
-  EXPECT_EQ(IsPortConflict("nfs_nlm", 4000, 4000), 1) << "the status daemon's";
+  EXPECT_EQ(IsPortConflict("nfs_nlm", 4000, 4000), 0) << "the status daemon's: ports can be exchanged";
+  EXPECT_EQ(IsPortConflict("nfs_mountd", 4000, 4000), 1);
   EXPECT_EQ(IsPortConflict("rpcbind", 4000, 4000), 1) << "a service without a program";
   const vorn::FileDescriptor foreign = Listen(AF_INET, SOCK_DGRAM, 4000);
   EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 1) << "somebody else's, of the other protocol";
@@ -99,8 +101,9 @@ TEST(PortConflict, IsTheConfiguredPortOfAnotherService) {
     int conflict;
   } cases[] = {{"nfs_statd", 111, true, 1},   {"nfs_statd", 20490, true, 1}, {"nfs_statd", 2049, true, 0},
                {"nfs_statd", 20048, true, 1}, {"nfs_statd", 20000, true, 0}, {"nfs_statd", 4000, true, 0},
-               {"nfs_statd", 4001, true, 1},  {"nfs_nlm", 4000, true, 1},    {"nfs_nlm", 4001, true, 0},
-               {"nfs_statd", 4001, false, 0}, {"nfs_nlm", 4000, false, 0}};
+               {"nfs_statd", 4001, true, 0},  {"nfs_nlm", 4000, true, 0},    {"nfs_nlm", 4001, true, 0},
+               {"nfs_statd", 4001, false, 0}, {"nfs_nlm", 4000, false, 0},   {"nfs_mountd", 4001, true, 1},
+               {"nfs_mountd", 4001, false, 0}};
   for (const auto& c : cases) {
     record.custom_port_enable = c.custom_ports ? 1 : 0;
     ASSERT_EQ(VORNNFSConfSet(&record), 0);
@@ -108,11 +111,18 @@ TEST(PortConflict, IsTheConfiguredPortOfAnotherService) {
   }
 }
 
-TEST(PortConflict, IsWhatNobodyCanVouchFor) {
+TEST(PortConflict, ReadsAPortAsItsDaemonDoes) {
   const TemporaryRoot root;
-  root.Write("/etc/nfs.conf", "[mountd]\nport = many\n");
+  root.Write("/etc/nfs.conf", "[mountd]\nport = 4000x\n[nfsd]\nport = many\n");
   EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 1);
-  EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4001, 4001), 0);
+}
+
+TEST(PortConflict, IsAPortThatCannotBeChecked) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf/x", "");
+  EXPECT_EQ(IsPortConflict("nfs_statd", 4000, 4000), 1);
+  EXPECT_EQ(KLIBCErrGet(), EINVAL);
 }
 
 }  // namespace

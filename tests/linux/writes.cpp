@@ -7,6 +7,7 @@
 
 #include "keytab_maker.h"
 #include "nfsconf.h"
+#include "webapi.h"
 
 namespace {
 
@@ -70,6 +71,16 @@ int SaveSettings() {
   return VORNNFSConfSet(&record);
 }
 
+// As a request does that changes a port: the check of the port reads the files once more.
+int SavePort() {
+  const VornConf configuration;
+  NFSConfRecord record{};
+  if (VORNNFSConfGet(&record) < 0 || WebUtils::IsPortConflict("nfs_statd", 4000, 4000) != 0) return -1;
+  record.custom_port_enable = 1;
+  record.statd_port = 4000;
+  return VORNNFSConfSet(&record);
+}
+
 int AnnounceSizes() { return VORNNFSUDPPrefSizeSet(65536, 65536); }
 
 int StartService() { return KLIBServiceStart("nfsd", 0); }
@@ -86,6 +97,7 @@ std::vector<Change> AllChanges(const TemporaryRoot& root) {
           {"a change of the domain", ChangeDomain, {kIDMap}},
           {"an import of a keytab", [upload] { return VORNNFSKeytabImport(upload.c_str()); }, {kKeytab, kSettings}},
           {"a change of the settings", SaveSettings, {kSettings}},
+          {"a change of a port", SavePort, {kSettings}},
           {"a change of the transfer sizes", AnnounceSizes, {kDropIn}},
           {"a start of the service", StartService, {kState, kDropIn}}};
 }

@@ -214,7 +214,7 @@ void CheckIni(const File& file, const std::string& now, const IsOurs& is_ours, s
   CheckLines(file, now, is_ours, added, faults);
   const auto before = vorn::IniDocument::Parse(file.text);
   const auto after = vorn::IniDocument::Parse(now);
-  if (!after || ForeignEntries(*before, is_ours) != ForeignEntries(*after, is_ours)) {
+  if (ForeignEntries(before, is_ours) != ForeignEntries(after, is_ours)) {
     faults->push_back(std::string(file.path) + ": another's setting is changed:\n" + now);
   }
 }

@@ -1,0 +1,218 @@
+#include "ini_files.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <functional>
+#include <set>
+#include <utility>
+
+#include "ascii.h"
+#include "configuration_lock.h"
+
+namespace vorn {
+namespace {
+
+constexpr std::size_t kDeepestInclude = 10;
+constexpr std::size_t kMostSources = 1000;
+constexpr int kMostReferences = 16;
+
+// The names in the folder that are read.
+bool IsConfigurationFile(std::string_view name) {
+  constexpr std::string_view kEnding = ".conf";
+  return name.front() != '.' && name.size() > kEnding.size() && name.substr(name.size() - kEnding.size()) == kEnding;
+}
+
+Result<std::vector<std::string>> NamesIn(Box& box, const std::string& folder) {
+  const Result<std::shared_ptr<const StoredFolder>> listed = box.List(folder);
+  if (!listed.ok()) return listed.status();
+  std::vector<std::string> names;
+  std::copy_if((*listed)->names.begin(), (*listed)->names.end(), std::back_inserter(names), IsConfigurationFile);
+  return names;
+}
+
+// A version that stands for a list of names.
+Version VersionOf(const std::vector<std::string>& names) {
+  Version version;
+  version.exists = true;
+  std::string text;
+  for (const std::string& name : names) text += name + "\n";
+  version.state = {names.size(), text.size(), std::hash<std::string>()(text), 0, 0};
+  return version;
+}
+
+// The path under which the list of a folder's names is remembered.
+std::string ListPath(const std::string& folder) { return folder + "/*.conf"; }
+
+// The path in an include line: relative to the folder of the file, and optional if it begins with a hyphen.
+std::string IncludedPath(const std::string& including, std::string_view file) {
+  if (!file.empty() && file.front() == '-') file.remove_prefix(1);
+  if (!file.empty() && file.front() == '/') return std::string(file);
+  return including.substr(0, including.rfind('/') + 1) + std::string(file);
+}
+
+// The readers skip what they cannot open.
+bool IsSkipped(int code) {
+  return code == EINVAL || code == ENOTDIR || code == ELOOP || code == ENAMETOOLONG || code == EACCES || code == ENXIO;
+}
+
+// A setting and its place among all files.
+struct Placed {
+  IniFound found;
+  std::vector<int> position;
+  bool is_hidden;
+};
+
+std::vector<int> PositionOf(const std::vector<int>& source, int line) {
+  std::vector<int> position = source;
+  position.push_back(line);
+  return position;
+}
+
+}  // namespace
+
+std::string IniFound::Where() const { return file->location() + ":" + std::to_string(line); }
+
+Result<IniFiles> IniFiles::Open(Box& box, const std::string& path, const std::optional<Draft>& draft) {
+  IniFiles files;
+  const Status status = files.AddAll(box, path, draft);
+  return status.ok() ? Result<IniFiles>(std::move(files)) : status;
+}
+
+Status IniFiles::AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft) {
+  folder_ = path + ".d";
+  Result<std::vector<std::string>> names = NamesIn(box, folder_);
+  if (!names.ok()) return names.status();
+  names_ = VersionOf(*names);
+  FirstReads::Note(box, ListPath(folder_), names_);
+  const bool is_new = draft && draft->path.compare(0, folder_.size() + 1, folder_ + "/") == 0;
+  if (is_new) names->push_back(draft->path.substr(folder_.size() + 1));
+  std::sort(names->begin(), names->end(),
+            [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; });
+  names->erase(std::unique(names->begin(), names->end()), names->end());
+  if (Status status = Add(box, {path, nullptr, std::nullopt, {0}}, draft); !status.ok()) return status;
+  for (const std::string& name : *names) {
+    Source source{folder_ + "/", nullptr, std::nullopt, {static_cast<int>(sources_.size()) + 1}};
+    source.path += name;
+    if (Status status = Add(box, std::move(source), draft); !status.ok()) return status;
+  }
+  return {};
+}
+
+Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft) {
+  if (source.position.size() > kDeepestInclude || sources_.size() >= kMostSources) return {};
+  if (draft && draft->path == source.path) {
+    const std::string below = box.root().is_box() ? "" : box.root().directory();
+    source.file = IniFile::FromText(below + source.path, draft->text);
+  } else {
+    Result<SharedIniFile> file = IniFile::Open(box, source.path);
+    const bool is_main = sources_.empty();
+    if (!file.ok()) return is_main || !IsSkipped(file.status().code()) ? file.status() : Status();
+    source.file = std::move(*file);
+  }
+  sources_.push_back(source);
+  return AddIncludes(box, source, draft);
+}
+
+Status IniFiles::AddIncludes(Box& box, const Source& source, const std::optional<Draft>& draft) {
+  for (const IniInclude& include : source.file->document().Includes()) {
+    std::optional<std::string> section = include.section;
+    if (section == IniDocument::kInherited) section = source.inherited;
+    const bool is_in_section = section.has_value() || include.section != IniDocument::kInherited;
+    if (!is_in_section) continue;  // the reader ignores every line outside of a section
+    Source included{IncludedPath(source.path, include.file), nullptr, section,
+                    PositionOf(source.position, include.line)};
+    if (Status status = Add(box, std::move(included), draft); !status.ok()) return status;
+  }
+  return {};
+}
+
+std::optional<IniFound> IniFiles::FindStored(std::string_view section, std::string_view key) const {
+  std::optional<Placed> last;
+  const auto consider = [&](const Source& source, std::string_view name) {
+    const std::optional<IniSetting> setting = source.file->document().FindLast(name, key);
+    if (!setting) return;
+    std::vector<int> position = PositionOf(source.position, setting->line);
+    if (last && position < last->position) return;
+    last = Placed{
+        {setting->key, setting->value, setting->value, source.file.get(), setting->line}, position, setting->is_hidden};
+  };
+  for (const Source& source : sources_) {
+    consider(source, section);
+    if (source.inherited == LowerAscii(section)) consider(source, IniDocument::kInherited);
+  }
+  if (!last || last->is_hidden) return std::nullopt;
+  return last->found;
+}
+
+std::optional<std::string_view> IniFiles::Resolve(std::string_view value) const {
+  for (int references = 0; !value.empty() && value.front() == '$'; ++references) {
+    const std::optional<IniFound> variable = FindStored("environment", value.substr(1));
+    if (!variable || references == kMostReferences) return std::nullopt;
+    value = variable->stored;
+  }
+  return value;
+}
+
+std::optional<IniFound> IniFiles::Find(std::string_view section, std::string_view key) const {
+  std::optional<IniFound> found = FindStored(section, key);
+  if (!found) return std::nullopt;
+  const std::optional<std::string_view> value = Resolve(found->stored);
+  if (!value) return std::nullopt;
+  found->value = *value;
+  return found;
+}
+
+std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
+  std::vector<IniFound> settings;
+  int contributing = 0;
+  for (const Source& source : sources_) {
+    const auto add = [&](std::string_view name) {
+      const std::vector<IniSetting> own = source.file->document().Settings(name);
+      contributing += source.file->document().HasSection(name) ? 1 : 0;
+      for (const IniSetting& s : own) settings.push_back({s.key, s.value, s.value, source.file.get(), s.line});
+    };
+    if (source.inherited == LowerAscii(section)) add(IniDocument::kInherited);
+    add(section);
+  }
+  std::set<std::string> seen;  // a file that is included twice gives a key twice
+  const auto is_void = [&](IniFound& setting) {
+    if (contributing > 1) {
+      const std::optional<IniFound> deciding = FindStored(section, setting.key);
+      if (!deciding || deciding->file != setting.file || deciding->line != setting.line) return true;
+      if (!seen.insert(LowerAscii(setting.key)).second) return true;
+    }
+    const std::optional<std::string_view> value = Resolve(setting.stored);
+    setting.value = value.value_or("");
+    return !value.has_value();
+  };
+  std::vector<IniFound> in_force;
+  for (IniFound& setting : settings) {
+    if (!is_void(setting)) in_force.push_back(setting);
+  }
+  return in_force;
+}
+
+std::vector<std::shared_ptr<const void>> IniFiles::sources() const {
+  std::vector<std::shared_ptr<const void>> files;
+  files.reserve(sources_.size());
+  for (const Source& source : sources_) files.push_back(source.file);
+  return files;
+}
+
+Status IniFiles::CheckUnchanged(Box& box) const {
+  if (Status status = FirstReads::Check(box, ListPath(folder_), names_); !status.ok()) return status;
+  for (const Source& source : sources_) {
+    if (Status status = FirstReads::Check(box, source.path, source.file->version()); !status.ok()) return status;
+  }
+  return {};
+}
+
+Status IniFiles::NoteOwnWrite(Box& box, const std::string& path) {
+  const std::string folder = path.substr(0, path.rfind('/'));
+  const Result<std::vector<std::string>> names = NamesIn(box, folder);
+  if (names.ok()) FirstReads::Renew(box, ListPath(folder), VersionOf(*names));
+  return names.status();
+}
+
+}  // namespace vorn

@@ -1,0 +1,83 @@
+// The configuration of nfs-utils over all files that its programs read.
+#ifndef VORN_LINUX_BOX_INI_FILES_H
+#define VORN_LINUX_BOX_INI_FILES_H
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "box.h"
+#include "ini_file.h"
+#include "status.h"
+
+namespace vorn {
+
+// A setting that is in force, and where it comes from. Valid as long as the IniFiles object.
+struct IniFound {
+  std::string_view key;
+  std::string_view value;   // a reference "$name" is resolved
+  std::string_view stored;  // the value as it is in the file
+  const IniFile* file = nullptr;
+  int line = 0;
+
+  std::string Where() const;  // "/etc/nfs.conf:3"
+};
+
+// One reading of "/etc/NAME.conf" and of "/etc/NAME.conf.d/*.conf" in the order of versionsort(3), each with the
+// files that it includes: nfs.conf(5), and idmapd.conf(5), which libnfsidmap reads in the same way. The last value
+// of a key counts. A file that is missing or not a regular file is skipped, as the readers do.
+//
+// "$name" refers to a key of the section [environment]. The readers look for a variable of their own process first;
+// its value is unknown here.
+class IniFiles {
+ public:
+  // A text that takes the place of what is stored at `path`.
+  struct Draft {
+    std::string path;
+    std::string text;
+  };
+
+  static Result<IniFiles> Open(Box& box, const std::string& path, const std::optional<Draft>& draft = std::nullopt);
+
+  // The setting in force; nullopt if the key has no value, or one that refers to nothing.
+  std::optional<IniFound> Find(std::string_view section, std::string_view key) const;
+
+  // The setting that decides over the key, also if its value refers to nothing. A reference is not resolved.
+  std::optional<IniFound> FindStored(std::string_view section, std::string_view key) const;
+
+  // The settings of a section that are in force, in the order in which they are read.
+  std::vector<IniFound> Settings(std::string_view section) const;
+
+  // The files that were read. Two readings with equal lists have equal settings.
+  std::vector<std::shared_ptr<const void>> sources() const;
+
+  // Fails with kChangedBehind if the configuration context of this thread has first read another version of one of
+  // the files, or another list of files.
+  Status CheckUnchanged(Box& box) const;
+
+  // To be called after the thread has written one of the files itself.
+  static Status NoteOwnWrite(Box& box, const std::string& path);
+
+ private:
+  struct Source {
+    std::string path;
+    SharedIniFile file;
+    std::optional<std::string> inherited;  // the section of the include line
+    std::vector<int> position;             // of the include lines that lead to the file; orders the sources
+  };
+
+  Status AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft);
+  Status Add(Box& box, Source source, const std::optional<Draft>& draft);
+  Status AddIncludes(Box& box, const Source& source, const std::optional<Draft>& draft);
+  std::optional<std::string_view> Resolve(std::string_view value) const;
+
+  std::string folder_;
+  Version names_;  // stands for the list of files in the folder
+  std::vector<Source> sources_;
+};
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_BOX_INI_FILES_H

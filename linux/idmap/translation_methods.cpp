@@ -1,0 +1,85 @@
+#include "translation_methods.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <optional>
+
+namespace vorn {
+namespace {
+
+constexpr char kSection[] = "Translation";
+constexpr char kGSSMethods[] = "GSS-Methods";
+constexpr char kMethod[] = "Method";
+constexpr char kStatic[] = "static";
+
+// Splits a list as libnfsidmap does: at commas; blanks before a name do not count, and blanks after it do.
+std::vector<std::string> Split(std::string_view list) {
+  std::vector<std::string> words;
+  while (!list.empty()) {
+    std::string_view word = list.substr(0, list.find(','));
+    list.remove_prefix(std::min(word.size() + 1, list.size()));
+    word.remove_prefix(std::min(word.find_first_not_of(" \t"), word.size()));
+    if (!word.empty()) words.emplace_back(word);
+  }
+  return words;
+}
+
+std::vector<std::string> ListOf(const IniFiles& files, const char* key) {
+  const std::optional<IniFound> found = files.Find(kSection, key);
+  return found ? Split(found->value) : std::vector<std::string>();
+}
+
+bool Exists(const Box& box, const std::string& path) {
+  const Result<std::string> location = box.root().Locate(path);
+  return location.ok() && access(location->c_str(), F_OK) == 0;
+}
+
+// The folder in which libnfsidmap looks for plug-ins, or "".
+std::string PluginFolder(const Box& box) {
+  constexpr const char* kFolders[] = {"/usr/lib/" VORN_LIBRARY_ARCHITECTURE "/libnfsidmap", "/usr/lib64/libnfsidmap",
+                                      "/usr/lib/libnfsidmap"};
+  for (const char* folder : kFolders) {
+    if (Exists(box, folder)) return folder;
+  }
+  return "";
+}
+
+}  // namespace
+
+std::vector<std::string> GSSMethods(const IniFiles& files) {
+  std::vector<std::string> methods = ListOf(files, kGSSMethods);
+  if (methods.empty()) methods = ListOf(files, kMethod);
+  if (methods.empty()) methods = {"nsswitch"};
+  return methods;
+}
+
+bool IsStaticFirst(const std::vector<std::string>& methods) { return !methods.empty() && methods.front() == kStatic; }
+
+Status PutStaticFirst(const std::vector<std::string>& methods, IniDocument* document) {
+  std::string list = kStatic;
+  for (const std::string& method : methods) {
+    if (method != kStatic) list += "," + method;
+  }
+  const std::optional<IniValue> value = IniValue::From(list);
+  if (!value) return Status::Failure(kSyntax, "the translation methods cannot be written back");
+  document->Set(*IniSection::From(kSection), *IniKey::From(kGSSMethods), *value);
+  return {};
+}
+
+std::vector<std::string> MissingPlugins(const Box& box, const IniFiles& files) {
+  std::vector<std::string> sentences;
+  const std::string folder = PluginFolder(box);
+  if (folder.empty()) return sentences;
+  for (const char* key : {kMethod, kGSSMethods}) {
+    for (const std::string& method : ListOf(files, key)) {
+      const std::string plugin = folder + "/" + method + ".so";
+      if (Exists(box, plugin)) continue;
+      sentences.push_back(files.Find(kSection, key)->Where() + ": " + key + " names \"" + method + "\", but " + plugin +
+                          " does not exist; libnfsidmap maps nobody until this is corrected");
+    }
+  }
+  return sentences;
+}
+
+}  // namespace vorn

@@ -9,7 +9,7 @@
 //  - A refused save changes nothing.
 //  - FindExportFaults finds exactly the lines at which exportfs stops.
 //
-// VORN_GENERATED_FILES is the number of files (default 200), VORN_GENERATOR_SEED the first seed (default 1).
+// VORN_CASES is the number of files (default 200), VORN_SEED the seed (default 1).
 #include <gtest/gtest.h>
 #include <unistd.h>
 
@@ -35,6 +35,7 @@
 #include "current_box.h"
 #include "exportfs_judge.h"
 #include "exports_files.h"
+#include "generated_case.h"
 #include "nfsconf.h"
 #include "share.h"
 #include "temporary_root.h"
@@ -795,11 +796,6 @@ class Properties {
   const Table after_;
 };
 
-unsigned Setting(const char* name, unsigned otherwise) {
-  const char* value = std::getenv(name);
-  return value == nullptr ? otherwise : static_cast<unsigned>(std::strtoul(value, nullptr, 10));
-}
-
 constexpr int kFilesOfABox = 25;
 
 void CheckFaults(const Outcome& outcome, const std::string& messages) {
@@ -839,8 +835,8 @@ TEST(GeneratedExports, AreSavedAsRequestedAndNothingElseChanges) {
   const Spellings spellings(judge);
   ASSERT_EQ(spellings.NameOf("nowhere"), "");
   ASSERT_EQ(spellings.NameOf("alpha"), spellings.NameOf("alpha."));
-  const unsigned seed = Setting("VORN_GENERATOR_SEED", 1);
-  const unsigned boxes = (Setting("VORN_GENERATED_FILES", 200) + kFilesOfABox - 1) / kFilesOfABox;
+  const unsigned seed = NumberFromEnvironment("VORN_SEED", 1);
+  const unsigned boxes = (NumberFromEnvironment("VORN_CASES", 200) + kFilesOfABox - 1) / kFilesOfABox;
   int saved = 0;
   unsigned tried = 0;
   for (unsigned box = 0; box < boxes && !testing::Test::HasFailure(); ++box) {

@@ -117,7 +117,10 @@ class Client {
                                  {"write_size", 8192},
                                  {"unix_pri_enable", Any(2) == 0},
                                  {"custom_port_enable", ports}});
-    if (ports) params["statd_port"] = params["nlm_port"] = 40000 + number_;
+    if (ports) {
+      params["statd_port"] = 40000 + 2 * number_;
+      params["nlm_port"] = 40001 + 2 * number_;
+    }
     // Somebody on this machine may have the port, or another client in this moment.
     EXPECT_THAT(Ask(NFSAdvSet, params).code, AnyOf(0, kPortConflict));
   }

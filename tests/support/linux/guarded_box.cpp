@@ -6,6 +6,7 @@
 #include <functional>
 #include <string_view>
 
+#include "export_paths.h"
 #include "exports_document.h"
 #include "ini_document.h"
 #include "unseen_characters.h"
@@ -191,10 +192,11 @@ void CheckExports(const File& file, const std::string& now, Lines* faults) {
   const vorn::ExportsDocument before(file.text);
   const vorn::ExportsDocument after(now);
   for (const vorn::ExportLine& line : after.Lines()) {
-    if (!line.fault.empty()) faults->push_back("exports: " + line.fault);
+    if (line.fault) faults->push_back("exports: " + line.fault->reason);
   }
+  const vorn::ExportPaths paths;
   for (const char* path : {"/volume1/media", "/volume1/backup"}) {
-    if (!(before.Entries(path) == after.Entries(path))) faults->push_back("exports: another's share is changed");
+    if (!(before.Entries(path, paths) == after.Entries(path, paths))) faults->push_back("exports: another's share is changed");
   }
 }
 

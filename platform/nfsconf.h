@@ -174,16 +174,16 @@ static_assert(sizeof(void*) != 4 || (sizeof(ExportRuleList) == 512 && offsetof(E
 
 // Reads the rules of the share at `path` from all its lines in the exports file `file`, in file order. "/etc/exports"
 // includes the files of /etc/exports.d. Where the security flavours of a client differ, the fields of its rule have the
-// widest access of any of them. Returns a positive value if `*list` contains the rules; 0 if there are none, and `*list`
-// may be unchanged; a negative value on failure, also for a path of more than 507 bytes. The list belongs to the caller,
-// also after a failure if it was set.
+// widest access of any of them. Returns a positive value if `*list` contains the rules; 0 if there are none, and
+// `*list` may be unchanged; a negative value on failure, also for a path of more than 507 bytes. The list belongs to
+// the caller, also after a failure if it was set.
 int VORNNFSRuleExtGet(const char* file, const char* path, ExportRuleList** list);
 
 // Replaces all rules of the share at `path` in the exports file by those of `list`. A null `list` removes them. Of a
-// client that has a rule, only the fields that differ from that rule are changed. The operation fails and writes nothing
-// for a rule that exports(5) cannot represent, a changed or missing rule of a file in /etc/exports.d, a changed rule on
-// a line that is not understood, a change that is ambiguous because the client's security flavours differ, and a path
-// of more than 507 bytes. The list stays the caller's.
+// client that has a rule, only the fields that differ from that rule are changed. The operation fails and writes
+// nothing for a rule that exports(5) cannot represent, a changed or missing rule of a file in /etc/exports.d, a changed
+// rule on a line that is not understood, a change that is ambiguous because the client's security flavours differ, and
+// a path of more than 507 bytes. The list stays the caller's.
 int VORNNFSRuleExtSetAll(const char* path, const ExportRuleList* list);
 
 // Frees a list and its rules. Accepts null.

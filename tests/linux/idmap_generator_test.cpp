@@ -173,7 +173,7 @@ std::string AllText(const TemporaryRoot& root, const GeneratedFiles& files) {
   return text;
 }
 
-// What follows the last complete line.
+// The text after the last complete line.
 std::string Tail(const std::string& text) { return text.substr(text.rfind('\n') + 1); }
 
 bool IsNamed(const std::vector<LogLine>& log, const std::string& principal) {

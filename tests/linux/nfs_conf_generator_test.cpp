@@ -96,7 +96,7 @@ Values AskNfsconf(const TemporaryRoot& root) {
   return values;
 }
 
-// As conf_get_bool of nfs-utils reads it.
+// Reads a switch as conf_get_bool of nfs-utils does.
 bool ReadSwitch(const std::string& text, bool fallback) {
   for (const char* word : {"1", "t", "true", "y", "yes", "on"}) {
     if (strcasecmp(text.c_str(), word) == 0) return true;
@@ -107,7 +107,7 @@ bool ReadSwitch(const std::string& text, bool fallback) {
   return fallback;
 }
 
-// As conf_get_num of nfs-utils reads it; a number that is no port counts as none.
+// Reads a number as conf_get_num of nfs-utils does; one that is no port counts as none.
 int ReadPort(const std::string& text, int fallback) {
   if (text.empty()) return fallback;
   const int port = std::atoi(text.c_str());

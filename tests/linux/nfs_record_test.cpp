@@ -116,8 +116,7 @@ TEST(NFSConf, RemembersPortsThatAreNotInUse) {
 
 TEST(NFSConf, FollowsTheAdministratorsOwnFiles) {
   const TemporaryRoot root;
-  root.Write("/etc/nfs.conf",
-             "[nfsd]\nvers4=off\n[mountd]\nmanage-gids = TRUE\n[statd]\nport=16\n[lockd]\nport=10\n");
+  root.Write("/etc/nfs.conf", "[nfsd]\nvers4=off\n[mountd]\nmanage-gids = TRUE\n[statd]\nport=16\n[lockd]\nport=10\n");
   root.Write("/etc/nfs.conf.d/2.conf", "[lockd]\nport=2\n");
   root.Write("/etc/nfs.conf.d/10.conf", "[lockd]\nport=11\n");
   root.Write("/etc/nfs.conf.d/.hidden.conf", "[lockd]\nport=12\n");

@@ -71,7 +71,7 @@ int SaveSettings() {
   return VORNNFSConfSet(&record);
 }
 
-// As a request does that changes a port: the check of the port reads the files once more.
+// Changes a port as a request does: the check of the port reads the files once more.
 int SavePort() {
   const VornConf configuration;
   NFSConfRecord record{};

@@ -196,7 +196,8 @@ void CheckExports(const File& file, const std::string& now, Lines* faults) {
   }
   const vorn::ExportPaths paths;
   for (const char* path : {"/volume1/media", "/volume1/backup"}) {
-    if (!(before.Entries(path, paths) == after.Entries(path, paths))) faults->push_back("exports: another's share is changed");
+    if (!(before.Entries(path, paths) == after.Entries(path, paths)))
+      faults->push_back("exports: another's share is changed");
   }
 }
 

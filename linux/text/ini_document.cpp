@@ -161,7 +161,7 @@ void IniDocument::Replace(Place line, const IniValue& value) {
   if (old.value == value.text()) return;
   const std::string head(line->text.substr(0, old.value_begin));
   std::string text = head + Rendered(value) + std::string(line->text.substr(old.value_end));
-  // What follows the quotes of the old value is dropped if it is not a comment.
+  // Text after the quotes of the old value is dropped if it is not a comment.
   const bool is_read = ReadIniLine(JoinIniLine(text)).value == value.text();
   if (!is_read) text = std::string(old.name) + " = " + Rendered(value) + line_end_;
   const KeyId id{line->section, old.name};

@@ -9,7 +9,7 @@
 
 namespace vorn {
 
-// What a line means. The views point into the line.
+// The meaning of a line. The views point into the line.
 struct IniLine {
   enum class Kind {
     kOther,       // blank, a comment, or nothing that the reader understands

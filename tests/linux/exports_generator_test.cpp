@@ -99,7 +99,7 @@ class Random {
 };
 
 // ---------------------------------------------------------------------------------------------
-// What exportfs says.
+// The answer of exportfs.
 
 struct Access {
   bool read_only = false;
@@ -488,7 +488,7 @@ ExportsSet ReadSet(const TemporaryRoot& root) {
   return set;
 }
 
-// What the module does with the path of a share: it copies the path into the list, cut to the field, and saves.
+// Saves as the module does: it copies the path of the share into the list, cut to the field.
 bool SavePath(const char* path, ExportRuleList* list) {
   std::snprintf(list->path, sizeof list->path, "%s", path);
   return VORNNFSRuleExtSetAll(list->path, list->first == nullptr ? nullptr : list) == 0;
@@ -621,7 +621,7 @@ bool Widest(const Row& row, bool Access::*field, bool wide) {
                      [&](const auto& flavor) { return flavor.second.*field == wide; });
 }
 
-// What the record must show of a row.
+// The record that must be shown for a row.
 std::int32_t SquashOf(const Row& row) {
   if (!Widest(row, &Access::all_squash, false)) return VORNNFS_SQUASH_ALL_ADMIN;
   if (Widest(row, &Access::root_squash, false)) return VORNNFS_SQUASH_ROOT;

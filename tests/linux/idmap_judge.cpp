@@ -1,9 +1,14 @@
 #include "idmap_judge.h"
 
+#include <unistd.h>
+
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <filesystem>
 #include <fstream>
 #include <functional>
+#include <iterator>
 #include <stdexcept>
 
 #include "processes.h"
@@ -19,9 +24,27 @@ namespace {
 
 void Silent(const char* /*format*/, ...) {}
 
+std::size_t CountThreads() {
+  const std::filesystem::directory_iterator threads("/proc/self/task");
+  return static_cast<std::size_t>(std::distance(begin(threads), end(threads)));
+}
+
+// fork(2) copies the calling thread only: a lock that another thread owns, such as that of a name service, stays
+// taken in the child. The platform asks for the host's domain in a thread, which ends with the answer. A sanitizer
+// may have a thread that never ends, so the number of threads is only waited for once.
+void WaitForOtherThreads() {
+  static const std::size_t usual = [] {
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+    while (CountThreads() > 1 && std::chrono::steady_clock::now() < deadline) usleep(1000);
+    return CountThreads();
+  }();
+  Eventually([] { return CountThreads() <= usual; });
+}
+
 // Asks in a process of its own: the library reads its file once.
 std::vector<std::string> Ask(const std::string& path, const std::function<void(std::ostream&)>& questions) {
   const TemporaryRoot scratch;
+  WaitForOtherThreads();
   ChildProcess child([&] {
     std::string file = path;
     nfs4_set_debug(0, Silent);

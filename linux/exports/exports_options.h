@@ -10,7 +10,7 @@
 
 namespace vorn {
 
-// What a client may do with one security flavour: the options that the kernel keeps per flavour
+// The rights of a client with one security flavour: the options that the kernel keeps per flavour
 // (NFSEXP_SECINFO_FLAGS of <linux/nfsd/export.h>).
 struct ExportAccess {
   bool read_only = true;

@@ -24,7 +24,7 @@ struct ForeignEntry {
   std::string place;  // of its line
 };
 
-// What the files say of one share. The foreign entries include those that an own entry overrides.
+// The contents of the files about one share. The foreign entries include those that an own entry overrides.
 struct ShareExports {
   std::vector<ExportLine> own_lines;
   std::vector<ExportEntry> own;

@@ -55,7 +55,7 @@ class IDMap {
 // missing are then logged.
 Result<std::shared_ptr<const IDMap>> ReadIDMap(Box& box, const std::string& path = kIDMapFile);
 
-// What a change stores; nullopt and nullptr leave a part as it is.
+// The parts of the ID map that a change stores; nullopt and nullptr leave a part as it is.
 struct IDMapChange {
   std::optional<std::string> domain;          // "" removes the configured domain
   std::shared_ptr<const TextPairs> mappings;  // as shown by IDMap

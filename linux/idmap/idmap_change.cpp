@@ -25,7 +25,7 @@ constexpr std::size_t kLongestPrincipal = 513;
 constexpr std::size_t kMostNotices = 1000;
 
 // ---------------------------------------------------------------------------------------------
-// What a change means for the file.
+// The consequences of a change for the file.
 
 struct Mapping {
   std::string principal;

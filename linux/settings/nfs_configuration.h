@@ -14,8 +14,8 @@ namespace vorn {
 inline constexpr int kLargestPort = 65535;
 inline constexpr char kNFSConfigurationFile[] = "/etc/nfs.conf";
 
-// What is in force over all files of nfs.conf(5). A value that its reader cannot use counts as absent, as it does for
-// the daemons; a warning that names its file and line is then logged once per version of the file.
+// The values that are in force over all files of nfs.conf(5). A value that its reader cannot use counts as absent, as
+// it does for the daemons; a warning that names its file and line is then logged once per version of the file.
 class NFSConfiguration {
  public:
   // Reads the configuration of the box; with a draft, what it would be with that text.

@@ -10,7 +10,7 @@
 
 namespace vorn {
 
-// What is in force, over all files of nfs.conf(5).
+// The record that is in force, over all files of nfs.conf(5).
 Result<NFSConfRecord> ReadNFSRecord(Box& box);
 
 // Makes the fields of the record that differ from what is in force take effect, by keys in

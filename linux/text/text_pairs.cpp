@@ -12,9 +12,8 @@ TextPairs::TextPairs(std::vector<Pair> pairs) : pairs_(std::move(pairs)), by_key
 }
 
 const TextPairs::Pair* TextPairs::Find(std::string_view key) const {
-  const auto found =
-      std::lower_bound(by_key_.begin(), by_key_.end(), key,
-                       [this](std::uint32_t at, std::string_view k) { return std::string_view(pairs_[at].first) < k; });
+  const auto found = std::lower_bound(by_key_.begin(), by_key_.end(), key,
+                                      [this](std::uint32_t at, std::string_view k) { return pairs_[at].first < k; });
   return found != by_key_.end() && pairs_[*found].first == key ? &pairs_[*found] : nullptr;
 }
 

@@ -28,6 +28,7 @@ class Exchange {
 
   // Decides whether the sender may make this request. Called before the client is told to send a body and before
   // any of it is read. Returns immediately: kGranted, or kPending and then `proceed` is called exactly once.
+  // NOLINTNEXTLINE(performance-unnecessary-value-param): an override keeps `proceed`.
   virtual Authorization Authorize(Proceed /*proceed*/) { return Authorization::kGranted; }
 
   // Takes the next piece of the body. A response refuses the request; the rest of the body is then not read.

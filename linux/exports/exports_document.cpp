@@ -220,16 +220,16 @@ struct ExportsDocument::Content {
   }
 
   const ExportsIndex& Index() const {
-    std::call_once(has_index, [this] { index.emplace(text, lines); });
-    return *index;
+    std::call_once(has_index_, [this] { index_.emplace(text, lines); });
+    return *index_;
   }
 
   const std::string text;
   ExportSpans lines;
 
  private:
-  mutable std::once_flag has_index;
-  mutable std::optional<ExportsIndex> index;
+  mutable std::once_flag has_index_;
+  mutable std::optional<ExportsIndex> index_;
 };
 
 ExportsDocument::ExportsDocument(std::string text) : content_(std::make_shared<const Content>(std::move(text))) {}

@@ -35,7 +35,7 @@ struct UserIds {
   unsigned long largest = 60000;
 };
 
-Result<UserIds> ParseUserIds(StoredFile file) {
+Result<UserIds> ParseUserIds(const StoredFile& file) {
   UserIds ids;
   std::istringstream lines(file.text);
   for (std::string line; std::getline(lines, line);) {

@@ -28,7 +28,7 @@ std::string HostName() {
 
 // Asks the sources of nsswitch.conf(5), name servers among them.
 std::string ResolveCanonicalName() {
-  const std::string name = HostName();
+  std::string name = HostName();
   addrinfo hints{};
   hints.ai_flags = AI_CANONNAME;
   addrinfo* found = nullptr;
@@ -39,7 +39,7 @@ std::string ResolveCanonicalName() {
 
 // The first name of the line of /etc/hosts that has the host's name: the canonical one (hosts(5)).
 std::string CanonicalNameInHostsFile() {
-  const std::string host = HostName();
+  std::string host = HostName();
   const Result<FileText> file = ReadFileOrNothing("/etc/hosts");
   if (!file.ok()) return host;
   std::istringstream lines(file->text);
@@ -72,7 +72,7 @@ struct HostDomain::State {
   std::chrono::seconds refresh_after;
 };
 
-HostDomain::HostDomain(std::string first_name, Resolver resolve, std::chrono::seconds refresh_after)
+HostDomain::HostDomain(const std::string& first_name, Resolver resolve, std::chrono::seconds refresh_after)
     : state_(std::make_shared<State>()) {
   state_->domain = DomainOf(first_name);
   state_->resolve = std::move(resolve);

@@ -18,7 +18,7 @@ class HostDomain {
 
   // `first_name` is the name that is used until the resolver has answered. `refresh_after` is the age at which an
   // answer is asked for again.
-  HostDomain(std::string first_name, Resolver resolve, std::chrono::seconds refresh_after);
+  HostDomain(const std::string& first_name, Resolver resolve, std::chrono::seconds refresh_after);
 
   // The last known domain. Never waits. Starts the background thread if the domain is not fresh; at most one thread
   // runs at a time, and it ends with the answer. The thread may outlive this object.

@@ -73,10 +73,13 @@ std::vector<std::string> MissingPlugins(const Box& box, const IniFiles& files) {
   if (folder.empty()) return sentences;
   for (const char* key : {kMethod, kGSSMethods}) {
     for (const std::string& method : ListOf(files, key)) {
-      const std::string plugin = folder + "/" + method + ".so";
+      std::string plugin = folder;
+      plugin.append("/").append(method).append(".so");
       if (Exists(box, plugin)) continue;
-      sentences.push_back(files.Find(kSection, key)->Where() + ": " + key + " names \"" + method + "\", but " + plugin +
-                          " does not exist; libnfsidmap maps nobody until this is corrected");
+      std::string sentence = files.Find(kSection, key)->Where();
+      sentence.append(": ").append(key).append(" names \"").append(method).append("\", but ").append(plugin);
+      sentence.append(" does not exist; libnfsidmap maps nobody until this is corrected");
+      sentences.push_back(std::move(sentence));
     }
   }
   return sentences;

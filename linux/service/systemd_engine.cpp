@@ -183,7 +183,7 @@ class SystemdEngine : public Engine {
     const std::lock_guard lock(mutex_);
     const bool is_comparable = folders->front()->version.exists;
     if (is_comparable && enabled_ && folders_ == *folders) return *enabled_;
-    const Result<bool> enabled = AskIsEnabled();
+    Result<bool> enabled = AskIsEnabled();
     if (!enabled.ok()) return enabled;
     folders_ = *folders;
     enabled_ = *enabled;

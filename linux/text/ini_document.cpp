@@ -57,7 +57,7 @@ void IniDocument::Append(std::string_view text) {
   }
   if (content.kind == IniLine::Kind::kSection || HasMeaning(content.kind)) line.section = current_;
   line.has_argument = current_has_argument_;
-  lines_.push_back(std::move(line));
+  lines_.push_back(line);
   if (lines_.back().section != kNoSection) Index(std::prev(lines_.end()));
 }
 
@@ -169,7 +169,7 @@ void IniDocument::Replace(Place line, const IniValue& value) {
   Line changed = MakeLine(texts_.emplace_back(std::move(text)), line->section);
   changed.number = line->number;
   changed.earlier = line->earlier;
-  *line = std::move(changed);
+  *line = changed;
   entry.key() = KeyId{line->section, line->content.name};
   deciding_.insert(std::move(entry));
 }

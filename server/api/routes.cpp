@@ -58,7 +58,7 @@ Routes::Routes(const std::vector<Module>& modules) {
 void Routes::Add(const APIRow& row, const Module& module) {
   Route route{row, &module.descriptor, {}};
   route.method = module.descriptor.MethodAt(std::string(kPrefix) + route.Id());
-  const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, std::move(route));
+  const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, route);
   if (!added) syslog(LOG_ERR, "%s: %s is there already", module.path.c_str(), place->second.Name().c_str());
 }
 

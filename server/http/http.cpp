@@ -229,6 +229,7 @@ void HttpServer::Engine::OnAcceptFailed(const Error& error) {
   if (!IsExhaustion(error)) return;
   const std::vector<std::shared_ptr<Session>> sessions(sessions_.begin(), sessions_.end());
   std::vector<ConnectionUse> uses;
+  uses.reserve(sessions.size());
   for (const auto& session : sessions) uses.push_back(session->use());
   const std::size_t chosen = MostExpendable(uses);
   if (chosen == kNoConnection) return;

@@ -24,6 +24,7 @@ class Stream {
   virtual ~Stream() = default;
 
   // The handshake before the first byte of HTTP; a plain stream has none. `done` may be called immediately.
+  // NOLINTNEXTLINE(performance-unnecessary-value-param): a handshake keeps `done`.
   virtual void Begin(Done done) { done({}, 0); }
 
   virtual void ReadSome(boost::asio::mutable_buffer buffer, Done done) = 0;

@@ -183,7 +183,7 @@ class Crowd:
         client = self._clients.get(connection)
         if client is None or not (data or client.unsent):
             return
-        # What is left of a request goes on; a further one waits until it is through.
+        # The rest of a partly sent request is sent first; the next request waits for it.
         client.unsent = client.unsent or data
         try:
             client.unsent = client.unsent[connection.send(client.unsent):]

@@ -1,7 +1,7 @@
 // The settings of the NFS configuration record, and the steps that every API shares which changes them.
 //
 // A step that can fail logs the reason at the given call site (docs/decisions/0002) and returns false.
-// Nothing here has state: all functions are thread-safe on different objects.
+// The functions of this header have no state: they are thread-safe on different objects.
 #ifndef VORN_SRC_SETTINGS_CHANGE_H
 #define VORN_SRC_SETTINGS_CHANGE_H
 

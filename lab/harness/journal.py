@@ -7,7 +7,7 @@ from harness.programs import run
 
 _WARNING = 4  # syslog(3)
 
-# What is a complaint, by the program that says it. Our own programs and the daemons use priorities; exportfs(8) and
+# The log lines that count as complaints, by program. Our own programs and the daemons use priorities; exportfs(8) and
 # nfsdctl write to standard error, which the journal has at priority 6.
 _WARNINGS_OF = {"vornd", "S83nfsd", "S83nfsd.sh", "rpc.mountd", "rpc.statd", "rpc.idmapd", "rpc.svcgssd", "sm-notify",
                 "nfsdcld", "rpcbind"}
@@ -17,7 +17,7 @@ _KERNEL_TROUBLE = re.compile(r"BUG:|Oops|WARNING:|RPC fragment too large|hung ta
 _UNIT_TROUBLE = re.compile(r"^(nfs-|rpc|vorn|auth-rpcgss)\S*\.(service|socket|mount): "
                            r"(Failed|Start request repeated|State '.*' timed out)")
 
-# What a healthy box says, too.
+# Log lines that a healthy box writes as well.
 _NORMAL = re.compile(r"refused (un)?mount request|"  # a client that no rule admits
                      r"exiting on signal 15|Setting log level to|Flags: TI-RPC|"
                      r"Failed to read /var/lib/nfs/state: Success|"  # the first start of all

@@ -65,6 +65,7 @@ class Run:
         self._keep_going = keep_going
         self._stop = threading.Event()
         self._lock = threading.Lock()
+        self._processes = set()  # of the steps that have been started
         self.results = {}
         self.complaint = ""
 
@@ -83,6 +84,7 @@ class Run:
         for thread in threads:
             while thread.is_alive():
                 thread.join(0.5)
+                self._reap_orphans()
                 if time.monotonic() > self._deadline:
                     self.stop(f"the limit of {self._limit_minutes} minutes is exceeded")
         kill_descendants()
@@ -93,6 +95,12 @@ class Run:
 
     def failed(self):
         return [name for name, result in self.results.items() if result.status != 0 and not result.stopped]
+
+    def _reap_orphans(self):
+        """Waits for the adopted orphans that have ended. The steps' own processes are left to their lanes."""
+        with self._lock:
+            while (pid := ended_child()) is not None and pid not in self._processes:
+                os.waitpid(pid, 0)
 
     def _run_lane(self, lane):
         try:
@@ -130,8 +138,11 @@ class Run:
         """Runs the command to its end, or kills it. Returns its exit status."""
         # The other lanes wait for clocks and guests; the compilers of the main lane must not slow them down.
         prefix = ("nice", "-n", "10") if step.lane == "main" else ()
-        process = subprocess.Popen(  # pylint: disable=consider-using-with
-            prefix + step.command, cwd=PROJECT, stdin=subprocess.DEVNULL, stdout=output, stderr=output, start_new_session=True)
+        with self._lock:
+            process = subprocess.Popen(  # pylint: disable=consider-using-with
+                prefix + step.command, cwd=PROJECT, stdin=subprocess.DEVNULL, stdout=output, stderr=output,
+                start_new_session=True)
+            self._processes.add(process.pid)
         told = None  # when the step was told to end
         while True:
             pid, status, usage = os.wait4(process.pid, os.WNOHANG)
@@ -170,6 +181,15 @@ def kill_group(leader, number):
 def adopt_orphans():
     """Makes this process the parent of every orphan of a step, see PR_SET_CHILD_SUBREAPER in prctl(2)."""
     ctypes.CDLL(None).prctl(36, 1, 0, 0, 0)
+
+
+def ended_child():
+    """The process ID of a child that has ended and has not been waited for, or None."""
+    try:
+        ended = os.waitid(os.P_ALL, 0, os.WEXITED | os.WNOHANG | os.WNOWAIT)
+    except ChildProcessError:
+        return None
+    return ended.si_pid if ended else None
 
 
 def kill_descendants():

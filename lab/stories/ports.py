@@ -2,6 +2,7 @@
 
 import errno
 import fcntl
+import pathlib
 import socket
 
 import pytest
@@ -86,3 +87,30 @@ def test_the_firewall_returns_when_the_box_loads_its_own_rules_again(box, client
     run("nft", "-f", firewall.STRICT_RULES)
     assert reaches(client, 32765)
     assert not reaches(client, 32766)
+
+
+def test_the_ports_of_the_two_daemons_are_exchanged_while_nfs_runs(box, client):
+    box.foresees("rpc.statd|rpc-statd")  # the first attempt finds the port in use
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
+    box.advanced(custom_port_enable=True, statd_port=32803, nlm_port=32765)
+    assert box.rpc_ports("status") == {32803}
+    assert box.rpc_ports("nlockmgr") == {32765}
+    assert client.mounts("/srv/data", version="3") and client.mounts("/srv/data")
+
+
+def test_a_start_with_equal_ports_names_them_and_other_ports_mend_it(box, client):
+    box.foresees("rpc.statd|rpc-statd|lockd|nfs-server|nfsd|^vornd: ")
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
+    box.nfs(enable_nfs=False)
+    settings = pathlib.Path("/etc/nfs.conf.d/vorn.conf")
+    settings.write_text(settings.read_text(encoding="utf-8").replace("32803", "32765"), encoding="utf-8")
+    with pytest.raises(api.Refused):
+        box.nfs(enable_nfs=True)
+    assert "statd_port = 32765, nlm_port = 32765" in box.journal.text()
+    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
+    assert box.rpc_ports("nlockmgr") == {32803}
+    assert client.mounts("/srv/data", version="3")

@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "configured_ports.h"
 #include "engines.h"
 #include "share_rules.h"
 
@@ -18,6 +19,7 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr char kUnit[] = "nfs-server.service";
+constexpr char kStatusDaemon[] = "rpc-statd.service";
 constexpr char kDestination[] = "org.freedesktop.systemd1";
 constexpr char kManagerPath[] = "/org/freedesktop/systemd1";
 constexpr char kManager[] = "org.freedesktop.systemd1.Manager";
@@ -253,17 +255,40 @@ class SystemdEngine : public Engine {
     // The unit files may have changed since systemd read them.
     if (Status status = manager.Reload(); !status.ok()) return status;
     // After a few quick restarts systemd refuses further ones until the failure is reset.
-    for (const char* unit : {"nfs-idmapd.service", "nfs-mountd.service", kUnit}) manager.ForgetFailure(unit);
-    if (Status status = RestartStatusDaemon(manager); !status.ok()) return status;
-    if (Status status = manager.RunJob(method, kUnit); !status.ok()) return status;
-    return HasThreads() ? Status() : Failed(kUnit, "it started, but the kernel's server has no threads");
+    for (const char* unit : {"nfs-idmapd.service", "nfs-mountd.service", kStatusDaemon, kUnit}) {
+      manager.ForgetFailure(unit);
+    }
+    if (Status status = RestartStatusDaemon(manager); !status.ok()) return WithPorts(status);
+    if (Status status = manager.RunJob(method, kUnit); !status.ok()) return WithPorts(status);
+    return HasThreads() ? Status() : WithPorts(Failed(kUnit, "it started, but the kernel's server has no threads"));
   }
 
   // Only a restart of rpc.statd(8) applies new ports of the status daemon and the lock manager. A daemon that does
   // not run is started with the service; a box for NFSv4 only may have masked its unit.
+  //
+  // The lock manager keeps its old port until the kernel's server stops. If rpc.statd is to have that port, it fails
+  // to start until then.
   static Status RestartStatusDaemon(Manager& manager) {
-    const Status status = manager.RunJob("TryRestartUnit", "rpc-statd.service");
-    return status.code() == kUnknownService ? Status() : status;
+    const Status status = manager.RunJob("TryRestartUnit", kStatusDaemon);
+    if (status.ok() || status.code() == kUnknownService) return {};
+    if (Status stopped = manager.RunJob("StopUnit", kUnit); !stopped.ok()) return stopped;
+    manager.ForgetFailure(kStatusDaemon);
+    return manager.RunJob("StartUnit", kStatusDaemon);
+  }
+
+  // Adds the ports that the daemons are configured to use, because a port that they cannot have is the most likely
+  // reason of a failed start.
+  Status WithPorts(const Status& failure) {
+    const Result<std::vector<ConfiguredPort>> ports = ReadConfiguredPorts(box_);
+    if (!ports.ok()) return failure;
+    std::string sentence;
+    for (const ConfiguredPort& port : *ports) {
+      const char* setting = port.service == "nfs_statd" ? "statd_port" : port.service == "nfs_nlm" ? "nlm_port" : "";
+      if (*setting != 0)
+        sentence += std::string(sentence.empty() ? "" : ", ") + setting + " = " + std::to_string(port.port);
+    }
+    if (sentence.empty()) return failure;
+    return Status::Failure(failure.code(), failure.reason() + "; check the ports: " + sentence);
   }
 
   // The unit counts as active even while the kernel's server has no threads.

@@ -33,6 +33,7 @@ class SystemdEngine : public testing::Test {
 const std::vector<std::string> kBringUp = {"Reload",
                                            "ResetFailedUnit nfs-idmapd.service",
                                            "ResetFailedUnit nfs-mountd.service",
+                                           "ResetFailedUnit rpc-statd.service",
                                            "ResetFailedUnit nfs-server.service",
                                            "Subscribe",
                                            "TryRestartUnit rpc-statd.service replace"};
@@ -79,6 +80,29 @@ TEST_F(SystemdEngine, StopsAndDisables) {
 TEST_F(SystemdEngine, ForgetsOldFailuresAndMovesTheStatusDaemonBeforeARestart) {
   EXPECT_TRUE(Engine()->Restart().ok());
   EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"RestartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, StopsTheServerWhereItsLockManagerHasThePortOfTheStatusDaemon) {
+  manager_.End("TryRestartUnit rpc-statd.service", "failed");
+  const Status status = Engine()->Restart();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(manager_.TakeCalls(),
+              ElementsAreArray(
+                  Joined(kBringUp, {"StopUnit nfs-server.service replace", "ResetFailedUnit rpc-statd.service",
+                                    "StartUnit rpc-statd.service replace", "RestartUnit nfs-server.service replace"})));
+}
+
+TEST_F(SystemdEngine, NamesThePortsThatMayKeepTheServiceFromStarting) {
+  folder_.Write("/etc/nfs.conf",
+                "[vorn]\ncustom-ports = y\n[statd]\nport = 4001\n[lockd]\nport = 4002\nudp-port = 4002\n");
+  manager_.End("TryRestartUnit rpc-statd.service", "failed");
+  manager_.End("StartUnit rpc-statd.service", "failed");
+  EXPECT_THAT(Engine()->Restart().reason(),
+              HasSubstr("StartUnit rpc-statd.service: the job ended as failed; check the ports: statd_port = 4001, "
+                        "nlm_port = 4002"));
+  manager_.End("StartUnit rpc-statd.service", "done");
+  SetThreads("0\n");
+  EXPECT_THAT(Engine()->Restart().reason(), HasSubstr("no threads; check the ports: statd_port = 4001"));
 }
 
 TEST_F(SystemdEngine, NeedsNoStatusDaemon) {
@@ -139,8 +163,8 @@ TEST_F(SystemdEngine, DoesNotWaitForEverForAJob) {
 }
 
 TEST_F(SystemdEngine, StopsWhereACallIsRefused) {
-  for (const char* call : {"EnableUnitFiles nfs-server.service", "StartUnit nfs-server.service",
-                           "TryRestartUnit rpc-statd.service", "Reload", "Subscribe"}) {
+  for (const char* call :
+       {"EnableUnitFiles nfs-server.service", "StartUnit nfs-server.service", "Reload", "Subscribe"}) {
     StandInManager manager;
     manager.Refuse(call);
     vorn::SystemdOptions options;

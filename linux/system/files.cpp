@@ -36,17 +36,22 @@ FileStamp StampOf(const struct stat& file) {
   return {true, file.st_dev, file.st_ino, file.st_size, Nanoseconds(file.st_mtim), Nanoseconds(file.st_ctim)};
 }
 
-Result<std::string> ReadAll(int file, const std::string& path) {
-  std::string text;
-  char buffer[64 * 1024];
+// Reads a file to its end. `size` is the size to expect.
+Result<std::string> ReadAll(int file, std::size_t size, const std::string& path) {
+  constexpr std::size_t kFurther = 64 * 1024;
+  std::string text(std::min(size, kLargestFile) + 1, '\0');  // one byte more, to see the end
+  std::size_t filled = 0;
   for (;;) {
-    const ssize_t size = read(file, buffer, sizeof buffer);
-    if (size == 0) return text;
-    if (size < 0 && errno == EINTR) continue;
-    if (size < 0) return Status::System(errno, path);
-    text.append(buffer, static_cast<std::size_t>(size));
-    if (text.size() > kLargestFile) return Status::System(EFBIG, path);
+    const ssize_t got = read(file, text.data() + filled, text.size() - filled);
+    if (got < 0 && errno == EINTR) continue;
+    if (got < 0) return Status::System(errno, path);
+    filled += static_cast<std::size_t>(got);
+    if (filled > kLargestFile) return Status::System(EFBIG, path);
+    if (got == 0) break;
+    if (filled == text.size()) text.resize(filled + kFurther);
   }
+  text.resize(filled);
+  return text;
 }
 
 Status SyncFolder(const fs::path& folder) {
@@ -204,7 +209,7 @@ Result<FileText> ReadFile(const std::string& path) {
   if (!S_ISREG(stat.st_mode)) return Status::Failure(EINVAL, path + " is no regular file");
   constexpr int kMostReads = 10;
   for (int reads = 1;; ++reads) {
-    Result<std::string> text = ReadAll(file.get(), path);
+    Result<std::string> text = ReadAll(file.get(), static_cast<std::size_t>(stat.st_size), path);
     if (!text.ok()) return text.status();
     // A file that is written in place while it is read can give parts of two contents.
     const FileStamp before = StampOf(stat);

@@ -18,45 +18,43 @@ Result<std::shared_ptr<const StoredFolder>> Box::List(const std::string& folder)
   const Result<Version> version = store_->VersionOf(folder);
   if (!version.ok()) return version.status();
   const Key key{typeid(StoredFolder), folder};
-  Document document = Find(key, *version);
-  if (document == nullptr) {
-    Result<StoredFolder> listed = store_->List(folder);
-    if (!listed.ok()) return listed.status();
-    const bool is_settled = listed->is_settled;
-    const Version listed_version = listed->version;
-    document = std::make_shared<const StoredFolder>(std::move(*listed));
-    if (is_settled) Keep(key, listed_version, document);
-  }
-  return std::static_pointer_cast<const StoredFolder>(document);
+  const Cached known = Find(key);
+  if (known.IsOf(*version)) return std::static_pointer_cast<const StoredFolder>(known.document);
+  Result<StoredFolder> listed = store_->List(folder);
+  if (!listed.ok()) return listed.status();
+  auto document = std::make_shared<const StoredFolder>(std::move(*listed));
+  Keep(key, {document->version, document->is_settled, document});
+  return document;
 }
 
 Result<Box::Document> Box::LoadAny(std::type_index type, const std::string& path,
-                                   const std::function<Result<Document>(StoredFile file)>& parse) {
+                                   const std::function<Result<Document>(StoredFile, const void*)>& parse) {
   const Result<Version> version = store_->VersionOf(path);
   if (!version.ok()) return version.status();
   const Key key{type, path};
-  if (Document document = Find(key, *version)) {
+  const Cached known = Find(key);
+  if (known.IsOf(*version)) {
     FirstReads::Note(*this, path, *version);
-    return document;
+    return known.document;
   }
   Result<StoredFile> file = Read(path);
   if (!file.ok()) return file.status();
   const Version read = file->version;
   const bool is_settled = file->is_settled;
-  Result<Document> document = parse(std::move(*file));
-  if (document.ok() && is_settled) Keep(key, read, *document);
+  Result<Document> document = parse(std::move(*file), known.document.get());
+  if (document.ok()) Keep(key, {read, is_settled, *document});
   return document;
 }
 
-Box::Document Box::Find(const Key& key, const Version& version) {
+Box::Cached Box::Find(const Key& key) {
   const std::lock_guard lock(mutex_);
   const auto found = documents_.find(key);
-  return found != documents_.end() && found->second.version == version ? found->second.document : nullptr;
+  return found != documents_.end() ? found->second : Cached{};
 }
 
-void Box::Keep(const Key& key, const Version& version, Document document) {
+void Box::Keep(const Key& key, Cached document) {
   const std::lock_guard lock(mutex_);
-  documents_[key] = {version, std::move(document)};
+  documents_[key] = std::move(document);
 }
 
 Box::Document Box::FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources) {

@@ -46,8 +46,16 @@ class Box {
   template <typename T>
   Result<std::shared_ptr<const T>> Load(const std::string& path,
                                         const std::function<Result<T>(StoredFile file)>& parse) {
-    const auto parse_any = [&](StoredFile file) -> Result<std::shared_ptr<const void>> {
-      Result<T> document = parse(std::move(file));
+    return LoadAfter<T>(path, [&parse](StoredFile file, const T* /*previous*/) { return parse(std::move(file)); });
+  }
+
+  // Like Load, for a document that is made faster with another version of it at hand. `previous` is the document
+  // that was made last, or nullptr.
+  template <typename T>
+  Result<std::shared_ptr<const T>> LoadAfter(
+      const std::string& path, const std::function<Result<T>(StoredFile file, const T* previous)>& parse) {
+    const auto parse_any = [&](StoredFile file, const void* previous) -> Result<std::shared_ptr<const void>> {
+      Result<T> document = parse(std::move(file), static_cast<const T*>(previous));
       if (!document.ok()) return document.status();
       return std::shared_ptr<const void>(std::make_shared<const T>(std::move(*document)));
     };
@@ -82,7 +90,10 @@ class Box {
   using Document = std::shared_ptr<const void>;
   struct Cached {
     Version version;
+    bool is_settled = false;  // whether any later change of the file gives another version
     Document document;
+
+    bool IsOf(const Version& current) const { return is_settled && document != nullptr && version == current; }
   };
   struct Derived {
     std::vector<std::shared_ptr<const void>> sources;
@@ -91,9 +102,9 @@ class Box {
   using Key = std::pair<std::type_index, std::string>;  // the document's type, the path
 
   Result<Document> LoadAny(std::type_index type, const std::string& path,
-                           const std::function<Result<Document>(StoredFile file)>& parse);
-  Document Find(const Key& key, const Version& version);
-  void Keep(const Key& key, const Version& version, Document document);
+                           const std::function<Result<Document>(StoredFile file, const void* previous)>& parse);
+  Cached Find(const Key& key);
+  void Keep(const Key& key, Cached document);
   Document FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources);
   void KeepDerived(const Key& key, Derived derived);
 

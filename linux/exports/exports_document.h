@@ -6,55 +6,22 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "export_paths.h"
-#include "exports_index.h"
-#include "exports_options.h"
+#include "exports_line.h"
 #include "status.h"
 
 namespace vorn {
-
-// One client of one path.
-struct ExportEntry {
-  std::string client;  // "*" also where the line names no client: it is exported to everybody
-  ExportOptions options;
-  // The entry's text in the file, if that alone tells its options; it is written back unchanged. Otherwise
-  // empty, and the entry is written from `client` and `options`.
-  std::string word;
-};
-
-// Whether both are the same client with the same options. The spelling in the file does not matter.
-bool operator==(const ExportEntry& a, const ExportEntry& b);
-
-// A part of a line that is not understood.
-struct ExportFault {
-  std::size_t position = 0;  // in the text of the file
-  std::string reason;
-  // Whether exportfs(8) stops here: it exports the entries before the fault, and nothing after it in the file.
-  // Otherwise it reads on, but the line hardly means what its author intended.
-  bool ends_file = false;
-};
-
-// The meaning of one line.
-struct ExportLine {
-  ExportSpan span;
-  std::size_t path_end = 0;  // the end of its first word
-  std::string path;          // in normal form
-  std::vector<ExportEntry> entries;
-  std::string comment;  // with its "#", or empty
-  std::optional<ExportFault> fault;
-};
-
-// The entries of several lines in order. If two have clients that are one client to exportfs(8), only the first
-// is returned, as exportfs ignores the second.
-std::vector<ExportEntry> EntriesOf(const std::vector<ExportLine>& lines);
 
 // One text of a file. Immutable: copies share it, and any number of threads may use it.
 class ExportsDocument {
  public:
   explicit ExportsDocument(std::string text);
+
+  // Reads another version of the text of `previous`. That is faster than reading the text alone if they have most
+  // lines in common.
+  ExportsDocument(std::string text, const ExportsDocument& previous);
 
   const std::string& text() const;
 
@@ -78,9 +45,8 @@ class ExportsDocument {
   std::string Place(std::size_t position) const;
 
  private:
-  struct Content;
+  class Content;
 
-  ExportSpans SpansOf(const std::string& path, const ExportPaths& paths) const;
   std::vector<ExportLine> Read(const ExportSpans& spans) const;
   Result<std::string> Rendered(const ExportSpans& own, const std::string& path,
                                const std::vector<ExportEntry>& entries) const;

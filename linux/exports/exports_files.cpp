@@ -23,8 +23,10 @@ bool IsRegularFile(Box& box, const std::string& path) {
 }  // namespace
 
 Result<SharedExportsFile> OpenExportsFile(Box& box, const std::string& path) {
-  return box.Load<ExportsFile>(path, [&path](StoredFile file) -> Result<ExportsFile> {
-    return ExportsFile{path, std::move(file.location), file.version, ExportsDocument(std::move(file.text))};
+  return box.LoadAfter<ExportsFile>(path, [&path](StoredFile file, const ExportsFile* previous) -> Result<ExportsFile> {
+    ExportsDocument document = previous == nullptr ? ExportsDocument(std::move(file.text))
+                                                   : ExportsDocument(std::move(file.text), previous->document);
+    return ExportsFile{path, std::move(file.location), file.version, std::move(document)};
   });
 }
 

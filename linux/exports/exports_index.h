@@ -9,40 +9,32 @@
 #include <vector>
 
 #include "export_paths.h"
+#include "exports_lines.h"
 
 namespace vorn {
 
-// Where a line is, with its continuations and its line break.
-struct ExportSpan {
-  std::size_t begin = 0;
-  std::size_t path = 0;  // where its path begins, after blanks
-  std::size_t end = 0;
-};
-
-using ExportSpans = std::vector<ExportSpan>;
-
 // Finding the lines of one directory takes time in proportion to the number of different parent folders, not of
-// lines. Immutable. Refers to the text and the lines that it was made of.
+// lines. Immutable.
 class ExportsIndex {
  public:
-  ExportsIndex(std::string_view text, const ExportSpans& lines);
+  explicit ExportsIndex(const ExportsLines& lines);
 
-  // Returns the numbers, from 0 and in order, of the lines whose path leads to the directory `path`.
-  std::vector<std::size_t> Find(const std::string& path, const ExportPaths& paths) const;
+  // Returns the numbers, from 0 and in order, of the lines whose path leads to the directory `path`. `lines` are those
+  // that the index was made of, or lines that have the same paths (HaveSamePaths).
+  std::vector<std::size_t> Find(const ExportsLines& lines, const std::string& path, const ExportPaths& paths) const;
 
  private:
-  void Append(std::string_view path, std::vector<std::size_t>* found) const;
-  void AppendLinked(std::string_view folder, const std::string& target, const ExportPaths& paths,
-                    std::vector<std::size_t>* found) const;
-  std::size_t Slot(std::string_view path) const;
-  std::string_view PlainPath(std::size_t line) const;
+  class Search;
 
-  std::string_view text_;
-  const ExportSpans* lines_;
-  std::vector<std::uint32_t> slots_;       // a hash table of the plain paths: line + 1, or 0
-  std::vector<std::string_view> folders_;  // the parent folders of the plain paths, each once
-  std::vector<std::uint32_t> unusual_;     // lines whose path must be decoded or normalised before it is compared
+  std::size_t Slot(std::string_view path) const;
+
+  std::vector<std::uint32_t> slots_;    // a hash table of the plain paths: line + 1, or 0
+  std::vector<std::string> folders_;    // the parent folders of the plain paths, each once
+  std::vector<std::uint32_t> unusual_;  // lines whose path must be decoded or normalised before it is compared
 };
+
+// Whether the lines of `now`, which were read after `old`, have the paths of `old`, as they are written.
+bool HaveSamePaths(const ExportsLines& now, const ExportsLines& old);
 
 }  // namespace vorn
 

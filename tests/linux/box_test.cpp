@@ -75,6 +75,21 @@ TEST(Box, NeverKeepsAFileThatMayChangeWithoutANewVersion) {
   }
 }
 
+TEST(Box, HandsTheLastDocumentToTheParserOfTheNext) {
+  const TemporaryRoot root;
+  Box& box = CurrentBox();
+  const auto load = [&box] {
+    const auto parse = [](StoredFile file, const std::string* previous) -> Result<std::string> {
+      return (previous == nullptr ? "nothing" : *previous) + ", " + file.text;
+    };
+    return **box.LoadAfter<std::string>(kFile, parse);
+  };
+  root.Write(kFile, "one");
+  EXPECT_EQ(load(), "nothing, one");
+  root.Write(kFile, "other");
+  EXPECT_EQ(load(), "nothing, one, other");
+}
+
 TEST(Box, RefusesAWriteIfTheFileChangedSinceTheContextReadIt) {
   const TemporaryRoot root;
   root.Write(kFile, "one");

@@ -326,6 +326,28 @@ TEST(ExportsDocument, ReplacesTheLinesOfAPathByOne) {
   }
 }
 
+TEST(ExportsDocument, FindsTheSameEntriesAfterEditsAsWithoutThem) {
+  const char* const paths[] = {"/a", "/b", "/c", "/b c", "/d"};
+  std::mt19937 random(3);
+  const auto below = [&](std::size_t limit) { return random() % limit; };
+  for (int file = 0; file < 50; ++file) {
+    ExportsDocument edited("/a h1(ro)\n/b h2 # note\n\n/c h3");
+    for (int edit = 0; edit < 20; ++edit) {
+      std::vector<ExportEntry> entries;
+      for (std::size_t client = below(3); client > 0; --client) {
+        entries.push_back(Entry("h" + std::to_string(client), below(2) == 0 ? "rw" : "ro"));
+      }
+      const Result<std::string> text = edited.Replace(paths[below(5)], entries, ExportPaths());
+      ASSERT_TRUE(text.ok()) << text.status().reason();
+      edited = ExportsDocument(*text, edited);
+      const ExportsDocument alone(*text);
+      for (const char* path : paths) {
+        ASSERT_EQ(edited.Entries(path, ExportPaths()), alone.Entries(path, ExportPaths())) << path << " in " << *text;
+      }
+    }
+  }
+}
+
 TEST(ExportsDocument, KeepsTheWordsOfEntriesThatStay) {
   const ExportsDocument document("/a \"b\"(rw,async) -no_wdelay c\n");
   const auto text = document.Replace("/a", document.Entries("/a", ExportPaths()), ExportPaths());

@@ -1,0 +1,133 @@
+#include "exports_lines.h"
+
+#include <algorithm>
+#include <cstring>
+#include <utility>
+
+#include "exports_text.h"
+
+namespace vorn {
+namespace {
+
+bool IsPlain(std::string_view text) {
+  return text.find('"') == std::string_view::npos && text.find('\\') == std::string_view::npos;
+}
+
+// Finds one line after the other. Nearly all lines have no quotation mark and no backslash; those end at the
+// next line break and need not be read for that.
+class LineFinder {
+ public:
+  explicit LineFinder(std::string_view text) : text_(text) {}
+
+  // Returns the next line that begins at or after `position`, which must not decrease from call to call. After the
+  // last line it returns an empty span at the end of the text.
+  ExportSpan Next(std::size_t position) {
+    ExportsReader reader(text_, position);
+    ExportSpan span{position, position, position};
+    if (position == text_.size() || text_[position] != '/') span.begin = reader.SkipToPath();
+    span.path = reader.position();
+    const std::size_t newline = text_.find('\n', span.path);
+    span.end = newline == std::string_view::npos ? text_.size() : newline + 1;
+    const bool simple =
+        Following('"', span.path, &quotation_) >= span.end && Following('\\', span.path, &backslash_) >= span.end;
+    return simple ? span : ReadExportLine(text_, span).span;
+  }
+
+ private:
+  // Returns where `c` is next at or after `position`. `last` keeps the result of the last search, so that the whole
+  // text is searched only once.
+  std::size_t Following(char c, std::size_t position, std::size_t* last) const {
+    if (*last < position || position == 0) *last = std::min(text_.find(c, position), text_.size());
+    return *last;
+  }
+
+  std::string_view text_;
+  std::size_t quotation_ = 0;
+  std::size_t backslash_ = 0;
+};
+
+// Large blocks are compared by memcmp(3), which is several times faster than a loop over bytes.
+constexpr std::size_t kBlock = 4096;
+
+std::size_t CommonPrefix(std::string_view a, std::string_view b) {
+  const std::size_t size = std::min(a.size(), b.size());
+  std::size_t same = 0;
+  while (size - same >= kBlock && std::memcmp(a.data() + same, b.data() + same, kBlock) == 0) same += kBlock;
+  while (same < size && a[same] == b[same]) ++same;
+  return same;
+}
+
+std::size_t CommonSuffix(std::string_view a, std::string_view b) {
+  const std::size_t size = std::min(a.size(), b.size());
+  const char* const a_end = a.data() + a.size();
+  const char* const b_end = b.data() + b.size();
+  std::size_t same = 0;
+  while (size - same >= kBlock && std::memcmp(a_end - same - kBlock, b_end - same - kBlock, kBlock) == 0)
+    same += kBlock;
+  while (same < size && *(a_end - same - 1) == *(b_end - same - 1)) ++same;
+  return same;
+}
+
+bool BeginsLine(std::string_view text, std::size_t position) { return position == 0 || text[position - 1] == '\n'; }
+
+// The sizes of the parts at the beginning and at the end that two texts have in common, in whole lines.
+struct Common {
+  std::size_t head;
+  std::size_t tail;
+};
+
+Common CommonLines(std::string_view a, std::string_view b) {
+  const std::size_t prefix = CommonPrefix(a, b);
+  const std::size_t head = a.substr(0, prefix).rfind('\n') + 1;  // npos + 1 is 0
+  std::size_t tail = CommonSuffix(a.substr(head), b.substr(head));
+  if (!BeginsLine(a, a.size() - tail) || !BeginsLine(b, b.size() - tail)) {
+    const std::size_t newline = a.find('\n', a.size() - tail);
+    tail = newline == std::string_view::npos ? 0 : a.size() - newline - 1;
+  }
+  return {head, tail};
+}
+
+}  // namespace
+
+ExportsLines::ExportsLines(std::string text) : text_(std::move(text)) { FindAll(); }
+
+ExportsLines::ExportsLines(std::string text, const ExportsLines& previous) : text_(std::move(text)) {
+  if (!previous.is_plain_ || !FindChanged(previous)) FindAll();
+}
+
+void ExportsLines::FindAll() {
+  is_plain_ = IsPlain(text_);
+  spans_.reserve(text_.size() / 64 + 1);
+  LineFinder finder(text_);
+  for (ExportSpan line = finder.Next(0); line.path < text_.size(); line = finder.Next(line.end)) spans_.push_back(line);
+}
+
+// Finds the lines between those that `previous` has as well. Returns false if one of them may continue in another
+// line, and if `previous` has such lines.
+bool ExportsLines::FindChanged(const ExportsLines& previous) {
+  const Common common = CommonLines(previous.text_, text_);
+  const std::size_t tail_begin = text_.size() - common.tail;
+  const auto up_to_tail = std::string_view(text_).substr(0, tail_begin);
+  if (!IsPlain(up_to_tail.substr(common.head))) return false;
+  is_plain_ = true;
+
+  const auto begins_before = [](const ExportSpan& line, std::size_t position) { return line.begin < position; };
+  const ExportSpans& old = previous.spans_;
+  const auto head_end = std::lower_bound(old.begin(), old.end(), common.head, begins_before);
+  const auto tail = std::lower_bound(old.begin(), old.end(), previous.text_.size() - common.tail, begins_before);
+  spans_.reserve(old.size() + 16);
+  spans_.assign(old.begin(), head_end);
+  LineFinder finder(up_to_tail);
+  for (ExportSpan line = finder.Next(common.head); line.path < tail_begin; line = finder.Next(line.end)) {
+    spans_.push_back(line);
+  }
+  const std::size_t shift = text_.size() - previous.text_.size();  // modulo 2^64 if the text is shorter
+  for (auto line = tail; line != old.end(); ++line) {
+    spans_.push_back({line->begin + shift, line->path + shift, line->end + shift});
+  }
+  shared_head_ = static_cast<std::size_t>(head_end - old.begin());
+  shared_tail_ = static_cast<std::size_t>(old.end() - tail);
+  return true;
+}
+
+}  // namespace vorn

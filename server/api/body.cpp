@@ -21,6 +21,7 @@ Response NotJson(int status, const std::string& error) {
 
 std::optional<Response> Body::Receive(std::string_view piece) {
   if (piece.size() > most_bytes_ - text_.size()) return too_large_();
+  if (auto refusal = Check(piece)) return refusal;
   text_ += piece;
   return std::nullopt;
 }

@@ -23,8 +23,10 @@ class Body {
  public:
   virtual ~Body() = default;
 
-  // Appends the next piece. A response refuses the request.
+  // Checks and appends the next piece. A response refuses the request.
   std::optional<Response> Receive(std::string_view piece);
+
+  std::size_t size() const { return text_.size(); }  // bytes received
 
   // Returns the parameter object, or a response that refuses the request. Called once, after the last piece.
   virtual std::variant<Json::Value, Response> TakeParameters() = 0;
@@ -38,6 +40,9 @@ class Body {
   std::string_view text() const { return text_; }
 
  private:
+  // Checks the next piece, as far as that takes little time: the network thread waits for it.
+  virtual std::optional<Response> Check(std::string_view /*piece*/) { return std::nullopt; }
+
   const std::size_t most_bytes_;
   Response (*const too_large_)();
   std::string text_;

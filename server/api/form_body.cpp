@@ -13,27 +13,24 @@
 namespace vorn::server {
 namespace {
 
+// The parser copies each piece.
 constexpr std::size_t kPieceBytes = std::size_t{64} * 1024;
-constexpr std::size_t kMaxTextBytes = std::size_t{64} * 1024;  // of one part
-
-std::string Quoted(const std::string& name) { return "\"" + name + "\""; }
 
 }  // namespace
 
 Response FormBody::TooLarge() { return Refusal(413, "The form is larger than a file of 1 MiB and its envelope."); }
 
 FormBody::FormBody(std::string boundary, const UploadFolder& uploads)
-    : Body(kMaxBytes, TooLarge), boundary_(std::move(boundary)), uploads_(uploads) {}
+    : Body(kMaxBytes, TooLarge), boundary_(std::move(boundary)), uploads_(uploads), check_(boundary_) {}
+
+std::optional<Response> FormBody::Check(std::string_view piece) { return check_.Feed(piece); }
 
 std::variant<Json::Value, Response> FormBody::TakeParameters() {
+  if (!check_.complete()) return Refusal(400, "The form ends before its closing boundary.");
   MultipartParser parser(boundary_, *this);
-  // In pieces, because the parser copies each one.
   for (std::string_view rest = text(); !rest.empty(); rest.remove_prefix(std::min(rest.size(), kPieceBytes))) {
-    if (parser.Feed(rest.substr(0, kPieceBytes))) continue;
-    if (refusal_) return *std::move(refusal_);
-    return Refusal(400, "The form is malformed: " + parser.error() + ".");
+    if (!parser.Feed(rest.substr(0, kPieceBytes))) return *std::move(refusal_);
   }
-  if (!parser.complete()) return Refusal(400, "The form ends before its closing boundary.");
   return std::move(parameters_);
 }
 
@@ -45,30 +42,16 @@ std::vector<std::string> FormBody::Uploads() const {
 
 bool FormBody::BeginPart(const PartHead& head) {
   part_ = head;
-  part_bytes_ = 0;
   part_text_.clear();
-  if (++parts_ > kMaxParts) return Refuse(Refusal(413, "The form has more than 8 parts."));
-  if (!IsPlainUtf8(head.name)) return Refuse(Refusal(400, "The name of a part is not UTF-8."));
-  if (IsReservedName(head.name)) return Refuse(ReservedName(head.name));
-  const std::string parameter = head.is_file ? head.name + std::string(kUploadSuffix) : head.name;
-  if (parameters_.isMember(parameter)) return Refuse(Refusal(400, "The part " + Quoted(head.name) + " comes twice."));
-  return !head.is_file || BeginFile(parameter);
-}
-
-bool FormBody::BeginFile(const std::string& parameter) {
+  if (!head.is_file) return true;
   std::optional<Upload> file = uploads_.Create();
   if (!file) return CannotStore();
-  parameters_[parameter] = file->path();
+  parameters_[ParameterOf(head)] = file->path();
   files_.push_back(std::move(*file));
   return true;
 }
 
 bool FormBody::PartData(std::string_view data) {
-  part_bytes_ += data.size();
-  if (part_bytes_ > (part_.is_file ? kMaxFileBytes : kMaxTextBytes)) {
-    return Refuse(
-        Refusal(413, "The part " + Quoted(part_.name) + " is larger than " + (part_.is_file ? "1 MiB." : "64 KiB.")));
-  }
   if (part_.is_file) return files_.back().Append(data) || CannotStore();
   part_text_ += data;
   return true;
@@ -76,7 +59,7 @@ bool FormBody::PartData(std::string_view data) {
 
 bool FormBody::EndPart() {
   if (part_.is_file) return files_.back().Close() || CannotStore();
-  if (!IsPlainUtf8(part_text_)) return Refuse(Refusal(400, "The part " + Quoted(part_.name) + " is not UTF-8 text."));
+  if (!IsPlainUtf8(part_text_)) return Refuse(Refusal(400, "The part \"" + part_.name + "\" is not UTF-8 text."));
   parameters_[part_.name] = part_text_;
   return true;
 }

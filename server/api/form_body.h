@@ -13,19 +13,19 @@
 #include <vector>
 
 #include "body.h"
+#include "form_check.h"
 #include "multipart.h"
 #include "upload.h"
 
 namespace vorn::server {
 
 // multipart/form-data. A part that is text is a parameter. A part that is a file is stored in a file of its own; the
-// parameter NAME_tmp is the path of that file.
+// parameter NAME_tmp is the path of that file. The form is checked while it is received; files are made by
+// TakeParameters().
 class FormBody : public Body, private PartReceiver {
  public:
-  static constexpr std::size_t kMaxParts = 8;
-  static constexpr std::size_t kMaxFileBytes = std::size_t{1024} * 1024;
   // A file of the largest size, other parts, and the boundaries and heads around them.
-  static constexpr std::size_t kMaxBytes = kMaxFileBytes + std::size_t{64} * 1024;
+  static constexpr std::size_t kMaxBytes = FormCheck::kMaxFileBytes + std::size_t{64} * 1024;
   static Response TooLarge();
 
   // The folder must outlive this.
@@ -38,15 +38,14 @@ class FormBody : public Body, private PartReceiver {
   bool BeginPart(const PartHead& head) override;
   bool PartData(std::string_view data) override;
   bool EndPart() override;
-  bool BeginFile(const std::string& parameter);
+  std::optional<Response> Check(std::string_view piece) override;
   bool Refuse(Response response);
   bool CannotStore();
 
   const std::string boundary_;
   const UploadFolder& uploads_;
+  FormCheck check_;
   PartHead part_;
-  std::size_t parts_ = 0;
-  std::size_t part_bytes_ = 0;
   std::string part_text_;    // of a part that is not a file
   std::list<Upload> files_;  // while a file part is read, the last one is its file
   Json::Value parameters_{Json::objectValue};

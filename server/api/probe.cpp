@@ -25,7 +25,7 @@ Response Unready(const char* text) noexcept {
 void Probe::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
-    if (pool_.Submit(&kLane, shared_from_this(), time_)) return;
+    if (pool_.Submit({&kLane, JobSize::kSmall}, shared_from_this(), time_)) return;
   } catch (const std::bad_alloc&) {
   }
   Refuse();

@@ -28,16 +28,17 @@ WorkerPool::~WorkerPool() {
   watch_.join();
 }
 
-bool WorkerPool::Submit(const void* lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
+bool WorkerPool::Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
   const auto now = Clock::now();
   Entries one;
   one.push_back({nullptr, std::move(job), now + time, {}});
   const std::lock_guard<std::mutex> lock(mutex_);
   Lane& its_lane = lanes_[lane];
-  if (closed_ || its_lane.queued >= limits_.lane_queue) return false;
-  ++its_lane.queued;
+  if (closed_ || its_lane.queue.size() >= limits_.lane_queue) return false;
+  its_lane.size = lane.second;
   one.front().lane = &its_lane;
-  queue_.splice(queue_.end(), one);
+  its_lane.queue.splice(its_lane.queue.end(), one);
+  ++queued_;
   if (MayTake()) {
     EngageThread();
     WatchNoLaterThan(now + time);
@@ -52,8 +53,8 @@ void WorkerPool::Close() {
   {
     const std::lock_guard<std::mutex> lock(mutex_);
     closed_ = true;
-    for (const Entry& entry : queue_) --entry.lane->queued;
-    refused.swap(queue_);
+    for (auto& [id, lane] : lanes_) refused.splice(refused.end(), lane.queue);
+    queued_ = 0;
   }
   for (const Entry& entry : refused) entry.job->Refuse();
 }
@@ -70,37 +71,51 @@ void WorkerPool::EngageThread() {
   }
 }
 
-WorkerPool::Entries::iterator WorkerPool::FirstRunnable() {
-  if (!MayTake()) return queue_.end();
-  return std::find_if(queue_.begin(), queue_.end(),
-                      [this](const Entry& entry) { return entry.lane->running < limits_.lane_threads; });
+bool WorkerPool::MayTakeFrom(const Lane& lane) const {
+  const std::size_t share = lane.size == JobSize::kLarge ? limits_.large_threads : limits_.lane_threads;
+  return !lane.queue.empty() && lane.running < share;
+}
+
+// Returns the lane whose last turn is the longest ago, of those whose next job may begin; nullptr if there is none.
+WorkerPool::Lane* WorkerPool::NextLane() {
+  if (queued_ == 0 || !MayTake()) return nullptr;
+  Lane* next = nullptr;
+  for (auto& [id, lane] : lanes_) {
+    if (MayTakeFrom(lane) && (next == nullptr || lane.turn < next->turn)) next = &lane;
+  }
+  return next;
 }
 
 void WorkerPool::Work() {
   pthread_setname_np(pthread_self(), "worker");
   std::unique_lock<std::mutex> lock(mutex_);
   while (!ending_) {
-    const auto entry = FirstRunnable();
-    if (entry == queue_.end()) {
+    Lane* const lane = NextLane();
+    if (lane == nullptr) {
       ++idle_;
       wake_.wait(lock);
       --idle_;
       continue;
     }
-    Begin(entry);
-    RunUnlocked(entry, &lock);
+    RunUnlocked(Begin(lane), &lock);
   }
 }
 
-// Moves the entry to those that run. The next job may have been submitted to this thread, too: another one takes it.
-void WorkerPool::Begin(Entries::iterator entry) {
+// Moves the first job of the lane to those that run. The next job may have been submitted to this thread, too: another
+// one takes it.
+WorkerPool::Entries::iterator WorkerPool::Begin(Lane* lane) {
+  const auto entry = lane->queue.begin();
   entry->begun = Clock::now();
-  --entry->lane->queued;
-  ++entry->lane->running;
-  running_.splice(running_.end(), queue_, entry);
-  if (queue_.empty()) return;
-  if (FirstRunnable() != queue_.end()) EngageThread();
-  WatchNoLaterThan(entry->begun + limits_.long_after);
+  entry->is_long = lane->size == JobSize::kLarge;
+  if (entry->is_long) ++long_jobs_;
+  ++lane->running;
+  lane->turn = ++turn_;
+  running_.splice(running_.end(), lane->queue, entry);
+  if (--queued_ > 0) {
+    if (NextLane() != nullptr) EngageThread();
+    WatchNoLaterThan(entry->begun + limits_.long_after);
+  }
+  return entry;
 }
 
 void WorkerPool::RunUnlocked(Entries::iterator entry, std::unique_lock<std::mutex>* lock) {
@@ -131,14 +146,21 @@ void WorkerPool::Watch() {
     if (watch_wake_.wait_until(lock, time) != std::cv_status::timeout) continue;
     const auto now = Clock::now();
     MarkLongJobs(now);
-    bool running = false;
-    while (std::shared_ptr<Job> job = TakeOverdue(now, &running)) {
-      lock.unlock();
-      job->Expire(running);
-      job.reset();
-      lock.lock();
-    }
+    ExpireUnlocked(now, &lock);
     next_watch_ = NextWatch();
+  }
+}
+
+void WorkerPool::ExpireUnlocked(Clock::time_point now, std::unique_lock<std::mutex>* lock) {
+  for (;;) {
+    std::shared_ptr<Job> job = TakeOverdue(now);
+    const bool running = job == nullptr;
+    if (running) job = MarkOverdue(now);
+    if (job == nullptr) return;
+    lock->unlock();
+    job->Expire(running);
+    job.reset();
+    lock->lock();
   }
 }
 
@@ -147,34 +169,43 @@ void WorkerPool::MarkLongJobs(Clock::time_point now) {
     if (entry.is_long || now < entry.begun + limits_.long_after) continue;
     entry.is_long = true;
     ++long_jobs_;
-    if (FirstRunnable() != queue_.end()) EngageThread();
+    if (NextLane() != nullptr) EngageThread();
   }
 }
 
-// Returns one job whose deadline has passed, or nullptr. A job that waits is removed from the queue.
-std::shared_ptr<Job> WorkerPool::TakeOverdue(Clock::time_point now, bool* running) {
-  const auto overdue = [now](const Entry& entry) { return !entry.expired && now >= entry.deadline; };
-  const auto waiting = std::find_if(queue_.begin(), queue_.end(), overdue);
-  const auto begun = std::find_if(running_.begin(), running_.end(), overdue);
-  *running = waiting == queue_.end();
-  if (*running && begun == running_.end()) return nullptr;
-  if (*running) {
-    begun->expired = true;
-    return begun->job;
+// Removes one job whose deadline has passed from its queue and returns it; nullptr if there is none.
+std::shared_ptr<Job> WorkerPool::TakeOverdue(Clock::time_point now) {
+  for (auto& [id, lane] : lanes_) {
+    const auto entry = std::find_if(lane.queue.begin(), lane.queue.end(),
+                                    [now](const Entry& waiting) { return now >= waiting.deadline; });
+    if (entry == lane.queue.end()) continue;
+    std::shared_ptr<Job> job = std::move(entry->job);
+    lane.queue.erase(entry);
+    --queued_;
+    return job;
   }
-  std::shared_ptr<Job> job = std::move(waiting->job);
-  --waiting->lane->queued;
-  queue_.erase(waiting);
-  return job;
+  return nullptr;
+}
+
+// Returns one running job whose deadline has passed, each of them once; nullptr if there is none.
+std::shared_ptr<Job> WorkerPool::MarkOverdue(Clock::time_point now) {
+  for (Entry& entry : running_) {
+    if (entry.expired || now < entry.deadline) continue;
+    entry.expired = true;
+    return entry.job;
+  }
+  return nullptr;
 }
 
 // The next deadline, or the moment when a running job counts as long if another one waits for that.
 WorkerPool::Clock::time_point WorkerPool::NextWatch() const {
   auto next = Clock::time_point::max();
-  for (const Entry& entry : queue_) next = std::min(next, entry.deadline);
+  for (const auto& [id, lane] : lanes_) {
+    for (const Entry& entry : lane.queue) next = std::min(next, entry.deadline);
+  }
   for (const Entry& entry : running_) {
     if (!entry.expired) next = std::min(next, entry.deadline);
-    if (!entry.is_long && !queue_.empty()) next = std::min(next, entry.begun + limits_.long_after);
+    if (!entry.is_long && queued_ > 0) next = std::min(next, entry.begun + limits_.long_after);
   }
   return next;
 }

@@ -5,11 +5,13 @@
 #include <chrono>
 #include <condition_variable>
 #include <cstddef>
+#include <cstdint>
 #include <list>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <thread>
-#include <unordered_map>
+#include <utility>
 #include <vector>
 
 namespace vorn::server {
@@ -30,11 +32,18 @@ class Job {
   virtual void Refuse() = 0;
 };
 
-// Runs jobs in the order of their arrival, except that:
-//   - A lane (a method) has a share of the threads and of the queue. A lane that hangs delays no other lane.
+// How much work a job is expected to be, as far as that is known before it begins.
+enum class JobSize { kSmall, kLarge };
+
+// The jobs of one owner (a method) and one size. The owner is identified by its address only.
+using LaneId = std::pair<const void*, JobSize>;
+
+// Runs the jobs of a lane in the order of their arrival, and takes the lanes by turns, so that the jobs that wait in
+// one lane delay no other lane:
+//   - A lane has a share of the threads and of the queue.
 //   - Only a few threads work at the same time as long as jobs are short, because more of them would only compete
 //     for the same locks and caches. A job that has run for `long_after` counts as long, and a further thread
-//     takes the next job.
+//     takes the next job. A large job counts as long from its beginning.
 // All functions are thread-safe.
 class WorkerPool {
  public:
@@ -43,7 +52,8 @@ class WorkerPool {
   struct Limits {
     std::size_t short_threads = 2;  // threads that run short jobs at the same time
     std::size_t threads = 64;       // all threads; each is started when it is needed for the first time
-    std::size_t lane_threads = 4;   // jobs of one lane that run at the same time
+    std::size_t lane_threads = 4;   // small jobs of one lane that run at the same time
+    std::size_t large_threads = 1;  // large jobs of one lane that run at the same time
     std::size_t lane_queue = 256;   // jobs of one lane that wait
     std::chrono::milliseconds long_after{5};
   };
@@ -56,18 +66,14 @@ class WorkerPool {
   WorkerPool& operator=(const WorkerPool&) = delete;
 
   // Takes a job that must be done `time` from now. Returns false, without calling any of the job's functions, if
-  // the lane's share of the queue is used up or the pool is closed. A lane is identified by its address only.
-  // Throws std::bad_alloc and has then no effect.
-  bool Submit(const void* lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
+  // the lane's share of the queue is used up or the pool is closed. Throws std::bad_alloc and has then no effect.
+  bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
 
   // Refuses the jobs that wait and all further ones. Running jobs go on. Does not wait.
   void Close();
 
  private:
-  struct Lane {
-    std::size_t running = 0;
-    std::size_t queued = 0;
-  };
+  struct Lane;
   struct Entry {
     Lane* lane;
     std::shared_ptr<Job> job;
@@ -77,25 +83,35 @@ class WorkerPool {
     bool expired = false;
   };
   using Entries = std::list<Entry>;
+  struct Lane {
+    JobSize size = JobSize::kSmall;
+    Entries queue;
+    std::size_t running = 0;
+    std::uint64_t turn = 0;  // when a job of the lane was last begun; see turn_
+  };
 
   void Work();
   void Watch();
   bool MayTake() const { return running_.size() < limits_.short_threads + long_jobs_; }
-  Entries::iterator FirstRunnable();
+  bool MayTakeFrom(const Lane& lane) const;
+  Lane* NextLane();
   void EngageThread();
-  void Begin(Entries::iterator entry);
+  Entries::iterator Begin(Lane* lane);
   void RunUnlocked(Entries::iterator entry, std::unique_lock<std::mutex>* lock);
   void WatchNoLaterThan(Clock::time_point time);
   void MarkLongJobs(Clock::time_point now);
-  std::shared_ptr<Job> TakeOverdue(Clock::time_point now, bool* running);
+  void ExpireUnlocked(Clock::time_point now, std::unique_lock<std::mutex>* lock);
+  std::shared_ptr<Job> TakeOverdue(Clock::time_point now);
+  std::shared_ptr<Job> MarkOverdue(Clock::time_point now);
   Clock::time_point NextWatch() const;
 
   const Limits limits_;
   std::mutex mutex_;
   std::condition_variable wake_;        // workers wait for a job
   std::condition_variable watch_wake_;  // the watch thread waits for the next deadline or stall
-  std::unordered_map<const void*, Lane> lanes_;
-  Entries queue_;
+  std::map<LaneId, Lane> lanes_;        // all that have ever had a job
+  std::size_t queued_ = 0;              // in all lanes
+  std::uint64_t turn_ = 0;              // counts the jobs that were begun
   Entries running_;
   std::size_t long_jobs_ = 0;  // of running_
   std::size_t idle_ = 0;       // threads that wait for a job

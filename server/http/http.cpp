@@ -1,5 +1,6 @@
 #include "http.h"
 
+#include <pthread.h>
 #include <syslog.h>
 
 #include <algorithm>
@@ -155,6 +156,7 @@ void HttpServer::Engine::Open(Listener& listener) {
 
 // Without memory an operation may not have begun, so all are begun again after an exception.
 void HttpServer::Engine::Serve() {
+  pthread_setname_np(pthread_self(), "network");
   for (;;) {
     try {
       Arm();

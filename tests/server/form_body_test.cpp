@@ -78,10 +78,10 @@ TEST_F(FormBodyTest, AFormIsRefusedWithAReason) {
       {"nothing", "", 400},
       {"malformed", "--b\r\n\r\n", 400},
       {"large text", Part("name=a", std::string(64 * 1024 + 1, 'x')) + "--b--", 413},
-      {"large file", Part(file, std::string(FormBody::kMaxFileBytes + 1, 'x')) + "--b--", 413},
+      {"large file", Part(file, std::string(FormCheck::kMaxFileBytes + 1, 'x')) + "--b--", 413},
       {"large preamble", std::string(FormBody::kMaxBytes, 'x') + "\r\n--b--", 413},
       {"the largest text", Part("name=a", std::string(64 * 1024, 'x')) + "--b--", 0},
-      {"the largest file", Part(file, std::string(FormBody::kMaxFileBytes, 'x')) + "--b--", 0},
+      {"the largest file", Part(file, std::string(FormCheck::kMaxFileBytes, 'x')) + "--b--", 0},
       {"the largest number of parts", Parts(8) + "--b--", 0},
       {"more parts", Parts(9) + "--b--", 413},
       {"empty file", Part(file, "") + "--b--", 0},
@@ -90,6 +90,24 @@ TEST_F(FormBodyTest, AFormIsRefusedWithAReason) {
   for (const auto& c : cases) {
     EXPECT_EQ(Refusal(c.form), c.status) << c.name;
     EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("uploads"))) << c.name;
+  }
+}
+
+TEST_F(FormBodyTest, AFormIsRefusedOnItsWay) {
+  const struct {
+    const char* name;
+    std::string begin;
+    int status;
+  } cases[] = {{"more parts", Parts(9), 413},
+               {"path from outside", Part("name=keytab_file_tmp", "/etc/passwd"), 400},
+               {"text twice", Part("name=a", "1") + Part("name=a", "2"), 400},
+               {"malformed", "--b\r\n\r\n", 400},
+               {"large text", Part("name=a", std::string(64 * 1024 + 100, 'x')), 413}};
+  for (const auto& c : cases) {
+    FormBody body("b", *uploads_);
+    const auto refusal = body.Receive(c.begin);
+    ASSERT_TRUE(refusal) << c.name;
+    EXPECT_EQ(refusal->status, c.status) << c.name;
   }
 }
 

@@ -33,7 +33,7 @@ TEST(Probe, TellsWhetherAWorkerIsFreeInTime) {
   WorkerPool pool(limits);
   EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 200);
   std::promise<void> end;
-  pool.Submit(&limits, std::make_shared<Blocker>(end.get_future().share()), std::chrono::hours(1));
+  pool.Submit({&limits, JobSize::kSmall}, std::make_shared<Blocker>(end.get_future().share()), std::chrono::hours(1));
   EXPECT_EQ(StatusOf(pool, std::chrono::milliseconds(1)), 503);
   end.set_value();
   EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 200);

@@ -124,6 +124,22 @@ TEST_F(Calls, ThatAreSlowDelayNobody) {
   for (Connection& client : slow) EXPECT_EQ(client.Receive().Envelope()["data"], "released");
 }
 
+TEST_F(Calls, OfManyParametersDoNotDelayOthersOfTheirMethod) {
+  const std::string padding(2000, ' ');
+  std::vector<Connection> large;
+  for (int i = 0; i < 50; ++i) {
+    large.push_back(server_.ConnectTcp());
+    large.back().Send(Post("/api/Test.Echo/v1/wait", Wait(i == 0 ? "first" : "later") + padding));
+  }
+  EXPECT_TRUE(Eventually([&] { return HasBegun("first") || HasBegun("later"); }));
+  sandbox_.Write("now", "");
+  const std::string small = R"({"begun": "/dev/null", "release": ")" + sandbox_.File("now") + "\"}";
+  for (int i = 0; i < 20; ++i) EXPECT_EQ(Call("v1/wait", small).status, 200);
+  EXPECT_NE(HasBegun("first"), HasBegun("later")) << "one large call of a method runs at a time";
+  sandbox_.Write("release", "");
+  for (Connection& client : large) EXPECT_EQ(client.Receive().Envelope()["data"], "released");
+}
+
 TEST_F(Calls, BeyondTheQueueOfTheirMethodAreRefused) {
   std::vector<Connection> slow;
   for (int i = 0; i < 260; ++i) {  // four run, 256 wait

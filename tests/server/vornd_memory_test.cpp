@@ -73,6 +73,21 @@ class FailingAllocator : public testing::Test {
     EXPECT_TRUE(failed || status < 500 || request.find("throw") != std::string::npos) << status;
     return failed;
   }
+  // The same, in the network thread. A connection that has served a request before is used for this one.
+  bool TryConnection(const std::string& request, int n, bool stay) {
+    Connection client = server_->Connect();
+    client.Send(Get("/healthz"));
+    EXPECT_EQ(client.Receive().status, 200);
+    faults_->failed = 0;
+    faults_->stay = stay;
+    faults_->countdown = n;
+    client.Send(request);
+    client.FinishSending();
+    const std::string answer = client.ReceiveAll();
+    faults_->countdown = 0;
+    EXPECT_EQ(answer.find("(open)"), std::string::npos) << "allocation " << n << " of " << request.substr(0, 60);
+    return faults_->failed > 0;
+  }
   void ExpectHealthy() {
     Connection client = server_->Connect();
     client.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
@@ -95,6 +110,50 @@ TEST_F(FailingAllocator, EndsTheCallThatFindsNoMemoryAndNoOther) {
     }
   }
   EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("run/vorn/uploads")));
+}
+
+// Requests that take different ways through the network thread.
+std::vector<std::string> NetworkRequests() {
+  std::vector<std::string> requests = Requests();
+  for (const std::string& request :
+       {Get("/api"), Get("/healthz/ready"), Get("/nothing"), std::string("GET / HTTP/9\r\n\r\n"),
+        Post("/api/Test.Echo/v1/get", R"({"a": ")" + std::string(20000, 'x') + "\"}"),
+        Post("/api/Test.Echo/v1/get", R"({"a": 1})", "Expect: 100-continue\r\n"),
+        Post("/api/Test.Echo/v1/get", R"({"a": 1})", "Connection: close\r\n")}) {
+    requests.push_back(request);
+  }
+  return requests;
+}
+
+// The connection may end without an answer. It ends, however, and no other one does.
+TEST_F(FailingAllocator, EndsTheConnectionThatFindsNoMemoryAndNoOther) {
+  faults_->network = true;
+  Connection other = server_->Connect();
+  for (const bool stay : {false, true}) {
+    for (const std::string& request : NetworkRequests()) {
+      int n = 1;
+      while (n < 2000 && TryConnection(request, n, stay)) ++n;
+      EXPECT_GT(n, 5) << request.substr(0, 60);
+      EXPECT_LT(n, 2000) << request.substr(0, 60);
+      other.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
+      ASSERT_EQ(other.Receive().status, 200) << request.substr(0, 60);
+    }
+  }
+}
+
+// While there is no memory at all, nobody is accepted; afterwards everybody is.
+TEST_F(FailingAllocator, AcceptsConnectionsAgainOnceThereIsMemory) {
+  faults_->network = true;
+  for (int n = 1; n < 20; ++n) {
+    faults_->stay = true;
+    faults_->failed = 0;
+    faults_->countdown = n;
+    std::vector<Connection> clients;
+    for (int i = 0; i < 3; ++i) clients.push_back(server_->ConnectTcp());
+    EXPECT_TRUE(Eventually([this] { return faults_->failed > 0; })) << n;
+    faults_->countdown = 0;
+    ExpectHealthy();
+  }
 }
 
 std::uint64_t AddressSpaceOf(pid_t pid) {

@@ -69,6 +69,14 @@ TEST_F(Uploads, OfTheLargestSizeAreTakenAndLargerOnesRefused) {
   EXPECT_TRUE(NothingIsLeft());
 }
 
+TEST_F(Uploads, OfTooManyPartsAreRefusedBeforeTheirEnd) {
+  std::string begin;
+  for (int i = 0; i < 9; ++i) begin += Part("name=f" + std::to_string(i) + "; filename=k", "x");
+  Connection client = server_.Connect();
+  client.Send(FormHead(1024 * 1024) + begin);
+  EXPECT_EQ(client.Receive().status, 413);
+}
+
 TEST_F(Uploads, NeverReadAFileOfTheServer) {
   EXPECT_EQ(Send(Part("name=keytab_file_tmp", "/etc/passwd") + "--b--").status, 400);
   Connection client = server_.Connect();

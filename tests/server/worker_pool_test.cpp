@@ -53,17 +53,18 @@ class WorkerPoolTest : public testing::Test {
  protected:
   ~WorkerPoolTest() override { Release(); }
 
-  bool Submit(WorkerPool& pool, int lane, std::function<void()> work = {}, milliseconds time = hours(1)) {
-    return pool.Submit(&kLanes[lane], std::make_shared<TestJob>(counts_, std::move(work)), time);
+  bool Submit(WorkerPool& pool, int lane, std::function<void()> work = {}, milliseconds time = hours(1),
+              JobSize size = JobSize::kSmall) {
+    return pool.Submit({&kLanes[lane], size}, std::make_shared<TestJob>(counts_, std::move(work)), time);
   }
   // Submits a job that runs until Release().
-  bool SubmitHanging(WorkerPool& pool, int lane, milliseconds time = hours(1)) {
+  bool SubmitHanging(WorkerPool& pool, int lane, milliseconds time = hours(1), JobSize size = JobSize::kSmall) {
     const auto hang = [this] {
       most_ = std::max(most_.load(), ++hanging_);
       released_.wait();
       --hanging_;
     };
-    return Submit(pool, lane, hang, time);
+    return Submit(pool, lane, hang, time, size);
   }
   void Release() {
     if (!std::exchange(is_released_, true)) release_.set_value();
@@ -117,6 +118,35 @@ TEST_F(WorkerPoolTest, RunsFewShortJobsAtTheSameTime) {
   EXPECT_TRUE(Eventually([&] { return counts_.done == 10; }));
 }
 
+TEST_F(WorkerPoolTest, TakesTheLanesByTurns) {
+  WorkerPool::Limits limits = Limits(1, 4, 100);
+  limits.long_after = hours(1);
+  WorkerPool pool(limits);
+  SubmitHanging(pool, 0);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 1; }));
+  std::string order;  // one job runs at a time
+  const auto submit = [&](int lane, char mark) { Submit(pool, lane, [&order, mark] { order += mark; }); };
+  for (int i = 0; i < 4; ++i) submit(1, 'a');
+  for (int i = 0; i < 2; ++i) submit(2, 'b');
+  submit(3, 'c');
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 8; }));
+  EXPECT_EQ(order, "abcabaa");
+}
+
+TEST_F(WorkerPoolTest, LargeJobsLeaveTheShortThreadsToSmallJobsOfTheSameOwner) {
+  WorkerPool::Limits limits = Limits(1, 4, 100);
+  limits.long_after = hours(1);
+  WorkerPool pool(limits);
+  for (int i = 0; i < 10; ++i) SubmitHanging(pool, 0, hours(1), JobSize::kLarge);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 1; }));
+  for (int i = 0; i < 100; ++i) Submit(pool, 0);
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 100; }));
+  EXPECT_EQ(most_, 1) << "one large job of a lane runs at a time";
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 110; }));
+}
+
 TEST_F(WorkerPoolTest, RefusesMoreThanALanesShareOfTheQueue) {
   WorkerPool pool(Limits(1, 1, 2));
   SubmitHanging(pool, 0);
@@ -159,7 +189,7 @@ TEST_F(WorkerPoolTest, DestroysAJobOnceItIsDone) {
   WorkerPool pool(Limits(1, 1, 10));
   auto job = std::make_shared<TestJob>(counts_);
   const std::weak_ptr<TestJob> watched = job;
-  pool.Submit(&kLanes[0], std::move(job), hours(1));
+  pool.Submit({&kLanes[0], JobSize::kSmall}, std::move(job), hours(1));
   EXPECT_TRUE(Eventually([&] { return watched.expired(); }));
 }
 

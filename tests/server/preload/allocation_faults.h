@@ -8,7 +8,8 @@ namespace vorn::server {
 
 // In a file that both processes map; a file of zeros lets every allocation succeed.
 struct AllocationFaults {
-  std::atomic<int> countdown;  // the allocation of a worker thread that fails: 1 is the next one; 0 none
+  std::atomic<bool> network;   // allocations of the network thread fail, and not those of the workers
+  std::atomic<int> countdown;  // the allocation that fails: 1 is the next one; 0 none
   std::atomic<bool> stay;      // all later allocations fail, too, until countdown is set to 0
   std::atomic<int> failed;     // how many have failed
 };

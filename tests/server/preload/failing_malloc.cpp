@@ -33,16 +33,16 @@ __attribute__((constructor)) void MapFaults() {
   if (page != MAP_FAILED) faults = static_cast<AllocationFaults*>(page);
 }
 
-// A worker names its thread before it allocates for the first call.
-bool IsWorker() {
+// The threads name themselves before they serve the first request.
+bool IsAffectedThread() {
   char name[16] = "";
   pthread_getname_np(pthread_self(), name, sizeof name);
-  return std::strcmp(name, "worker") == 0;
+  return std::strcmp(name, faults->network.load() ? "network" : "worker") == 0;
 }
 
 bool Fails() {
   if (faults == nullptr || faults->countdown.load() <= 0) return false;
-  if (!IsWorker()) return false;
+  if (!IsAffectedThread()) return false;
   const int left = faults->countdown.fetch_sub(1);
   if (left != 1) return false;
   ++faults->failed;

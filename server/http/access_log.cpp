@@ -84,6 +84,22 @@ void AccessLog::Add(AccessRecord record) noexcept {
   ++counts_.dropped;
 }
 
+void AccessLog::Drop() noexcept {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  ++counts_.dropped;
+}
+
+void AccessLog::Write(const std::vector<AccessRecord>& records) noexcept {
+  for (const AccessRecord& record : records) {
+    try {
+      sink_.write(record);
+    } catch (const std::exception&) {
+      Drop();
+    }
+  }
+}
+
+// The counts of a summary that finds no memory are part of the next one.
 void AccessLog::Work() {
   std::unique_lock<std::mutex> lock(mutex_);
   auto next_summary = std::chrono::steady_clock::now() + kSummaryInterval;
@@ -93,9 +109,9 @@ void AccessLog::Work() {
       WriteCounts(&lock);
       next_summary = std::chrono::steady_clock::now() + kSummaryInterval;
     }
-    std::deque<AccessRecord> records = std::exchange(queue_, {});
+    const std::vector<AccessRecord> records = std::exchange(queue_, {});
     lock.unlock();
-    for (const AccessRecord& record : records) sink_.write(record);
+    Write(records);
     lock.lock();
   }
   WriteCounts(&lock);
@@ -105,8 +121,16 @@ void AccessLog::WriteCounts(std::unique_lock<std::mutex>* lock) {
   const Counts counts = std::exchange(counts_, {});
   if (counts.busy == 0 && counts.dropped == 0) return;
   lock->unlock();
-  sink_.summarize(counts);
+  bool written = true;
+  try {
+    sink_.summarize(counts);
+  } catch (const std::exception&) {
+    written = false;
+  }
   lock->lock();
+  if (written) return;
+  counts_.busy += counts.busy;
+  counts_.dropped += counts.dropped;
 }
 
 std::string FormatRecord(const AccessRecord& record) {

@@ -6,11 +6,11 @@
 #include <condition_variable>
 #include <cstddef>
 #include <cstdint>
-#include <deque>
 #include <functional>
 #include <mutex>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "message.h"
 
@@ -48,15 +48,19 @@ class AccessLog {
   // Thread-safe; does not wait and does not throw.
   void Add(AccessRecord record) noexcept;
 
+  // Counts a record that could not be made.
+  void Drop() noexcept;
+
  private:
   void Work();
+  void Write(const std::vector<AccessRecord>& records) noexcept;
   void WriteCounts(std::unique_lock<std::mutex>* lock);
 
   const Sink sink_;
   const std::size_t limit_;
   std::mutex mutex_;
   std::condition_variable wake_;
-  std::deque<AccessRecord> queue_;
+  std::vector<AccessRecord> queue_;
   Counts counts_;
   bool stopping_ = false;
   std::thread thread_;

@@ -1,14 +1,17 @@
 #include "http.h"
 
 #include <pthread.h>
+#include <sys/socket.h>
 #include <syslog.h>
 
 #include <algorithm>
+#include <atomic>
 #include <boost/asio/basic_socket_acceptor.hpp>
 #include <boost/asio/executor_work_guard.hpp>
 #include <boost/asio/posix/basic_stream_descriptor.hpp>
-#include <boost/asio/post.hpp>
 #include <boost/asio/steady_timer.hpp>
+#include <cerrno>
+#include <cstring>
 #include <ctime>
 #include <exception>
 #include <future>
@@ -33,10 +36,10 @@ using Acceptor = asio::basic_socket_acceptor<Protocol, Executor>;
 constexpr rlim_t kReservedDescriptors = 192;
 constexpr std::size_t kFewestConnections = 8;  // of a listener
 
-bool IsExhaustion(const Error& error) {
-  return error == asio::error::no_descriptors || error == asio::error::no_buffer_space ||
-         error == asio::error::no_memory || error.value() == ENFILE;
-}
+// Connections that are accepted before others are served again.
+constexpr int kAcceptedAtOnce = 8;
+
+bool IsExhaustion(int error) { return error == EMFILE || error == ENFILE || error == ENOBUFS || error == ENOMEM; }
 
 }  // namespace
 
@@ -55,7 +58,10 @@ HttpLimits FitToDescriptors(HttpLimits limits, const std::vector<Listener>& list
 }
 
 // All sessions, the sockets they come from and the clock they are held to. Everything but the constructor, the
-// destructor, Stop, Cut and the joins runs on the network thread.
+// destructor, Stop and the joins runs on the network thread.
+//
+// No function of this class that is called for many sessions allocates memory, and no operation of Asio has a result
+// that would be lost if there is no memory for it (as async_accept would lose a connection and its handler).
 class HttpServer::Engine : public SessionHost {
  public:
   Engine(Service& service, std::vector<Listener> listeners, HttpLimits limits, HttpParts parts);
@@ -84,12 +90,16 @@ class HttpServer::Engine : public SessionHost {
   void Open(Listener& listener);
   void Serve();
   void Arm();
+  void AwaitConnections(std::size_t listener);
   void Accept(std::size_t listener);
-  void OnAccepted(std::size_t listener, const Error& error, Socket socket);
-  void Admit(std::size_t listener, Socket socket);
+  void Admit(std::size_t listener, UniqueFd connection);
+  std::shared_ptr<Session> NewSession(std::size_t listener, UniqueFd connection);
   void KeepToShare(const std::shared_ptr<Session>& newest);
-  void OnAcceptFailed(const Error& error);
+  bool MakeRoom(int error);
+  template <typename Step>
+  void ForEachSession(const Step& step);
   void ReadMailbox();
+  void OnWake();
   void StartTimer();
   void OnTick();
   void OnStop();
@@ -108,6 +118,8 @@ class HttpServer::Engine : public SessionHost {
   bool reading_letters_ = false;
   bool ticking_ = false;
   bool stopping_ = false;
+  std::atomic<bool> stop_wanted_{false};
+  std::atomic<bool> end_wanted_{false};
   std::vector<std::unique_ptr<Door>> doors_;
   std::unordered_set<std::shared_ptr<Session>> sessions_;
   Clock::time_point warned_;  // of a lack of descriptors
@@ -125,16 +137,14 @@ HttpServer::Engine::Engine(Service& service, std::vector<Listener> listeners, Ht
 }
 
 HttpServer::Engine::~Engine() {
-  asio::post(io_, [this] {
-    OnStop();
-    const auto sessions = sessions_;  // they leave while they are told
-    for (const auto& session : sessions) session->Close();
-  });
+  end_wanted_ = true;
+  Stop();
   Join();
 }
 
 void HttpServer::Engine::Stop() {
-  asio::post(io_, [this] { OnStop(); });
+  stop_wanted_ = true;
+  mailbox_->Wake();
 }
 
 void HttpServer::Engine::Join() {
@@ -173,34 +183,53 @@ void HttpServer::Engine::Serve() {
 void HttpServer::Engine::Arm() {
   if (stopping_ && sessions_.empty()) return Finish();
   ReadMailbox();
-  for (std::size_t i = 0; i < doors_.size(); ++i) Accept(i);
+  for (std::size_t i = 0; i < doors_.size(); ++i) AwaitConnections(i);
   if (!sessions_.empty()) StartTimer();
 }
 
-void HttpServer::Engine::Accept(std::size_t listener) {
+void HttpServer::Engine::AwaitConnections(std::size_t listener) {
   Door& door = *doors_[listener];
   if (door.waiting || stopping_) return;
-  door.acceptor.async_accept(
-      [this, listener](const Error& error, Socket socket) { OnAccepted(listener, error, std::move(socket)); });
+  door.acceptor.async_wait(Acceptor::wait_read, [this, listener](const Error& /*error*/) {
+    doors_[listener]->waiting = false;
+    if (!stopping_) Accept(listener);
+  });
   door.waiting = true;
 }
 
-void HttpServer::Engine::OnAccepted(std::size_t listener, const Error& error, Socket socket) {
-  doors_[listener]->waiting = false;
-  if (stopping_) return;
+void HttpServer::Engine::Accept(std::size_t listener) {
   StartTimer();
-  if (error) return OnAcceptFailed(error);
-  Admit(listener, std::move(socket));
-  Accept(listener);
+  const int acceptor = doors_[listener]->acceptor.native_handle();
+  for (int i = 0; i < kAcceptedAtOnce; ++i) {
+    UniqueFd connection(accept4(acceptor, nullptr, nullptr, SOCK_CLOEXEC));
+    if (!connection && errno == EAGAIN) break;
+    if (!connection && !MakeRoom(errno)) return;  // until the next tick
+    if (connection) Admit(listener, std::move(connection));
+  }
+  AwaitConnections(listener);
 }
 
-void HttpServer::Engine::Admit(std::size_t listener, Socket socket) {
-  Peer peer = PeerOf(socket.native_handle());
+void HttpServer::Engine::Admit(std::size_t listener, UniqueFd connection) {
+  std::shared_ptr<Session> session;
+  try {
+    session = NewSession(listener, std::move(connection));
+    session->Start();
+    KeepToShare(session);
+  } catch (const std::exception& exception) {
+    syslog(LOG_ERR, "A new connection ends: %s", exception.what());
+    if (session) session->Close();
+  }
+}
+
+std::shared_ptr<Session> HttpServer::Engine::NewSession(std::size_t listener, UniqueFd connection) {
+  Peer peer = PeerOf(connection.get());
+  Socket socket(io_.get_executor());
+  socket.assign(Protocol(listeners_[listener].family(), 0), connection.get());
+  (void)connection.release();
   auto stream = std::make_unique<SocketStream>(std::move(socket));
-  const auto session = std::make_shared<Session>(*this, std::move(stream), std::move(peer), listener);
+  auto session = std::make_shared<Session>(*this, std::move(stream), std::move(peer), listener);
   sessions_.insert(session);
-  session->Start();
-  KeepToShare(session);
+  return session;
 }
 
 void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {
@@ -208,6 +237,8 @@ void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {
   if (sessions_.size() <= std::min(share.total, share.per_address)) return;
   std::vector<std::shared_ptr<Session>> sessions;
   std::vector<ConnectionUse> uses;
+  sessions.reserve(sessions_.size());
+  uses.reserve(sessions_.size());
   const auto add = [&](const std::shared_ptr<Session>& session) {
     sessions.push_back(session);
     uses.push_back(session->use());
@@ -221,22 +252,32 @@ void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {
   sessions[surplus] == newest ? newest->TurnAway() : sessions[surplus]->Close();
 }
 
-// Without a descriptor for the new connection, the most expendable one makes room; if there is none, the next tick
-// tries again, so that the thread does not spin.
-void HttpServer::Engine::OnAcceptFailed(const Error& error) {
+// Called after accept(2) has failed. Without a descriptor for the new connection, the most expendable one makes room.
+// Returns false if it is no use to try again before the next tick.
+bool HttpServer::Engine::MakeRoom(int error) {
+  if (error == ECONNABORTED || error == EINTR) return true;
   if (const auto now = Clock::now(); now - warned_ > std::chrono::minutes(1)) {
     warned_ = now;
-    syslog(LOG_WARNING, "No connection accepted: %s", error.message().c_str());
+    syslog(LOG_WARNING, "No connection accepted: %s", std::strerror(error));
   }
-  if (!IsExhaustion(error)) return;
+  if (!IsExhaustion(error)) return false;
   const std::vector<std::shared_ptr<Session>> sessions(sessions_.begin(), sessions_.end());
   std::vector<ConnectionUse> uses;
   uses.reserve(sessions.size());
   for (const auto& session : sessions) uses.push_back(session->use());
   const std::size_t chosen = MostExpendable(uses);
-  if (chosen == kNoConnection) return;
+  if (chosen == kNoConnection) return false;
   sessions[chosen]->Close();
-  for (std::size_t i = 0; i < doors_.size(); ++i) Accept(i);
+  return true;
+}
+
+// A session may leave while `step` is called with it.
+template <typename Step>
+void HttpServer::Engine::ForEachSession(const Step& step) {
+  for (auto next = sessions_.begin(); next != sessions_.end();) {
+    const std::shared_ptr<Session> session = *next++;
+    step(*session);
+  }
 }
 
 void HttpServer::Engine::Forget(const std::shared_ptr<Session>& session) {
@@ -251,9 +292,15 @@ void HttpServer::Engine::ReadMailbox() {
                              reading_letters_ = false;
                              if (error) return;
                              mailbox_->Deliver();
+                             OnWake();
                              if (!stopping_ || !sessions_.empty()) ReadMailbox();
                            });
   reading_letters_ = true;
+}
+
+void HttpServer::Engine::OnWake() {
+  if (stop_wanted_) OnStop();
+  if (end_wanted_) ForEachSession([](Session& session) { session.Close(); });
 }
 
 // Deadlines are checked once a second, and not at all while nobody is connected.
@@ -267,9 +314,8 @@ void HttpServer::Engine::StartTimer() {
 void HttpServer::Engine::OnTick() {
   ticking_ = false;
   const auto now = Clock::now();
-  const auto sessions = sessions_;
-  for (const auto& session : sessions) session->Tick(now);
-  for (std::size_t i = 0; i < doors_.size(); ++i) Accept(i);
+  ForEachSession([now](Session& session) { session.Tick(now); });
+  for (std::size_t i = 0; i < doors_.size(); ++i) AwaitConnections(i);
   if (!sessions_.empty()) StartTimer();
 }
 
@@ -278,8 +324,7 @@ void HttpServer::Engine::OnStop() {
   stopping_ = true;
   Error ignored;
   for (const auto& door : doors_) door->acceptor.close(ignored);
-  const auto sessions = sessions_;  // they leave while they are told
-  for (const auto& session : sessions) session->Stop();
+  ForEachSession([](Session& session) { session.Stop(); });
   if (sessions_.empty()) Finish();
 }
 

@@ -24,9 +24,11 @@ void Mailbox::Send(std::shared_ptr<Letter> letter) noexcept {
   const bool first = last_ == nullptr;
   (first ? first_ : last_->next) = std::move(letter);
   last_ = sent;
-  // Fails only if the counter is at its maximum, and then the descriptor is readable.
-  if (first) (void)eventfd_write(event_.get(), 1);
+  if (first) Wake();
 }
+
+// Writing fails only if the counter is at its maximum, and then the descriptor is readable.
+void Mailbox::Wake() noexcept { (void)eventfd_write(event_.get(), 1); }
 
 void Mailbox::Deliver() {
   for (std::shared_ptr<Letter> letter = TakeAll(); letter;) {

@@ -29,11 +29,14 @@ class Mailbox {
   Mailbox(const Mailbox&) = delete;
   Mailbox& operator=(const Mailbox&) = delete;
 
-  // An eventfd(2) that is readable while there may be letters.
+  // An eventfd(2) that is readable while there may be letters, and after Wake().
   int descriptor() const { return event_.get(); }
 
   // Thread-safe. Each letter is sent at most once.
   void Send(std::shared_ptr<Letter> letter) noexcept;
+
+  // Makes the descriptor readable without a letter. Thread-safe.
+  void Wake() noexcept;
 
   // Delivers all letters that have been sent so far.
   void Deliver();

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <charconv>
 #include <exception>
+#include <new>
 #include <utility>
 #include <variant>
 
@@ -34,6 +35,7 @@ Session::Session(SessionHost& host, std::unique_ptr<Stream> stream, Peer peer, s
     : host_(host),
       stream_(std::move(stream)),
       peer_(std::move(peer)),
+      share_key_(peer_.ShareKey()),
       listener_(listener),
       reader_(host.limits().head_bytes) {}
 
@@ -107,7 +109,7 @@ void Session::Stop() {
   deadline_ = std::min(deadline_, Clock::now() + host_.limits().last_write);
 }
 
-void Session::Close() {
+void Session::Close() noexcept {
   if (closed_) return;
   if (phase_ == Phase::kWrite) Log();
   closed_ = true;
@@ -132,7 +134,7 @@ void Session::Expire() {
 }
 
 ConnectionUse Session::use() const {
-  ConnectionUse use{peer_.ShareKey(), Activity::kWaiting, since_};
+  ConnectionUse use{share_key_, Activity::kWaiting, since_};
   if (phase_ == Phase::kDrain) use.activity = Activity::kEnding;
   const bool between = phase_ == Phase::kIdle || (phase_ == Phase::kHead && !reader_.begun());
   if (between && Clock::now() - since_ > kIdleAfter) use.activity = Activity::kIdle;
@@ -218,7 +220,7 @@ bool Session::ChargeBody() {
   const HttpLimits& limits = host_.limits();
   if (host_.bodies() == nullptr || body_charge_ <= limits.uncharged_body) return true;
   const auto amount = static_cast<std::size_t>(std::min<std::uint64_t>(body_charge_, limits.largest_charge));
-  charge_ = host_.bodies()->Take(peer_.ShareKey(), amount);
+  charge_ = host_.bodies()->Take(share_key_, amount);
   return charge_.has_value();
 }
 
@@ -316,11 +318,16 @@ void Session::Drain() {
   Read();
 }
 
-void Session::Log() {
+// Without memory for it, a request has no record.
+void Session::Log() noexcept {
   if (host_.log() == nullptr) return;
-  record_.caller = std::move(response_.caller);
-  record_.peer = peer_;
-  host_.log()->Add(std::move(record_));
+  try {
+    record_.caller = std::move(response_.caller);
+    record_.peer = peer_;
+    host_.log()->Add(std::move(record_));
+  } catch (const std::bad_alloc&) {
+    host_.log()->Drop();
+  }
 }
 
 }  // namespace vorn::server

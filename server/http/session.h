@@ -51,7 +51,7 @@ class Session : public std::enable_shared_from_this<Session> {
 
   // The server stops: closes the connection now, or after the answer of the request that is running.
   void Stop();
-  void Close();
+  void Close() noexcept;
 
   // Called once a second: applies the deadline, and tells a running call if its client has left.
   void Tick(Clock::time_point now);
@@ -92,11 +92,12 @@ class Session : public std::enable_shared_from_this<Session> {
   void SendMore();
   void Finish();
   void Drain();
-  void Log();
+  void Log() noexcept;
 
   SessionHost& host_;
   const std::unique_ptr<Stream> stream_;
   const Peer peer_;
+  const std::string share_key_;  // Peer::ShareKey()
   const std::size_t listener_;
 
   Phase phase_ = Phase::kHead;

@@ -4,7 +4,7 @@
 
 #include <chrono>
 #include <cstddef>
-#include <string>
+#include <string_view>
 #include <vector>
 
 namespace vorn::server {
@@ -19,7 +19,7 @@ enum class Activity {
 
 // One connection of a listener.
 struct ConnectionUse {
-  std::string share_key;  // Peer::ShareKey()
+  std::string_view share_key;  // Peer::ShareKey(), which must outlive this
   Activity activity = Activity::kIdle;
   std::chrono::steady_clock::time_point since;  // of this activity; a byte now and then does not renew it
 };

@@ -7,8 +7,8 @@
 namespace vorn::server {
 namespace {
 
-ConnectionUse Use(std::string key, Activity activity, int second) {
-  return {std::move(key), activity, std::chrono::steady_clock::time_point(std::chrono::seconds(second))};
+ConnectionUse Use(std::string_view key, Activity activity, int second) {
+  return {key, activity, std::chrono::steady_clock::time_point(std::chrono::seconds(second))};
 }
 
 TEST(Shares, NobodyGoesWhileThereIsRoom) {

@@ -73,11 +73,10 @@ class FailingAllocator : public testing::Test {
     EXPECT_TRUE(failed || status < 500 || request.find("throw") != std::string::npos) << status;
     return failed;
   }
-  // The same, in the network thread. A connection that has served a request before is used for this one.
+  // The same for a connection, which has served a request before, and beside which there is another one.
   bool TryConnection(const std::string& request, int n, bool stay) {
-    Connection client = server_->Connect();
-    client.Send(Get("/healthz"));
-    EXPECT_EQ(client.Receive().status, 200);
+    Connection other = ConnectAndAsk();
+    Connection client = ConnectAndAsk();  // when this one is accepted, the server is done with the request of the other
     faults_->failed = 0;
     faults_->stay = stay;
     faults_->countdown = n;
@@ -85,8 +84,16 @@ class FailingAllocator : public testing::Test {
     client.FinishSending();
     const std::string answer = client.ReceiveAll();
     faults_->countdown = 0;
+    other.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
+    EXPECT_EQ(other.Receive().status, 200) << "allocation " << n << " of " << request.substr(0, 60);
     EXPECT_EQ(answer.find("(open)"), std::string::npos) << "allocation " << n << " of " << request.substr(0, 60);
     return faults_->failed > 0;
+  }
+  Connection ConnectAndAsk() {
+    Connection client = server_->Connect();
+    client.Send(Get("/healthz"));
+    EXPECT_EQ(client.Receive().status, 200);
+    return client;
   }
   void ExpectHealthy() {
     Connection client = server_->Connect();
@@ -100,6 +107,7 @@ class FailingAllocator : public testing::Test {
 };
 
 TEST_F(FailingAllocator, EndsTheCallThatFindsNoMemoryAndNoOther) {
+  faults_->thread = 'w';  // workers
   for (const bool stay : {false, true}) {
     for (const std::string& request : Requests()) {
       int n = 1;
@@ -127,23 +135,30 @@ std::vector<std::string> NetworkRequests() {
 
 // The connection may end without an answer. It ends, however, and no other one does.
 TEST_F(FailingAllocator, EndsTheConnectionThatFindsNoMemoryAndNoOther) {
-  faults_->network = true;
-  Connection other = server_->Connect();
-  for (const bool stay : {false, true}) {
-    for (const std::string& request : NetworkRequests()) {
-      int n = 1;
-      while (n < 2000 && TryConnection(request, n, stay)) ++n;
-      EXPECT_GT(n, 5) << request.substr(0, 60);
-      EXPECT_LT(n, 2000) << request.substr(0, 60);
-      other.Send(Post("/api/Test.Echo/v1/get", R"({"a": 1})"));
-      ASSERT_EQ(other.Receive().status, 200) << request.substr(0, 60);
+  for (const char thread : {'n', '\0'}) {  // the network thread; all threads
+    faults_->thread = thread;
+    for (const bool stay : {false, true}) {
+      for (const std::string& request : NetworkRequests()) {
+        int n = 1;
+        while (n < 2000 && TryConnection(request, n, stay)) ++n;
+        EXPECT_GT(n, 5) << request.substr(0, 60);
+        EXPECT_LT(n, 2000) << request.substr(0, 60);
+      }
     }
   }
 }
 
+TEST_F(FailingAllocator, StopsWithoutMemory) {
+  const Connection idle = ConnectAndAsk();
+  faults_->stay = true;
+  faults_->countdown = 1;
+  server_->Signal(SIGTERM);
+  EXPECT_EQ(server_->Wait(), 0) << server_->log();
+}
+
 // While there is no memory at all, nobody is accepted; afterwards everybody is.
 TEST_F(FailingAllocator, AcceptsConnectionsAgainOnceThereIsMemory) {
-  faults_->network = true;
+  faults_->thread = 'n';
   for (int n = 1; n < 20; ++n) {
     faults_->stay = true;
     faults_->failed = 0;
@@ -156,9 +171,12 @@ TEST_F(FailingAllocator, AcceptsConnectionsAgainOnceThereIsMemory) {
   }
 }
 
-std::uint64_t AddressSpaceOf(pid_t pid) {
-  std::uint64_t pages = 0;
-  std::ifstream("/proc/" + std::to_string(pid) + "/statm") >> pages;
+// The private writable memory of a process. The address space would say little: the C library reserves 64 MiB of it for
+// the threads' allocations.
+std::uint64_t DataOf(pid_t pid) {
+  std::uint64_t pages = 0;  // the sixth number (proc(5))
+  std::ifstream file("/proc/" + std::to_string(pid) + "/statm");
+  for (int i = 0; i < 6; ++i) file >> pages;
   return pages * static_cast<std::uint64_t>(sysconf(_SC_PAGESIZE));
 }
 
@@ -172,9 +190,9 @@ TEST(MemoryLimit, EndsCallsAndNotTheServer) {
   const Sandbox sandbox;
   ServerProcess server(sandbox);
   const std::string request = Post("/api/Test.Echo/v1/get", LargestJson());
-  const rlim_t limit = AddressSpaceOf(server.pid()) + rlim_t{24} * 1024 * 1024;
+  const rlim_t limit = DataOf(server.pid()) + rlim_t{12} * 1024 * 1024;
   const rlimit limits{limit, limit};
-  ASSERT_EQ(prlimit(server.pid(), RLIMIT_AS, &limits, nullptr), 0);
+  ASSERT_EQ(prlimit(server.pid(), RLIMIT_DATA, &limits, nullptr), 0);
   int refused = 0;
   for (int round = 0; round < 3; ++round) {
     std::vector<Connection> clients;

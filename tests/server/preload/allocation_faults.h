@@ -8,12 +8,12 @@ namespace vorn::server {
 
 // In a file that both processes map; a file of zeros lets every allocation succeed.
 struct AllocationFaults {
-  std::atomic<bool> network;   // allocations of the network thread fail, and not those of the workers
+  std::atomic<char> thread;    // first character of the name of the threads that it concerns; 0: all threads
   std::atomic<int> countdown;  // the allocation that fails: 1 is the next one; 0 none
   std::atomic<bool> stay;      // all later allocations fail, too, until countdown is set to 0
   std::atomic<int> failed;     // how many have failed
 };
-static_assert(std::atomic<int>::is_always_lock_free && std::atomic<bool>::is_always_lock_free,
+static_assert(std::atomic<int>::is_always_lock_free && std::atomic<char>::is_always_lock_free,
               "usable between processes");
 
 }  // namespace vorn::server

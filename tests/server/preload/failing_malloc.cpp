@@ -6,7 +6,6 @@
 
 #include <cerrno>
 #include <cstdlib>
-#include <cstring>
 
 #include "allocation_faults.h"
 
@@ -35,18 +34,24 @@ __attribute__((constructor)) void MapFaults() {
 
 // The threads name themselves before they serve the first request.
 bool IsAffectedThread() {
+  const char wanted = faults->thread.load();
   char name[16] = "";
-  pthread_getname_np(pthread_self(), name, sizeof name);
-  return std::strcmp(name, faults->network.load() ? "network" : "worker") == 0;
+  return wanted == '\0' || (pthread_getname_np(pthread_self(), name, sizeof name) == 0 && name[0] == wanted);
+}
+
+// The countdown is not written after the test may have reset it.
+bool CountDown() {
+  int left = faults->countdown.load();
+  while (left > 0) {
+    if (left == 1 && faults->stay.load()) return true;
+    if (faults->countdown.compare_exchange_weak(left, left - 1)) return left == 1;
+  }
+  return false;
 }
 
 bool Fails() {
-  if (faults == nullptr || faults->countdown.load() <= 0) return false;
-  if (!IsAffectedThread()) return false;
-  const int left = faults->countdown.fetch_sub(1);
-  if (left != 1) return false;
+  if (faults == nullptr || faults->countdown.load() <= 0 || !IsAffectedThread() || !CountDown()) return false;
   ++faults->failed;
-  if (faults->stay.load()) faults->countdown.store(1);
   errno = ENOMEM;
   return true;
 }

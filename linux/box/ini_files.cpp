@@ -3,17 +3,18 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 #include <functional>
 #include <set>
 #include <utility>
 
 #include "ascii.h"
 #include "configuration_lock.h"
+#include "notice.h"
 
 namespace vorn {
 namespace {
 
-constexpr std::size_t kDeepestInclude = 10;
 constexpr std::size_t kMostSources = 1000;
 constexpr int kMostReferences = 16;
 
@@ -56,6 +57,9 @@ bool IsSkipped(int code) {
   return code == EINVAL || code == ENOTDIR || code == ELOOP || code == ENAMETOOLONG || code == EACCES || code == ENXIO;
 }
 
+// The path without "." and "..", to compare it with others.
+std::string NormalPath(const std::string& path) { return std::filesystem::path(path).lexically_normal(); }
+
 // A setting and its place among all files.
 struct Placed {
   IniFound found;
@@ -75,8 +79,10 @@ std::string IniFound::Where() const { return file->location() + ":" + std::to_st
 
 Result<IniFiles> IniFiles::Open(Box& box, const std::string& path, const std::optional<Draft>& draft) {
   IniFiles files;
-  const Status status = files.AddAll(box, path, draft);
-  return status.ok() ? Result<IniFiles>(std::move(files)) : status;
+  if (Status status = files.AddAll(box, path, draft); !status.ok()) return status;
+  const Status& includes = files.CheckIncludes();
+  if (!includes.ok() && !draft) NoticeOnce(path, files.sources_.front().file->version(), includes.reason());
+  return files;
 }
 
 Status IniFiles::AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft) {
@@ -99,9 +105,19 @@ Status IniFiles::AddAll(Box& box, const std::string& path, const std::optional<D
   return {};
 }
 
-Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft) {
-  if (source.position.size() > kDeepestInclude || sources_.size() >= kMostSources) return {};
-  if (draft && draft->path == source.path) {
+// Two paths can have the same normal form and be different files, because ".." follows symbolic links.
+bool IniFiles::Opened::Has(const Source& other) const {
+  const std::string path = NormalPath(other.path);
+  for (const Opened* opened = this; opened != nullptr; opened = opened->including) {
+    const Source& own = opened->source;
+    const bool is_same_file = own.file->version() == other.file->version() && NormalPath(own.path) == path;
+    if (is_same_file && own.inherited == other.inherited) return true;
+  }
+  return false;
+}
+
+Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft, const Opened* including) {
+  if (draft && draft->path == NormalPath(source.path)) {
     const std::string below = box.root().is_box() ? "" : box.root().directory();
     source.file = IniFile::FromText(below + source.path, draft->text);
   } else {
@@ -110,11 +126,28 @@ Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft)
     if (!file.ok()) return is_main || !IsSkipped(file.status().code()) ? file.status() : Status();
     source.file = std::move(*file);
   }
+  if (including != nullptr && including->Has(source)) {
+    Reject(source, including, "the file includes itself, and the programs of nfs-utils read it until they crash");
+    return {};
+  }
+  if (sources_.size() >= kMostSources) {
+    Reject(source, including, "more than " + std::to_string(kMostSources) + " files are included");
+    return {};
+  }
   sources_.push_back(source);
-  return AddIncludes(box, source, draft);
+  return AddIncludes(box, {source, including}, draft);
 }
 
-Status IniFiles::AddIncludes(Box& box, const Source& source, const std::optional<Draft>& draft) {
+void IniFiles::Reject(const Source& source, const Opened* including, const std::string& why) {
+  if (!includes_.ok()) return;
+  const std::string where = including == nullptr
+                                ? source.file->location()
+                                : including->source.file->location() + ":" + std::to_string(source.position.back());
+  includes_ = Status::Failure(kSyntax, where + ": " + why);
+}
+
+Status IniFiles::AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft) {
+  const Source& source = opened.source;
   for (const IniInclude& include : source.file->document().Includes()) {
     std::optional<std::string> section = include.section;
     if (section == IniDocument::kInherited) section = source.inherited;
@@ -122,7 +155,7 @@ Status IniFiles::AddIncludes(Box& box, const Source& source, const std::optional
     if (!is_in_section) continue;  // the reader ignores every line outside of a section
     Source included{IncludedPath(source.path, include.file), nullptr, section,
                     PositionOf(source.position, include.line)};
-    if (Status status = Add(box, std::move(included), draft); !status.ok()) return status;
+    if (Status status = Add(box, std::move(included), draft, &opened); !status.ok()) return status;
   }
   return {};
 }

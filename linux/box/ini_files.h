@@ -29,6 +29,9 @@ struct IniFound {
 // files that it includes: nfs.conf(5), and idmapd.conf(5), which libnfsidmap reads in the same way. The last value
 // of a key counts. A file that is missing or not a regular file is skipped, as the readers do.
 //
+// A file that includes itself is read once more for each section that it can begin in, which gives the values of
+// programs that read it to the end. They do not: see CheckIncludes.
+//
 // "$name" refers to a key of the section [environment]. The readers look for a variable of their own process first;
 // its value is unknown here.
 class IniFiles {
@@ -53,6 +56,10 @@ class IniFiles {
   // The files that were read. Two readings with equal lists have equal settings.
   std::vector<std::shared_ptr<const void>> sources() const;
 
+  // Fails with kSyntax, naming file and line, if a file includes itself, directly or through others. The programs of
+  // nfs-utils then read it again until they crash, so nothing is in force. Opening logs the same sentence once.
+  const Status& CheckIncludes() const { return includes_; }
+
   // Fails with kChangedBehind if the configuration context of this thread has first read another version of one of
   // the files, or another list of files.
   Status CheckUnchanged(Box& box) const;
@@ -68,14 +75,24 @@ class IniFiles {
     std::vector<int> position;             // of the include lines that lead to the file; orders the sources
   };
 
+  // A file whose lines are being read, and the one that includes it.
+  struct Opened {
+    const Source& source;
+    const Opened* including;
+
+    bool Has(const Source& other) const;
+  };
+
   Status AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft);
-  Status Add(Box& box, Source source, const std::optional<Draft>& draft);
-  Status AddIncludes(Box& box, const Source& source, const std::optional<Draft>& draft);
+  Status Add(Box& box, Source source, const std::optional<Draft>& draft, const Opened* including = nullptr);
+  Status AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft);
+  void Reject(const Source& source, const Opened* including, const std::string& why);
   std::optional<std::string_view> Resolve(std::string_view value) const;
 
   std::string folder_;
   Version names_;  // stands for the list of files in the folder
   std::vector<Source> sources_;
+  Status includes_;
 };
 
 }  // namespace vorn

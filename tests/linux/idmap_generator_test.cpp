@@ -217,13 +217,27 @@ bool IsReadByLibrary(const TemporaryRoot& root) {
   }
 }
 
+// No daemon starts with such files: a change has no effect, so it must be refused.
+void ExpectRefusal(const TemporaryRoot& root, const GeneratedFiles& files) {
+  const std::string text_before = AllText(root, files);
+  const Map map(VORNNFSIDMapGet());
+  ASSERT_NE(map, nullptr) << text_before;
+  TakeLog();
+  EXPECT_FALSE(Apply(map, {"", "eve@X", "daemon"})) << text_before;
+  EXPECT_NE(TakeLog().back().text.find("includes itself"), std::string::npos) << text_before;
+  EXPECT_EQ(AllText(root, files), text_before);
+}
+
 // Returns whether the change succeeded.
 bool RunCase(unsigned number) {
   Chance chance(number);
   const TemporaryRoot root;
   const GeneratedFiles files = MakeFiles(&chance);
   for (const auto& [path, text] : files) root.Write(path, text);
-  if (!IsReadByLibrary(root)) return false;
+  if (!IsReadByLibrary(root)) {
+    ExpectRefusal(root, files);
+    return false;
+  }
   const std::string text_before = AllText(root, files);
   const Change change = MakeChange(&chance);
   SCOPED_TRACE("case " + std::to_string(number) + ": " + change.domain + change.principal + " = " + change.name + "\n" +

@@ -1,6 +1,7 @@
 #include "ini_judge.h"
 
 #include <sstream>
+#include <utility>
 
 #include "ascii.h"
 #include "processes.h"
@@ -34,6 +35,11 @@ IniContent ReadByNfsconf(std::string_view text) {
     }
   }
   return content;
+}
+
+std::optional<std::string> DumpByNfsconf(const std::string& path) {
+  ProgramResult result = RunProgram({"nfsconf", "--file", path, "--dump"});
+  return result.status == 0 ? std::optional<std::string>(std::move(result.output)) : std::nullopt;
 }
 
 std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key) {

@@ -8,6 +8,7 @@
 #include <cstring>
 #include <iostream>
 #include <map>
+#include <optional>
 
 #include "captured_log.h"
 #include "generated_case.h"
@@ -88,10 +89,14 @@ GeneratedFiles MakeFiles(Chance* chance) {
 
 using Values = std::map<std::string, std::string>;  // by "section key"
 
-Values AskNfsconf(const TemporaryRoot& root) {
+// nullopt if nfsconf(8) crashes.
+std::optional<Values> AskNfsconf(const TemporaryRoot& root) {
+  const std::optional<std::string> dump = DumpByNfsconf(root.At(kMain));
+  if (!dump) return std::nullopt;
   Values values;
   for (const Key& key : kKeys) {
-    values[std::string(key.section) + " " + key.key] = GetByNfsconf(root.At(kMain), key.section, key.key);
+    const bool is_set = dump->find(" " + std::string(key.key) + " = ") != std::string::npos;
+    values[std::string(key.section) + " " + key.key] = is_set ? GetByNfsconf(root.At(kMain), key.section, key.key) : "";
   }
   return values;
 }
@@ -183,22 +188,38 @@ void ExpectEffect(const Change& change, const Values& before, Values after, cons
   EXPECT_EQ(Text(RecordByNfsconf(after)), Text(wanted));
 }
 
+// No daemon starts with such files: a change has no effect, so it must be refused.
+void ExpectRefusal(const TemporaryRoot& root, const GeneratedFiles& files) {
+  const std::string text_before = AllText(root, files);
+  NFSConfRecord record{};
+  EXPECT_EQ(VORNNFSConfGet(&record), 0) << text_before;
+  record.unix_pri_enable = record.unix_pri_enable == 0 ? 1 : 0;
+  TakeLog();
+  EXPECT_LT(VORNNFSConfSet(&record), 0) << text_before;
+  EXPECT_NE(TakeLog().back().text.find("includes itself"), std::string::npos) << text_before;
+  EXPECT_EQ(AllText(root, files), text_before);
+}
+
 // Returns whether the change succeeded.
 bool RunCase(unsigned number) {
   Chance chance(number);
   const TemporaryRoot root;
   const GeneratedFiles files = MakeFiles(&chance);
   for (const auto& [path, text] : files) root.Write(path, text);
+  const std::optional<Values> before = AskNfsconf(root);
+  if (!before) {
+    ExpectRefusal(root, files);
+    return false;
+  }
   const Change& change = chance.Of(kChanges);
   const std::string text_before = AllText(root, files);
   SCOPED_TRACE("case " + std::to_string(number) + ": " + change.name + "\n" + text_before);
-  const Values before = AskNfsconf(root);
   NFSConfRecord record{};
   if (VORNNFSConfGet(&record) < 0) {
     ADD_FAILURE() << "no record";
     return false;
   }
-  EXPECT_EQ(Text(record), Text(RecordByNfsconf(before))) << "what is read";
+  EXPECT_EQ(Text(record), Text(RecordByNfsconf(*before))) << "what is read";
   change.make(&record);
   TakeLog();
   const bool done = VORNNFSConfSet(&record) >= 0;
@@ -208,7 +229,7 @@ bool RunCase(unsigned number) {
     EXPECT_EQ(AllText(root, files), text_before);
     return false;
   }
-  ExpectEffect(change, before, AskNfsconf(root), record);
+  ExpectEffect(change, *before, AskNfsconf(root).value_or(Values()), record);
   NFSConfRecord stored{};
   EXPECT_EQ(VORNNFSConfGet(&stored), 0);
   EXPECT_EQ(std::memcmp(&stored, &record, sizeof record), 0) << Text(stored);

@@ -311,6 +311,49 @@ TEST(NFSConf, ReadsEachValueAsItsDaemonDoes) {
   }
 }
 
+TEST(NFSConf, RefusesToChangeWhatIncludesItself) {
+  const struct {
+    const char* text;  // of /etc/nfs.conf
+    const char* part;  // of /etc/part
+    const char* reason;
+  } cases[] = {
+      {"[statd]\nport = 4000\ninclude = nfs.conf\n", "", "/etc/nfs.conf:3: the file includes itself"},
+      {"[statd]\nport = 4000\ninclude = part\n", "\ninclude = nfs.conf\n", "/etc/nfs.conf:3: the file includes itself"},
+      {"[statd]\nport = 4000\ninclude = part\n", "include = ./part\n", "/etc/part:1: the file includes itself"},
+      {"[statd]\nport = 4000\ninclude = part\n", "include = ../etc/part\n", "/etc/part:1: the file includes itself"},
+      {"[statd]\nport = 1\ninclude = part\n", "port = 4000\n[lockd]\ninclude = part\n", "/etc/part:3: the file inc"},
+  };
+  for (const auto& c : cases) {
+    const TemporaryRoot root;
+    root.Write("/etc/nfs.conf", c.text);
+    root.Write("/etc/part", c.part);
+    root.Write("/etc/nfs.conf.d/zz.conf", "[mountd]\nmanage-gids = y\n");
+    TakeLog();
+    NFSConfRecord record = Get();
+    EXPECT_EQ(record.statd_port, 4000) << c.text << c.part;
+    EXPECT_EQ(record.unix_pri_enable, 1) << "later files are read";
+    const std::vector<LogLine> log = TakeLog();
+    ASSERT_EQ(log.size(), 1U) << c.reason;
+    EXPECT_NE(log[0].text.find(c.reason), std::string::npos) << log[0].text;
+    record.read_size = 4096;
+    EXPECT_LT(VORNNFSConfSet(&record), 0) << c.text;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+    EXPECT_NE(TakeLog().back().text.find(c.reason), std::string::npos) << c.reason;
+    EXPECT_FALSE(root.Read(kFile).has_value());
+  }
+}
+
+TEST(NFSConf, ReadsIncludedFilesAtAnyDepth) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[statd]\ninclude = p1\n");
+  for (int depth = 1; depth <= 50; ++depth) {
+    root.Write("/etc/p" + std::to_string(depth), "include = p" + std::to_string(depth + 1) + "\n");
+  }
+  root.Write("/etc/p51", "port = 4051\n");
+  EXPECT_EQ(Judged(root, "statd", "port"), "4051");
+  EXPECT_EQ(Get().statd_port, 4051);
+}
+
 TEST(NFSConf, TakesAPrincipalOfAnyLengthThatFits) {
   const TemporaryRoot root;
   NFSConfRecord record = Full();

@@ -1,5 +1,8 @@
 #include "idmap_judge.h"
 
+#include <dlfcn.h>
+#include <netdb.h>
+#include <pwd.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -22,6 +25,8 @@ extern "C" {
 
 namespace {
 
+constexpr int kSignalled = 128;  // ProgramResult::status
+
 void Silent(const char* /*format*/, ...) {}
 
 std::size_t CountThreads() {
@@ -41,9 +46,20 @@ void WaitForOtherThreads() {
   Eventually([] { return CountThreads() <= usual; });
 }
 
+// Lets the children inherit what each of them would find out again: the modules of the name service, and the folders
+// without plug-ins, which the dynamic linker remembers.
+void PrepareForChildren() {
+  [[maybe_unused]] static const bool is_prepared = [] {
+    getpwnam("root");
+    gethostbyname("localhost");
+    return dlopen("static.so", RTLD_NOW) == nullptr && dlopen("nsswitch.so", RTLD_NOW) == nullptr;
+  }();
+}
+
 // Asks in a process of its own: the library reads its file once.
 std::vector<std::string> Ask(const std::string& path, const std::function<void(std::ostream&)>& questions) {
   const TemporaryRoot scratch;
+  PrepareForChildren();
   WaitForOtherThreads();
   ChildProcess child([&] {
     std::string file = path;
@@ -53,7 +69,9 @@ std::vector<std::string> Ask(const std::string& path, const std::function<void(s
     questions(answers);
     return answers.flush() ? 0 : 2;
   });
-  if (child.Wait() != 0) throw std::runtime_error("the ID-mapping library refuses " + path);
+  const int status = child.Wait();
+  if (status >= kSignalled) throw LibraryCrash("the ID-mapping library crashes on " + path);
+  if (status != 0) throw std::runtime_error("the ID-mapping library refuses " + path);
   std::ifstream answers(scratch.At("/answers"));
   std::vector<std::string> lines;
   for (std::string line; std::getline(answers, line);) lines.push_back(line);

@@ -3,8 +3,14 @@
 #define VORN_TESTS_LINUX_IDMAP_JUDGE_H
 
 #include <optional>
+#include <stdexcept>
 #include <string>
 #include <vector>
+
+// The library ended its process. If it only refuses a file, the functions below throw std::runtime_error.
+struct LibraryCrash : std::runtime_error {
+  using std::runtime_error::runtime_error;
+};
 
 // The local user ids of Kerberos principals; none where a principal is mapped to nobody. The local
 // names are those of this system's users.

@@ -49,6 +49,8 @@ bool IsSameLine(const ExportsLines& old, std::size_t a, const ExportsLines& now,
   const std::size_t b_left = now.spans().size() - b;
   if ((a == b && a < now.shared_head()) || (a_left == b_left && a_left <= now.shared_tail())) return true;
   const ExportSpan& line = old.spans()[a];
+  const bool inherits = line.inherited != std::string_view::npos;
+  if (inherits != (now.spans()[b].inherited != std::string_view::npos)) return false;
   if (line.end == old.text().size()) return IsSameLastLine(old, line, now, now.spans()[b]);
   return old.TextOf(line) == now.TextOf(now.spans()[b]);
 }

@@ -12,11 +12,13 @@ namespace {
 
 using Found = ExportsReader::Found;
 
+constexpr std::size_t kNone = std::string_view::npos;
+
 // Returns the end of the line at `position`. A backslash before the line break continues it.
 std::size_t LineEnd(std::string_view text, std::size_t position) {
   for (;;) {
     const std::size_t newline = text.find('\n', position);
-    if (newline == std::string_view::npos) return text.size();
+    if (newline == kNone) return text.size();
     if (newline == 0 || text[newline - 1] != '\\') return newline + 1;
     position = newline + 1;
   }
@@ -55,7 +57,7 @@ class LineReader {
 
   Found ReadClientWord() {
     const std::size_t comment = reader_.SkipToClient();
-    if (comment != std::string_view::npos) line_.comment = text_.substr(comment, reader_.position() - comment);
+    if (comment != kNone) line_.comment = text_.substr(comment, reader_.position() - comment);
     word_begin_ = reader_.position();
     return reader_.ReadWord(kLongestExportClient, &word_);
   }
@@ -69,8 +71,21 @@ class LineReader {
         has_defaults_ = true;
         found = ReadClientWord();
       }
-      if (!CheckWord(found) || !AddEntry(found)) return;
+      if (!CheckWord(found) || !ApplyInherited(found) || !AddEntry(found)) return;
     }
+  }
+
+  bool ApplyInherited(Found found) {
+    const std::size_t inherited = std::exchange(line_.span.inherited, kNone);
+    const bool is_applied = found == Found::kNothing && !has_defaults_ && line_.entries.empty();
+    if (inherited == kNone || !is_applied) return true;
+    line_.span.inherited = inherited;
+    std::string word;
+    ExportsReader(text_, inherited).ReadWord(kLongestExportClient, &word);
+    word.resize(std::min(word.find('('), word.size()));
+    if (!Apply(&defaults_, std::string_view{word}.substr(1))) return false;
+    line_.fault = {line_.span.path, "no client; exportfs applies \"" + word + "\" of the line before", false};
+    return true;
   }
 
   // exportfs cannot resolve a client that contains the rest of the file.
@@ -97,18 +112,23 @@ class LineReader {
       const std::string_view list = std::string_view{word_}.substr(open + 1, word_.size() - open - 2);
       if (!Apply(&options, list)) return false;
     }
-    if (word_.substr(0, 1) == "/" && !line_.fault) {
-      line_.fault = {word_begin_, "a path among the clients; the line before may end with a backslash", false};
-    }
+    line_.left_over = word_.substr(0, 1) == "-" ? word_begin_ : kNone;
+    Doubt("/", "a path among the clients; the line before may end with a backslash");
+    Doubt("-", "exportfs takes a second word of default options for a host name");
     ExportEntry entry{open == 0 ? "*" : word_.substr(0, open), options.Options(), {}};
     if (!has_defaults_ && open > 0) entry.word = text_.substr(word_begin_, reader_.word_end() - word_begin_);
     line_.entries.push_back(std::move(entry));
     return true;
   }
 
+  // exportfs reads on after such a client.
+  void Doubt(std::string_view first_character, const char* reason) {
+    if (word_.substr(0, 1) == first_character && !line_.fault) line_.fault = {word_begin_, reason, false};
+  }
+
   void FinishLine() {
     const std::size_t comment = reader_.SkipToClient();
-    if (comment != std::string_view::npos) line_.comment = text_.substr(comment, reader_.position() - comment);
+    if (comment != kNone) line_.comment = text_.substr(comment, reader_.position() - comment);
     line_.span.end = reader_.position();
     if (reader_.at_end()) return;
     word_begin_ = reader_.position();

@@ -17,6 +17,10 @@ struct ExportSpan {
   std::size_t begin = 0;
   std::size_t path = 0;  // where its path begins, after blanks
   std::size_t end = 0;
+  // Where the word of the line before is that exportfs(8) applies to this one; npos if there is none. exportfs does
+  // not clear its buffer: where a line has no client, the last client of the line before, if that begins with "-",
+  // is read as default options once more.
+  std::size_t inherited = std::string_view::npos;
 };
 
 using ExportSpans = std::vector<ExportSpan>;
@@ -50,11 +54,12 @@ struct ExportLine {
   std::vector<ExportEntry> entries;
   std::string comment;  // with its "#", or empty
   std::optional<ExportFault> fault;
+  std::size_t left_over = std::string_view::npos;  // where its last client is, if that begins with "-"
 };
 
-// Reads the line whose begin and path are those of `span`. The end of `span` is not used; that of the result is the
-// line's. After a fault that ends the file, the line ends at the next line break without a backslash, even in a
-// quotation.
+// Reads the line whose begin, path and inherited word are those of `span`. The end of `span` is not used; that of the
+// result is the line's, and its inherited word is npos if the line has a client. After a fault that ends the file, the
+// line ends at the next line break without a backslash, even in a quotation.
 ExportLine ReadExportLine(std::string_view text, const ExportSpan& span);
 
 // The entries of several lines in order. If two have clients that are one client to exportfs(8), only the first

@@ -9,12 +9,12 @@
 namespace vorn {
 namespace {
 
-bool IsPlain(std::string_view text) {
-  return text.find('"') == std::string_view::npos && text.find('\\') == std::string_view::npos;
-}
+constexpr std::size_t kNone = std::string_view::npos;
 
-// Finds one line after the other. Nearly all lines have no quotation mark and no backslash; those end at the
-// next line break and need not be read for that.
+bool IsPlain(std::string_view text) { return text.find('"') == kNone && text.find('\\') == kNone; }
+
+// Finds one line after the other. Nearly all lines have no quotation mark, no backslash and no default options; those
+// end at the next line break and need not be read for that.
 class LineFinder {
  public:
   explicit LineFinder(std::string_view text) : text_(text) {}
@@ -23,17 +23,34 @@ class LineFinder {
   // last line it returns an empty span at the end of the text.
   ExportSpan Next(std::size_t position) {
     ExportsReader reader(text_, position);
-    ExportSpan span{position, position, position};
+    ExportSpan span{position, position, position, std::exchange(left_over_, kNone)};
     if (position == text_.size() || text_[position] != '/') span.begin = reader.SkipToPath();
     span.path = reader.position();
     const std::size_t newline = text_.find('\n', span.path);
-    span.end = newline == std::string_view::npos ? text_.size() : newline + 1;
-    const bool simple =
-        Following('"', span.path, &quotation_) >= span.end && Following('\\', span.path, &backslash_) >= span.end;
-    return simple ? span : ReadExportLine(text_, span).span;
+    span.end = newline == kNone ? text_.size() : newline + 1;
+    if (IsSimple(span)) return span;
+    const ExportLine line = ReadExportLine(text_, span);
+    left_over_ = line.left_over;
+    has_left_over_ = has_left_over_ || left_over_ != kNone;
+    return line.span;
   }
 
+  // Whether one of the lines has a word that exportfs(8) may apply to the next line.
+  bool has_left_over() const { return has_left_over_; }
+
  private:
+  bool IsSimple(const ExportSpan& span) {
+    return span.inherited == kNone && Following('"', span.path, &quotation_) >= span.end &&
+           Following('\\', span.path, &backslash_) >= span.end && !HasDefaults(span);
+  }
+
+  bool HasDefaults(const ExportSpan& span) {
+    for (std::size_t at = Following('-', span.path, &hyphen_); at < span.end; at = Following('-', at + 1, &hyphen_)) {
+      if (at > 0 && ExportsReader::EndsWord(text_[at - 1])) return true;
+    }
+    return false;
+  }
+
   // Returns where `c` is next at or after `position`. `last` keeps the result of the last search, so that the whole
   // text is searched only once.
   std::size_t Following(char c, std::size_t position, std::size_t* last) const {
@@ -44,6 +61,9 @@ class LineFinder {
   std::string_view text_;
   std::size_t quotation_ = 0;
   std::size_t backslash_ = 0;
+  std::size_t hyphen_ = 0;
+  std::size_t left_over_ = kNone;
+  bool has_left_over_ = false;
 };
 
 // Large blocks are compared by memcmp(3), which is several times faster than a loop over bytes.
@@ -82,7 +102,7 @@ Common CommonLines(std::string_view a, std::string_view b) {
   std::size_t tail = CommonSuffix(a.substr(head), b.substr(head));
   if (!BeginsLine(a, a.size() - tail) || !BeginsLine(b, b.size() - tail)) {
     const std::size_t newline = a.find('\n', a.size() - tail);
-    tail = newline == std::string_view::npos ? 0 : a.size() - newline - 1;
+    tail = newline == kNone ? 0 : a.size() - newline - 1;
   }
   return {head, tail};
 }
@@ -96,10 +116,11 @@ ExportsLines::ExportsLines(std::string text, const ExportsLines& previous) : tex
 }
 
 void ExportsLines::FindAll() {
-  is_plain_ = IsPlain(text_);
+  spans_.clear();
   spans_.reserve(text_.size() / 64 + 1);
   LineFinder finder(text_);
   for (ExportSpan line = finder.Next(0); line.path < text_.size(); line = finder.Next(line.end)) spans_.push_back(line);
+  is_plain_ = IsPlain(text_) && !finder.has_left_over();
 }
 
 // Finds the lines between those that `previous` has as well. Returns false if one of them may continue in another
@@ -109,7 +130,6 @@ bool ExportsLines::FindChanged(const ExportsLines& previous) {
   const std::size_t tail_begin = text_.size() - common.tail;
   const auto up_to_tail = std::string_view(text_).substr(0, tail_begin);
   if (!IsPlain(up_to_tail.substr(common.head))) return false;
-  is_plain_ = true;
 
   const auto begins_before = [](const ExportSpan& line, std::size_t position) { return line.begin < position; };
   const ExportSpans& old = previous.spans_;
@@ -121,9 +141,11 @@ bool ExportsLines::FindChanged(const ExportsLines& previous) {
   for (ExportSpan line = finder.Next(common.head); line.path < tail_begin; line = finder.Next(line.end)) {
     spans_.push_back(line);
   }
+  is_plain_ = !finder.has_left_over();
+  if (!is_plain_) return false;
   const std::size_t shift = text_.size() - previous.text_.size();  // modulo 2^64 if the text is shorter
   for (auto line = tail; line != old.end(); ++line) {
-    spans_.push_back({line->begin + shift, line->path + shift, line->end + shift});
+    spans_.push_back({line->begin + shift, line->path + shift, line->end + shift, kNone});
   }
   shared_head_ = static_cast<std::size_t>(head_end - old.begin());
   shared_tail_ = static_cast<std::size_t>(old.end() - tail);

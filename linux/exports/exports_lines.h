@@ -37,7 +37,9 @@ class ExportsLines {
   void FindAll();
 
   std::string text_;
-  bool is_plain_ = false;  // whether there is no quotation mark and no backslash, so that each line is one of the text
+  // Whether no line depends on another one: there is no quotation mark and no backslash, and no word that exportfs(8)
+  // applies to the next line.
+  bool is_plain_ = false;
   ExportSpans spans_;
   std::size_t shared_head_ = 0;
   std::size_t shared_tail_ = 0;

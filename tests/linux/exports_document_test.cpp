@@ -64,6 +64,14 @@ const std::vector<std::string> kFiles = {
     "/a -" + kLast,
     "/a -sec=krb5,rw alpha(ro) gamma(sec=sys) beta.example -all_squash 10.0.0.4(async)" + kLast,
     "/a alpha(ro) -rw" + kLast,
+    "/a -ro -async\n/b\n/c" + kLast,
+    "/a -ro -rw,async(insecure)\n\n# c\n\"/b\" # x" + kLast,
+    "/a -ro \"-rw\" \n/b " + kLast,
+    "/a -ro \\055async\n/b" + kLast,
+    "/a -ro -async alpha\n/b" + kLast,
+    "/a alpha -ro -async\n/b alpha\n/c" + kLast,
+    "/a alpha -ro -async\n/b -rw\n/c" + kLast,
+    "/a -ro -foo\n/b" + kLast,
     "/a alpha(sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i)" + kLast,
     "/a (ro)" + kLast,
     "/a alpha (rw)" + kLast,
@@ -389,6 +397,17 @@ TEST(ExportsDocument, RefusesToRewriteALineThatItDoesNotUnderstand) {
   }
 }
 
+TEST(ExportsDocument, RefusesToChangeWhatExportfsAppliesToTheNextLine) {
+  const ExportsDocument document("/a -ro -all_squash\n/b x(rw)\n/c\n/d -ro -rw\n/e\n");
+  const ExportPaths paths;
+  EXPECT_TRUE(document.Replace("/c", {Entry("h", "")}, paths).ok());
+  EXPECT_FALSE(document.Replace("/e", {Entry("h", "")}, paths).ok()) << "its access is an accident";
+  EXPECT_FALSE(document.Replace("/d", {}, paths).ok()) << "/e would lose the options";
+  EXPECT_TRUE(document.Replace("/b", {Entry("x", "ro")}, paths).ok());
+  EXPECT_FALSE(document.Replace("/b", {}, paths).ok()) << "/c would get the options";
+  EXPECT_TRUE(document.Replace("/e", {}, paths).ok());
+}
+
 TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
   for (const char* text : {"\"/b x\n", "\"/b x", "/b \"x", "/b x\n/c \"y(rw)"}) {
     const auto edited = ExportsDocument(text).Replace("/a", {Entry("h", "")}, ExportPaths());
@@ -408,7 +427,8 @@ TEST(ExportsDocument, TellsWhereALineIsNotUnderstoodAndWhy) {
                              {"/a x \\\n y(rw\n", "2:2", "\")\"", true},
                              {"/a h1(rw) h2(rw, sync) h3(ro)\n", "1:11", "\")\"", true},
                              {"/a x\n\r\n", "2:1", "path", true},
-                             {"/a x \\\n/b y(rw)\n", "2:1", "backslash", false}};
+                             {"/a x \\\n/b y(rw)\n", "2:1", "backslash", false},
+                             {"/a -ro -rw\n", "1:8", "host name", false}};
   for (const FaultCase& c : cases) {
     const ExportsDocument document(c.text);
     std::vector<ExportFault> faults;

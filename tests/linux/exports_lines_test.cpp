@@ -12,16 +12,17 @@
 namespace vorn {
 
 bool operator==(const ExportSpan& a, const ExportSpan& b) {
-  return a.begin == b.begin && a.path == b.path && a.end == b.end;
+  return a.begin == b.begin && a.path == b.path && a.end == b.end && a.inherited == b.inherited;
 }
 
 namespace {
 
-// Parts of lines, mostly whole ones. The rare parts continue a line, or open a quotation.
+// Parts of lines, mostly whole ones. The rare parts continue a line, open a quotation, or have a second word of
+// options.
 std::string Text(Chance* chance, int parts) {
   static const char* const common[] = {"/a h(rw)\n", "/b/c h1 h2\n", "/d h", "\n",
                                        "# note\n",   "  /e h # x\n", "\t",   "\n\n"};
-  static const char* const rare[] = {"\\\n", "\"", "/q\\040r h\n", "/s \"h (rw)\"\n", "\\"};
+  static const char* const rare[] = {"\\\n", "\"", "/q\\040r h\n", "/s \"h (rw)\"\n", "\\", "/o -ro -rw\n", "/n\n"};
   const bool is_plain = !chance->OneIn(3);
   std::string text;
   for (int part = 0; part < parts; ++part) {

@@ -15,32 +15,21 @@ namespace {
 constexpr char kReplacement[] = "\xef\xbf\xbd";
 
 // Shows each principal under a string of its own. Principals that are valid UTF-8 are shown as they are.
-class UniqueNames {
- public:
-  explicit UniqueNames(const std::vector<IniFound>& stored) {
-    for (const IniFound& mapping : stored) {
-      const std::string shown = ToValidUtf8(mapping.key);
-      if (shown == mapping.key) valid_.insert(mapping.key);
-    }
-  }
-
-  std::string NameOf(std::string_view principal) {
-    std::string shown = ToValidUtf8(principal);
-    if (shown == principal) return shown;
-    while (valid_.count(shown) != 0 || !repaired_.insert(shown).second) shown += kReplacement;
-    return shown;
-  }
-
- private:
-  std::unordered_set<std::string_view> valid_;
-  std::unordered_set<std::string> repaired_;
-};
-
 std::shared_ptr<const TextPairs> Shown(const std::vector<IniFound>& stored) {
-  UniqueNames names(stored);
   std::vector<TextPairs::Pair> pairs;
   pairs.reserve(stored.size());
-  for (const IniFound& mapping : stored) pairs.emplace_back(names.NameOf(mapping.key), ToValidUtf8(mapping.value));
+  std::vector<std::size_t> repaired;
+  for (const IniFound& mapping : stored) {
+    pairs.emplace_back(ToValidUtf8(mapping.key), ToValidUtf8(mapping.value));
+    if (pairs.back().first != mapping.key) repaired.push_back(pairs.size() - 1);
+  }
+  if (!repaired.empty()) {
+    std::unordered_set<std::string> taken;
+    for (const IniFound& mapping : stored) taken.emplace(mapping.key);
+    for (const std::size_t at : repaired) {
+      while (!taken.insert(pairs[at].first).second) pairs[at].first += kReplacement;
+    }
+  }
   return std::make_shared<const TextPairs>(std::move(pairs));
 }
 

@@ -35,6 +35,7 @@ IniDocument IniDocument::Parse(std::string_view text) {
   const std::string_view read = rest.substr(0, rest.find('\0'));
   const std::size_t first_end = read.find('\n');
   if (first_end != std::string_view::npos && first_end > 0 && read[first_end - 1] == '\r') document.line_end_ = "\r\n";
+  document.deciding_.reserve(static_cast<std::size_t>(std::count(read.begin(), read.end(), '\n')));
   std::size_t at = 0;
   while (const std::size_t length = IniLineLength(read.substr(at))) {
     document.Append(read.substr(at, length));
@@ -64,15 +65,17 @@ void IniDocument::Append(std::string_view text) {
 IniDocument::Line IniDocument::MakeLine(std::string_view text, SectionNumber section) {
   std::string_view joined = text;
   if (text.find("\\\n") != std::string_view::npos) joined = texts_.emplace_back(JoinIniLine(text));
-  return {text, ReadIniLine(joined), 0, section, false, {}};
+  return {text, ReadIniLine(joined), 0, section, false, false, {}};
 }
 
 void IniDocument::Index(Place line) {
   if (!line->has_argument) sections_[line->section].last = line;
   if (line->content.kind != IniLine::Kind::kAssignment || line->content.value.empty()) return;
   const auto [found, is_new] = deciding_.try_emplace(KeyId{line->section, line->content.name}, line);
+  line->decides = true;
   if (is_new) return;
   line->earlier = found->second;
+  found->second->decides = false;
   found->second = line;
 }
 
@@ -121,9 +124,7 @@ std::vector<IniSetting> IniDocument::Settings(std::string_view section) const {
   const SectionNumber number = Known(section);
   if (number == kNoSection) return settings;
   for (const Line& line : lines_) {
-    if (line.section != number || line.content.kind != IniLine::Kind::kAssignment) continue;
-    const auto found = deciding_.find(KeyId{number, line.content.name});
-    if (found == deciding_.end() || &*found->second != &line || line.has_argument) continue;
+    if (line.section != number || !line.decides || line.has_argument) continue;
     settings.push_back({line.content.name, line.content.value, line.number});
   }
   return settings;
@@ -168,6 +169,7 @@ void IniDocument::Replace(Place line, const IniValue& value) {
   auto entry = deciding_.extract(id);  // its key is a view of the old text
   Line changed = MakeLine(texts_.emplace_back(std::move(text)), line->section);
   changed.number = line->number;
+  changed.decides = line->decides;
   changed.earlier = line->earlier;
   *line = changed;
   entry.key() = KeyId{line->section, line->content.name};

@@ -98,6 +98,7 @@ class IniDocument {
     int number = 0;
     SectionNumber section = kNoSection;  // of a line with meaning
     bool has_argument = false;           // whether its section has one
+    bool decides = false;                // whether it gives its key the value that counts
     std::optional<Place> earlier;        // the line before that gives the same key a value
   };
 

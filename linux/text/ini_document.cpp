@@ -70,7 +70,9 @@ IniDocument::Line IniDocument::MakeLine(std::string_view text, SectionNumber sec
 
 void IniDocument::Index(Place line) {
   if (!line->has_argument) sections_[line->section].last = line;
-  if (line->content.kind != IniLine::Kind::kAssignment || line->content.value.empty()) return;
+  if (line->content.value.empty()) return;
+  if (line->content.kind == IniLine::Kind::kInclude) includes_.push_back(line);
+  if (line->content.kind != IniLine::Kind::kAssignment) return;
   const auto [found, is_new] = deciding_.try_emplace(KeyId{line->section, line->content.name}, line);
   line->decides = true;
   if (is_new) return;
@@ -140,11 +142,9 @@ std::vector<IniEntry> IniDocument::Entries(std::string_view section) const {
 
 std::vector<IniInclude> IniDocument::Includes() const {
   std::vector<IniInclude> includes;
-  for (const Line& line : lines_) {
-    if (line.content.kind != IniLine::Kind::kInclude || line.content.value.empty()) continue;
-    if (line.section == kNoSection) continue;
-    includes.push_back({std::nullopt, std::string(line.content.value), line.number});
-    if (!line.has_argument) includes.back().section = sections_[line.section].name;
+  for (const Place line : includes_) {
+    includes.push_back({std::nullopt, std::string(line->content.value), line->number});
+    if (!line->has_argument) includes.back().section = sections_[line->section].name;
   }
   return includes;
 }

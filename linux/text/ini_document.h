@@ -43,7 +43,7 @@ struct IniInclude {
 // The reader ignores a last line without line feed, and everything from a NUL byte on. An edit leaves that tail at
 // the end of the file, without effect.
 //
-// Parsing takes time in proportion to the text, and every other operation but Settings, Entries and Includes takes
+// Parsing takes time in proportion to the text, and every other operation but Settings and Entries takes
 // constant time plus the time for the lines of its key. Reading is thread-safe; editing is not.
 class IniDocument {
  public:
@@ -139,6 +139,7 @@ class IniDocument {
   SectionNumber current_ = kNoSection;  // the section at the end
   bool current_has_argument_ = false;
   std::unordered_map<KeyId, Place, HashKeyId, SameKeyId> deciding_;  // the line that gives a key its value
+  std::vector<Place> includes_;                                      // in order; no edit adds or removes one
   const char* line_end_ = "\n";
 };
 

@@ -1,6 +1,6 @@
 # vorn_add_fuzzer(NAME LIBRARIES...): the libFuzzer program of NAME.cpp in this folder, with its seeds in
 # corpus/NAME/. Its sources must be compiled for it: configure with clang and VORN_SANITIZE, which the
-# preset "fuzz" does. ctest runs every seed once; scripts that hunt give the program a time of their own.
+# preset "fuzz" does. ctest runs every seed once; scripts/fuzz runs the program for a given time.
 add_custom_target(fuzzers)  # all of them
 
 function(vorn_add_fuzzer name)

@@ -1,4 +1,4 @@
-// A request's parameters. What is accepted survives being written and read again.
+// The parameters of a request. Parameters that are accepted stay equal when they are written and read again.
 #include "json_input.h"
 
 #include <json/writer.h>

@@ -1,5 +1,5 @@
-// Keytab files. One that we accept is a whole one to Kerberos' own library too, which lists the same keys in the
-// same order and finds each of them, and what the file lists goes back into the library as a principal.
+// Keytab files. libkrb5 accepts each keytab that the platform accepts, lists the same keys in the same order, finds
+// each of them, and parses each principal that is listed.
 #include <fcntl.h>
 #include <krb5/krb5.h>
 #include <sys/mman.h>

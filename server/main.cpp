@@ -49,7 +49,7 @@ bool StartedBySystemd() {
   return pid != nullptr && pid == std::to_string(getpid());
 }
 
-// Tells systemd, where it waits for that, and nobody otherwise.
+// Notifies systemd if it started this process with Type=notify (sd_notify(3)); otherwise does nothing.
 void Notify(const char* state) { sd_notify(0, state); }
 
 // Beside the program where it is installed, else where it was built.

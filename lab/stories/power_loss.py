@@ -81,7 +81,7 @@ def test_everything_acknowledged_is_there_after_the_boot(box, client):
     assert recorded("rule")[-1] <= int(high) * 250 + int(low) - 1 <= recorded("try")[-1]
     mapped = {item["id"] for item in api.call("NFS.IDMap", "list")["idmap"]}
     assert {f"user{number}@LAB.TEST" for number in recorded("mapping")} <= mapped
-    assert client.mounts("/srv/good")  # nobody started it but the boot
+    assert client.mounts("/srv/good")  # only the boot has started it
     box.allow("data")
     api.call("NFS.IDMap", "delete", id=sorted(mapped))
     assert list(pathlib.Path("/etc").glob(".*.vorn-*")) == []

@@ -7,7 +7,7 @@
 namespace vorn::server {
 namespace {
 
-// The parameters are in memory a second time when the method has asked for all of them at once.
+// A method that asks for all parameters in one object has a second copy of them in memory.
 constexpr std::size_t kCopies = 2;
 
 // From here on it pays to give memory back immediately: the tree of 20,000 values.

@@ -100,7 +100,7 @@ MultipartParser::Step MultipartParser::SkipPreamble() {
   return step;
 }
 
-// What follows a boundary: two hyphens after the last, else blanks and the end of the line.
+// Reads the rest of a boundary line: two hyphens after the last boundary, else blanks and the line break.
 MultipartParser::Step MultipartParser::EndBoundary() {
   if (pending_.size() < 2) return Step::kNeedMore;
   if (pending_.substr(0, 2) == "--") {

@@ -8,7 +8,7 @@
 
 namespace vorn::server {
 
-// What one part says about itself.
+// The head of one part.
 struct PartHead {
   std::string name;
   bool is_file = false;  // it has a file name, or a type that is not text/plain

@@ -13,7 +13,7 @@ bool IsTokenCharacter(char c) {
          kTokenMarks.find(c) != std::string_view::npos;
 }
 
-// Takes a token off the front of `rest`; empty when there is none.
+// Removes a token from the front of `rest` and returns it; empty if `rest` does not begin with one.
 std::string_view TakeToken(std::string_view* rest) {
   const auto end = std::find_if_not(rest->begin(), rest->end(), IsTokenCharacter);
   const std::string_view token = rest->substr(0, static_cast<std::size_t>(end - rest->begin()));

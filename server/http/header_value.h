@@ -23,7 +23,7 @@ bool EqualsIgnoringCase(std::string_view a, std::string_view b);  // of ASCII le
 // Commas in quoted strings are not recognised.
 void ForEachElement(std::string_view list, const std::function<void(std::string_view)>& visit);
 
-// None for a value that does not follow the grammar or that gives a parameter twice.
+// Returns nullopt for a value that does not follow the grammar or that gives a parameter twice.
 std::optional<HeaderValue> ParseHeaderValue(std::string_view text);
 
 }  // namespace vorn::server

@@ -140,7 +140,7 @@ SocketAddress LocalAddress(int socket) {
   return address;
 }
 
-// As --listen takes it; empty for an address that is none of ours.
+// Returns the address in the syntax of --listen; empty for a socket of another address family.
 std::string NameOf(const SocketAddress& address) {
   if (address.family() == AF_UNIX) return std::string(kUnixScheme) + address.As<sockaddr_un>().sun_path;
   if (address.family() == AF_INET) {

@@ -14,8 +14,8 @@ using IniContent = std::map<std::string, std::map<std::string, std::string>>;
 // The content of a file holding `text`.
 IniContent ReadByNfsconf(std::string_view text);
 
-// What nfsconf(8) prints of the file at `path` and the folder `path`.d; nullopt if it crashes, as it does if a file
-// includes itself.
+// Returns what nfsconf(8) prints of the file at `path` and the folder `path`.d; nullopt if it crashes, as it does if a
+// file includes itself.
 std::optional<std::string> DumpByNfsconf(const std::string& path);
 
 // The value in the file at `path` and, as its services read it, in the folder `path`.d; empty when

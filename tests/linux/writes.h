@@ -39,7 +39,7 @@ using Contents = std::map<std::string, std::optional<std::string>>;  // by path;
 // Returns the contents of the files of a change.
 Contents ContentsOf(const TemporaryRoot& root, const Change& change);
 
-// The temporary files that lie beside the files of a change.
+// The temporary files in the folders of the files of a change.
 std::vector<std::string> Leftovers(const TemporaryRoot& root, const Change& change);
 
 #endif  // VORN_TESTS_LINUX_WRITES_H

@@ -94,7 +94,7 @@ Json::Value Parsed(const std::string& json) {
   return *value;
 }
 
-// What has no say in what is stored: it is taken for a switch, whatever it is.
+// Whether the method converts the value to a boolean, so that every value is accepted.
 bool IsConverted(const Method& method, const std::string& place) {
   return method.entry == NFSAdvSet && place == "enable_nfs";
 }
@@ -152,7 +152,7 @@ void Hostile::Try(const Method& method, const std::string& place, const HostileV
   Json::Value params = Parsed(method.params);
   Json::Value& value = At(&params, place);
   value = hostile.value;
-  // What an upload names is removed, so it must not exist.
+  // The module removes the file that an upload names, so the path must not exist.
   if (place == "keytab_file_tmp" && value.isString()) value = box_.root().At("/none/") + value.asString();
 
   Tally& tally = tallies_[hostile.kind];
@@ -183,7 +183,7 @@ void Hostile::Print() const {
 }
 
 // ---------------------------------------------------------------------------------------------
-// What the readers say.
+// The files as their readers understand them.
 
 // Without what requests may change.
 IniContent WithoutOurs(IniContent content) {

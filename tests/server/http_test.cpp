@@ -55,7 +55,7 @@ TEST_F(HttpTest, ABodyThatIsRefusedOnItsWayEndsTheConnection) {
   Connection client = Connect();
   client.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 100000000\r\n\r\nabc stop");
   EXPECT_EQ(client.Receive().body, "stopped");
-  // Whoever sends on without looking still gets to see the answer, and then the end.
+  // A client that keeps sending without reading still receives the answer, and then the end of the connection.
   client.Send(std::string(1000000, 'x'));
   client.FinishSending();
   EXPECT_TRUE(client.IsClosedByServer());

@@ -1,4 +1,4 @@
-// All methods at once, by many threads and many processes: the real module on the Linux platform, over one root. Each
+// Many threads and processes call all methods concurrently: the real module on the Linux platform, over one root. Each
 // client owns a share, some principals and a setting, and finds in them what it was told to be done.
 #include <gmock/gmock.h>
 #include <json/writer.h>

@@ -1,4 +1,4 @@
-// What the real vornd makes of requests that two readers could take differently, and of malformed ones.
+// The answers of the real vornd to malformed requests, and to requests that two parsers could frame differently.
 #include <gtest/gtest.h>
 
 #include <csignal>

@@ -46,7 +46,7 @@ void Wait(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess("released");
 }
 
-// What the server was told of the root.
+// Answers with the root that the server was started with.
 void Root(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   const char* root = std::getenv("VORN_ROOT");
   response->SetSuccess(root == nullptr ? Json::Value() : Json::Value(root));

@@ -134,11 +134,15 @@ Status CheckUnderstood(const ExportsFile& file, const std::vector<ExportLine>& l
   return {};
 }
 
+// Whether the caller removes all rules of the share. Faulty lines are then removed, too; a save that only keeps the
+// rules of other files must not do that.
+bool RemovesAll(const ExportRuleList* list) { return list == nullptr || list->first == nullptr; }
+
 Status WriteEntries(Box& box, const ExportsFile& file, const std::string& path, const ShareExports& share,
-                    const std::vector<ExportEntry>& entries) {
-  const bool removes_nothing = !entries.empty() || share.own_lines.empty();
-  if (share.own == entries && removes_nothing) return box.Confirm(kExportsFile);
-  if (Status status = entries.empty() ? Status() : CheckUnderstood(file, share.own_lines); !status.ok()) return status;
+                    const std::vector<ExportEntry>& entries, bool removes_all) {
+  const bool removes_line = removes_all && !share.own_lines.empty();
+  if (share.own == entries && !removes_line) return box.Confirm(kExportsFile);
+  if (Status status = removes_all ? Status() : CheckUnderstood(file, share.own_lines); !status.ok()) return status;
   const Result<std::string> text = file.document.Replace(path, entries, BoxPaths(box.root()));
   return text.ok() ? box.Replace(kExportsFile, *text, file.version) : text.status();
 }
@@ -177,7 +181,7 @@ Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* 
     if (Status status = writer.Add(*rule); !status.ok()) return status;
   }
   if (Status status = writer.CheckForeign(); !status.ok()) return status;
-  return WriteEntries(box, *files->front(), path, share, writer.entries());
+  return WriteEntries(box, *files->front(), path, share, writer.entries(), RemovesAll(list));
 }
 
 Result<ExportsVersion> ReadExportsVersion(Box& box) {

@@ -602,7 +602,10 @@ class GeneratedBox {
       const bool is_other = line.path != outcome.path && line.text.find('\\') == std::string::npos;
       const bool must_stay = is_other || (line.has_fault && !outcome.removed_all);
       const bool stays = after.file.find(line.text) != std::string::npos;
-      EXPECT_TRUE(stays || !must_stay) << outcome.name << "\n" << before.file << "\nlost: " << line.text;
+      EXPECT_TRUE(stays || !must_stay) << outcome.name << "\n"
+                                       << before.file << "\nlost: " << line.text << "\nshare: " << outcome.path
+                                       << "\nafter:\n"
+                                       << after.file;
     }
   }
 

@@ -243,6 +243,17 @@ TEST_F(ForeignExports, StayWhereTheyAreIfTheyDoNotChange) {
   EXPECT_EQ(File(), "/volume1/data own(rw,sync,root_squash,sec=sys)\n");
 }
 
+TEST_F(ForeignExports, AreKeptByASaveThatLeavesAFaultyLineAlone) {
+  const std::string faulty = "/volume1/zfs x(foo) hidden(rw)\n";
+  root.Write(kFile, faulty);
+  const List list = Get("/volume1/zfs", 1);
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/zfs", list.get()), 0) << "nothing changes";
+  EXPECT_EQ(File(), faulty);
+  root.Write(kFile, "/volume1/zfs own(ro) x(foo) hidden(rw)\n");
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/zfs", list.get()), -1) << "hidden would be lost";
+  EXPECT_THAT(Reason(), HasSubstr("/etc/exports:1:"));
+}
+
 TEST_F(ForeignExports, CannotBeChangedOrRemoved) {
   const List list = Get("/volume1/data", 2);
   list->first->next->privilege = 1;

@@ -1,13 +1,12 @@
 """Locks and open files, when the service restarts under the clients that hold them."""
 
 import contextlib
-import errno
-import fcntl
 import os
 import pathlib
 
 import pytest
 
+from harness.locks import is_locked, lock
 from harness.programs import wait_for
 
 
@@ -20,26 +19,6 @@ def long_lease(box):
     box.restart()
     yield
     settings.unlink()
-
-
-def lock(path):
-    """Locks the file for this process; raises OSError where another machine has the lock."""
-    file = open(path, "r+", encoding="ascii")  # pylint: disable=consider-using-with
-    try:
-        fcntl.lockf(file, fcntl.LOCK_EX | fcntl.LOCK_NB)
-    except OSError:
-        file.close()
-        raise
-    return file
-
-
-def is_locked(path):
-    try:
-        lock(path).close()
-    except OSError as failure:
-        assert failure.errno in (errno.EAGAIN, errno.EACCES)
-        return True
-    return False
 
 
 def restart_by_settings(box):

@@ -1,7 +1,5 @@
 """Fixed ports: rpcbind shows them, the firewall follows them, and locks work through them."""
 
-import errno
-import fcntl
 import pathlib
 import socket
 
@@ -9,6 +7,7 @@ import pytest
 
 from harness import api, firewall
 from harness.firewall import reaches
+from harness.locks import is_locked, lock
 from harness.programs import run
 
 @pytest.fixture
@@ -17,22 +16,6 @@ def strict_firewall(box):
     del box
     with firewall.strict_firewall():
         yield
-
-
-def lock(path):
-    """Locks the file for this process; raises OSError where somebody else has it."""
-    file = open(path, "w", encoding="ascii")  # pylint: disable=consider-using-with
-    fcntl.lockf(file, fcntl.LOCK_EX | fcntl.LOCK_NB)
-    return file
-
-
-def is_locked(path):
-    try:
-        lock(path).close()
-    except OSError as failure:
-        assert failure.errno in (errno.EAGAIN, errno.EACCES)
-        return True
-    return False
 
 
 def test_the_daemons_listen_where_they_are_told_to(box):

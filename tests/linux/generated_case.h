@@ -2,8 +2,11 @@
 #ifndef VORN_TESTS_LINUX_GENERATED_CASE_H
 #define VORN_TESTS_LINUX_GENERATED_CASE_H
 
+#include <gtest/gtest.h>
+
 #include <cstddef>
 #include <cstdlib>
+#include <iostream>
 #include <random>
 #include <string>
 #include <utility>
@@ -29,6 +32,19 @@ class Chance {
  private:
   std::mt19937 random_;
 };
+
+// Runs the cases 0, 1, 2 ... until one fails. `run_case` returns whether the case made its change; at least a quarter
+// of all must, or the generator has become too hostile to test anything.
+template <typename RunCase>
+void RunCases(unsigned number_of_cases, const RunCase& run_case) {
+  const unsigned cases = NumberFromEnvironment("VORN_CASES", number_of_cases);
+  unsigned done = 0;
+  for (unsigned number = 0; number < cases && !testing::Test::HasFailure(); ++number) done += run_case(number) ? 1 : 0;
+  std::cout << "  " << done << " of " << cases << " changes were made, the others refused\n";
+  if (!testing::Test::HasFailure()) {
+    EXPECT_GT(done, cases / 4);
+  }
+}
 
 // Files by path below the root.
 using GeneratedFiles = std::vector<std::pair<std::string, std::string>>;

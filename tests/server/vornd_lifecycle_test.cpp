@@ -34,13 +34,19 @@ TEST(Vornd, ListensThereByDefault) {
   EXPECT_EQ(there.st_mode & 07777, 0660U);
 }
 
+// Begins a call that runs until the sandbox has a file "release". Returns when it runs.
+Connection BeginCall(const Sandbox& sandbox, const ServerProcess& server) {
+  Connection client = server.Connect();
+  client.Send(Post("/api/Test.Echo/v1/wait",
+                   R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("release") + "\"}"));
+  EXPECT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  return client;
+}
+
 TEST(Vornd, FinishesARunningCallAndThenEnds) {
   const Sandbox sandbox;
   ServerProcess server(sandbox);
-  Connection running = server.Connect();
-  running.Send(Post("/api/Test.Echo/v1/wait",
-                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("release") + "\"}"));
-  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  Connection running = BeginCall(sandbox, server);
   server.Signal(SIGTERM);
   EXPECT_TRUE(Eventually([&] { return !server.ConnectTcp().connected(); })) << "no new connections";
   sandbox.Write("release", "");
@@ -65,10 +71,7 @@ TEST(Vornd, EndsOnInterruptWithIdleClients) {
 TEST(Vornd, ASecondSignalEndsItWhileACallRuns) {
   const Sandbox sandbox;
   ServerProcess server(sandbox);
-  Connection running = server.Connect();
-  running.Send(Post("/api/Test.Echo/v1/wait",
-                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("release") + "\"}"));
-  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  Connection running = BeginCall(sandbox, server);
   server.Signal(SIGTERM);
   EXPECT_TRUE(Eventually([&] { return !server.ConnectTcp().connected(); })) << "the first is being handled";
   server.Signal(SIGINT);
@@ -78,10 +81,7 @@ TEST(Vornd, ASecondSignalEndsItWhileACallRuns) {
 TEST(Vornd, EndsWithoutACallThatNeverEnds) {
   const Sandbox sandbox;
   ServerProcess server(sandbox);
-  Connection running = server.Connect();
-  running.Send(Post("/api/Test.Echo/v1/wait",
-                    R"({"begun": ")" + sandbox.File("begun") + R"(", "release": ")" + sandbox.File("never") + "\"}"));
-  ASSERT_TRUE(Eventually([&] { return std::filesystem::exists(sandbox.File("begun")); }));
+  Connection running = BeginCall(sandbox, server);
   server.Signal(SIGTERM);
   EXPECT_EQ(server.Wait(), 0);
   EXPECT_THAT(server.log(), HasSubstr("calls are still running"));

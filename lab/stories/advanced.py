@@ -73,14 +73,6 @@ def test_equal_ports_are_refused_before_anything_is_written(box, client):
     assert client.mounts("/srv/data", version="3")
 
 
-@pytest.mark.pending("the status daemon restarts before the lock manager has left its port")
-def test_the_two_ports_can_be_exchanged(box):
-    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
-    box.advanced(statd_port=32803, nlm_port=32765)
-    assert box.rpc_ports("status") == {32803}
-    assert box.rpc_ports("nlockmgr") == {32765}
-
-
 def test_the_last_settings_are_in_force_when_everything_changes_in_one_call(box, client):
     box.share("data")
     box.allow("data", {"client": client.address})

@@ -25,6 +25,7 @@
 #include "memory.h"
 #include "module.h"
 #include "options.h"
+#include "recovery.h"
 #include "routes.h"
 #include "runtime_folder.h"
 #include "termination.h"
@@ -109,6 +110,7 @@ int Serve(const Options& options) {
     syslog(LOG_ERR, "%s", error.c_str());
     return EXIT_FAILURE;
   }
+  (void)VORN::RemoveLeftovers();  // a failure is logged, and is no reason not to serve
   const std::string module_folder = options.modules.empty() ? DefaultModuleFolder() : options.modules;
   const std::vector<Module> modules = LoadModules(module_folder);
   if (modules.empty()) {

@@ -14,8 +14,6 @@
 namespace vorn {
 namespace {
 
-constexpr char kFile[] = "/var/lib/vorn/firewall.nft";
-
 struct FreeContext {
   void operator()(nft_ctx* context) const { nft_ctx_free(context); }
 };
@@ -48,8 +46,8 @@ Status Load(const std::string& ruleset) {
 Status Save(Box& box, const std::string& ruleset) {
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
-  const Result<StoredFile> before = box.Read(kFile);
-  return before.ok() ? box.Replace(kFile, ruleset, before->version) : before.status();
+  const Result<StoredFile> before = box.Read(kFirewallFile);
+  return before.ok() ? box.Replace(kFirewallFile, ruleset, before->version) : before.status();
 }
 
 }  // namespace

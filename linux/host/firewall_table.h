@@ -12,6 +12,8 @@
 
 namespace vorn {
 
+inline constexpr char kFirewallFile[] = "/var/lib/vorn/firewall.nft";
+
 // Makes the table match the configured ports, in one transaction, and saves it in /var/lib/vorn/firewall.nft,
 // which a unit of the package loads at boot. Does nothing if the box's settings switch the firewall off.
 Status UpdateFirewall(Box& box);

@@ -16,7 +16,6 @@
 namespace vorn {
 namespace {
 
-constexpr char kKeytabFile[] = "/etc/nfs/krb5.keytab";
 constexpr std::size_t kLargest = std::size_t{1} << 20;
 constexpr mode_t kOwnerOnly = 0600;
 

@@ -11,6 +11,8 @@
 
 namespace vorn {
 
+inline constexpr char kKeytabFile[] = "/etc/nfs/krb5.keytab";
+
 // Validates the keytab at `path` and installs it atomically with mode 0600. The server's
 // own principal in the NFS settings becomes that of the keytab. Fails with kNoKeytab for a file that is not a
 // keytab or has no key; the file at `path` is left alone. Without a call context `path` is one of this system, with one

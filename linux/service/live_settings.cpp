@@ -11,7 +11,6 @@
 namespace vorn {
 namespace {
 
-constexpr char kDropIn[] = "/etc/systemd/system/nfs-server.service.d/vorn.conf";
 
 // The "-" ignores a failure: a size that the kernel refuses must not keep NFS from starting.
 constexpr char kDropInText[] =
@@ -36,9 +35,9 @@ void LogNextStart(int size) {
 Status PrepareTransferSizes(Box& box) {
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
-  const Result<StoredFile> before = box.Read(kDropIn);
+  const Result<StoredFile> before = box.Read(kDropInFile);
   if (!before.ok()) return before.status();
-  return before->text == kDropInText ? box.Confirm(kDropIn) : box.Replace(kDropIn, kDropInText, before->version);
+  return before->text == kDropInText ? box.Confirm(kDropInFile) : box.Replace(kDropInFile, kDropInText, before->version);
 }
 
 Status ApplyTransferSizes(Box& box, int read_size, int write_size) {

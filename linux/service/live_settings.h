@@ -7,6 +7,9 @@
 
 namespace vorn {
 
+// The drop-in that PrepareTransferSizes() installs.
+inline constexpr char kDropInFile[] = "/etc/systemd/system/nfs-server.service.d/vorn.conf";
+
 // Installs a drop-in of nfs-server.service, by which each start of the server, whoever asks for it, applies the
 // transfer sizes that are configured then (nfsd(7), max_block_size).
 Status PrepareTransferSizes(Box& box);

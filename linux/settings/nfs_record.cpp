@@ -16,7 +16,6 @@ namespace {
 
 using Type = NFSSetting::Type;
 
-constexpr char kFile[] = "/etc/nfs.conf.d/vorn.conf";
 constexpr char kHeading[] =
     "# The NFS settings of this box, kept by its management. Other lines here are left alone.\n";
 
@@ -158,7 +157,7 @@ Status PutDaemonPort(Box& box, const DaemonPort& daemon, const NFSConfRecord& re
     return {};
   }
   document->Remove(daemon.section, daemon.key);
-  const Result<NFSConfiguration> others = NFSConfiguration::Open(box, IniFiles::Draft{kFile, document->Text()});
+  const Result<NFSConfiguration> others = NFSConfiguration::Open(box, IniFiles::Draft{kNFSRecordFile, document->Text()});
   if (!others.ok()) return others.status();
   if (PortInForce(*others, daemon) != 0) Put(document, daemon.section, daemon.key, NumberValue(0));
   return {};
@@ -240,13 +239,13 @@ Status Verify(const NFSConfiguration& configuration, const NFSConfRecord& now, c
 }
 
 Status VerifyDraft(Box& box, const NFSConfRecord& now, const NFSConfRecord& wanted, IniEditor* file) {
-  const auto draft = NFSConfiguration::Open(box, IniFiles::Draft{kFile, file->document().Text()});
+  const auto draft = NFSConfiguration::Open(box, IniFiles::Draft{kNFSRecordFile, file->document().Text()});
   return draft.ok() ? Verify(*draft, now, wanted, file->location()) : draft.status();
 }
 
 // The change is stored, so a file that cannot be read any more is only a warning.
 Status ReadBack(Box& box, const NFSConfRecord& now, const NFSConfRecord& wanted, const std::string& own_file) {
-  const Status noted = IniFiles::NoteOwnWrite(box, kFile);
+  const Status noted = IniFiles::NoteOwnWrite(box, kNFSRecordFile);
   const Result<NFSConfiguration> stored = NFSConfiguration::Open(box);
   if (!noted.ok() || !stored.ok()) {
     Notice("the NFS settings are stored, but cannot be read back: " + (noted.ok() ? stored.status() : noted).reason());
@@ -283,7 +282,7 @@ Status WriteNFSRecord(Box& box, const NFSConfRecord& record) {
   if (const Status& status = configuration->files().CheckIncludes(); !status.ok()) return status;
   const NFSConfRecord now = RecordOf(*configuration);
   if (Status status = Check(*configuration, now, record); !status.ok()) return status;
-  Result<IniEditor> file = IniEditor::Open(box, kFile, kHeading);
+  Result<IniEditor> file = IniEditor::Open(box, kNFSRecordFile, kHeading);
   if (!file.ok()) return file.status();
   if (Status status = PutChanges(box, now, record, &file->document()); !status.ok()) return status;
   if (Status status = VerifyDraft(box, now, record, &*file); !status.ok()) return status;

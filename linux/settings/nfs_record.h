@@ -10,6 +10,9 @@
 
 namespace vorn {
 
+// The file that WriteNFSRecord() writes.
+inline constexpr char kNFSRecordFile[] = "/etc/nfs.conf.d/vorn.conf";
+
 // The record that is in force, over all files of nfs.conf(5).
 Result<NFSConfRecord> ReadNFSRecord(Box& box);
 

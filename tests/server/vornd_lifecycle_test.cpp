@@ -24,6 +24,26 @@ TEST(Vornd, ListensAtTheSocketOfItsRoot) {
   EXPECT_EQ(StatusOf(server.Connect()), 200);
 }
 
+TEST(Vornd, RemovesTheTemporaryFilesOfKilledWriters) {
+  const Sandbox sandbox;
+  for (const char* folder : {"etc/nfs.conf.d", "etc/nfs", "etc/systemd/system/nfs-server.service.d", "var/lib/vorn"}) {
+    std::filesystem::create_directories(sandbox.File(folder));
+  }
+  const char* const left[] = {"etc/.exports.vorn-a1B2c3",
+                              "etc/.idmapd.conf.vorn-a1B2c3",
+                              "etc/nfs.conf.d/.vorn.conf.vorn-a1B2c3",
+                              "etc/nfs/.krb5.keytab.vorn-a1B2c3",
+                              "etc/systemd/system/nfs-server.service.d/.vorn.conf.vorn-a1B2c3",
+                              "var/lib/vorn/.firewall.nft.vorn-a1B2c3"};
+  const char* const foreign[] = {"etc/exports", "etc/.exports.vorn-backups", "etc/.passwd.vorn-a1B2c3"};
+  for (const char* file : left) sandbox.Write(file, "text");
+  for (const char* file : foreign) sandbox.Write(file, "text");
+  const ServerProcess server(sandbox);
+  ASSERT_TRUE(server.ready()) << server.log();
+  for (const char* file : left) EXPECT_FALSE(std::filesystem::exists(sandbox.File(file))) << file;
+  for (const char* file : foreign) EXPECT_EQ(ReadWholeFile(sandbox.File(file)), "text") << file;
+}
+
 TEST(Vornd, ListensThereByDefault) {
   const Sandbox sandbox;
   const ServerProcess server(sandbox, {"--modules", TEST_MODULES});  // no --listen

@@ -1,0 +1,39 @@
+#include "recovery.h"
+
+#include <utility>
+
+#include "configuration_lock.h"
+#include "current_box.h"
+#include "error.h"
+#include "exports_files.h"
+#include "firewall_table.h"
+#include "idmap.h"
+#include "keytab.h"
+#include "live_settings.h"
+#include "nfs_record.h"
+
+namespace vorn {
+namespace {
+
+// Every file that the platform replaces.
+constexpr const char* kFiles[] = {kExportsFile, kIDMapFile, kNFSRecordFile, kKeytabFile, kDropInFile, kFirewallFile};
+
+Status ConfirmFiles(Box& box) {
+  const ConfigurationLock lock(box);
+  Status first = lock.status();
+  if (!first.ok()) return first;
+  for (const char* file : kFiles) {
+    Status status = box.Confirm(file);
+    if (first.ok()) first = std::move(status);
+  }
+  return first;
+}
+
+}  // namespace
+}  // namespace vorn
+
+namespace VORN {
+
+int RemoveLeftovers() { return vorn::ToResult(vorn::ConfirmFiles(vorn::CurrentBox())); }
+
+}  // namespace VORN

@@ -1,5 +1,6 @@
 #include "web_api.h"
 
+#include <algorithm>
 #include <functional>
 #include <string>
 #include <utility>
@@ -20,10 +21,11 @@ using NewBody = std::variant<std::unique_ptr<Body>, Response>;
 
 std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& names) {
   const std::string_view host = head.host.value_or("");
-  if (head.over_tcp && !names.Include(host)) {
+  if (!head.peer.credentials && !names.Include(host)) {
     return Refusal(421, "The Host header names another server. Names of this one can be set with --host-name.");
   }
-  const bool own_origin = !head.origin || names.AreOrigin(*head.origin, host);
+  const std::optional<std::string_view> origin = head.Header("Origin");
+  const bool own_origin = !origin || names.AreOrigin(*origin, host);
   if (own_origin && IsOwnFetch(head.Header("Sec-Fetch-Site").value_or("none"))) return std::nullopt;
   return Refusal(403, "Web pages of other sites, and of other ports, may not use this server.");
 }
@@ -97,13 +99,23 @@ Response Unchanging(Response response) {
 
 }  // namespace
 
+// The resources beside the methods. The network thread answers them, so it answers "/healthz" and "/healthz/live" as
+// long as the process is alive; only "/healthz/ready" asks the workers.
+const std::array<WebApi::Page, 4> WebApi::kPages = {{{"/api", &WebApi::List},
+                                                     {"/healthz", &WebApi::Alive},
+                                                     {"/healthz/live", &WebApi::Alive},
+                                                     {"/healthz/ready", &WebApi::Ready}}};
+
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
-WebApi::WebApi(Parts parts, Limits limits) : parts_(parts), limits_(limits) {}
+WebApi::WebApi(Parts parts, Limits limits)
+    : parts_(parts), limits_(limits), list_(Unchanging(Success(parts.routes.List()))) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepOtherSitesOut(head, parts_.names)) return *std::move(refusal);
   if (head.target == "*" && head.method == "OPTIONS") return Options("GET, HEAD, POST");
-  if (auto page = BeginPage(head)) return *std::move(page);
+  const auto page =
+      std::find_if(kPages.begin(), kPages.end(), [&head](const Page& each) { return each.path == head.target; });
+  if (page != kPages.end()) return BeginPage(*page, head);
   std::string unknown;
   const Route* route = parts_.routes.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
@@ -126,17 +138,17 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }
 
-// "/healthz" and "/healthz/live" are answered by the network thread: the process is alive.
-std::optional<WebApi::Begun> WebApi::BeginPage(const Head& head) const {
-  const bool list = head.target == "/api";
-  const bool alive = head.target == "/healthz" || head.target == "/healthz/live";
-  const bool ready = head.target == "/healthz/ready";
-  if (!list && !alive && !ready) return std::nullopt;
+WebApi::Begun WebApi::BeginPage(const Page& page, const Head& head) const {
   if (head.method == "OPTIONS") return Options("GET, HEAD");
   if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
   if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
-  if (ready) return std::make_shared<Probe>(parts_.workers.reading, limits_.ready);
-  return list ? Unchanging(Success(parts_.routes.List())) : Success(Json::Value());
+  return (this->*page.begin)();
 }
+
+WebApi::Begun WebApi::List() const { return list_; }
+
+WebApi::Begun WebApi::Alive() const { return Success(Json::Value()); }
+
+WebApi::Begun WebApi::Ready() const { return std::make_shared<Probe>(parts_.workers.reading, limits_.ready); }
 
 }  // namespace vorn::server

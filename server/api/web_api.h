@@ -2,6 +2,7 @@
 #ifndef VORN_SERVER_WEB_API_H
 #define VORN_SERVER_WEB_API_H
 
+#include <array>
 #include <chrono>
 #include <memory>
 #include <optional>
@@ -42,11 +43,22 @@ class WebApi : public Service {
  private:
   using Begun = std::variant<std::shared_ptr<Exchange>, Response>;
 
-  std::optional<Begun> BeginPage(const Head& head) const;
+  // A resource that is read with GET.
+  struct Page {
+    std::string_view path;
+    Begun (WebApi::*begin)() const;
+  };
+  static const std::array<Page, 4> kPages;
+
+  Begun BeginPage(const Page& page, const Head& head) const;
+  Begun List() const;
+  Begun Alive() const;
+  Begun Ready() const;
   Begun BeginCall(const Route& route, const Head& head) const;
 
   const Parts parts_;
   const Limits limits_;
+  const Response list_;  // of the methods
 };
 
 }  // namespace vorn::server

@@ -30,6 +30,10 @@ struct HttpLimits {
   std::size_t uncharged_body = std::size_t{8} * 1024;     // bodies of up to this size are not charged
   std::size_t largest_charge = std::size_t{1088} * 1024;  // for larger bodies and those of unknown length
 
+  // A charged body arrives with at least `body_rate` bytes a second on average, after the first `body_grace`.
+  std::size_t body_rate = std::size_t{16} * 1024;
+  std::chrono::seconds body_grace{5};
+
   // A connection is closed within about a second after its deadline; a request that is incomplete then is answered
   // with 408.
   std::chrono::seconds head{10};   // from a request's first byte, or from the connection's begin, to its last header

@@ -20,15 +20,13 @@ namespace vorn::server {
 
 // A request without its body. All strings live as long as the call that the head is passed to.
 struct Head {
-  std::string_view method;                 // "GET", in the sender's case
-  std::string_view target;                 // the path: "/api/..."; "*" for the server as a whole
-  std::string_view query;                  // what follows the '?' of the target
-  std::optional<std::string_view> host;    // of an absolute target, else of the Host header (RFC 9112, 3.2.2)
-  std::optional<std::string_view> origin;  // the Origin header
-  std::string_view content_type;           // empty if there is none
+  std::string_view method;               // "GET", in the sender's case
+  std::string_view target;               // the path: "/api/..."; "*" for the server as a whole
+  std::string_view query;                // what follows the '?' of the target
+  std::optional<std::string_view> host;  // of an absolute target, else of the Host header (RFC 9112, 3.2.2)
+  std::string_view content_type;         // empty if there is none
   bool has_body = false;
   std::uint64_t content_length = 0;                                    // 0 also for a body of unknown length
-  bool over_tcp = false;                                               // false: over a Unix socket
   std::vector<std::pair<std::string_view, std::string_view>> headers;  // all, in the order sent
   Peer peer;
 

@@ -221,7 +221,6 @@ Head RequestReader::MakeHead() const {
     head.query = head.target.substr(question + 1);
     head.target = question == 0 ? "/" : head.target.substr(0, question);
   }
-  head.origin = head.Header("Origin");
   head.content_type = head.Header("Content-Type").value_or("");
   head.has_body = !parsing_->parser->is_done();
   head.content_length = parsing_->parser->content_length().value_or(0);

@@ -119,12 +119,19 @@ void Session::Close() noexcept {
 
 void Session::Tick(Clock::time_point now) {
   Guard([this, now] {
-    if (now >= deadline_) return Expire();
+    if (now >= deadline_ || IsTooSlow(now)) return Expire();
     const bool waiting = phase_ == Phase::kCall && !abandoned_ && now - since_ >= std::chrono::seconds(1);
     if (!waiting || !stream_->PeerHasLeft()) return;
     abandoned_ = true;
     exchange_->Abandon();
   });
+}
+
+bool Session::IsTooSlow(Clock::time_point now) const {
+  const HttpLimits& limits = host_.limits();
+  if (phase_ != Phase::kBody || !charge_ || now < since_ + limits.body_grace) return false;
+  const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(now - since_ - limits.body_grace);
+  return body_bytes_ < static_cast<std::uint64_t>(seconds.count()) * limits.body_rate;
 }
 
 void Session::Expire() {
@@ -157,6 +164,7 @@ void Session::OnRead(const Error& error, std::size_t bytes) {
   if (error) return Close();
   if (phase_ == Phase::kDrain) return Drain();
   buffer_.commit(bytes);
+  if (phase_ == Phase::kBody) body_bytes_ += bytes;
   Advance();
 }
 
@@ -180,7 +188,6 @@ void Session::Advance() {
 void Session::BeginExchange() {
   Head head = reader_.MakeHead();
   head.peer = peer_;
-  head.over_tcp = !peer_.credentials;
   form_ = FormOf(head, reader_.is_old());
   record_.method = head.method;
   record_.target = head.target;
@@ -209,6 +216,7 @@ void Session::OnAuthorized(std::optional<Response> refusal) {
   }
   reader_.Attach(exchange_);
   Enter(Phase::kBody);
+  body_bytes_ = buffer_.size();
   if (reader_.state() == RequestReader::State::kDone) return Run();
   if (!reader_.expects_continue() || buffer_.size() > 0) return Advance();
   continuing_ = true;

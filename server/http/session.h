@@ -71,6 +71,7 @@ class Session : public std::enable_shared_from_this<Session> {
   std::chrono::seconds LimitOf(Phase phase) const;
   void Enter(Phase phase);
   void Expire();
+  bool IsTooSlow(Clock::time_point now) const;
 
   void OnBegun(const Error& error, std::size_t bytes);
   void Read();
@@ -113,6 +114,7 @@ class Session : public std::enable_shared_from_this<Session> {
   std::shared_ptr<Exchange> exchange_;
   std::optional<Charge> charge_;
   std::uint64_t body_charge_ = 0;  // what the body of the request costs
+  std::uint64_t body_bytes_ = 0;   // of it have been received
   bool abandoned_ = false;
 
   Response response_;

@@ -1,5 +1,6 @@
 #include "echo_service.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <utility>
 
@@ -18,6 +19,8 @@ class EchoService::Echo : public Exchange {
 
   std::optional<Response> Receive(std::string_view piece) override {
     body_ += piece;
+    const std::lock_guard<std::mutex> lock(service_.mutex_);
+    service_.largest_piece_ = std::max(service_.largest_piece_, piece.size());
     if (body_.find("stop") != std::string::npos) return Response{413, "stopped"};
     return std::nullopt;
   }
@@ -56,6 +59,11 @@ std::variant<std::shared_ptr<Exchange>, Response> EchoService::Begin(const Head&
 int EchoService::heads() {
   const std::lock_guard<std::mutex> lock(mutex_);
   return heads_;
+}
+
+std::size_t EchoService::largest_piece() {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return largest_piece_;
 }
 
 int EchoService::abandoned() {

@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstddef>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -41,6 +42,7 @@ class EchoService : public Service {
 
   int heads();
   int abandoned();
+  std::size_t largest_piece();  // of any body
   Seen last();
   void SetFixed(Response response);
 
@@ -54,6 +56,7 @@ class EchoService : public Service {
   std::mutex mutex_;
   int heads_ = 0;
   int abandoned_ = 0;
+  std::size_t largest_piece_ = 0;
   Seen last_;
   Response fixed_;
   std::vector<Answer> held_;

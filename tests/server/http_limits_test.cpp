@@ -33,6 +33,44 @@ TEST_F(HttpTest, SlowSendersAreToldAndDroppedAndDisturbNobody) {
   EXPECT_EQ(service_.heads(), 2);
 }
 
+TEST_F(HttpTest, ABodyThatIsChargedAndComesTooSlowlyIsRefused) {
+  HttpLimits limits;
+  limits.body = std::chrono::hours(1);
+  limits.body_grace = kShort;
+  Budget memory(1000000, 1000000);
+  Start(limits, {&memory, nullptr});
+  Connection small = Connect();
+  small.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 3\r\n\r\na");
+  Connection slow = Connect();
+  slow.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 600000\r\n\r\nab");
+  EXPECT_EQ(slow.Receive().status, 408);
+  EXPECT_TRUE(Eventually([&] { return memory.used() == 0; }));
+  small.Send("bc");
+  EXPECT_EQ(small.Receive().body, "abc") << "a body that is not charged has time";
+}
+
+TEST_F(HttpTest, ABodyThatComesAtTheRequiredRateIsTaken) {
+  HttpLimits limits;
+  limits.body_grace = std::chrono::seconds(0);
+  limits.body_rate = 1;
+  Budget memory(1000000, 1000000);
+  Start(limits, {&memory, nullptr});
+  Connection client = Connect();
+  client.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 100000\r\n\r\n" + std::string(99999, 'x'));
+  std::this_thread::sleep_for(std::chrono::seconds(3));  // in which the rate is judged at least twice
+  client.Send("x");
+  EXPECT_EQ(client.Receive().status, 200);
+}
+
+// One client has the network thread for no longer than a piece takes.
+TEST_F(HttpTest, ABodyIsReadInPieces) {
+  Start();
+  Connection client = Connect();
+  client.Send(Post("/echo", std::string(1000000, 'x')));
+  EXPECT_EQ(client.Receive().body.size(), 1000000U);
+  EXPECT_LE(service_.largest_piece(), 8192U);
+}
+
 TEST_F(HttpTest, AClientThatDoesNotReadIsDropped) {
   HttpLimits limits;
   limits.write = kShort;

@@ -25,6 +25,7 @@ class WebApiTest : public testing::Test {
     Head head;
     head.method = "POST";
     head.target = target;
+    head.peer.credentials = Peer::Credentials{1, 1000, 1000};  // at a Unix socket
     return head;
   }
   static Head PostJson(std::string_view type, std::uint64_t length = 2) {
@@ -186,7 +187,7 @@ TEST_F(WebApiTest, OverTcpOnlyItsOwnNamesAreServed) {
   Head head = Post("/api/Nfs/v1/get");
   head.host = "evil.example";
   EXPECT_EQ(Begin(head), 0) << "a Unix socket has no name";
-  head.over_tcp = true;
+  head.peer = {"127.0.0.1", true, std::nullopt};
   EXPECT_EQ(Begin(head), 421);
   head.host = std::nullopt;
   EXPECT_EQ(Begin(head), 421);
@@ -199,14 +200,14 @@ TEST_F(WebApiTest, OverTcpOnlyItsOwnNamesAreServed) {
 TEST_F(WebApiTest, PagesOfOtherSitesAndPortsAreKeptOut) {
   Head head = Post("/api/Nfs/v1/get");
   head.host = "localhost:8080";
-  head.origin = "http://localhost:8080";
+  head.headers = {{"origin", "http://localhost:8080"}};
   EXPECT_EQ(Begin(head), 0);
   for (const char* origin : {"http://localhost:3000", "http://evil.example", "null", ""}) {
-    head.origin = origin;
+    head.headers = {{"origin", origin}};
     EXPECT_EQ(Begin(head), 403) << origin;
   }
   head.host = "nas.example";
-  head.origin = "https://nas.example";
+  head.headers = {{"origin", "https://nas.example"}};
   EXPECT_EQ(Begin(head), 0);
 }
 
@@ -232,8 +233,7 @@ TEST_F(WebApiTest, TakesParametersInUtf8Only) {
 }
 
 TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {
-  Head head = Post("/api/Nfs/v1/who");
-  head.peer.credentials = Peer::Credentials{1, 1000, 1000};
+  const Head head = Post("/api/Nfs/v1/who");
   auto begun = api_.Begin(head);
   std::promise<std::string> answer;
   std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& response) { answer.set_value(response.body); });

@@ -1,4 +1,4 @@
-// The service script, with stand-ins for the service manager and for the kernel's files.
+// The service script, with replacements for the service manager and for the kernel's files.
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 
@@ -17,8 +17,8 @@ constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
 constexpr char kLimit[] = "/fs/nfsd/max_block_size";
 constexpr char kMark[] = "/run/nfs-leaves-groups-alone";
 
-// A box in namespaces of its own: a systemctl that writes down what it is asked, and in place of /proc and
-// /etc/nfs.conf.d files of the test's.
+// A box in namespaces of its own: a systemctl that records its arguments, and files of the test in place of /proc and
+// /etc/nfs.conf.d.
 class Box {
  public:
   Box() {

@@ -26,7 +26,7 @@ struct Outcome {
   std::vector<std::string> lines;
 };
 
-// Runs a shell script, as the program that it is.
+// Runs a shell script directly as a program.
 Outcome RunScript(const std::string& script, const ProgramOptions& options = {}) {
   Outcome outcome;
   outcome.status = RunProgram(

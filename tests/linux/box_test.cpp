@@ -1,4 +1,4 @@
-// The promises of a box to readers and writers: shared documents, and no lost edit.
+// Box: readers share parsed documents, and no edit is lost.
 #include "box.h"
 
 #include <gmock/gmock.h>
@@ -38,7 +38,7 @@ std::string Load(Box& box) {
   return text.ok() ? **text : "";
 }
 
-// Waits until the file is old enough to be kept.
+// Waits until the file is old enough for its document to be cached.
 void Settle(Box& box) {
   ASSERT_TRUE(Eventually([&] { return box.Read(kFile)->is_settled; }));
 }

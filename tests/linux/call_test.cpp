@@ -1,4 +1,4 @@
-// The context of a thread's call: which one counts, and what it collects.
+// CallContext: which context of a thread is the current one, and what it collects.
 #include "call.h"
 
 #include <gmock/gmock.h>

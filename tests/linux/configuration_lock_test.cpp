@@ -21,13 +21,13 @@ namespace {
 
 constexpr char kLockFile[] = "/run/vorn/config.lock";
 
-// Whether somebody holds the root's lock, seen from outside.
+// Returns whether any process owns the root's lock.
 bool IsHeld(const TemporaryRoot& root) {
   const FileDescriptor file(open(root.At(kLockFile).c_str(), O_RDWR | O_CLOEXEC));
   return file && flock(file.get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
 }
 
-// Whether a process is blocked until the root's lock is free: proc(5), /proc/locks.
+// Returns whether a process is blocked until the root's lock is free: proc(5), /proc/locks.
 bool SomebodyWaits(const TemporaryRoot& root) {
   struct stat file {};
   if (stat(root.At(kLockFile).c_str(), &file) != 0) return false;
@@ -39,7 +39,7 @@ bool SomebodyWaits(const TemporaryRoot& root) {
   return false;
 }
 
-// Adds one to the number in a file, as a writer without care would.
+// Increments the number in a file by an unprotected read and write.
 void Increment(const std::string& path) {
   int number = 0;
   std::ifstream(path) >> number;

@@ -1,4 +1,4 @@
-// A process that dies at any moment of a change, and another one that goes on.
+// A process is killed at each system call of a change; another process must be able to continue.
 #include <gmock/gmock.h>
 #include <sys/mman.h>
 
@@ -13,7 +13,7 @@ using testing::AnyOf;
 using testing::Eq;
 using testing::IsEmpty;
 
-// One word that a child leaves for its parent, whatever becomes of it.
+// A flag in shared memory, which a child can set and which outlives it.
 class SharedFlag {
  public:
   SharedFlag()
@@ -30,7 +30,7 @@ class SharedFlag {
   volatile bool* const flag_;
 };
 
-// A box, and the change that is made on it.
+// The function that creates the files, and the index of the change that is made.
 struct Case {
   void (*furnish)(const TemporaryRoot& root);
   size_t index;
@@ -49,7 +49,7 @@ Contents After(const Case& test) {
   return ContentsOf(root, change);
 }
 
-// Kills the change at its system call number `count`. False when it ended before that.
+// Kills the change at its system call number `count`. Returns false if it made fewer calls.
 bool KilledAt(int count, const Case& test, const Contents& done) {
   const TemporaryRoot root;
   const Change change = test.On(root);
@@ -71,7 +71,7 @@ bool KilledAt(int count, const Case& test, const Contents& done) {
   return !ended;
 }
 
-// At each of its system calls in turn: how many there are.
+// Kills the change at each of its system calls in turn. Returns their number.
 int KillAtEachCall(const Case& test) {
   const Contents done = After(test);
   int count = 0;
@@ -87,7 +87,7 @@ Contents Before(const Case& test) {
 
 using Crash = Writes;
 
-TEST_F(Crash, LeavesTheOldFilesOrTheNewOnesAndNothingInTheWay) {
+TEST_F(Crash, LeavesTheOldFilesOrTheNewOnesAndNoObstacle) {
   int kills = 0;
   const size_t kinds = AllChanges(TemporaryRoot()).size();
   for (size_t index = 0; index < kinds; ++index) {

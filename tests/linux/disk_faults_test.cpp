@@ -1,5 +1,5 @@
-// A disk of its own that is really full, or really read-only, under every kind of change. The tests run in namespaces
-// of their own (private_network_main.cpp), so that anybody may mount one.
+// A real file system that is full or read-only, under every kind of change. The tests run in namespaces of their own
+// (private_network_main.cpp), in which a user without privileges may mount one.
 #include <gmock/gmock.h>
 #include <sys/mount.h>
 
@@ -56,15 +56,15 @@ class Disk {
   const TemporaryRoot root_;
 };
 
-struct Illness {
+struct DiskFault {
   const char* name;
   int code;
   const char* reason;  // in the log
-  void (Disk::*fall_ill)() const;
+  void (Disk::*inject)() const;
   void (Disk::*recover)() const;
 };
 
-const Illness kIllnesses[] = {
+const DiskFault kDiskFaults[] = {
     {"full", ENOSPC, "No space left on device", &Disk::Fill, &Disk::MakeRoom},
     {"out of inodes", ENOSPC, "No space left on device", &Disk::UseUpInodes, &Disk::FreeInodes},
     {"read-only", EROFS, "Read-only file system", &Disk::MakeReadOnly, &Disk::MakeWritable},
@@ -72,24 +72,24 @@ const Illness kIllnesses[] = {
 
 using DiskFaults = Writes;
 
-TEST_F(DiskFaults, LeaveTheOldFilesAloneUntilTheDiskIsWell) {
+TEST_F(DiskFaults, LeaveTheOldFilesAloneUntilTheDiskRecovers) {
   int cases = 0;
   const size_t kinds = AllChanges(TemporaryRoot()).size();
-  for (const Illness& illness : kIllnesses) {
+  for (const DiskFault& fault : kDiskFaults) {
     for (size_t index = 0; index < kinds; ++index, ++cases) {
       const Disk disk;
       FurnishFiles(disk.root());
       const Change change = AllChanges(disk.root())[index];
-      SCOPED_TRACE(std::string("a disk that is ") + illness.name + ": " + change.name);
+      SCOPED_TRACE(std::string("a disk that is ") + fault.name + ": " + change.name);
       const Contents before = ContentsOf(disk.root(), change);
-      (disk.*illness.fall_ill)();
+      (disk.*fault.inject)();
       TakeLog();
       EXPECT_LT(change.make(), 0);
-      EXPECT_EQ(KLIBCErrGet(), illness.code);
-      EXPECT_THAT(TakeLog(), Contains(Field(&LogLine::text, HasSubstr(illness.reason))));
+      EXPECT_EQ(KLIBCErrGet(), fault.code);
+      EXPECT_THAT(TakeLog(), Contains(Field(&LogLine::text, HasSubstr(fault.reason))));
       EXPECT_EQ(ContentsOf(disk.root(), change), before);
       EXPECT_THAT(Leftovers(disk.root(), change), IsEmpty());
-      (disk.*illness.recover)();
+      (disk.*fault.recover)();
       EXPECT_GE(change.make(), 0);
       EXPECT_NE(ContentsOf(disk.root(), change), before);
     }

@@ -16,9 +16,9 @@ namespace fs = std::filesystem;
 
 [[maybe_unused]] const bool kRequired = !RunsInCI() || RequirePrograms({"exportfs"});
 
-// Its arguments are the folder that has the files, and the one that becomes /mnt or an empty text. The kernel's export
-// features are those of Linux 6.1, so that exportfs also writes the options that older kernels do not keep per security
-// flavour.
+// The script's arguments are the folder with the files, and the folder to mount at /mnt or an empty string. The
+// kernel's export features are those of Linux 6.1, so that exportfs also writes the options that older kernels do not
+// keep per security flavour.
 constexpr const char* kScript = R"(
   cd "$0"
   mount -t tmpfs tmpfs /var/lib/nfs

@@ -20,7 +20,7 @@ using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it
 using testing::ElementsAre;
 using testing::HasSubstr;
 
-// The access of each client to each path, up to the fault at which exportfs(8) stops.
+// Returns the access of each client to each path, up to the fault at which exportfs(8) stops.
 using Table = std::map<std::pair<std::string, std::string>, std::string>;
 
 Table TableOf(const std::string& text) {
@@ -223,7 +223,7 @@ TEST(ExportsDocument, ReadsRandomFilesAsExportfsDoes) {
   }
 }
 
-// Rewriting one path keeps every other line, and what exportfs makes of it.
+// Rewriting one path preserves every other line and its meaning to exportfs.
 TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
   const ExportfsJudge judge;
   const ExportPaths paths;

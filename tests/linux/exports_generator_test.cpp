@@ -1,7 +1,7 @@
 // Generates exports files, folders and saves, and compares what the real exportfs(8) exports before and after.
 //
-// The grammar is that of exports(5). The truth is exportfs's own table: what a generated file means is not known
-// here. Properties:
+// The grammar is that of exports(5). The oracle is the table of exportfs: the test itself does not know the meaning
+// of a generated file. Properties:
 //  - A load returns what exportfs exports.
 //  - After a successful save the clients of the share have the access that the request asks for: what it changed
 //    is changed, and every other option of every security flavour is as it was.
@@ -73,8 +73,8 @@ const std::vector<std::string> kClients = {"alpha",
                                            "10.3.0.0/255.255.0.0",
                                            "nowhere"};
 
-// An option that this exportfs does not know stands for those of newer versions. For exportfs(8) it is replaced
-// by an option that it knows and that is not generated.
+// An option that the installed exportfs does not know represents those of newer versions. For exportfs(8) it is
+// replaced by an option that it knows and that is not generated.
 constexpr const char* kNewOption = "xprtsec=none:tls";
 constexpr const char* kKnownOption = "no_acl";
 
@@ -207,7 +207,7 @@ std::map<std::string, Row> RowsOf(const Table& table, const std::string& path) {
   return found == table.end() ? std::map<std::string, Row>() : found->second;
 }
 
-// Which spellings are one client, and under which name the table has it: asked of exportfs itself.
+// Asks exportfs which spellings denote the same client, and under which name its table has that client.
 class Spellings {
  public:
   explicit Spellings(const ExportfsJudge& judge) {
@@ -233,7 +233,7 @@ class Spellings {
     }
   }
 
-  // One name for all spellings of a client; empty if exportfs cannot resolve it.
+  // Returns the same name for all spellings of a client; empty if exportfs cannot resolve it.
   std::string NameOf(const std::string& client) const {
     const auto found = names_.find(client);
     return found == names_.end() ? "" : found->second;
@@ -383,7 +383,7 @@ class FileMaker {
 };
 
 // ---------------------------------------------------------------------------------------------
-// One save.
+// Saves.
 
 struct Outcome {
   std::string name;

@@ -1,4 +1,4 @@
-// The lines that are found in a changed text with the help of its previous version are those of the text alone.
+// Parsing a changed text with its previous version gives the same lines as parsing the text alone.
 #include "exports_lines.h"
 
 #include <gtest/gtest.h>

@@ -110,7 +110,7 @@ TEST(EntryOf, KeepsWhatTheRuleDoesNotSay) {
   }
 }
 
-// A client that is root with write by Kerberos from any port, and squashed and read-only by AUTH_SYS.
+// A client with root and write access over Kerberos from any port, and squashed and read-only over AUTH_SYS.
 const char* const kMixed = "sec=krb5,rw,no_root_squash,insecure,sec=sys,ro,root_squash,all_squash,secure,anonuid=7";
 
 struct FieldChange {

@@ -36,7 +36,7 @@ mode_t ModeOf(const std::string& path) {
   return stat(path.c_str(), &file) == 0 ? file.st_mode & 07777 : 0;
 }
 
-// The clock of inodes has coarse ticks: two edits within one look alike.
+// File times have a coarse resolution: two edits within one tick get the same time.
 bool ClockOfInodesPasses(const TemporaryRoot& root, std::int64_t time) {
   return Eventually([&] { return root.Write("/tick", ""), ReadFile(root.At("/tick"))->stamp.changed > time; });
 }
@@ -135,7 +135,7 @@ TEST(ReplaceFile, KeepsExtendedAttributesAndTheAccessControlList) {
   for (const auto& [name, value] : attributes) EXPECT_EQ(AttributeOf(root.At(kFile), name), value) << name;
 }
 
-// Whether a process is blocked until the lock of this file is free: proc(5), /proc/locks.
+// Returns whether a process is blocked until the lock of this file is free: proc(5), /proc/locks.
 bool SomebodyWaitsFor(const std::string& path) {
   struct stat file {};
   if (stat(path.c_str(), &file) != 0) return false;
@@ -267,7 +267,7 @@ TEST(ReplaceFile, LeavesAWholeFileWhereverItsProcessIsKilled) {
   EXPECT_GT(kills, 10);
 }
 
-// An edit by hand, in both ways in which editors write.
+// A manual edit, in the two ways in which editors save: in place, and by a rename.
 void EditInPlace(const TemporaryRoot& root) { root.Write(kFile, "somebody's own"); }
 
 void EditByReplacing(const TemporaryRoot& root) {
@@ -277,7 +277,7 @@ void EditByReplacing(const TemporaryRoot& root) {
 
 using Edit = void (*)(const TemporaryRoot& root);
 
-// A whole edit at system call number `call` of a write. Whether the write made that many.
+// Makes an edit at system call number `call` of a write. Returns whether the write made that many calls.
 bool KeepsTheEditAt(int call, const char* before, Edit edit) {
   const TemporaryRoot root;
   fs::create_directory(root.At("/etc"));

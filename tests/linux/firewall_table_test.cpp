@@ -1,4 +1,4 @@
-// The firewall's table, in a network of the test's own. The judge is nft(8).
+// The firewall's table, in a network namespace of the test. nft(8) is the reference.
 #include <gmock/gmock.h>
 
 #include <cerrno>

@@ -34,7 +34,7 @@ class Chance {
 };
 
 // Runs the cases 0, 1, 2 ... until one fails. `run_case` returns whether the case made its change; at least a quarter
-// of all must, or the generator has become too hostile to test anything.
+// of the cases must, otherwise the generator makes too many invalid cases to be a test.
 template <typename RunCase>
 void RunCases(unsigned number_of_cases, const RunCase& run_case) {
   const unsigned cases = NumberFromEnvironment("VORN_CASES", number_of_cases);

@@ -1,4 +1,4 @@
-// An administrator's editor, which takes no lock, at any moment of a change: whatever it saved stays.
+// An administrator's editor, which takes no lock, saves a file at each system call of a change: the edit is preserved.
 #include <gmock/gmock.h>
 
 #include <filesystem>
@@ -29,14 +29,14 @@ const struct {
      }},
 };
 
-// The file of a change in which administrators write lines of their own; null where a change keeps the whole of it.
+// Returns the file of a change that administrators edit; nullptr if the change writes no such file.
 const char* EditedFile(const Change& change) {
   static const std::set<std::string> documents = {"/etc/exports", "/etc/idmapd.conf", "/etc/nfs.conf.d/vorn.conf"};
   return documents.count(change.files.back()) != 0 ? change.files.back() : nullptr;
 }
 
-// The edit at system call number `call` of a change: the change is made beside it, or refused. Whether the change
-// made that many.
+// Saves an edit at system call number `call` of a change, and expects that the change keeps the edit or is refused.
+// Returns whether the change made that many calls.
 bool KeepsTheEditAt(int call, size_t index, Editor save, const std::string& done) {
   const TemporaryRoot root;
   FurnishFiles(root);

@@ -1,6 +1,6 @@
-// Changes of generated idmapd.conf files, compared with what libnfsidmap makes of the files before and afterwards: a
-// change that succeeds has its own effect and no other, a change that is refused leaves every byte, and what is listed
-// is what the library knows.
+// Changes of generated idmapd.conf files, compared with the mappings of libnfsidmap before and afterwards: a
+// successful change has the requested effect and no other, a refused change leaves every byte, and the list has the
+// mappings of the library.
 #include <gtest/gtest.h>
 #include <pwd.h>
 
@@ -180,7 +180,8 @@ bool IsNamed(const std::vector<LogLine>& log, const std::string& principal) {
                      [&](const LogLine& line) { return line.text.find(" " + principal + " = ") != std::string::npos; });
 }
 
-// Whether the change creates or changes a mapping; one that is stored already may be without effect, and stays so.
+// Returns whether the change creates or changes a mapping. A mapping that is stored already may have no effect, and
+// keeps having none.
 bool PutsMapping(const Change& change, const Users& static_before) {
   const auto stored = static_before.find(change.principal);
   return !change.name.empty() && (stored == static_before.end() || stored->second != UserId(change.name));

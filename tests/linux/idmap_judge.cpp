@@ -19,7 +19,7 @@
 
 extern "C" {
 #include <sys/types.h>
-// Needs the types above, and says nothing of C++ itself.
+// This header needs the types above and has no extern "C" of its own.
 #include <nfsidmap.h>
 }
 
@@ -46,8 +46,8 @@ void WaitForOtherThreads() {
   Eventually([] { return CountThreads() <= usual; });
 }
 
-// Lets the children inherit what each of them would find out again: the modules of the name service, and the folders
-// without plug-ins, which the dynamic linker remembers.
+// Loads the modules of the name service, and lets the dynamic linker cache the folders without plug-ins, so that each
+// child inherits both.
 void PrepareForChildren() {
   [[maybe_unused]] static const bool is_prepared = [] {
     getpwnam("root");
@@ -56,7 +56,7 @@ void PrepareForChildren() {
   }();
 }
 
-// Asks in a process of its own: the library reads its file once.
+// Calls the library in a child process, because it reads its file only once per process.
 std::vector<std::string> Ask(const std::string& path, const std::function<void(std::ostream&)>& questions) {
   const TemporaryRoot scratch;
   PrepareForChildren();

@@ -12,11 +12,11 @@ struct LibraryCrash : std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-// The local user ids of Kerberos principals; none where a principal is mapped to nobody. The local
-// names are those of this system's users.
+// Returns the local user ID of each Kerberos principal; nullopt for a principal without a mapping. Local names are
+// looked up on this system.
 std::vector<std::optional<unsigned>> MapByLibrary(const std::string& path, const std::vector<std::string>& principals);
 
-// The NFSv4 domain.
+// Returns the NFSv4 domain.
 std::string DomainByLibrary(const std::string& path);
 
 #endif  // VORN_TESTS_LINUX_IDMAP_JUDGE_H

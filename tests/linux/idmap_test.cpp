@@ -208,7 +208,7 @@ TEST(IDMap, RefusesWhatTheFileCannotCarry) {
   }
 }
 
-TEST(IDMap, RefusesWhatNobodySeesOrReadsToItsEnd) {
+TEST(IDMap, RefusesInvisibleCharactersAndNamesThatAreTooLong) {
   const TemporaryRoot root;
   root.Write(kFile, "[Static]\nb@X = daemon\n");
   const auto before = root.Read(kFile);
@@ -352,12 +352,12 @@ TEST(IDMap, RecordWithoutDomainOrTableLeavesThemAlone) {
   EXPECT_EQ(root.Read(kFile), "[General]\nDomain = a.example\n[Static]\na@X = nobody\n");
 }
 
-TEST(IDMap, RecordThatCannotBeHadIsNull) {
+TEST(IDMap, RecordThatCannotBeReadIsNull) {
   const TemporaryRoot root;
   root.Write("/etc/idmapd.conf/x", "");
   EXPECT_EQ(VORNNFSIDMapGet(), nullptr);
   EXPECT_EQ(KLIBCErrGet(), EINVAL);
-  // And it holds nothing: another process gets in.
+  // The failed call owns no lock: another process can take it.
   ChildProcess other([] {
     const VornConf configuration;
     return 0;
@@ -375,7 +375,7 @@ TEST(StaticMap, FiltersByPrincipalOrNameInAnyCase) {
   EXPECT_THAT(Stored("nothing"), IsEmpty());
 }
 
-TEST(StaticMap, AppendReplacesAndRemoveForgives) {
+TEST(StaticMap, AppendReplacesAndRemoveIgnoresMissingKeys) {
   KLIBSZHASH* table = KLIBCSzHashAlloc(0);
   KLIBSZHASH* pairs = KLIBCSzHashAlloc(0);
   KLIBSZLIST* gone = KLIBCSzListAlloc(0);

@@ -11,15 +11,15 @@
 // are in lower case.
 using IniContent = std::map<std::string, std::map<std::string, std::string>>;
 
-// The content of a file holding `text`.
+// Returns the content of a file with this text.
 IniContent ReadByNfsconf(std::string_view text);
 
 // Returns what nfsconf(8) prints of the file at `path` and the folder `path`.d; nullopt if it crashes, as it does if a
 // file includes itself.
 std::optional<std::string> DumpByNfsconf(const std::string& path);
 
-// The value in the file at `path` and, as its services read it, in the folder `path`.d; empty when
-// there is none.
+// Returns the value of a key in the file at `path` and the folder `path`.d, as the services read them; empty if the
+// key has no value.
 std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key);
 
 #endif  // VORN_TESTS_LINUX_INI_JUDGE_H

@@ -39,7 +39,7 @@ TEST(Keytab, HasItsKeysInFileOrder) {
   EXPECT_THAT(Keys(ThreeKeys()), ElementsAreArray(ListedByKlist(ThreeKeys())));
 }
 
-TEST(Keytab, OfARealmIsReadAsKlistReadsItWithTheHoleOfARemovedKey) {
+TEST(Keytab, OfARealmIsReadAsKlistReadsItWithTheGapOfARemovedKey) {
   const std::string content = MakeKeytabOfARealm();
   EXPECT_THAT(content, HasSubstr(std::string(8, '\0'))) << "no hole";
   const auto keys = Keys(content);
@@ -49,7 +49,7 @@ TEST(Keytab, OfARealmIsReadAsKlistReadsItWithTheHoleOfARemovedKey) {
 
 TEST(Keytab, MayHaveNoKey) { EXPECT_THAT(Keys(EncodeFile({})), IsEmpty()); }
 
-TEST(Keytab, NamesAnEncryptionTypeThatNobodyKnowsByItsNumber) {
+TEST(Keytab, NamesAnUnknownEncryptionTypeByItsNumber) {
   EXPECT_THAT(Keys(EncodeFile({EncodeEntry("alice", "LAB.TEST", 99)})), ElementsAre("1 alice@LAB.TEST (etype 99)"));
 }
 
@@ -58,7 +58,7 @@ TEST(Keytab, QuotesWhatAPrincipalMustNotHold) {
               ElementsAre("1 a\\/b\\@c\\n@R (aes128-cts-hmac-sha1-96)"));
 }
 
-// The library itself accepts every one of these.
+// libkrb5 accepts each of these principals.
 TEST(Keytab, IsNoneWhenItIsCutOffExceptBetweenTwoEntries) {
   const std::string& whole = ThreeKeys();
   std::set<std::size_t> counts;
@@ -93,7 +93,7 @@ TEST(Keytab, MayBeOfTheFirstVersion) {
   }
 }
 
-// An entry in which `size` bytes at `at` are others.
+// Returns an entry in which `size` bytes at `at` are replaced.
 std::string Changed(std::string entry, std::size_t at, std::size_t size, const std::string& bytes) {
   return entry.replace(at, size, bytes);
 }

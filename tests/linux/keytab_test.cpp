@@ -1,4 +1,4 @@
-// The keytab's operations of the contract.
+// The contract's operations on keytabs.
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>

@@ -1,5 +1,5 @@
-// Processes that write without a pause, killed at random moments and started again: what one of them was told to be
-// done is there, always, and none is in the way of the others.
+// Processes that write without a pause are killed at random moments and started again. Every acknowledged change is
+// stored, and a killed process does not block the others.
 #include <gmock/gmock.h>
 #include <sys/mman.h>
 
@@ -34,7 +34,7 @@ struct Free {
   void operator()(ExportRuleList* list) const { VORNNFSRuleExtFree(list); }
 };
 
-// Memory that the writers share with their parent; it survives them.
+// Memory that the writers share with their parent. It outlives a killed writer.
 struct Board {
   std::atomic<bool> over{false};
   std::atomic<int> acknowledged[4]{};  // the steps of each writer, which count from 1
@@ -130,7 +130,7 @@ class Writers {
 
   int Acknowledged(int writer) const { return board_->acknowledged[writer]; }
 
-  // Not before it has done something, and then whenever it is.
+  // Kills the writer `time` after its next acknowledged change.
   void KillLater(int writer, std::chrono::microseconds time) {
     const int before = Acknowledged(writer);
     ASSERT_TRUE(Eventually([&] { return Acknowledged(writer) > before; }));
@@ -163,7 +163,7 @@ class Writers {
   std::unique_ptr<ChildProcess> processes_[kCount];
 };
 
-// Mappings stay; so at any moment there are all that were acknowledged before.
+// Mappings are only added, so every mapping acknowledged before the read must be stored.
 void ExpectAllMappings(const Writers& writers) {
   int acknowledged[Writers::kOfSettings];
   for (int writer = 0; writer < Writers::kOfSettings; ++writer) acknowledged[writer] = writers.Acknowledged(writer);
@@ -175,7 +175,7 @@ void ExpectAllMappings(const Writers& writers) {
   }
 }
 
-// Each writer's last step is what its own part of the box is like.
+// Expects that the files of each writer have the values of its last acknowledged step.
 void ExpectLastSteps(const Writers& writers, const TemporaryRoot& root) {
   for (int writer = 0; writer < Writers::kOfSettings; ++writer) {
     EXPECT_EQ(ClientOf(Share(writer)), Client(writers.Acknowledged(writer))) << writer;
@@ -190,7 +190,7 @@ void ExpectLastSteps(const Writers& writers, const TemporaryRoot& root) {
 
 using Kills = Writes;
 
-TEST_F(Kills, InARowUnderLoadLoseNothingThatWasAcknowledged) {
+TEST_F(Kills, LoseNoAcknowledgedChangeUnderLoad) {
   const TemporaryRoot root;
   FurnishFiles(root);
   Writers writers(root);

@@ -137,7 +137,7 @@ TEST(List, DoesNotLogWhatItDoesNotFind) {
   EXPECT_TRUE(TakeLog().empty());
 }
 
-// With a scan for each find this takes the better part of an hour.
+// With a linear scan per lookup this test would take most of an hour.
 TEST(List, IsBuiltAndSearchedInTurnWithoutScans) {
   List list;
   constexpr int kCount = 200'000;

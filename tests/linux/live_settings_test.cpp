@@ -29,7 +29,7 @@ TEST(TransferSizes, AreHandedOverByADropInOfTheUnit) {
                         "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"));
 }
 
-// The judge of the drop-in; it looks for the programs of a unit, so the root has those.
+// systemd-analyze verifies the drop-in. It requires the programs of a unit, so the root has them.
 TEST(TransferSizes, AreUnderstoodBySystemd) {
   if (const std::string missing = ProgramMissing("systemd-analyze"); !missing.empty()) {
     if (RunsInCI()) FAIL() << missing;

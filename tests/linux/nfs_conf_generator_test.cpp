@@ -1,6 +1,6 @@
-// Changes of generated nfs.conf files, compared with what nfsconf(8) says of the files before and afterwards: a change
-// that succeeds has its own effect and no other, a change that is refused leaves every byte, and the record that is
-// read is what the daemons read.
+// Changes of generated nfs.conf files, compared with the output of nfsconf(8) before and afterwards: a successful
+// change has the requested effect and no other, a refused change leaves every byte, and the record has the values that
+// the daemons read.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -111,7 +111,7 @@ bool ReadSwitch(const std::string& text, bool fallback) {
   return fallback;
 }
 
-// Reads a number as conf_get_num of nfs-utils does; one that is no port counts as none.
+// Reads a number as conf_get_num of nfs-utils does; a number that is not a port counts as missing.
 int ReadPort(const std::string& text, int fallback) {
   if (text.empty()) return fallback;
   const int port = std::atoi(text.c_str());

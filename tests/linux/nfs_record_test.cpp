@@ -48,7 +48,7 @@ bool Same(const NFSConfRecord& a, const NFSConfRecord& b) {
          a.custom_port_enable == b.custom_port_enable;
 }
 
-// The value that the services read.
+// Returns the value that the services read.
 std::string Judged(const TemporaryRoot& root, const char* section, const char* key) {
   return GetByNfsconf(root.At("/etc/nfs.conf"), section, key);
 }
@@ -186,7 +186,7 @@ TEST(NFSConf, StoresARecordThatNoContextRead) {
   EXPECT_THAT(root.Read(kFile).value_or(""), testing::StartsWith("# by hand\n"));
 }
 
-// A hand edit of any file that was read, also with a port check in between, which reads the files once more.
+// A manual edit of any file that was read, also with a port check in between, which reads the files again.
 TEST(NFSConf, RefusesAfterAHandEditOfAnyFileThatWasRead) {
   for (const char* file : {"/etc/nfs.conf", "/etc/nfs.conf.d/site.conf", "/etc/nfs.conf.d/new.conf", "/etc/part"}) {
     const TemporaryRoot root;

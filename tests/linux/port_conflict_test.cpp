@@ -1,4 +1,4 @@
-// WebUtils::IsPortConflict, in a network of the test's own.
+// WebUtils::IsPortConflict, in a network namespace of the test.
 #include <arpa/inet.h>
 #include <gmock/gmock.h>
 #include <netinet/in.h>
@@ -20,7 +20,7 @@ using WebUtils::IsPortConflict;
 constexpr unsigned long kStatusProgram = 100024;
 constexpr unsigned long kLockProgram = 100021;
 
-// A socket that waits for others, on all addresses.
+// A listening socket on all addresses.
 vorn::FileDescriptor Listen(int family, int type, int port) {
   vorn::FileDescriptor descriptor(socket(family, type, 0));
   const int on = 1;
@@ -50,7 +50,7 @@ TEST(PortConflict, IsEverythingThatIsNoPort) {
   for (const auto& c : cases) EXPECT_EQ(IsPortConflict("nfs_statd", c.first, c.last), c.conflict) << c.first;
 }
 
-TEST(PortConflict, IsASocketOfAnyKindThatSomebodyListensOn) {
+TEST(PortConflict, IsAListeningSocketOfAnyKind) {
   const TemporaryRoot root;
   for (const int family : {AF_INET, AF_INET6}) {
     for (const int type : {SOCK_STREAM, SOCK_DGRAM}) {
@@ -63,7 +63,7 @@ TEST(PortConflict, IsASocketOfAnyKindThatSomebodyListensOn) {
       EXPECT_EQ(IsPortConflict("nfs_statd", 5001, 5001), 0);
     }
   }
-  EXPECT_EQ(IsPortConflict("nfs_statd", 5000, 5000), 0) << "nobody listens any longer";
+  EXPECT_EQ(IsPortConflict("nfs_statd", 5000, 5000), 0) << "the socket is closed";
 }
 
 TEST(PortConflict, IsNotTheServicesOwnSocket) {

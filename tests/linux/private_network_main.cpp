@@ -1,4 +1,4 @@
-// main() of tests that change the state of the network, or mount file systems. It runs the test program once more in
+// main() of tests that change the state of the network, or mount file systems. It runs the test program again in
 // mount and network namespaces of its own, with a loopback interface and an empty /run.
 #include <gmock/gmock.h>
 #include <unistd.h>

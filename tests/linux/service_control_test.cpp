@@ -40,7 +40,7 @@ TEST(Service, IsOffUntilItIsStartedAndAgainOnceItIsStopped) {
 TEST(Service, SaysOnATrialRootWhatWouldHaveBeenDone) {
   const struct {
     int (*operation)();
-    const char* deed;
+    const char* log;
   } cases[] = {{[] { return KLIBServiceStart("nfsd", 0); }, "enabled and started"},
                {[] { return KLIBServiceStop("nfsd", 0); }, "stopped and disabled"},
                {[] { return KLIBServiceRestart("nfsd"); }, "restarted"},
@@ -48,9 +48,9 @@ TEST(Service, SaysOnATrialRootWhatWouldHaveBeenDone) {
   const TemporaryRoot root;
   for (const auto& c : cases) {
     TakeLog();
-    EXPECT_EQ(c.operation(), 0) << c.deed;
+    EXPECT_EQ(c.operation(), 0) << c.log;
     EXPECT_EQ(TakeLogTexts(),
-              std::string("nfs-server.service would be ") + c.deed + ": this root is no booted system\n");
+              std::string("nfs-server.service would be ") + c.log + ": this root is no booted system\n");
   }
 }
 
@@ -97,7 +97,7 @@ TEST(Service, DoesNotComeUpUnprepared) {
   EXPECT_THAT(TakeLogTexts(), testing::Not(testing::HasSubstr("would be")));
 }
 
-// An operation that has to wait because another process has its turn.
+// An operation that waits in the service queue behind another process.
 class WaitingOperation : public testing::Test {
  protected:
   WaitingOperation() {

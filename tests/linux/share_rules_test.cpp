@@ -1,4 +1,4 @@
-// The contract's operations on export rules, each on a root of its own.
+// The contract's operations on export rules, each on a temporary root.
 #include "share_rules.h"
 
 #include <gmock/gmock.h>
@@ -147,7 +147,7 @@ TEST_F(Exports, ThatDoNotChangeAreNotWritten) {
   EXPECT_EQ(before.st_ino, after.st_ino);
 }
 
-TEST_F(Exports, KeepAnOddClientThatTheFileHas) {
+TEST_F(Exports, KeepAnInvalidClientThatTheFileHas) {
   root.Write(kFile, "/volume1/data gss/krb5(ro) 10.0.0.0/255.0.255.0(ro) 10.0.0.1 10.0.0.1/32\n");
   const List list = Get("/volume1/data", 4);
   list->first->privilege = 1;

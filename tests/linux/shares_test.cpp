@@ -10,7 +10,7 @@
 
 namespace {
 
-// The path of a share, or the error's code.
+// Returns the path of a share, or the error code as a string.
 std::string PathOf(const char* name) {
   VORNSHARE* share = nullptr;
   if (VORNShareGet(name, &share) < 0) {

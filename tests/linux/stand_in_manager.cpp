@@ -47,7 +47,7 @@ void Must(int result, const char* what) {
   if (result < 0) throw std::runtime_error(what);
 }
 
-// The call as a test sees it: the method and its texts.
+// Formats a call for the tests: the method and its string arguments.
 std::string Describe(sd_bus_message* message, const std::string& types) {
   std::string call = sd_bus_message_get_member(message);
   if (types == "as") Must(sd_bus_message_enter_container(message, 'a', "s"), "array");
@@ -142,7 +142,7 @@ int StandInManager::AnswerJob(sd_bus_message* message, const std::string& call) 
   const std::string job = std::string(kPath) + "/job/" + std::to_string(++jobs_);
   const auto found = outcomes_.find(call);
   const std::string outcome = found == outcomes_.end() ? "done" : found->second;
-  // Before the answer even, as a job that had nothing to do may end.
+  // The signal is sent before the reply, as it can happen for a job without work.
   if (outcome != "never") {
     sd_bus_emit_signal(bus_, kPath, kInterface, "JobRemoved", "uoss", static_cast<unsigned>(jobs_), job.c_str(),
                        call.c_str(), outcome.c_str());

@@ -1,5 +1,5 @@
-// A stand-in for systemd's manager on a bus of its own: it takes the calls that the service engine
-// makes, writes them down, and ends jobs as it is told to.
+// A fake of systemd's manager on a private bus. It records the calls of the service engine and ends
+// jobs as the test requests.
 #ifndef VORN_TESTS_LINUX_STAND_IN_MANAGER_H
 #define VORN_TESTS_LINUX_STAND_IN_MANAGER_H
 
@@ -29,9 +29,9 @@ class StandInManager {
   // Returns the calls since the last time, in order: "StartUnit nfs-server.service replace".
   std::vector<std::string> TakeCalls();
 
-  // "MethodName unit" answers with an error: org.freedesktop.systemd1.`error`.
+  // Makes "MethodName unit" answer with an error: org.freedesktop.systemd1.`error`.
   void Refuse(const std::string& call, const std::string& error = "Refused");
-  // The job of "MethodName unit" ends as `outcome`; "never" for one that does not.
+  // Makes the job of "MethodName unit" end with the result `outcome`; with "never" it does not end.
   void End(const std::string& call, const std::string& outcome);
   void SetUnitFileState(const std::string& state);
 

@@ -1,4 +1,4 @@
-// A stand-in for rpcbind(8): it says which services are registered. It needs a /run of the test's own.
+// A fake rpcbind(8) that answers which services are registered. It needs a private /run.
 #ifndef VORN_TESTS_LINUX_STAND_IN_RPCBIND_H
 #define VORN_TESTS_LINUX_STAND_IN_RPCBIND_H
 

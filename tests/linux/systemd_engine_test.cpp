@@ -134,13 +134,13 @@ TEST_F(SystemdEngine, NamesTheLineThatAReloadDidNotTake) {
   EXPECT_THAT(status.reason(), HasSubstr("/etc/exports:3:1: /volume1/media"));
 }
 
-TEST_F(SystemdEngine, HasNothingToReloadWhereTheKernelServesNobody) {
+TEST_F(SystemdEngine, HasNothingToReloadWhileTheKernelServerIsOff) {
   SetThreads("0\n");
   EXPECT_TRUE(Engine()->Reload().ok());
   EXPECT_THAT(manager_.TakeCalls(), ElementsAre());
 }
 
-TEST_F(SystemdEngine, FailsWhenTheUnitStartsButTheKernelServesNobody) {
+TEST_F(SystemdEngine, FailsWhenTheUnitStartsButTheKernelServerIsOff) {
   SetThreads("0\n");
   const Status status = Engine()->Start();
   EXPECT_EQ(status.code(), vorn::kServiceFailed);
@@ -156,7 +156,7 @@ TEST_F(SystemdEngine, FailsWithTheNameOfTheJobAndItsOutcome) {
   }
 }
 
-TEST_F(SystemdEngine, DoesNotWaitForEverForAJob) {
+TEST_F(SystemdEngine, HasATimeLimitForAJob) {
   limit_ = 0;
   manager_.End("StopUnit nfs-server.service", "never");
   EXPECT_THAT(Engine()->Stop().reason(), HasSubstr("it did not end in time"));

@@ -35,7 +35,7 @@ int SaveRules() {
 
 int RemoveRules() { return VORNNFSRuleExtSetAll("/volume1/data", nullptr); }
 
-// Read, edit, write: as every request about the ID map does.
+// Reads, edits and writes the record, as every request about the ID map does.
 int EditMap(const std::function<void(_tag_nfs_id_map_*)>& edit) {
   const std::unique_ptr<_tag_nfs_id_map_, FreeMap> map(VORNNFSIDMapGet());
   if (map == nullptr) return -1;

@@ -1,4 +1,4 @@
-// Every kind of change that the contract writes to the box's files, for the tests that hurt them all.
+// Every kind of change that the contract writes to the box's files, for tests that disturb each of them.
 #ifndef VORN_TESTS_LINUX_WRITES_H
 #define VORN_TESTS_LINUX_WRITES_H
 
@@ -13,7 +13,7 @@
 
 #include "temporary_root.h"
 
-// Their roots are in memory: nothing here depends on a disk but the time it takes.
+// Base of these tests. Their roots are in memory, because a disk would only make the tests slower.
 class Writes : public testing::Test {
  protected:
   static void SetUpTestSuite() { setenv("TMPDIR", "/dev/shm", 1); }
@@ -21,25 +21,25 @@ class Writes : public testing::Test {
 
 struct Change {
   const char* name;
-  std::function<int()> make;       // what the operation answers: negative on failure
-  std::vector<const char*> files;  // that it writes, below the root
+  std::function<int()> make;       // returns the result of the operation; negative on failure
+  std::vector<const char*> files;  // the files that it writes, below the root
 };
 
-// The changes; on the box of FurnishFiles() each of them alters each of its files.
+// Returns all kinds of change. After FurnishFiles() each of them alters each of its files.
 std::vector<Change> AllChanges(const TemporaryRoot& root);
 
-// A box whose files all exist, an administrator's lines in them.
+// Creates all files, with lines of an administrator in them.
 void FurnishFiles(const TemporaryRoot& root);
 
-// A box where nothing of ours was ever written; the changes that take something away have nothing to do there.
+// Creates only the files that are not written by the platform. The changes that remove something have no effect then.
 void LeaveFilesToBeMade(const TemporaryRoot& root);
 
-using Contents = std::map<std::string, std::optional<std::string>>;  // by path; none where there is no file
+using Contents = std::map<std::string, std::optional<std::string>>;  // by path; nullopt for a missing file
 
 // Returns the contents of the files of a change.
 Contents ContentsOf(const TemporaryRoot& root, const Change& change);
 
-// The temporary files in the folders of the files of a change.
+// Returns the temporary files in the folders of the files of a change.
 std::vector<std::string> Leftovers(const TemporaryRoot& root, const Change& change);
 
 #endif  // VORN_TESTS_LINUX_WRITES_H

@@ -1,5 +1,5 @@
-// A world in which something is wrong: whatever it is, a change fails with a reason in the log, loses nothing, leaves
-// nothing behind, and can be made when the world is well again.
+// Faults of the system, each under every kind of change: the change fails with a reason in the log, leaves the files as
+// they were and no temporary file, and succeeds once the fault is gone.
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sys/resource.h>
@@ -27,7 +27,7 @@ void Limit(int resource, rlim_t value) {
 
 struct Fault {
   const char* name;
-  void (*strike)();  // in the process that makes the change
+  void (*inject)();  // called in the process that makes the change
 };
 
 const Fault kFaults[] = {
@@ -36,7 +36,7 @@ const Fault kFaults[] = {
        signal(SIGXFSZ, SIG_IGN);
        Limit(RLIMIT_FSIZE, 0);
      }},
-    {"a disk that does not take what it was given", [] { FailSystemCall(SYS_fsync, EIO); }},
+    {"a disk that fails to write", [] { FailSystemCall(SYS_fsync, EIO); }},
     {"a read-only file system", [] { FailSystemCall(SYS_renameat2, EROFS); }},
     {"no permission to make files", [] { FailSystemCall(SYS_openat, EACCES); }},
     {"no permission to replace files", [] { FailSystemCall(SYS_renameat2, EACCES); }},
@@ -44,21 +44,21 @@ const Fault kFaults[] = {
     {"no locks", [] { FailSystemCall(SYS_flock, ENOLCK); }},
 };
 
-// In a process of its own: the change, and whether it failed and said why.
+// Makes the change under the fault in a child process. Returns whether it failed and logged a reason.
 int MakeUnder(const Fault& fault, const Change& change) {
   constexpr int kFailedWithReason = 1;
   ChildProcess process([&] {
     TakeLog();
-    fault.strike();
+    fault.inject();
     const bool failed = change.make() < 0;
     return failed && !TakeLog().empty() ? kFailedWithReason : 0;
   });
   return process.Wait() == kFailedWithReason;
 }
 
-using World = Writes;
+using SystemFaults = Writes;
 
-TEST_F(World, MayBeIllWithoutLosingAnything) {
+TEST_F(SystemFaults, FailTheChangeAndLeaveTheFilesUnchanged) {
   int cases = 0;
   const size_t kinds = AllChanges(TemporaryRoot()).size();
   for (const Fault& fault : kFaults) {
@@ -70,7 +70,7 @@ TEST_F(World, MayBeIllWithoutLosingAnything) {
       EXPECT_TRUE(MakeUnder(fault, change)) << fault.name << ": " << change.name;
       EXPECT_EQ(ContentsOf(root, change), before) << fault.name << ": " << change.name;
       EXPECT_THAT(Leftovers(root, change), IsEmpty()) << fault.name << ": " << change.name;
-      EXPECT_GE(change.make(), 0) << fault.name << ": " << change.name << ": it is over";
+      EXPECT_GE(change.make(), 0) << fault.name << ": " << change.name << ": after the fault";
       EXPECT_NE(ContentsOf(root, change), before) << fault.name << ": " << change.name;
     }
   }
@@ -89,7 +89,7 @@ const Obstacle kObstacles[] = {
     {"a pipe", [](const std::string& path) { mkfifo(path.c_str(), 0600); }},
 };
 
-TEST_F(World, MayHaveSomethingElseWhereAFileIsExpected) {
+TEST_F(SystemFaults, IncludeAPathThatIsNoRegularFile) {
   const size_t kinds = AllChanges(TemporaryRoot()).size();
   for (const Obstacle& obstacle : kObstacles) {
     for (size_t index = 0; index < kinds; ++index) {
@@ -108,7 +108,7 @@ TEST_F(World, MayHaveSomethingElseWhereAFileIsExpected) {
   }
 }
 
-TEST_F(World, MayLackTheFoldersOfAFile) {
+TEST_F(SystemFaults, DoNotIncludeMissingFolders) {
   int made = 0;
   for (size_t index = 0; index < AllChanges(TemporaryRoot()).size(); ++index) {
     const TemporaryRoot root;
@@ -117,7 +117,7 @@ TEST_F(World, MayLackTheFoldersOfAFile) {
     EXPECT_GE(change.make(), 0) << change.name;
     for (const auto& [path, text] : ContentsOf(root, change)) made += text ? 1 : 0;
   }
-  EXPECT_EQ(made, 11) << "all but those of the two removals";
+  EXPECT_EQ(made, 11) << "every file except those of the two removals";
 }
 
 }  // namespace

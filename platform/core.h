@@ -113,8 +113,8 @@ int KLIBCSzHashRemoveKey(KLIBSZHASH* hash, const char* key);
 // Files, strings, programs. Absolute paths are resolved below the platform's root directory.
 
 // Copies the value of `key` in `section` of an INI file into the buffer of `size` bytes. A krb5.conf(5) is read with
-// its own syntax. Returns the length of the value in bytes. A value that does not fit with its NUL is an error; it is
-// never truncated.
+// its own syntax. Returns the length of the value in bytes. A value that does not fit with its NUL, or that
+// is not UTF-8, is an error; it is never changed.
 int KLIBCFileGetSectionValue(const char* path, const char* section, const char* key, char* buffer, int size);
 
 // Converts `text` to upper case by Unicode's full case mapping and stores it in the buffer of `size` bytes. Returns the

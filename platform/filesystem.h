@@ -8,8 +8,8 @@ extern "C" {
 // file handles (name_to_handle_at(2), exports(5)).
 enum { VORNFS_MOUNT_UNEXPORTABLE = 32 };
 
-// Returns 1 if `path`, or a folder below it, is a mount point of that type, and 0 if not. Returns a negative value if
-// the mounts cannot be read; the reason is then in the error facility (core.h).
+// Returns 1 if `path` is in a mount of that type, or a folder below it is a mount point of that type, and 0 if not.
+// Returns a negative value if the mounts cannot be read; the reason is then in the error facility (core.h).
 int VORNFSHasMountPointType(const char* path, int type);
 
 }  // extern "C"

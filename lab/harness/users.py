@@ -2,6 +2,8 @@
 
 import dataclasses
 
+from harness.programs import run
+
 
 @dataclasses.dataclass(frozen=True)
 class User:
@@ -22,7 +24,8 @@ CAROL = User("carol", 2003, 2003)
 
 
 def create():
-    """Enters them into the box's files, once."""
+    """Enters them into the box's files, once. The package has created an "admin" of its own."""
+    run("userdel", ADMIN.name)
     with open("/etc/passwd", "a", encoding="ascii") as passwd, open("/etc/group", "a", encoding="ascii") as group:
         for user in (ADMIN, ALICE, BOB, CAROL):
             passwd.write(f"{user.name}:x:{user.uid}:{user.gid}::/tmp:/bin/sh\n")

@@ -41,7 +41,6 @@ def test_fixed_ports_are_those_of_both_transports(box):
     assert rpc_transports("nlockmgr") == {("tcp", 32803), ("udp", 32803)}
 
 
-@pytest.mark.pending("lockd keeps its fixed port while the firewall no longer opens it")
 def test_fixed_ports_that_are_switched_off_are_free(box):
     box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
     box.advanced(custom_port_enable=False)

@@ -1,5 +1,7 @@
 """The package: upgraded over a running service, removed, purged, and installed again."""
 
+import fcntl
+import os
 import pathlib
 
 import pytest
@@ -55,6 +57,50 @@ def test_an_upgrade_restarts_the_server_and_leaves_nfs_alone(box, client, settin
         (mounted / "after").touch()
     assert api.call("NFS", "get") == settings
     assert len(box.rules("data")) == 1
+
+
+def accounts():
+    return [line.split(":")[0] for line in pathlib.Path("/etc/passwd").read_text(encoding="ascii").splitlines()]
+
+
+@pytest.fixture
+def without_admin():
+    """A box without the account of the squash modes, which gets it back afterwards."""
+    passwd = pathlib.Path("/etc/passwd")
+    before = passwd.read_text(encoding="ascii")
+    passwd.write_text("".join(line + "\n" for line in before.splitlines() if not line.startswith("admin:")),
+                      encoding="ascii")
+    yield
+    passwd.write_text(before, encoding="ascii")
+
+
+def test_the_package_creates_the_accounts_of_the_squash_modes(box, client, without_admin):
+    del without_admin
+    box.foresees('no account "admin"; create it, or change the setting admin_account|^vornd: ')
+    box.share("data")
+    rule = {"client": client.address, "root_squash": "all_admin"}
+    with pytest.raises(api.Refused):
+        box.allow("data", rule)
+    assert 'no account "admin"' in box.journal.text()
+    assert "created the system account admin" in run("dpkg", "--install", PACKAGE)
+    wait_for(api.answers, "vornd does not listen")
+    assert accounts().count("admin") == 1
+    box.allow("data", rule)
+    assert "created" not in run("dpkg", "--install", PACKAGE)
+    wait_for(api.answers, "vornd does not listen")
+
+
+def test_a_lock_of_another_program_survives_a_restart(box):
+    del box
+    with open("/run/vorn/config.lock", "a", encoding="ascii") as held:
+        fcntl.flock(held, fcntl.LOCK_EX)
+        run("systemctl", "restart", "vornd")
+        wait_for(api.answers, "vornd does not listen")
+        assert os.path.samestat(os.fstat(held.fileno()), os.stat("/run/vorn/config.lock"))
+        run("systemctl", "stop", "vornd")
+        assert os.path.samestat(os.fstat(held.fileno()), os.stat("/run/vorn/config.lock"))
+        run("systemctl", "start", "vornd")
+        wait_for(api.answers, "vornd does not listen")
 
 
 def test_a_removed_package_leaves_its_settings_and_a_service_that_serves(box, client, settings):

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "unicode.h"
+
 namespace VORN {
 namespace {
 
@@ -39,7 +41,8 @@ const CallDescription& CallContext::description() const { return description_; }
 const std::vector<std::string>& CallContext::reasons() const { return reasons_; }
 const std::vector<std::string>& CallContext::warnings() const { return warnings_; }
 
-void CallContext::AddReason(std::string sentence) { Add(std::move(sentence), &reasons_); }
-void CallContext::AddWarning(std::string sentence) { Add(std::move(sentence), &warnings_); }
+// A sentence may quote a file, which need not be UTF-8.
+void CallContext::AddReason(std::string sentence) { Add(vorn::ToValidUtf8(sentence), &reasons_); }
+void CallContext::AddWarning(std::string sentence) { Add(vorn::ToValidUtf8(sentence), &warnings_); }
 
 }  // namespace VORN

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform_settings.h"
+#include "unicode.h"
 #include "users.h"
 
 namespace vorn {
@@ -74,6 +75,12 @@ bool IsSquashedAlike(const std::vector<ExportFlavor>& flavors) {
   });
 }
 
+std::string MissingAccount(bool is_guest, const SquashAccounts& accounts) {
+  return "the box has no account \"" + (is_guest ? accounts.guest_name : accounts.admin_name) +
+         "\"; create it, or change the setting " + (is_guest ? "guest_account" : "admin_account") +
+         " in /etc/vorn/platform.conf";
+}
+
 Status SetSquash(const ExportRule& rule, const SquashAccounts& accounts, ExportOptions* options) {
   if (!IsSquashedAlike(options->flavors)) {
     return Refuse(rule, "its security flavours have different squash options; only the exports file can change them");
@@ -86,8 +93,9 @@ Status SetSquash(const ExportRule& rule, const SquashAccounts& accounts, ExportO
   options->anon_uid = defaults.anon_uid;
   options->anon_gid = defaults.anon_gid;
   if (rule.squash == VORNNFS_SQUASH_ROOT) return {};
-  const auto& account = rule.squash == VORNNFS_SQUASH_GUEST ? accounts.guest : accounts.admin;
-  if (!account) return Refuse(rule, "the box has no account for its squash mode");
+  const bool is_guest = rule.squash == VORNNFS_SQUASH_GUEST;
+  const auto& account = is_guest ? accounts.guest : accounts.admin;
+  if (!account) return Refuse(rule, MissingAccount(is_guest, accounts));
   options->anon_uid = account->user;
   options->anon_gid = account->group;
   return {};
@@ -155,12 +163,13 @@ Result<SquashAccounts> SquashAccounts::Load(Box& box) {
   if (!settings.ok()) return settings.status();
   const auto accounts = ReadAccounts(box);
   if (!accounts.ok()) return accounts.status();
-  return SquashAccounts{FindIDs(**accounts, settings->admin_account), FindIDs(**accounts, settings->guest_account)};
+  return SquashAccounts{FindIDs(**accounts, settings->admin_account), FindIDs(**accounts, settings->guest_account),
+                        settings->admin_account, settings->guest_account};
 }
 
 ExportRule RuleOf(const ExportEntry& entry, const SquashAccounts& accounts) {
   ExportRule rule{};
-  entry.client.copy(rule.client, sizeof rule.client - 1);
+  ToValidUtf8(entry.client).copy(rule.client, sizeof rule.client - 1);
   rule.privilege = WidestAccess(entry.options).read_only ? 0 : 1;
   rule.squash = SquashOf(entry.options, accounts);
   rule.write_mode = entry.options.async ? VORNNFS_WRITE_ASYNC : VORNNFS_WRITE_SYNC;

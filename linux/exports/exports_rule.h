@@ -3,6 +3,7 @@
 #define VORN_LINUX_EXPORTS_EXPORTS_RULE_H
 
 #include <optional>
+#include <string>
 
 #include "box.h"
 #include "exports_document.h"
@@ -21,6 +22,8 @@ struct AccountIDs {
 struct SquashAccounts {
   std::optional<AccountIDs> admin;
   std::optional<AccountIDs> guest;
+  std::string admin_name = "admin";  // in the settings
+  std::string guest_name = "nobody";
 
   // Looks up the accounts that the settings of the box name in its passwd(5).
   static Result<SquashAccounts> Load(Box& box);

@@ -83,11 +83,15 @@ Result<bool> HasUnexportableMount(Box& box, const std::string& path) {
   const Iterator iterator(mnt_new_iter(MNT_ITER_FORWARD));
   if (!iterator) return Status::System(ENOMEM, "mount table");
   libmnt_fs* entry = nullptr;
+  libmnt_fs* own = nullptr;  // the mount that has `path`: the last one of the innermost
   while (mnt_table_next_fs(table->get(), iterator.get(), &entry) == 0) {
     const char* target = mnt_fs_get_target(entry);
-    if (target != nullptr && IsBelow(target, path) && IsUnexportable(entry, box.root().is_box())) return true;
+    if (target == nullptr) continue;
+    if (IsBelow(target, path) && IsUnexportable(entry, box.root().is_box())) return true;
+    const bool is_inner = own == nullptr || IsBelow(target, mnt_fs_get_target(own));
+    if (IsBelow(path, target) && is_inner) own = entry;
   }
-  return false;
+  return own != nullptr && IsUnexportable(own, box.root().is_box());
 }
 
 }  // namespace vorn

@@ -9,8 +9,8 @@
 
 namespace vorn {
 
-// Whether `path`, or a folder below it, is a mount whose file system the kernel's NFS server cannot export:
-// a network file system, FUSE, one of the kernel's own, or one without file handles (exportfs support).
+// Whether the file system of `path`, or that of a mount below it, is one that the kernel's NFS server cannot export: a
+// network file system, FUSE, one of the kernel's own, or one without file handles (exportfs support).
 Result<bool> HasUnexportableMount(Box& box, const std::string& path);
 
 }  // namespace vorn

@@ -3,7 +3,8 @@
 # and use the files as they are now.
 # S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured.
 # S83nfsd.sh groups: waits where a service that has just stopped asking for groups must not begin yet.
-# The service's unit calls these two before each start.
+# S83nfsd.sh lockports: has the lock manager forget fixed ports that are no longer configured.
+# The service's unit calls these three before each start.
 # On a trial root (VORN_ROOT) it only says what it would do.
 set -u
 
@@ -67,6 +68,19 @@ transfer_sizes() {
 	[ "$largest" = 0 ] || tell /proc/fs/nfsd/max_block_size "$largest"
 }
 
+# lockd_port KEY: a port of the lock manager, as rpc.statd(8) reads it. 0 or nothing is any port.
+lockd_port() {
+	nfsconf --file "$root/etc/nfs.conf" --get lockd "$1" | sed 's/^[[:space:]]*\([0-9]*\).*/\1/; s/^0*//'
+}
+
+# rpc.statd(8) gives the kernel the configured ports of the lock manager, but never takes one back.
+lock_ports() {
+	tcp=$(lockd_port port)
+	udp=$(lockd_port udp-port)
+	[ -n "$tcp" ] || tell /proc/sys/fs/nfs/nlm_tcpport 0
+	[ -n "${udp:-$tcp}" ] || tell /proc/sys/fs/nfs/nlm_udpport 0
+}
+
 manages_groups() {
 	case $(nfsconf --file "$root/etc/nfs.conf" --get mountd manage-gids | tr '[:upper:]' '[:lower:]') in
 	1 | t | true | y | yes | on) return 0 ;;
@@ -107,8 +121,11 @@ transfersizes)
 groups)
 	settle_groups
 	;;
+lockports)
+	lock_ports
+	;;
 *)
-	echo "usage: $0 reloadidmap | transfersizes | groups" >&2
+	echo "usage: $0 reloadidmap | transfersizes | groups | lockports" >&2
 	exit 2
 	;;
 esac

@@ -14,10 +14,11 @@ namespace {
 
 // The "-" ignores a failure: a size that the kernel refuses must not keep NFS from starting.
 constexpr char kDropInText[] =
-    "# Kept by the NFS settings: gives the kernel what nfs.conf.d/vorn.conf says and rpc.nfsd(8) does not read.\n"
+    "# Kept by the NFS settings: gives the kernel what nfs.conf says and the daemons of NFS do not tell it.\n"
     "[Service]\n"
     "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh groups\n"
-    "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n";
+    "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"
+    "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh lockports\n";
 
 void LogNextStart(int size) {
   if (size == 0) {

@@ -15,6 +15,8 @@ using testing::HasSubstr;
 
 constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
 constexpr char kLimit[] = "/fs/nfsd/max_block_size";
+constexpr char kLockPort[] = "/sys/fs/nfs/nlm_tcpport";
+constexpr char kLockUDPPort[] = "/sys/fs/nfs/nlm_udpport";
 constexpr char kMark[] = "/run/nfs-leaves-groups-alone";
 
 // A box in namespaces of its own: a systemctl that records its arguments, and files of the test in place of /proc and
@@ -32,6 +34,7 @@ class Box {
     folder_.Write("/nfs.conf", "");
     folder_.Write("/proc" + std::string(kFlush), "");
     folder_.Write("/proc" + std::string(kLimit), "");
+    for (const char* port : {kLockPort, kLockUDPPort}) folder_.Write("/proc" + std::string(port), "32803\n");
   }
 
   void Runs(const std::string& unit) const { folder_.Write("/active/" + unit, ""); }
@@ -151,6 +154,27 @@ TEST(TransferSizes, AreReadBelowATrialRoot) {
   root.Write("/etc/nfs.conf.d/vorn.conf", "[vorn]\nread-size = 65536\nwrite-size = 8192\n");
   EXPECT_EQ(RunProgram({BOX_SCRIPT, "transfersizes"}).output,
             "S83nfsd: would write 65536 to /proc/fs/nfsd/max_block_size\n");
+}
+
+TEST(LockPorts, AreForgottenOnceTheyAreNotConfigured) {
+  const struct {
+    const char* configuration;
+    const char* tcp;
+    const char* udp;
+  } cases[] = {{"", "0\n", "0\n"},
+               {"[lockd]\nport = 0\nudp-port = 0\n", "0\n", "0\n"},
+               {"[lockd]\nport = many\n", "0\n", "0\n"},
+               {"[lockd]\nport = 32803\n", "32803\n", "32803\n"},
+               {"[lockd]\nport = 32803x\nudp-port = 32803\n", "32803\n", "32803\n"},
+               {"[lockd]\nudp-port = 32803\n", "0\n", "32803\n"}};
+  for (const auto& c : cases) {
+    const Box box;
+    box.IsConfigured(c.configuration);
+    const ProgramResult result = box.Run("lockports");
+    EXPECT_EQ(result.status, 0) << c.configuration << result.errors;
+    EXPECT_EQ(box.Kernel(kLockPort), c.tcp) << c.configuration;
+    EXPECT_EQ(box.Kernel(kLockUDPPort), c.udp) << c.configuration;
+  }
 }
 
 TEST(Groups, DelayOnlyTheFirstServiceThatStoppedManagingThem) {

@@ -189,5 +189,14 @@ TEST(CallContext, CollectsTheReasonOfAFailure) {
   EXPECT_THAT(call.reasons(), testing::ElementsAre("there is no service \"ftpd\""));
 }
 
+TEST(CallContext, AnswersInUtf8) {
+  const TemporaryRoot root;
+  VORN::CallContext call({});
+  EXPECT_LT(KLIBServiceStart("ft\xe4pd", 0), 0);
+  call.AddWarning(std::string(1023, 'x') + "\xc3\xa4");
+  EXPECT_THAT(call.reasons(), testing::ElementsAre("there is no service \"ft\xef\xbf\xbdpd\""));
+  EXPECT_EQ(call.warnings().front(), std::string(1023, 'x'));
+}
+
 }  // namespace
 }  // namespace vorn

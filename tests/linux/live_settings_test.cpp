@@ -26,7 +26,8 @@ TEST(TransferSizes, AreHandedOverByADropInOfTheUnit) {
   ASSERT_EQ(VORNNFSUDPPrefSizeSet(65536, 131072), 0);
   EXPECT_THAT(root.Read(kDropIn).value_or(""),
               HasSubstr("\n[Service]\nExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh groups\n"
-                        "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"));
+                        "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh transfersizes\n"
+                        "ExecStartPre=-/usr/vorn/etc/rc.sysv/S83nfsd.sh lockports\n"));
 }
 
 // systemd-analyze verifies the drop-in. It requires the programs of a unit, so the root has them.

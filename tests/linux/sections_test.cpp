@@ -45,6 +45,16 @@ TEST(SectionValue, IsNeverCut) {
   EXPECT_LT(KLIBCFileGetSectionValue("/etc/x.conf", "a", "k", nullptr, 4), 0);
 }
 
+TEST(SectionValue, IsRefusedIfItIsNotUtf8) {
+  const TemporaryRoot root;
+  root.Write("/etc/x.conf", "[a]\nk = b\xe4r\n");
+  root.Write(kKrb5, "[libdefaults]\ndefault_realm = B\xc4R.EXAMPLE\n");
+  EXPECT_EQ(Get("/etc/x.conf", "a", "k"), std::nullopt);
+  EXPECT_EQ(KLIBCErrGet(), EILSEQ);
+  EXPECT_EQ(Get(kKrb5, "libdefaults", "default_realm"), std::nullopt);
+  EXPECT_EQ(KLIBCErrGet(), EILSEQ);
+}
+
 struct Krb5Case {
   const char* name;
   const char* text;

@@ -24,6 +24,7 @@ constexpr char kPasswd[] =
     "letters:x:abc:1000::/:/bin/sh\n"
     "Alice:x:1001:1001::/home/alice:/bin/bash\n"
     "\xc3\xa4nne:x:1002:1002::/home/anne:/bin/bash\n"
+    "\xe4nne:x:1003:1003:an account that JSON cannot name:/home/anne:/bin/bash\n"
     "last:x:60000:100::/:/bin/sh\n"
     "nobody:x:65534:65534:nobody:/nonexistent:/usr/sbin/nologin\n";
 

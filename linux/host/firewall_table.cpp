@@ -9,6 +9,8 @@
 
 #include "configuration_lock.h"
 #include "configured_ports.h"
+#include "foreign_firewalls.h"
+#include "notice.h"
 #include "platform_settings.h"
 
 namespace vorn {
@@ -43,6 +45,18 @@ Status Load(const std::string& ruleset) {
   return Status::Failure(kServiceFailed, std::string("nftables: ") + nft_ctx_get_error_buffer(context.get()));
 }
 
+// Logs once what keeps the ports closed. Only a remark: other programs decide over their own tables.
+void NoticeClosedPorts(const std::vector<ConfiguredPort>& ports) {
+  const std::unique_ptr<nft_ctx, FreeContext> context(nft_ctx_new(NFT_CTX_DEFAULT));
+  if (!context) return;
+  nft_ctx_buffer_error(context.get());
+  nft_ctx_buffer_output(context.get());
+  nft_ctx_output_set_flags(context.get(), NFT_CTX_OUTPUT_STATELESS);
+  if (nft_run_cmd_from_buffer(context.get(), "list ruleset") != 0) return;
+  const char* ruleset = nft_ctx_get_output_buffer(context.get());
+  for (const std::string& sentence : FindClosedFirewalls(ruleset, ports)) NoticeOnce("nftables", Version(), sentence);
+}
+
 Status Save(Box& box, const std::string& ruleset) {
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
@@ -59,8 +73,10 @@ Status UpdateFirewall(Box& box) {
   const auto ports = ReadConfiguredPorts(box);
   if (!ports.ok()) return ports.status();
   const std::string ruleset = Ruleset(*ports);
-  const Status saved = Save(box, ruleset);
-  return saved.ok() ? Load(ruleset) : saved;
+  if (Status status = Save(box, ruleset); !status.ok()) return status;
+  if (Status status = Load(ruleset); !status.ok()) return status;
+  NoticeClosedPorts(*ports);
+  return {};
 }
 
 }  // namespace vorn

@@ -15,7 +15,8 @@ namespace vorn {
 inline constexpr char kFirewallFile[] = "/var/lib/vorn/firewall.nft";
 
 // Makes the table match the configured ports, in one transaction, and saves it in /var/lib/vorn/firewall.nft,
-// which a unit of the package loads at boot. Does nothing if the box's settings switch the firewall off.
+// which a unit of the package loads at boot. Does nothing if the box's settings switch the firewall off. Where another
+// firewall keeps the ports closed (foreign_firewalls.h), the log says so once, and what to do.
 Status UpdateFirewall(Box& box);
 
 }  // namespace vorn

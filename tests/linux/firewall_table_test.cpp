@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <filesystem>
 
+#include "captured_log.h"
 #include "core.h"
 #include "firewall.h"
 #include "injected_failures.h"
@@ -59,6 +60,49 @@ TEST_F(Firewall, MarksWhatComesForTheConfiguredPortsInATableOfItsOwn) {
             "\t\ttype filter hook input priority filter - 1; policy accept;\n" +
                 mark("111", "rpcbind") + mark("2049", "nfs") + mark("20048", "nfs_mountd") + mark("4000", "nfs_statd") +
                 mark("4001", "nfs_nlm") + "\t}\n}\n");
+}
+
+TEST_F(Firewall, SaysOnceThatAnotherFirewallKeepsThePortsClosed) {
+  const struct {
+    const char* name;
+    const char* rules;
+    const char* remedy;  // "": the ports are open
+  } cases[] = {
+      {"drop policy", "table inet a { chain x { type filter hook input priority 0; policy drop; }; }",
+       "meta mark & 0x01000000 != 0 accept"},
+      {"the mark is accepted",
+       "table inet b { chain x { type filter hook input priority 0; policy drop; "
+       "meta mark & 0x01000000 != 0 accept; }; }",
+       ""},
+      {"the ports are accepted",
+       "table inet c { chain x { type filter hook input priority 0; policy drop; tcp dport { 111, 2049 } accept; }; }",
+       ""},
+      {"another port is accepted",
+       "table ip d { chain x { type filter hook input priority 0; policy drop; tcp dport { 1111, 2049 } accept; }; }",
+       "meta mark"},
+      {"the last rule rejects",
+       "table inet firewalld { chain x { type filter hook input priority 0; tcp dport 22 accept; counter; reject; }; }",
+       "firewall-cmd"},
+      {"ufw",
+       "table ip filter { chain ufw-before { }; chain INPUT { type filter hook input priority 0; policy drop; "
+       "jump ufw-before; }; }",
+       "ufw allow"},
+      {"one address is dropped",
+       "table inet e { chain x { type filter hook input priority 0; ip saddr 10.0.0.1 drop; }; }", ""},
+      {"only routed packets are dropped",
+       "table inet f { chain fw { type filter hook forward priority 0; policy drop; }; }", ""},
+  };
+  for (const auto& c : cases) {
+    ASSERT_EQ(RunProgram({"nft", "flush", "ruleset"}).status, 0);
+    ASSERT_EQ(RunProgram({"nft", c.rules}).status, 0) << c.name;
+    TakeLog();
+    EXPECT_EQ(VORNFwRuleHup(), 0) << c.name;
+    EXPECT_EQ(VORNFwRuleHup(), 0) << c.name;
+    const std::vector<LogLine> log = TakeLog();
+    ASSERT_EQ(log.size(), *c.remedy == '\0' ? 0U : 1U) << c.name;
+    if (log.empty()) continue;
+    EXPECT_THAT(log[0].text, AllOf(HasSubstr("111, 2049 of NFS are not open"), HasSubstr(c.remedy))) << c.name;
+  }
 }
 
 TEST_F(Firewall, IsKeptInAFileThatBringsItBack) {

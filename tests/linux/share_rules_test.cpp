@@ -215,6 +215,18 @@ std::string Reason() {
   return log.empty() ? "" : log.back().text;
 }
 
+TEST_F(Exports, ShowAClientThatIsNotUtf8AndRefuseToStoreIt) {
+  const std::string file = "/volume1/data b\xe4r(rw) other(ro)\n";
+  root.Write(kFile, file);
+  const List list = Get("/volume1/data", 2);
+  EXPECT_THAT(Clients(list), ElementsAre("b\xef\xbf\xbdr", "other"));
+  list->first->next->privilege = 1;
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), -1);
+  EXPECT_THAT(Reason(), HasSubstr("neither a host name nor an address"));
+  EXPECT_EQ(File(), file);
+  EXPECT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"other"}).get()), 0) << "it can be removed";
+}
+
 // One file of /etc/exports.d has a rule for the share, and one that its file overrides.
 class ForeignExports : public Exports {
  protected:

@@ -140,11 +140,11 @@ void Session::Expire() {
   Refuse(408, "The request did not arrive in time.");
 }
 
-ConnectionUse Session::use() const {
+ConnectionUse Session::UseAt(Clock::time_point now) const {
   ConnectionUse use{share_key_, Activity::kWaiting, since_};
   if (phase_ == Phase::kDrain) use.activity = Activity::kEnding;
   const bool between = phase_ == Phase::kIdle || (phase_ == Phase::kHead && !reader_.begun());
-  if (between && Clock::now() - since_ > kIdleAfter) use.activity = Activity::kIdle;
+  if (between && now - since_ > kIdleAfter) use.activity = Activity::kIdle;
   if (phase_ == Phase::kCall || phase_ == Phase::kAuthorize) use.activity = Activity::kWorking;
   return use;
 }

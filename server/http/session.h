@@ -57,7 +57,7 @@ class Session : public std::enable_shared_from_this<Session> {
   void Tick(Clock::time_point now);
 
   std::size_t listener() const { return listener_; }  // an index into the server's listeners
-  ConnectionUse use() const;
+  ConnectionUse UseAt(Clock::time_point now) const;
 
  private:
   using Error = Stream::Error;

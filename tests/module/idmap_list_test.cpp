@@ -21,7 +21,7 @@ using testing::Not;
 constexpr char kSuggest[] = R"({"suggestion": true})";
 constexpr char kBadType[] = "Invalid type of input.";
 
-// A box with five mappings and, root included, five suggestions.
+// A box with five mappings and, including root, five suggestions.
 void Furnish(FakePlatform* platform) {
   platform->mappings = {{"dora@BOX", "alice"}, {"Carl@BOX", "carol"}, {"abel@BOX", "bob"}, {"x", "y"}, {"=", "root"}};
   platform->users = {"dave", "bob", "carol", "alice"};

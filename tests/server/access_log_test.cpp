@@ -7,7 +7,7 @@
 namespace vorn::server {
 namespace {
 
-// A sink that keeps what is written.
+// A sink that stores the records.
 class Kept {
  public:
   AccessLog::Sink sink() {

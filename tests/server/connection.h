@@ -1,4 +1,4 @@
-// A client that sends exactly the bytes that a test wants sent.
+// A client that sends exactly the given bytes.
 #ifndef VORN_TESTS_SERVER_CONNECTION_H
 #define VORN_TESTS_SERVER_CONNECTION_H
 
@@ -28,17 +28,17 @@ class Connection {
   bool connected() const { return static_cast<bool>(socket_); }
   int socket() const { return socket_.get(); }
 
-  // False when the server has gone.
+  // Returns false if the server has closed the connection.
   bool Send(std::string_view bytes);
   void FinishSending();
 
-  // The next reply; `head_only` for one to a HEAD request.
+  // Receives the next reply. `head_only` is for the reply to a HEAD request.
   Reply Receive(bool head_only = false);
 
-  // Everything until the server closes; "(open)" in its end if it does not.
+  // Receives everything until the server closes; appends "(open)" if it does not close.
   std::string ReceiveAll();
 
-  // Whether the server closes the connection without another byte.
+  // Returns whether the server closes the connection without sending another byte.
   bool IsClosedByServer() { return ReceiveAll().empty(); }
 
  private:
@@ -49,7 +49,7 @@ class Connection {
   std::string unread_;
 };
 
-// A POST of JSON, or of nothing.
+// Returns a POST request with a JSON body, or without a body.
 std::string Post(const std::string& target, const std::string& json = "", const std::string& more_headers = "");
 std::string Get(const std::string& target);
 

@@ -1,4 +1,4 @@
-// A service for tests of the transport, and a server that has it.
+// A service for tests of the transport, and a server that uses it.
 #ifndef VORN_TESTS_SERVER_ECHO_SERVICE_H
 #define VORN_TESTS_SERVER_ECHO_SERVICE_H
 
@@ -20,7 +20,7 @@
 namespace vorn::server {
 
 // Answers a request with its body, from another thread. Other targets:
-//   /no      is refused with 404 at its head
+//   /no      is refused with 404 after its head
 //   /hold    waits for the test to answer
 //   /ask     waits for the test to authorise it, and then echoes
 //   /fixed   is answered with the response that the test has set

@@ -15,7 +15,7 @@ std::string Part(const std::string& disposition, const std::string& data) {
   return "--b\r\nContent-Disposition: form-data; " + disposition + "\r\n\r\n" + data + "\r\n";
 }
 
-// Files, each of which would hold a descriptor.
+// Returns a form with many files, each of which could keep a descriptor open.
 std::string Parts(int count) {
   std::string form;
   for (int i = 0; i < count; ++i) form += Part("name=f" + std::to_string(i) + "; filename=k", "x");
@@ -29,7 +29,7 @@ std::size_t OpenDescriptors() {
 
 class FormBodyTest : public testing::Test {
  protected:
-  // The status that the form is refused with; 0 if it is taken.
+  // Returns the status that the form is refused with; 0 if it is accepted.
   int Refusal(const std::string& form) {
     FormBody body("b", *uploads_);
     if (const auto refusal = body.Receive(form)) return refusal->status;

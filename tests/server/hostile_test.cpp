@@ -1,6 +1,6 @@
 // Hostile values for every parameter of every method: the real module on the Linux platform, on a box
-// whose files are looked at after each request. None ends the process, gets into a file or stays
-// without a clear code; the readers of those files judge what was taken.
+// whose files are checked after each request. No value ends the process or breaks a file, and each
+// refusal has a defined code. The real readers check the files that accepted requests wrote.
 #include <gmock/gmock.h>
 
 #include <cstdlib>
@@ -29,7 +29,7 @@ constexpr char kExports[] = "/etc/exports";
 constexpr char kIDMap[] = "/etc/idmapd.conf";
 constexpr char kSettings[] = "/etc/nfs.conf.d/vorn.conf";
 
-// A method, parameters that it takes, and the places in them: keys and positions, from the outside in.
+// A method, parameters that it accepts, and the paths of values in them: keys and positions, from the outside in.
 struct Method {
   const char* name;
   Entry entry;
@@ -79,7 +79,7 @@ const std::vector<Method>& Methods() {
   return methods;
 }
 
-// The value at a place.
+// Returns the value at a path.
 Json::Value& At(Json::Value* params, const std::string& place) {
   Json::Value* value = params;
   std::istringstream steps(place);
@@ -103,20 +103,20 @@ struct Tally {
   std::set<const void*> values;
   int requests = 0;
   int taken = 0;
-  int thrown = 0;  // a value that cannot be taken for a switch
+  int thrown = 0;  // values that cannot be converted to a boolean
   std::map<int, int> codes;
 };
 
 class Hostile : public testing::Test {
  protected:
-  // In memory: every request that is taken is written to the disk otherwise.
+  // Uses a root in memory, because every accepted request would write to the disk.
   static void SetUpTestSuite() { setenv("TMPDIR", "/dev/shm", 1); }
 
-  // Sends it, and looks at what it has done.
+  // Sends the method's parameters with the hostile value at `place`, and checks the answer and the files.
   void Try(const Method& method, const std::string& place, const HostileValue& hostile);
   void Print() const;
 
-  std::set<std::string> exports_;  // what files held after requests that were taken
+  std::set<std::string> exports_;  // contents of the files after accepted requests
   std::set<std::string> ini_files_;
   std::map<std::string, Tally> tallies_;
   const GuardedBox box_;
@@ -126,7 +126,7 @@ class Hostile : public testing::Test {
   void CollectFiles();
 };
 
-// The code of its answer, 0 for success; -1 when it was left with an exception, as the server answers it.
+// Returns the code of the answer, 0 for success; -1 if the method ended with an exception, which a server answers.
 int Hostile::Send(const Method& method, const Json::Value& params, Tally* tally) {
   VORN::APIRequest request(params);
   VORN::APIResponse response;
@@ -183,9 +183,9 @@ void Hostile::Print() const {
 }
 
 // ---------------------------------------------------------------------------------------------
-// The files as their readers understand them.
+// The contents of the files as their readers parse them.
 
-// Without what requests may change.
+// Returns the content without the keys that requests may change.
 IniContent WithoutOurs(IniContent content) {
   content.erase("static");
   content.erase("vorn");
@@ -221,7 +221,7 @@ TEST_F(Hostile, ValuesGetIntoNoFileAndHaveAClearCode) {
   for (const std::string& text : ini_files_) {
     EXPECT_THAT(WithoutOurs(ReadByNfsconf(text)), AnyOf(before[0], before[1])) << text;
   }
-  std::cout << ini_files_.size() << " INI files judged by nfsconf, " << exports_.size() << " exports files";
+  std::cout << ini_files_.size() << " INI files read by nfsconf, " << exports_.size() << " exports files";
   const ExportfsJudge judge;
   std::cout << (judge.Unavailable().empty() ? " by exportfs\n" : " not: " + judge.Unavailable() + "\n");
   if (!judge.Unavailable().empty()) return;
@@ -233,7 +233,7 @@ TEST_F(Hostile, ValuesGetIntoNoFileAndHaveAClearCode) {
   for (std::size_t i = 0; i < files.size(); ++i) EXPECT_EQ(LinesOfOthers(verdicts[i].table), wanted) << files[i];
 }
 
-// The server's own reader stands before the module.
+// The server's JSON reader refuses hostile JSON before it reaches the module.
 TEST_F(Hostile, JsonReachesNoMethod) {
   for (const HostileJson& json : HostileJsonTexts()) {
     for (const char* before : {"", "{\"filter\": ", "{\"idmap\": [", "{"}) {

@@ -26,7 +26,7 @@ std::string Unzip(const std::string& packed) {
   return text;
 }
 
-// `pieces` times 1000 bytes, of unknown length in total; fails after that if `fails`.
+// A body of `pieces` times 1000 bytes whose total length is unknown. It fails at its end if `fails`.
 class Generated : public BodySource {
  public:
   explicit Generated(int pieces, bool fails = false) : left_(pieces), fails_(fails) {}
@@ -45,7 +45,7 @@ class Generated : public BodySource {
 
 std::string GetWith(const std::string& headers) { return "GET /fixed HTTP/1.1\r\nHost: x\r\n" + headers + "\r\n"; }
 
-TEST_F(HttpTest, LargeAnswersAreCompressedForWhoAsks) {
+TEST_F(HttpTest, LargeAnswersAreCompressedOnRequest) {
   Start();
   const std::string large(5000, 'a');
   service_.SetFixed({200, large});

@@ -1,4 +1,4 @@
-// The transport's limits: bad clients cannot take the resources of good ones.
+// The transport's limits: misbehaving clients cannot exhaust the resources of others.
 #include <gmock/gmock.h>
 #include <sys/resource.h>
 
@@ -11,7 +11,7 @@ using testing::HasSubstr;
 
 constexpr std::chrono::seconds kShort{1};
 
-TEST_F(HttpTest, SlowSendersAreToldAndDroppedAndDisturbNobody) {
+TEST_F(HttpTest, SlowSendersAreAnsweredAndDroppedAndDelayNoOtherClient) {
   HttpLimits limits;
   limits.head = limits.body = limits.idle = kShort;
   Start(limits);
@@ -120,7 +120,7 @@ TEST_F(HttpTest, SlowClientsMakeRoomToo) {
   EXPECT_TRUE(slow[0].IsClosedByServer());
 }
 
-TEST_F(HttpTest, WhoFindsOnlyConnectionsThatWorkIsToldToComeBack) {
+TEST_F(HttpTest, AConnectionBeyondTheLimitIsAnswered503WhenAllOthersAreWorking) {
   HttpLimits limits;
   limits.unix_connections = {2, 2};
   Start(limits);
@@ -273,7 +273,7 @@ TEST_F(HttpTest, ACallIsToldThatItsClientHasLeft) {
   const Answer answer = service_.AwaitHeld();
   client.reset();
   EXPECT_TRUE(Eventually([&] { return service_.abandoned() == 1; }));
-  answer({200, "nobody reads this"});
+  answer({200, "not read by the client"});
 }
 
 TEST_F(HttpTest, AClientThatOnlyFinishesSendingGetsItsAnswer) {

@@ -1,4 +1,4 @@
-// How the transport stops while calls run, and what becomes of answers that come later. These tests find errors of
+// Stopping the transport while calls run, and answers that arrive afterwards. These tests find errors of
 // lifetime only under the address and thread sanitizers.
 #include <gmock/gmock.h>
 

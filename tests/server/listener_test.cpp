@@ -35,7 +35,7 @@ TEST(Listener, OpensAUnixSocketForOwnerAndGroupAlone) {
   EXPECT_FALSE(std::filesystem::exists(path)) << "removed with the listener";
 }
 
-TEST(Listener, ReplacesASocketThatNobodyServes) {
+TEST(Listener, ReplacesASocketWithoutAServer) {
   const Sandbox sandbox;
   const std::string address = "unix:" + sandbox.File("s");
   std::string error;

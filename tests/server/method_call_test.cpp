@@ -72,7 +72,7 @@ TEST(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
   EXPECT_EQ(VORN::CallContext::Current(), nullptr);
 }
 
-// A body that tells when it is gone.
+// A body that reports its destruction.
 class TracedBody : public Body {
  public:
   explicit TracedBody(bool* gone) : Body(1, JsonBody::TooLarge), gone_(gone) {}
@@ -83,7 +83,7 @@ class TracedBody : public Body {
   bool* gone_;
 };
 
-// A body for whose parameters there is no memory.
+// A body whose parameters cannot be allocated.
 class FailingBody : public Body {
  public:
   FailingBody() : Body(1, JsonBody::TooLarge) {}
@@ -110,7 +110,7 @@ class CallTest : public testing::Test {
     return std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone_), VORN::CallDescription{},
                                   Call::Environment{pool_, deadline});
   }
-  // Runs the call; the future is its answer.
+  // Runs the call. The future receives its answer.
   static std::future<Response> Run(const std::shared_ptr<Call>& call) {
     const auto promise = std::make_shared<std::promise<Response>>();
     call->Run([promise](Response response) { promise->set_value(std::move(response)); });

@@ -9,7 +9,7 @@ namespace {
 
 using testing::ElementsAre;
 
-// Writes down what it is told: "name:", "name@" for a file, the data, ";".
+// Records the events: "name:", "name@" for a file, the data, ";".
 class Recorder : public PartReceiver {
  public:
   bool BeginPart(const PartHead& head) override {
@@ -33,7 +33,7 @@ struct Outcome {
   std::string error;
 };
 
-// In two pieces, the second from `split`.
+// Parses the text in two pieces, split at `split`.
 Outcome Parse(const std::string& text, std::size_t split) {
   Recorder recorder;
   MultipartParser parser("xYz", recorder);

@@ -9,7 +9,7 @@
 namespace vorn::server {
 namespace {
 
-// A job that takes the pool's only thread until it is told to end.
+// A job that occupies the pool's only thread until `end` is ready.
 class Blocker : public Job {
  public:
   explicit Blocker(std::shared_future<void> end) : end_(std::move(end)) {}

@@ -1,5 +1,5 @@
 // Many threads and processes call all methods concurrently: the real module on the Linux platform, over one root. Each
-// client owns a share, some principals and a setting, and finds in them what it was told to be done.
+// client owns a share, some principals and a setting, and must find its acknowledged changes in them.
 #include <gmock/gmock.h>
 #include <json/writer.h>
 
@@ -77,7 +77,7 @@ void Furnish(const TemporaryRoot& root) {
 }
 
 // ---------------------------------------------------------------------------------------------
-// A client of everything.
+// A client that calls all methods.
 
 class Client {
  public:
@@ -121,7 +121,7 @@ class Client {
       params["statd_port"] = 40000 + 2 * number_;
       params["nlm_port"] = 40001 + 2 * number_;
     }
-    // Somebody on this machine may have the port, or another client in this moment.
+    // Another program or another client may use the port at this moment.
     EXPECT_THAT(Ask(NFSAdvSet, params).code, AnyOf(0, kPortConflict));
   }
 
@@ -207,7 +207,7 @@ class Client {
 };
 
 // ---------------------------------------------------------------------------------------------
-// Many of them.
+// Many clients.
 
 using ClientWork = std::function<void(int client)>;
 
@@ -259,7 +259,7 @@ TEST_F(Races, AllMethodsByManyProcesses) {
   ExpectOrder();
 }
 
-// Each client changes one field of the record, and finds its own value however often others change theirs.
+// Each client changes one field of the record, and must find its own value although others change their fields.
 void ChangeOneField(int client) {
   const struct {
     Entry set;

@@ -48,7 +48,7 @@ TEST(RuntimeFolder, MayBeReachedThroughALinkInside) {
   EXPECT_EQ(folder->path(), root.File("var/vorn"));
 }
 
-TEST(RuntimeFolder, CannotBeMadeWhereAFileStands) {
+TEST(RuntimeFolder, CannotReplaceAFile) {
   const Sandbox root;
   root.Write("run", "");
   std::string error;

@@ -1,4 +1,4 @@
-// A folder of its own for one test, removed with everything in it.
+// A temporary folder for one test. The destructor removes it with its content.
 #ifndef VORN_TESTS_SERVER_SANDBOX_H
 #define VORN_TESTS_SERVER_SANDBOX_H
 
@@ -26,10 +26,10 @@ class Sandbox {
 
 std::string ReadWholeFile(const std::string& path);
 
-// Longer than anything takes on the slowest machine: reaching it is a failure.
+// Longer than any step takes on the slowest machine. Reaching this limit is a failure.
 constexpr std::chrono::seconds kGenerous{60};
 
-// Whether `condition` came true; it is asked again and again.
+// Polls `condition` until it is true. Returns false after the time limit.
 bool Eventually(const std::function<bool()>& condition);
 
 }  // namespace vorn::server

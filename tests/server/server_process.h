@@ -15,8 +15,8 @@ namespace vorn::server {
 
 class ServerProcess {
  public:
-  // Starts vornd with --root, the test modules and `arguments`. Without any it listens at its
-  // default socket and at a free port of 127.0.0.1. Returns when it is ready or has ended.
+  // Starts vornd with --root, the test modules and `arguments`. Without arguments it listens at its
+  // default socket and at a free port of 127.0.0.1. Returns when vornd is ready or has ended.
   explicit ServerProcess(const Sandbox& sandbox, std::vector<std::string> arguments = {});
   ~ServerProcess();  // kills it if it still runs
   ServerProcess(const ServerProcess&) = delete;
@@ -33,7 +33,7 @@ class ServerProcess {
 
   void Signal(int number) const;
 
-  // Its exit status; 128 and the number of the signal that ended it.
+  // Waits for its end. Returns the exit status, or 128 plus the number of the signal that ended it.
   int Wait();
 
  private:

@@ -11,7 +11,7 @@ ConnectionUse Use(std::string_view key, Activity activity, int second) {
   return {key, activity, std::chrono::steady_clock::time_point(std::chrono::seconds(second))};
 }
 
-TEST(Shares, NobodyGoesWhileThereIsRoom) {
+TEST(Shares, NoConnectionIsClosedBelowTheLimit) {
   EXPECT_EQ(SurplusOf({}, {1, 1}), kNoConnection);
   EXPECT_EQ(SurplusOf({Use("", Activity::kIdle, 1), Use("", Activity::kIdle, 2)}, {2, 1}), kNoConnection)
       << "connections without a share key have no share of an address";

@@ -111,7 +111,7 @@ TEST_F(Calls, AreListed) {
   EXPECT_EQ(client.Receive().status, 200);
 }
 
-TEST_F(Calls, ThatAreSlowDelayNobody) {
+TEST_F(Calls, ThatAreSlowDelayNoOtherCall) {
   std::vector<Connection> slow;
   for (int i = 0; i < 50; ++i) {
     slow.push_back(server_.Connect());

@@ -54,7 +54,7 @@ TEST(Vornd, ListensThereByDefault) {
   EXPECT_EQ(there.st_mode & 07777, 0660U);
 }
 
-// Begins a call that runs until the sandbox has a file "release". Returns when it runs.
+// Starts a call that runs until the sandbox has a file "release". Returns once the call is running.
 Connection BeginCall(const Sandbox& sandbox, const ServerProcess& server) {
   Connection client = server.Connect();
   client.Send(Post("/api/Test.Echo/v1/wait",

@@ -1,4 +1,4 @@
-// The real vornd without memory: each call that finds none ends alone.
+// The real vornd with failing allocations: each failure ends only the call or connection that made the allocation.
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/mman.h>
@@ -27,7 +27,7 @@ std::string Form() {
          std::to_string(form.size()) + "\r\n\r\n" + form;
 }
 
-// Requests that take different ways through the worker.
+// Requests that take different code paths on a worker thread.
 std::vector<std::string> Requests() {
   return {Post("/api/Test.Echo/v1/get", R"({"a": ["text that is not short any more", 1, {"b": null}]})"),
           Post("/api/Test.Echo/v1/get", R"({"a": 1, "a": 2})"),
@@ -59,7 +59,7 @@ class FailingAllocator : public testing::Test {
     munmap(faults_, sizeof(AllocationFaults));
   }
 
-  // Lets the n-th allocation from now on fail while the request is served. Returns whether it came to that.
+  // Makes the n-th allocation from now on fail while the request is served. Returns whether it was reached.
   bool Try(const std::string& request, int n, bool stay) {
     faults_->failed = 0;
     faults_->stay = stay;
@@ -73,7 +73,7 @@ class FailingAllocator : public testing::Test {
     EXPECT_TRUE(failed || status < 500 || request.find("throw") != std::string::npos) << status;
     return failed;
   }
-  // The same for a connection, which has served a request before, and beside which there is another one.
+  // Like Try(), on a connection that has served a request before, while another connection is open.
   bool TryConnection(const std::string& request, int n, bool stay) {
     Connection other = ConnectAndAsk();
     Connection client = ConnectAndAsk();  // when this one is accepted, the server is done with the request of the other
@@ -120,7 +120,7 @@ TEST_F(FailingAllocator, EndsTheCallThatFindsNoMemoryAndNoOther) {
   EXPECT_TRUE(std::filesystem::is_empty(sandbox_.File("run/vorn/uploads")));
 }
 
-// Requests that take different ways through the network thread.
+// Requests that take different code paths on the network thread.
 std::vector<std::string> NetworkRequests() {
   std::vector<std::string> requests = Requests();
   for (const std::string& request :
@@ -133,7 +133,7 @@ std::vector<std::string> NetworkRequests() {
   return requests;
 }
 
-// The connection may end without an answer. It ends, however, and no other one does.
+// The connection may end without an answer, but it ends, and the other connection stays open.
 TEST_F(FailingAllocator, EndsTheConnectionThatFindsNoMemoryAndNoOther) {
   for (const char thread : {'n', '\0'}) {  // the network thread; all threads
     faults_->thread = thread;
@@ -156,7 +156,7 @@ TEST_F(FailingAllocator, StopsWithoutMemory) {
   EXPECT_EQ(server_->Wait(), 0) << server_->log();
 }
 
-// While there is no memory at all, nobody is accepted; afterwards everybody is.
+// Without memory no connection is accepted; once there is memory again, connections are accepted.
 TEST_F(FailingAllocator, AcceptsConnectionsAgainOnceThereIsMemory) {
   faults_->thread = 'n';
   for (int n = 1; n < 20; ++n) {
@@ -171,8 +171,8 @@ TEST_F(FailingAllocator, AcceptsConnectionsAgainOnceThereIsMemory) {
   }
 }
 
-// The private writable memory of a process. The address space would say little: the C library reserves 64 MiB of it for
-// the threads' allocations.
+// Returns the private writable memory of a process. Its address space is no measure of it, because the C library
+// reserves 64 MiB of address space for the threads' allocations.
 std::uint64_t DataOf(pid_t pid) {
   std::uint64_t pages = 0;  // the sixth number (proc(5))
   std::ifstream file("/proc/" + std::to_string(pid) + "/statm");

@@ -38,7 +38,7 @@ class WebApiTest : public testing::Test {
     head.content_length = length;
     return head;
   }
-  // The status of the answer; 0 when the call goes on.
+  // Returns the status of the answer; 0 if the request is accepted and the call runs.
   int Begin(const Head& head) {
     const auto begun = api_.Begin(head);
     return std::holds_alternative<Response>(begun) ? std::get<Response>(begun).status : 0;

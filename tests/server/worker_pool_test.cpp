@@ -17,7 +17,7 @@ using std::chrono::milliseconds;
 
 constexpr char kLanes[100] = "";
 
-// A job that counts what becomes of it.
+// A job that counts the calls of its functions.
 class TestJob : public Job {
  public:
   struct Counts {

@@ -1,4 +1,4 @@
-// A module whose methods do what the tests of the server need.
+// The module of the server's tests. Its methods echo, fail, wait, throw or upload as the tests request.
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -24,7 +24,7 @@ void EchoV2(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(request->GetParam("value", "none"));
 }
 
-// Fails with the code and the details asked for.
+// Fails with the requested code and details.
 void Fail(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetError(request->GetParam("code", 1).asInt(), request->GetParam("details", Json::Value()));
 }
@@ -37,7 +37,7 @@ void ThrowNumber(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/)
 
 void Silent(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) {}
 
-// Makes the file "begun", and answers once somebody has made the file "release".
+// Creates the file "begun", and answers once the test has created the file "release".
 void Wait(VORN::APIRequest* request, VORN::APIResponse* response) {
   const std::string begun = request->GetParam("begun", "").asString();
   const std::string release = request->GetParam("release", "").asString();
@@ -52,7 +52,7 @@ void Root(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   response->SetSuccess(root == nullptr ? Json::Value() : Json::Value(root));
 }
 
-// The uploaded file: its size, mode and first byte, and how the server named it. "remove" removes it.
+// Answers the size, mode, first byte and path of the uploaded file. "remove" removes the file.
 void Upload(VORN::APIRequest* request, VORN::APIResponse* response) {
   const std::string path = request->GetParam("keytab_file_tmp", "").asString();
   struct stat there {};
@@ -64,7 +64,7 @@ void Upload(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(result);
 }
 
-// Bytes that are no UTF-8.
+// Answers a string that is not UTF-8.
 void Binary(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetSuccess("\xff\xfe"); }
 
 // Adds the sentences of "reasons" and "warnings" to the call context, then fails with "code" unless it is 0.

@@ -6,7 +6,7 @@
 
 namespace vorn::server {
 
-// In a file that both processes map; a file of zeros lets every allocation succeed.
+// The content of a file that both processes map. With a file of zeros every allocation succeeds.
 struct AllocationFaults {
   std::atomic<char> thread;    // first character of the name of the threads that it concerns; 0: all threads
   std::atomic<int> countdown;  // the allocation that fails: 1 is the next one; 0 none

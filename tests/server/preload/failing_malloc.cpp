@@ -1,4 +1,4 @@
-// Preloaded into vornd by a test: lets allocations fail. The test controls it through a file that both map.
+// An allocator that fails on demand, preloaded into vornd. The test controls it through a file that both map.
 #include <fcntl.h>
 #include <pthread.h>
 #include <sys/mman.h>

@@ -25,7 +25,7 @@ std::vector<LogLine> TakeLog() {
   return std::exchange(lines, {});
 }
 
-// The C library's syslog(3) gives way to these; a fortified build calls the second.
+// These functions replace syslog(3) of the C library. A fortified build calls the second one.
 extern "C" {
 
 __attribute__((format(printf, 2, 3))) void syslog(int priority, const char* format, ...) {

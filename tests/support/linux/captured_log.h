@@ -1,4 +1,4 @@
-// The log of this test program: syslog(3) goes here instead of to the system.
+// The log of this test program: replaces syslog(3) and captures the messages.
 #ifndef VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H
 #define VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H
 

@@ -17,7 +17,7 @@ namespace {
 
 using Lines = std::vector<std::string>;
 
-// Whether requests may change the line, in this section.
+// Returns whether requests may change the line in this section.
 using IsOurs = std::function<bool(const std::string& section, std::string_view line)>;
 
 constexpr char kExports[] = R"(# /etc/exports: who may reach what. See exports(5).
@@ -116,13 +116,13 @@ std::string Trimmed(std::string_view text) {
 }
 
 // ---------------------------------------------------------------------------------------------
-// Whose a line is.
+// The owner of a line: the administrator or the requests.
 
 bool IsExportOfOurs(const std::string& /*section*/, std::string_view line) {
   return line.substr(0, 14) == "/volume1/data " || line.substr(0, 14) == "/volume1/data\t";
 }
 
-// "key = value" in lower case; none for anything else.
+// Returns "key = value" in lower case; nullopt for any other line.
 std::string KeyOf(std::string_view line) {
   const std::size_t equals = line.find('=');
   const bool comment = line.substr(0, 1) == "#" || line.substr(0, 1) == ";" || line.substr(0, 1) == "[";
@@ -153,7 +153,7 @@ bool IsSettingOfOurs(const std::string& section, std::string_view line) {
 }
 
 // ---------------------------------------------------------------------------------------------
-// One file.
+// Checks of one file.
 
 struct Sorted {
   Lines foreign;
@@ -184,7 +184,7 @@ void CheckLines(const File& file, const std::string& now, const IsOurs& is_ours,
   if (before.foreign != after.foreign)
     faults->push_back(std::string(file.path) + ": another's line is changed:\n" + now);
   if (after.ours > before.ours + added) faults->push_back(std::string(file.path) + ": a line too many:\n" + now);
-  if (HasUnseenCharacters(now)) faults->push_back(std::string(file.path) + ": characters that nobody sees");
+  if (HasUnseenCharacters(now)) faults->push_back(std::string(file.path) + ": invisible characters");
 }
 
 void CheckExports(const File& file, const std::string& now, Lines* faults) {
@@ -232,9 +232,9 @@ void CheckFile(const File& file, const std::string& now, std::size_t mappings, L
 }
 
 // ---------------------------------------------------------------------------------------------
-// The whole box.
+// Checks of the whole box.
 
-// Every file that the box had not at first, as the box calls it.
+// Returns the path below the root of each file that the box did not have at first.
 Lines NewFiles(const TemporaryRoot& root) {
   Lines found;
   for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root.directory())) {

@@ -1,5 +1,5 @@
-// A box on which hostile requests are tried: its files hold an administrator's lines beside those that
-// requests may change, and whatever a request leaves in them is looked at byte for byte.
+// A box for hostile requests. Its files have an administrator's lines beside those that requests may
+// change, and its files are checked byte for byte after a request.
 #ifndef VORN_TESTS_SUPPORT_LINUX_GUARDED_BOX_H
 #define VORN_TESTS_SUPPORT_LINUX_GUARDED_BOX_H
 
@@ -9,7 +9,7 @@
 
 #include "temporary_root.h"
 
-// Its share is "data" at /volume1/data, its people are alice and bob, its service is only kept book of.
+// The box has the share "data" at /volume1/data and the users alice and bob. Service operations are only recorded.
 class GuardedBox {
  public:
   GuardedBox();
@@ -20,10 +20,10 @@ class GuardedBox {
   // `mappings` new ID mappings, a file that its readers refuse, invisible characters, a temporary file.
   std::vector<std::string> Faults(std::size_t mappings) const;
 
-  // Whether every file is as it was at first.
+  // Returns whether every file has its initial content.
   bool IsUntouched() const;
 
-  // Makes it so.
+  // Restores the initial content of every file.
   void Restore() const;
 
  private:

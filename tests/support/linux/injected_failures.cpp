@@ -13,7 +13,7 @@
 
 namespace {
 
-// Lets a stopped child run to its next stop. Whether it is still there.
+// Resumes a stopped child until its next stop. Returns false if the child has ended.
 bool Continue(pid_t child) {
   int status = 0;
   if (ptrace(PTRACE_SYSCALL, child, 0, 0) != 0) throw std::runtime_error("ptrace is not allowed");
@@ -21,7 +21,7 @@ bool Continue(pid_t child) {
   return WIFSTOPPED(status);
 }
 
-// A child that stops before it runs `body`, and ends with its result.
+// Starts a child that stops before it runs `body`, and exits with its result.
 pid_t Trace(const std::function<int()>& body) {
   const pid_t child = fork();
   if (child < 0) throw std::runtime_error("cannot fork");
@@ -34,7 +34,7 @@ pid_t Trace(const std::function<int()>& body) {
   return child;
 }
 
-// Lets the child run to its system call number `count`, from 0. False when it ended before.
+// Resumes the child until its system call number `count`, from 0. Returns false if it ended before that.
 bool ReachSystemCall(int count, pid_t child) {
   // Each call stops twice, at its entry and its exit; the first stop here is an exit or an entry of
   // raise(3), which costs a few calls at the beginning and changes nothing.

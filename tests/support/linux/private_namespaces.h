@@ -1,5 +1,5 @@
-// Runs programs in mount and network namespaces of their own, with unshare(1): what they mount and configure is
-// visible to nobody else and is gone when they end.
+// Runs programs in mount and network namespaces of their own, with unshare(1). Other processes do not see what they
+// mount and configure, and the kernel removes it when they end.
 #ifndef VORN_TESTS_SUPPORT_LINUX_PRIVATE_NAMESPACES_H
 #define VORN_TESTS_SUPPORT_LINUX_PRIVATE_NAMESPACES_H
 
@@ -7,14 +7,14 @@
 #include <vector>
 
 struct PrivateNamespaces {
-  // The command line that a program and its arguments are appended to. The program runs as root of the namespaces.
+  // The command line to which a program and its arguments are appended. The program runs as root of the namespaces.
   std::vector<std::string> command;
-  // Why this machine does not allow it; empty if it does.
+  // The reason why this machine does not permit such namespaces; empty if it does.
   std::string unavailable;
 };
 
 // Root makes the namespaces directly, which also works in a chroot(2), where the kernel refuses user namespaces.
-// Everybody else makes a user namespace first. The answer is found out once per process. Not thread-safe.
+// Other users create a user namespace first. The result is determined once per process. Not thread-safe.
 const PrivateNamespaces& GetPrivateNamespaces();
 
 #endif  // VORN_TESTS_SUPPORT_LINUX_PRIVATE_NAMESPACES_H

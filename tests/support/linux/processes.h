@@ -14,12 +14,12 @@ struct ProgramResult {
   std::string errors;
 };
 
-// Runs a program to its end; it is found along PATH and the folders of system programs. Its standard
-// input is empty.
+// Runs a program and waits for its end. The program is searched along PATH and in the folders of system
+// programs. Its standard input is empty.
 ProgramResult RunProgram(const std::vector<std::string>& arguments);
 
-// A child of this process that runs a function and ends with its result as exit status. It is killed
-// with the object. Make it before any thread.
+// A child of this process that runs a function and ends with its result as exit status. The destructor
+// kills it. Construct it before any thread is started.
 class ChildProcess {
  public:
   explicit ChildProcess(const std::function<int()>& body);
@@ -35,7 +35,7 @@ class ChildProcess {
   pid_t id_ = -1;
 };
 
-// Whether `condition` came true; looks again and again, for a minute at the most.
+// Polls `condition` until it is true. Returns false after a minute.
 bool Eventually(const std::function<bool()>& condition);
 
 #endif  // VORN_TESTS_SUPPORT_LINUX_PROCESSES_H

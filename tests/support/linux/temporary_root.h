@@ -1,4 +1,5 @@
-// A root directory for one test: this process's root while the object lives, removed with it.
+// A root directory for one test. It is the root of this process during the object's lifetime; the destructor removes
+// it.
 #ifndef VORN_TESTS_SUPPORT_LINUX_TEMPORARY_ROOT_H
 #define VORN_TESTS_SUPPORT_LINUX_TEMPORARY_ROOT_H
 
@@ -7,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-// Roots nest: the one before is this process's root again afterwards.
+// Roots nest: the destructor makes the previous root the root of this process again.
 class TemporaryRoot {
  public:
   TemporaryRoot();
@@ -17,16 +18,16 @@ class TemporaryRoot {
 
   const std::string& directory() const { return directory_; }
 
-  // Where the root's "/etc/exports" is on this system; links are not followed.
+  // Returns the path on this system of a path below the root, such as "/etc/exports". Links are not followed.
   std::string At(std::string_view path) const { return directory_ + std::string(path); }
 
-  // Makes the file, and the folders above it.
+  // Writes the file, and creates the folders above it.
   void Write(std::string_view path, std::string_view text) const;
 
-  // The file's text; none when there is no file.
+  // Returns the content of the file; nullopt for a missing file.
   std::optional<std::string> Read(std::string_view path) const;
 
-  // The names in a folder, hidden ones too, sorted.
+  // Returns the names in a folder, sorted, including hidden ones.
   std::vector<std::string> Names(std::string_view folder) const;
 
  private:

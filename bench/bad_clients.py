@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Clients that hurt a server, many at a time, until they are killed.
+"""Misbehaving clients for load tests: runs many of one kind until it is killed.
 
 Usage: bench/bad_clients.py SCENARIO PORT [COUNT]
 

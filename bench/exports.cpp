@@ -34,7 +34,7 @@ struct CloseAugeas {
   void operator()(augeas* tree) const { aug_close(tree); }
 };
 
-// A root whose exports file has so many shares, two clients each, and the path of the one in the middle.
+// A root whose exports file has `shares` shares with two clients each, and the path of the share in the middle.
 struct Box {
   explicit Box(long shares) : path("/volume1/share" + std::to_string(shares / 2)) {
     std::string text = "# The shares of this box.\n";
@@ -56,7 +56,7 @@ List Load(const Box& box) {
   return List(list);
 }
 
-// Changes one line of the file as an editor would that writes in place, and makes sure of another version.
+// Changes one line of the file in place, as some editors do, and ensures that the file has a new version.
 class Editor {
  public:
   explicit Editor(const Box& box)
@@ -77,7 +77,7 @@ class Editor {
   timespec times_[2] = {{0, UTIME_OMIT}, {1'000'000'000, 0}};
 };
 
-// Every load finds another line changed.
+// A different line is changed before every load.
 void LoadShare(benchmark::State& state, long shares) {
   const Box box(shares);
   Load(box);
@@ -88,7 +88,7 @@ void LoadShare(benchmark::State& state, long shares) {
   }
 }
 
-// The first load of a process finds and indexes every line.
+// The first load of a process parses and indexes every line.
 void LoadShareFirst(benchmark::State& state, long shares) {
   std::optional<Box> box;
   for (auto step : state) {
@@ -99,10 +99,11 @@ void LoadShareFirst(benchmark::State& state, long shares) {
   }
 }
 
-// The file has been loaded before; the floor is one look at its stat(2) data.
+// The file has been loaded before; the floor is one call of stat(2).
 void LoadUnchangedShare(benchmark::State& state, long shares) {
   const Box box(shares);
-  std::this_thread::sleep_for(std::chrono::milliseconds(20));  // a file of the present clock tick is not kept
+  std::this_thread::sleep_for(
+      std::chrono::milliseconds(20));  // a document is not cached while its file is as new as the clock tick
   Load(box);
   for (auto step : state) benchmark::DoNotOptimize(Load(box));
 }
@@ -156,7 +157,7 @@ void SaveFloor(benchmark::State& state, long shares) {
   }
 }
 
-// Augeas, with the one lens that is needed.
+// Augeas, with only the lens for exports(5).
 std::unique_ptr<augeas, CloseAugeas> OpenTree(const Box& box) {
   const unsigned flags = AUG_NO_MODL_AUTOLOAD | AUG_NO_LOAD;
   std::unique_ptr<augeas, CloseAugeas> tree(aug_init(box.root.directory().c_str(), nullptr, flags));

@@ -18,7 +18,7 @@ namespace {
 constexpr const char* kMapFile = "/etc/idmapd.conf";
 constexpr const char* kUserFile = "/etc/passwd";
 
-// A root with so many mappings and users.
+// A root with the given numbers of mappings and users.
 struct Box {
   Box(long mappings, long users) {
     map = "[General]\nDomain = box.example\n\n[Static]\n";

@@ -53,7 +53,7 @@ void AnswerGet(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   response->SetSuccess(result);
 }
 
-// A change of settings looks at each key once.
+// The floor of a change of settings reads each key once.
 void AnswerSet(VORN::APIRequest* request, VORN::APIResponse* response) {
   const Json::Value params = request->GetParam("", Json::Value());
   for (const char* key :
@@ -78,7 +78,7 @@ Json::Value SaveParameters() {
   return params;
 }
 
-// A save looks at each key of each rule once and fills one record per rule.
+// The floor of a save reads each key of each rule once and fills one record per rule.
 void AnswerSave(VORN::APIRequest* request, VORN::APIResponse* response) {
   const Json::Value params = request->GetParam("", Json::Value());
   benchmark::DoNotOptimize(params["share_name"].isString());
@@ -100,7 +100,7 @@ void AnswerSave(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(Json::Value());
 }
 
-// A rejected request is read twice and logged.
+// The floor of a rejected request reads the parameters twice and logs them.
 void AnswerRejected(VORN::APIRequest* request, VORN::APIResponse* response) {
   benchmark::DoNotOptimize(request->GetParam("", Json::Value()));
   response->SetError(2301, Json::Value());

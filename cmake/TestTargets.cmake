@@ -1,5 +1,5 @@
 # vorn_add_test(NAME LIBRARIES...): the test program of NAME.cpp in this folder, run by ctest as
-# "FOLDER.NAME". It may include what its libraries show, and nothing else.
+# "FOLDER.NAME". It may include only the public headers of its libraries.
 function(vorn_add_test name)
   get_filename_component(folder ${CMAKE_CURRENT_SOURCE_DIR} NAME)
   set(target ${folder}_${name})

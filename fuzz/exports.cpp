@@ -1,4 +1,4 @@
-// Reads and edits any text as an exports document: what it writes reads back, and nothing else changes.
+// Parses and edits any text as an exports document. The edited entries are read back, and nothing else changes.
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>

@@ -1,5 +1,5 @@
-// The bytes of a connection, sent to a whole server in two pieces. Whatever they are, the server
-// answers with whole HTTP responses and then closes.
+// The bytes of a connection, sent to a complete server in two pieces. For any bytes, the server answers
+// with complete HTTP responses and then closes the connection.
 #include "http.h"
 
 #include <sys/socket.h>
@@ -17,7 +17,7 @@
 namespace vorn::server {
 namespace {
 
-// Takes every request whose target begins with "/e" and answers with the size of its body.
+// Accepts every request whose target begins with "/e" and answers with the size of its body.
 class SizeService : public Service {
  public:
   class Size : public Exchange {
@@ -56,7 +56,7 @@ class FuzzedServer {
     rmdir(path_.substr(0, path_.rfind('/')).c_str());
   }
 
-  // Everything that the server answers with.
+  // Returns everything that the server sends.
   std::string Exchange(std::string_view first, std::string_view second) const;
 
  private:
@@ -83,7 +83,7 @@ std::string FuzzedServer::Exchange(std::string_view first, std::string_view seco
   return answers;
 }
 
-// Takes one response off the front; false if there is no whole one.
+// Removes one response from the front. Returns false if there is no complete one.
 bool TakeResponse(std::string_view* answers) {
   static constexpr std::string_view kLength = "Content-Length: ";
   const std::size_t end = answers->find("\r\n\r\n");

@@ -23,7 +23,7 @@ using vorn::KeytabKey;
 
 constexpr std::size_t kVersionSize = 2;
 
-// The library, as a program of the box has it: with its usual context, on a file.
+// libkrb5 as the programs of a box use it: with its default context, on a file.
 class Library {
  public:
   Library() {

@@ -1,4 +1,4 @@
-// A form. It is read alike whether it comes in one piece, in two, or byte by byte.
+// A form. The parser gives the same events whether the form arrives in one piece, in two, or byte by byte.
 #include "multipart.h"
 
 #include <cstdint>
@@ -11,7 +11,7 @@ namespace {
 using vorn::server::MultipartParser;
 using vorn::server::PartHead;
 
-// One text of all that it is told.
+// Records all events in one string.
 class Transcript : public vorn::server::PartReceiver {
  public:
   bool BeginPart(const PartHead& head) override {

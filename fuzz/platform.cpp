@@ -1,6 +1,6 @@
 // The parameters of all methods, and through them the files of a box: the module on the Linux platform, in a root
-// of its own in memory. Whatever is asked for, nothing of it changes a file but where it may, everything can still
-// be read afterwards, and what was accepted is what the box then says.
+// in memory. Properties: a request changes only the lines that it may change, all files can still be read afterwards,
+// and the box returns the values that it accepted.
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>

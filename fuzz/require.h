@@ -5,7 +5,7 @@
 #include <cstdio>
 #include <cstdlib>
 
-// Ends the program, which libFuzzer takes for a finding, and says which property does not hold.
+// Prints the property that does not hold and aborts, which libFuzzer reports as a finding.
 inline void Require(bool property, const char* what = "a property") {
   if (property) return;
   std::fprintf(stderr, "does not hold: %s\n", what);

@@ -1,7 +1,7 @@
-"""Small faults put into C++ text, one at a time: what a slip of the hand or of the mind would change.
+"""Puts small faults into C++ sources, one at a time, like those that programmers make by mistake.
 
-The text is looked at as tokens, not as a grammar; it is that of this project, formatted by clang-format. What is
-made here and is not C++ is refused by the compiler.
+A source is read as a sequence of tokens, without a grammar. This works for sources of this project, which are
+formatted by clang-format. The compiler refuses a mutant that is not valid C++.
 
 >>> text = 'bool F(int a) {\\n  if (a < 1) Log("zero", a);\\n  return true && G(a);\\n}\\n'
 >>> for mutant in Source("f.cpp", text, {}).mutants():
@@ -35,23 +35,23 @@ TOKEN = re.compile(
 )
 
 OPENING, CLOSING = "([{", ")]}"
-COMPARISONS = {  # its opposite, and the boundary moved
+COMPARISONS = {  # the opposite comparison, and the one with the boundary moved
     "==": ["!="], "!=": ["=="], "<": [">=", "<="], "<=": [">", "<"], ">": ["<=", ">="], ">=": ["<", ">"],
 }
 REPLACED = COMPARISONS | {"+": ["-"], "-": ["+"], "true": ["false"], "false": ["true"]}
 HEADS = {"if", "for", "while", "switch"}
 NO_STATEMENT = HEADS | {"else", "case", "default", "public", "private", "protected", "using", "template", "do", "try"}
-ENDS = {";", ",", "?", ":", "=", "return", "{", "}"}  # of an operand, besides the bracket around it
+ENDS = {";", ",", "?", ":", "=", "return", "{", "}"}  # tokens that end an operand, besides its enclosing bracket
 
 
 @dataclass(frozen=True)
 class Mutant:
     path: str
     line: int
-    place: str  # the same in words that stay true when lines move
+    place: str  # the position described without a line number, so that it stays valid when lines move
     old: str
     new: str
-    text: str  # of the whole file, changed
+    text: str  # the whole changed file
 
     @property
     def change(self):
@@ -64,13 +64,13 @@ class Token:
     text: str
     begin: int
     end: int
-    match: int = -1  # the other bracket of the pair, as an index
-    inside: int = -1  # the innermost open bracket
+    match: int = -1  # the index of the other bracket of the pair
+    inside: int = -1  # the index of the innermost open bracket
     in_code: bool = False  # within a function's body
 
 
 def enumerators(texts):
-    """Each name that an enum of these texts declares, with the next one of its enum."""
+    """Maps each enumerator that these sources declare to the next one of its enum."""
     following = {}
     for text in texts:
         text = re.sub(r"//[^\n]*", "", text)
@@ -122,7 +122,7 @@ class Source:
         self.tokens = tokenise(text)
 
     def mutants(self):
-        """All of them, by place; no two make the same text."""
+        """All mutants in the order of their positions, without duplicates."""
         found = {}
         for i, token in enumerate(self.tokens):
             for begin, end, new in self.changes(i, token):
@@ -177,7 +177,7 @@ class Source:
             yield token.begin, token.end, ""
 
     def is_spaced(self, token):
-        """An operator between two operands, no template's bracket and no sign."""
+        """Whether the token is a binary operator, not a template bracket or a sign."""
         return self.text[token.begin - 1].isspace() and self.text[token.end].isspace()
 
     def dropped_statement(self, i):
@@ -186,7 +186,7 @@ class Source:
             yield self.tokens[i].begin, self.tokens[end].end, "{}"
 
     def statement_end(self, i):
-        """The semicolon of the statement that begins here; None if none does."""
+        """The index of the semicolon that ends the statement beginning here; None if no statement begins here."""
         if self.tokens[i].text in NO_STATEMENT or not self.begins_statement(i):
             return None
         for k in range(i, len(self.tokens)):
@@ -210,7 +210,7 @@ class Source:
         return before.text == ")" and self.tokens[before.match - 1].text in HEADS
 
     def negated_condition(self, i):
-        """Of if and while, and what is returned. A lone comparison, or `!`, is changed as such."""
+        """Negates a condition of if and while, or a returned value. Other mutations change a lone comparison or `!`."""
         token = self.tokens[i]
         if token.text in ("if", "while"):
             first, last = i + 2, self.tokens[i + 1].match - 1
@@ -228,7 +228,7 @@ class Source:
         yield begin, end, f"!({self.text[begin:end]})"
 
     def changed_connection(self, i):
-        """`a && b` becomes `a || b`, `a` and `b`; likewise `a || b`."""
+        """Replaces `a && b` by `a || b`, by `a` and by `b`, and `a || b` by `a && b`, by `a` and by `b`."""
         sign = self.tokens[i].text
         weaker = {"||"} if sign == "&&" else set()
         left = self.begin_of_operand(i - 1, ENDS | weaker)
@@ -250,7 +250,7 @@ class Source:
         yield begin, end, f"{b} : {a}"
 
     def swapped_arguments(self, i):
-        """Each argument of a call and the next one."""
+        """Exchanges each argument of a call with the next one."""
         commas = [k for k in self.within(i, i) if self.tokens[k].text == ","]
         bounds = [i, *commas, self.tokens[i].match]
         for before, comma, after in zip(bounds, bounds[1:], bounds[2:]):
@@ -261,7 +261,7 @@ class Source:
                 yield begin, end, f"{b}, {a}"
 
     def within(self, bracket, start):
-        """What stands between a bracket and its other one, from a place on, inner brackets left out."""
+        """The indexes from `start` to the closing bracket, without the content of inner brackets."""
         return (k for k in range(start, self.tokens[bracket].match) if self.tokens[k].inside == bracket)
 
     def begin_of_operand(self, i, ends):
@@ -280,7 +280,7 @@ class Source:
 
 
 def changed_string(text):
-    """Its first character is another one; a conversion of printf(3) keeps its own."""
+    """Replaces the first character of a string literal. A conversion of printf(3) at the beginning is preserved."""
     if text == '""' or text.startswith('"%'):
         return '"#' + text[1:]
     return '"#' + text[3 if text[1] == "\\" else 2 :]

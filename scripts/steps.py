@@ -31,12 +31,12 @@ class Step:
     share: str = ""  # the part of the time budget that it counts for
     lane: str = "main"  # the steps of one lane run one after the other, the lanes side by side
     after: tuple = ()
-    wanted: bool = True  # false: not this time
+    wanted: bool = True  # false: skipped in this run
 
 
 @dataclasses.dataclass
 class Result:
-    """How a step ended. `status` is its exit status, None while it runs. `stopped`: the run's end, not its own."""
+    """How a step ended. `status` is its exit status, None while it runs. `stopped`: the run ended it."""
     step: Step
     begun: float
     seconds: float = 0.0

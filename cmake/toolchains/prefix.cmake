@@ -1,4 +1,4 @@
-# Libraries are the target's: those of its prefix and its sysroot, and never this machine's.
+# Libraries are searched only in the target's prefix and sysroot, never on this machine.
 set(CMAKE_FIND_ROOT_PATH ${prefix} ${sysroot})
 set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
 set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)

@@ -1,4 +1,4 @@
-"""vornd's HTTP API, at its Unix socket."""
+"""A client of vornd's HTTP API over its Unix socket."""
 
 import http.client
 import json
@@ -15,7 +15,7 @@ _seconds = {}  # path of a method to the longest time that an answer took
 
 
 class Refused(Exception):
-    """An answer without success: its code and its text."""
+    """An answer that reports a failure, with its code and text."""
 
     def __init__(self, error):
         super().__init__(f"{error['code']}: {error['text']}")
@@ -44,7 +44,7 @@ def request(method, path, body=None, content_type="application/json"):
 
 
 def answers():
-    """Whether vornd is there."""
+    """Whether vornd answers."""
     try:
         return request("GET", "/api")[0] == 200
     except OSError:
@@ -75,7 +75,7 @@ def answer(api, method, version=1, **parameters):
 
 
 def call(api, method, version=1, **parameters):
-    """What the method answers. Raises Refused."""
+    """The data of the answer. Raises Refused."""
     return _data(answer(api, method, version, **parameters))
 
 

@@ -20,7 +20,7 @@ _RULE = {"privilege": "rw", "root_squash": "root", "async": False, "insecure": F
 
 
 class Box:
-    """What an administrator does, and what can be seen of it."""
+    """The operations of an administrator, and the state of the box that they result in."""
 
     def __init__(self, since_boot=False):
         self._before = {path: self._content(path) for path in FILES}
@@ -29,36 +29,36 @@ class Box:
     # The service.
 
     def nfs(self, **settings):
-        """Sets these settings of the service; it is to be on if nothing else is said."""
+        """Sets these settings of the service. Enables the service unless `enable_nfs` is given."""
         api.call("NFS", "set", **{"enable_nfs": True, **settings})
 
     def advanced(self, **settings):
-        """Sets these advanced settings, beside those that are."""
+        """Sets these advanced settings and keeps the others."""
         present = api.call("NFS.AdvancedSetting", "get")
         present["custom_port_enable"] = bool(present["custom_port_enable"])
         api.call("NFS.AdvancedSetting", "set", **{**present, "enable_nfs": True, **settings})
 
     def restart(self):
-        """Off and on again, as an administrator does it."""
+        """Switches the service off and on again, as an administrator does."""
         self.nfs(enable_nfs=False)
         self.nfs(enable_nfs=True)
 
     @staticmethod
     def threads():
-        """How many threads serve NFS; the file is there once the service was started."""
+        """The number of NFS server threads. Its file exists once the service was started."""
         threads = pathlib.Path("/proc/fs/nfsd/threads")
         return int(threads.read_text(encoding="ascii")) if threads.exists() else 0
 
     @staticmethod
     def rpc_ports(program):
-        """Where rpcbind says that the program ("status", "nlockmgr", ...) listens."""
+        """The ports at which rpcbind has registered the program ("status", "nlockmgr", ...)."""
         lines = [line.split() for line in run("rpcinfo", "-p").splitlines()]
         return {int(words[3]) for words in lines if words[-1] == program}
 
     # Shares.
 
     def share(self, name):
-        """A shared folder that everybody may write into; its path."""
+        """Creates a share whose folder is writable for all users. Returns its path."""
         path = pathlib.Path("/srv") / name
         path.mkdir(exist_ok=True)
         path.chmod(0o777)
@@ -97,14 +97,14 @@ class Box:
             table[path, client] = options.rstrip(")").split(",")
         return table
 
-    # The story's own business.
+    # The journal, and the state before and after a story.
 
     def foresees(self, pattern):
-        """A warning in the journal that belongs to this story."""
+        """Declares a warning in the journal that this story expects."""
         self.journal.foresee(pattern)
 
     def set_up(self):
-        """Serving, with nothing exported."""
+        """Starts the service without exports."""
         if self.threads() == 0:
             run("systemctl", "reset-failed")
             self.nfs(enable_nfs=True)

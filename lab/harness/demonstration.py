@@ -1,4 +1,4 @@
-"""A box to look at: serving, with a share and a client that has it mounted."""
+"""A box for demonstrations: NFS is on, and a client has mounted a share."""
 
 from harness import fixture_data
 from harness.box import Box

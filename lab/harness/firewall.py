@@ -1,4 +1,4 @@
-"""An administrator's own firewall, and what passes through it."""
+"""An administrator's own firewall, and whether connections pass it."""
 
 import contextlib
 import socket
@@ -24,7 +24,7 @@ table inet administrator {
 
 @contextlib.contextmanager
 def strict_firewall():
-    """For as long as the block lasts, the box's own rules reject every port that nobody opens."""
+    """Within the block, the box's own rules reject every port that no rule opens."""
     with open(STRICT_RULES, "w", encoding="ascii") as rules:
         rules.write(_STRICT)
     run("nft", "-f", STRICT_RULES)

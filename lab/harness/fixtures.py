@@ -1,4 +1,4 @@
-"""What a story can ask for by naming it as an argument, and the markers that it can have."""
+"""The fixtures of the stories, and their markers."""
 
 import pytest
 
@@ -10,7 +10,7 @@ _PROMISE_BROKEN = (AssertionError, OSError, api.Refused, network.MountFailed, pr
 
 
 def pytest_addoption(parser):
-    parser.addoption("--boot", default="1/1", help="which of the boots of this disk it is: NUMBER/COUNT")
+    parser.addoption("--boot", default="1/1", help="the number of this boot of the disk: NUMBER/COUNT")
 
 
 def _this_boot(config):
@@ -24,7 +24,7 @@ def _boot_of(item):
 
 
 def pytest_collection_modifyitems(config, items):
-    """Keeps the stories of this boot. A pending story must fail, and only because a promise is broken."""
+    """Selects the stories of this boot. A pending story must fail, and only with an assertion about the promise."""
     number, _ = _this_boot(config)
     config.hook.pytest_deselected(items=[item for item in items if _boot_of(item) != number])
     items[:] = [item for item in items if _boot_of(item) == number]
@@ -36,14 +36,14 @@ def pytest_collection_modifyitems(config, items):
 
 @pytest.hookimpl(hookwrapper=True)
 def pytest_runtest_makereport(item):
-    """Remembers whether the story itself failed; what the journal says is then no second failure."""
+    """Records whether the story itself failed. Complaints in the journal are then not reported as a second failure."""
     report = (yield).get_result()
     if report.when == "call":
         item.kept_its_promise = report.passed
 
 
 def pytest_runtest_logreport(report):
-    """Prints a failure when it happens: a guest that hangs later does not hide it."""
+    """Prints a failure immediately, because a guest that hangs later prints no report."""
     if report.failed:
         with open("/dev/console", "w", encoding="utf-8") as console:
             console.write(f"\n{report.nodeid} ({report.when}):\n{report.longreprtext}\n")
@@ -90,13 +90,13 @@ def client():
 
 @pytest.fixture
 def other():
-    """Another one, on the same network."""
+    """Another client machine, on the same network."""
     return _machine("other")
 
 
 @pytest.fixture
 def third():
-    """One in another network and another domain."""
+    """A client machine in another network and another domain."""
     return _machine("third")
 
 

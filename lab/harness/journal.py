@@ -1,4 +1,4 @@
-"""The box's journal: what the programs of the NFS service and the kernel said during a story."""
+"""The box's journal: the messages of the NFS service and the kernel during a story."""
 
 import json
 import re
@@ -27,18 +27,18 @@ _NORMAL = re.compile(r"refused (un)?mount request|"  # a client that no rule adm
 
 
 class Journal:
-    """From now on, or since the box booted."""
+    """Reads the journal from now on, or since the box booted."""
 
     def __init__(self, since_boot=False):
         self._foreseen = []
         self._from = "--boot" if since_boot else f"--after-cursor={self._read('--lines=1')[-1]['__CURSOR']}"
 
     def foresee(self, pattern):
-        """A complaint that belongs to the story; a regular expression for one kind of line."""
+        """Declares lines that the story expects, as a regular expression."""
         self._foreseen.append(re.compile(pattern))
 
     def complaints(self):
-        """The complaints that nobody foresaw."""
+        """The complaints that the story does not expect."""
         lines = [line for line in map(self._complaint, self._since()) if line]
         return [line for line in lines if not any(pattern.search(line) for pattern in self._foreseen)]
 

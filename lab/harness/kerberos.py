@@ -1,4 +1,4 @@
-"""A Kerberos realm, its centre on the box, and what makes a machine its client."""
+"""A Kerberos realm with its KDC on the box, and the set-up of its clients."""
 
 import contextlib
 import os
@@ -8,7 +8,7 @@ from harness.network import BOX_ADDRESS
 from harness.programs import run
 
 REALM = "LAB.TEST"
-SERVER = "box.lab.test"  # as whom the box serves: nfs/box.lab.test
+SERVER = "box.lab.test"  # the host name of the NFS service's principal, nfs/box.lab.test
 
 _CONFIGURATION = f"""[libdefaults]
  default_realm = {REALM}
@@ -41,7 +41,7 @@ def found_realm():
 
 
 def keytab(principal):
-    """The content of a keytab with new keys of the principal, which is made for it."""
+    """Creates the principal. Returns the content of a keytab with new keys of it."""
     path = pathlib.Path("/tmp/new.keytab")
     path.unlink(missing_ok=True)
     _kadmin(f"addprinc -randkey {principal}")
@@ -50,7 +50,7 @@ def keytab(principal):
 
 
 def sign_in(user, principal):
-    """The user's processes are the principal from now on."""
+    """Gives the user Kerberos credentials of the principal."""
     run("sh", "-c", f"echo secret | kinit {principal}", user=user)
 
 
@@ -60,7 +60,7 @@ def sign_out(user):
 
 @contextlib.contextmanager
 def joined(client):
-    """The machine is in the realm: its rpc.gssd(8) runs, with files in a place of their own."""
+    """Within the block, the machine is a client of the realm: its rpc.gssd(8) runs, with files of its own."""
     path = pathlib.Path(f"/tmp/{client.name}.keytab")
     path.write_bytes(keytab(f"host/{client.name}"))
     pipes = f"/run/pipes-{client.name}"

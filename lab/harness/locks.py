@@ -1,4 +1,4 @@
-"""POSIX locks of whole files, see fcntl(2), which the kernel's NFS client asks the server for."""
+"""POSIX locks of whole files, see fcntl(2), which the kernel's NFS client requests from the server."""
 
 import errno
 import fcntl

@@ -1,4 +1,4 @@
-"""What a mounted client observes: negotiated sizes, and who may enter a folder of a group."""
+"""Observations of a mounted client: negotiated sizes, and who may enter a folder of a group."""
 
 import os
 import pathlib
@@ -38,8 +38,8 @@ def make_team_folder(share):
 
 
 def admits_by_box(mounted):
-    """Whether the box's groups decide: alice may enter the folder. Otherwise the machine's do: bob says that he is a
-    member, and the box does not know him as one. Fails where it is neither."""
+    """Returns true if the box's groups decide (alice may enter the folder), false if the client's groups decide (bob,
+    a member on the client only, may enter it). Fails if neither is the case."""
     alice = may_enter(mounted / "team", users.ALICE)
     bob = may_enter(mounted / "team", users.User("bob", users.BOB.uid, users.BOB.gid, (_TEAM,)))
     assert alice != bob

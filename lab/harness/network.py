@@ -33,12 +33,12 @@ def ipv6(host):
 
 
 def bracketed(server):
-    """The server as mount(8) takes it before ":" and a path."""
+    """The server's address in the syntax of mount(8)."""
     return f"[{server}]" if ":" in server else server
 
 
 class MountFailed(Exception):
-    """A mount that the server or the client did not do."""
+    """A mount that the server or the client refused."""
 
 
 class Client:
@@ -56,16 +56,16 @@ class Client:
             self._build(short)
 
     def run(self, *command, **options):
-        """What a program prints that runs on this machine. The files are the box's, the network is not."""
+        """Runs a program on this machine and returns its output. It sees the box's files and the machine's network."""
         return run(*command, before=self._enter, **options)
 
     def succeeds(self, *command):
-        """Whether a program on this machine does what it is asked to."""
+        """Whether a program on this machine succeeds."""
         return succeeds(*command, before=self._enter)
 
     @contextlib.contextmanager
     def running(self, *command):
-        """A program that runs on this machine for as long as the block lasts, and all that it started."""
+        """Runs a program on this machine within the block, and then ends it with its child processes."""
         with subprocess.Popen(command, stdin=subprocess.DEVNULL, start_new_session=True,
                               preexec_fn=self._enter) as process:
             try:
@@ -104,7 +104,7 @@ class Client:
 
     @contextlib.contextmanager
     def mounted(self, path, **how):
-        """mount(), for as long as the block lasts."""
+        """Mounts the folder within the block."""
         target = self.mount(path, **how)
         try:
             yield target
@@ -126,7 +126,7 @@ class Client:
         self._mounts.remove(target)
 
     def unmount_all(self):
-        """At the end of a story, whatever happened in it."""
+        """Unmounts everything at the end of a story, also after a failure."""
         for target in list(self._mounts):
             with contextlib.suppress(ProgramFailed):
                 run("umount", "-f", "-l", str(target))

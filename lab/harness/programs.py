@@ -14,11 +14,11 @@ def wait_for(condition, what, limit=180):
 
 
 class ProgramFailed(Exception):
-    """A program that did not do what it was asked to, and what it said."""
+    """A program that failed, with its output."""
 
 
 def run(*command, user=None, timeout=300, before=None):
-    """What the program printed. `before` runs in the child, where it may change its world."""
+    """Runs a program and returns its output. `before` is called in the child, for example to change its namespaces."""
 
     def prepare():
         if before:
@@ -37,7 +37,7 @@ def run(*command, user=None, timeout=300, before=None):
 
 
 def succeeds(*command, **options):
-    """Whether the program does what it is asked to."""
+    """Whether the program succeeds."""
     try:
         run(*command, **options)
     except ProgramFailed:
@@ -46,14 +46,14 @@ def succeeds(*command, **options):
 
 
 def become(user):
-    """Gives this process for good to a User (see users.py)."""
+    """Changes the user of this process permanently to a User (see users.py)."""
     os.setgroups(user.groups)
     os.setgid(user.gid)
     os.setuid(user.uid)
 
 
 def as_user(user, action):
-    """Does `action` in a child that is the user; raises the OSError that it met there."""
+    """Calls `action` in a child process of the user. Raises the OSError that `action` raised."""
     child = os.fork()
     if child == 0:
         status = 0
@@ -62,7 +62,7 @@ def as_user(user, action):
             action()
         except OSError as error:
             status = error.errno
-        except BaseException:  # whatever else: not this story's process any more
+        except BaseException:  # the child must end here, whatever the exception
             status = 255
         os._exit(status)
     _, status = os.waitpid(child, 0)

@@ -1,4 +1,4 @@
-"""Who is who: the box knows them all, the stories choose."""
+"""The users of the stories. All of them exist on the box."""
 
 import dataclasses
 
@@ -7,7 +7,7 @@ from harness.programs import run
 
 @dataclasses.dataclass(frozen=True)
 class User:
-    """A user as a client's process shows them to the server."""
+    """A user with the numbers that a client's process sends to the server."""
 
     name: str
     uid: int
@@ -24,7 +24,7 @@ CAROL = User("carol", 2003, 2003)
 
 
 def create():
-    """Enters them into the box's files, once. The package has created an "admin" of its own."""
+    """Adds the users to the box's files, once. The package has created an "admin" of its own."""
     run("userdel", ADMIN.name)
     with open("/etc/passwd", "a", encoding="ascii") as passwd, open("/etc/group", "a", encoding="ascii") as group:
         for user in (ADMIN, ALICE, BOB, CAROL):

@@ -1,1 +1,1 @@
-"""The host's side of the lab: builds what a guest is made of, boots guests and collects their results."""
+"""The host's side of the lab: builds kernel and disk, boots guests and collects their results."""

@@ -38,7 +38,7 @@ def broken_package(item):
 
 
 def run_break(item, make_guest):
-    """The stories that failed with the break, or None where the guest could not be judged."""
+    """The stories that failed with the break, or None if the guest ended without a verdict."""
     package = broken_package(item) if item.source else None
     (story,) = stories.find([item.story])
 
@@ -57,7 +57,7 @@ def run_break(item, make_guest):
 def table(results):
     rows = [f"{'break':22} {'promise':44} noticed by"]
     for item, failed in results:
-        rows.append(f"{item.name:22} {item.promise:44} {', '.join(failed) or 'NOBODY'}")
+        rows.append(f"{item.name:22} {item.promise:44} {', '.join(failed) or 'NONE'}")
     return "\n".join(rows) + "\n"
 
 

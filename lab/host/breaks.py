@@ -1,4 +1,4 @@
-"""The deliberate breaks: each takes one promise of docs/reliability.md away and names the story that must notice."""
+"""The deliberate breaks. Each breaks one promise of docs/reliability.md and names the story that must fail."""
 
 import dataclasses
 
@@ -7,7 +7,7 @@ _SCRIPT = "/usr/vorn/etc/rc.sysv/S83nfsd.sh"
 
 
 def _preload(what):
-    """vornd with one property taken away by lab/breaks/preload.c."""
+    """A script that makes vornd run with lab/breaks/preload.c, which removes one property."""
     return (f"cp /lab/breaks/preload.so /usr/lib/; mkdir -p /etc/systemd/system/vornd.service.d; "
             f"printf '[Service]\\nEnvironment=LD_PRELOAD=/usr/lib/preload.so BREAK={what}\\n' "
             f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}")
@@ -40,7 +40,7 @@ BREAKS = [
     Break("job-result-ignored", "a service that does not start is an error", "faults",
           source=('*outcome == "done"', 's/\\*outcome == "done" || \\*outcome == "skipped"/true/'),
           select="does_not_start"),
-    Break("clients-unchecked", "no text is smuggled into a file", "hostile_rules",
+    Break("clients-unchecked", "no parameter injects lines into a file", "hostile_rules",
           source=("CheckExportClient(client)", "s/: CheckExportClient(client);/: Status();/")),
     Break("stall-at-each-save", "clients are not interrupted by a save", "save_under_load",
           "systemd-run --quiet --unit=freeze /usr/bin/python3 /lab/breaks/freeze"),
@@ -48,14 +48,14 @@ BREAKS = [
           "mkdir -p /etc/systemd/system/nfs-server.service.d; printf '[Service]\\nExecReload=\\nExecReload=/bin/sh -c "
           "\"systemctl --no-block restart nfs-server\"\\n' >/etc/systemd/system/nfs-server.service.d/break.conf; "
           "systemctl daemon-reload"),
-    Break("rights-stay", "a withdrawn right ends at once", "withdrawn_rights",
+    Break("rights-stay", "a withdrawn right ends immediately", "withdrawn_rights",
           "mv /usr/sbin/exportfs /usr/sbin/exportfs.real; printf '#!/bin/sh\\n[ \"$1\" != -r ] || set -- -a\\n"
           "exec exportfs.real \"$@\"\\n' >/usr/sbin/exportfs; chmod 755 /usr/sbin/exportfs",
           select="without_a_rule"),
-    Break("firewall-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vorn-firewall"),
-    Break("server-not-at-boot", "a box comes up by itself", "reboot", "systemctl disable vornd"),
+    Break("firewall-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vorn-firewall"),
+    Break("server-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vornd"),
     Break("firewall-not-loaded", "the firewall follows the ports", "ports", _preload("firewall"), select="firewall"),
-    Break("id-map-not-reloaded", "a changed mapping is in force at once", "kerberos",
+    Break("id-map-not-reloaded", "a changed mapping is in force immediately", "kerberos",
           f"sed -i 's/^\\treload_idmap$/\\texit 0/' {_SCRIPT}", select="id_map"),
     Break("sizes-not-applied", "settings reach the clients", "service",
           f"sed -i 's/^\\ttransfer_sizes$/\\texit 0/' {_SCRIPT}", select="sizes"),

@@ -40,7 +40,7 @@ _used = []  # locks of folders that this process uses; held until it ends
 
 
 class Cache:
-    """Filled folders. What this run uses is not removed by another run."""
+    """A cache of folders. Another run does not remove a folder that this run uses."""
 
     def __init__(self, logs):
         self._folder = _folder()
@@ -48,7 +48,7 @@ class Cache:
         self._logs = logs
 
     def get(self, name, key, program):
-        """The folder that `program` filled for this key, now or earlier. Of each name only the newest is kept."""
+        """The folder that `program` fills for this key. Only the newest folder of each name is kept."""
         with _locked(self._folder / "lock", fcntl.LOCK_EX):
             folder = self._folder / f"{name}-{key}"
             if not folder.is_dir():
@@ -74,7 +74,7 @@ class Cache:
         _used.append(lock)
 
     def _remove_old(self, name):
-        """Folders of the same name, and what a killed build left, unless another run uses them."""
+        """Removes folders of the same name and the remains of a killed build, unless another run uses them."""
         for folder in [*self._folder.glob(f"{name}-????????????????"), *self._folder.glob("new.*")]:
             with open(f"{folder}.lock", "a", encoding="ascii") as lock, contextlib.suppress(BlockingIOError):
                 fcntl.flock(lock, fcntl.LOCK_EX | fcntl.LOCK_NB)
@@ -97,6 +97,6 @@ def kernel(cache, machine):
 
 
 def disk(cache):
-    """The guest's disk image, made anew each month."""
+    """The folder with the guest's disk image, which is made again each month."""
     files = sorted((PROJECT / "lab/guest").iterdir())
     return cache.get("disk", digest(time.strftime("%Y-%m"), files), PROJECT / "lab/guest/disk") / "disk.img"

@@ -19,11 +19,11 @@ _TIME_LIMIT = 124
 
 _running = {}
 _ending = threading.Event()
-_lock = threading.RLock()  # the signal handler takes it too
+_lock = threading.RLock()  # the signal handler takes it, too
 
 
 def end_all():
-    """Ends all guests, and lets no other one begin. Their boot scripts clean up after them."""
+    """Ends all guests and prevents new ones. Their boot scripts clean up."""
     with _lock:
         _ending.set()
         for child in _running.values():
@@ -42,7 +42,7 @@ class Guest:
         self._fill(package or next((PROJECT / "build/package").glob("vorn-nfs_[0-9]*.deb")))
 
     def _claim(self):
-        """Another run of this checkout may use a guest of the same name."""
+        """Locks the guest's folder, because another run of this checkout may use the same name."""
         WORK.mkdir(parents=True, exist_ok=True)
         self._lock = open(f"{self.folder}.lock", "w", encoding="ascii")  # pylint: disable=consider-using-with
         try:
@@ -79,7 +79,7 @@ class Guest:
                 del _running[id(self)]
 
     def verdict(self, status):
-        """What the guest said of its stories: pytest's exit status. Raises LabError for a guest that said nothing."""
+        """The guest's verdict: pytest's exit status. Raises LabError if the guest wrote none."""
         planned = self.share / "dies"
         verdict = self.share / "verdict"
         said = verdict.read_text(encoding="ascii").strip() if verdict.exists() else ""
@@ -95,7 +95,7 @@ class Guest:
         raise LabError(f"the guest died without a verdict (its kernel's status: {status})")
 
     def keep_results(self, boot):
-        """Moves what this boot left out of the guest's reach, to be read after the run."""
+        """Moves the results of this boot to where the guest cannot change them."""
         for name in _RESULTS:
             left = self.share / name
             if left.exists():
@@ -104,7 +104,7 @@ class Guest:
 
 
 def tell(job, arguments, make_guest, quiet=False):
-    """Boots a guest for the job, prints what it said and returns its exit status; 5 where no story was selected."""
+    """Boots a guest for the job, prints its output and returns its exit status; 5 if no story was selected."""
     guest = make_guest(job.name)
     verdicts = []
     for boot in range(1, job.boots + 1):

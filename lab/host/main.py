@@ -49,7 +49,7 @@ def select(options):
 
 
 def prepare(machine):
-    """Builds what is missing; a function that makes a guest of this name."""
+    """Builds what is missing. Returns a function that creates a guest with a given name."""
     build([str(PROJECT / "scripts/setup"), "lab", f"lab_{machine}"], guest.WORK / "setup.log")
     say("packing the product")
     build([str(PROJECT / "packaging/build")], guest.WORK / "package.log")
@@ -59,7 +59,7 @@ def prepare(machine):
 
 
 def run_stories(chosen, options, make_guest):
-    """The exit status of the worst guest; 5 where pytest's arguments select no story at all."""
+    """Runs the jobs. Returns the exit status of the worst guest; 5 if pytest's arguments select no story."""
     begun = time.monotonic()
     jobs = stories.plan(chosen, options.jobs)
     pool = concurrent.futures.ThreadPoolExecutor(options.jobs)
@@ -80,7 +80,7 @@ def run_stories(chosen, options, make_guest):
 
 
 def look(options, make_guest):
-    """Boots a box to look at; the status of its kernel."""
+    """Boots a box for demonstrations. Returns the exit status of its kernel."""
     if options.shell:
         return make_guest("shell").boot(["shell"], {"CONSOLE": "fd:0,fd:1", "LIMIT": _DAY})
     port = os.environ.get("PORT", "8080")

@@ -37,7 +37,7 @@ def build(command, log, **options):
 
 
 def output_of(*command, cwd=None):
-    """What the program printed. Raises LabError."""
+    """Runs a program and returns its output. Raises LabError."""
     done = subprocess.run(command, capture_output=True, text=True, check=False, cwd=cwd)
     if done.returncode != 0:
         raise LabError(f"{' '.join(command)}: {done.stderr.strip()}")

@@ -1,4 +1,4 @@
-"""What a run took and found, as a table."""
+"""The results and times of a run, as a table."""
 
 import collections
 import xml.etree.ElementTree
@@ -25,7 +25,7 @@ def _state(case):
 
 
 def by_story(jobs):
-    """Story name to a counter of states and seconds, over all guests that told it."""
+    """Story name to a counter of states and seconds, over all guests that ran it."""
     result = {}
     for job in jobs:
         for case in _cases(job):

@@ -14,7 +14,7 @@ _BOOT_SECONDS = 15
 
 @dataclasses.dataclass(frozen=True)
 class Story:
-    """A file of stories. `boots` boots of one disk tell it; `guests` guests tell it, one after the other."""
+    """A file of stories. It is run in `boots` boots of one disk, and in `guests` guests one after the other."""
 
     name: str
     boots: int = 1
@@ -28,7 +28,7 @@ class Story:
 
 @dataclasses.dataclass
 class Job:
-    """What one guest does: these stories, in `boots` boots of a disk of its own."""
+    """The job of one guest: these stories, in `boots` boots of a disk of its own."""
 
     name: str
     stories: list
@@ -62,7 +62,7 @@ def _constants(path):
 
 
 def find(names):
-    """These stories, or all of them. Raises LabError for a name that is none."""
+    """The named stories, or all of them. Raises LabError for an unknown name."""
     times = measured_times()
     known = {path.stem: path for path in sorted(FOLDER.glob("*.py"))}
     for name in names:
@@ -88,7 +88,7 @@ def plan(stories, lanes):
     jobs = [job for story in stories if story.needs_own_guest for job in _jobs_of_their_own(story)]
     shared = [Job(f"guest{number}", []) for number in range(1, lanes + 1)]
     loads = {id(job): job.seconds for job in shared}
-    for job in sorted(jobs, key=lambda job: -job.seconds):  # what the lanes do beside their shared guest
+    for job in sorted(jobs, key=lambda job: -job.seconds):  # the jobs of the lanes besides their shared guest
         loads[min(loads, key=loads.get)] += job.seconds
     for story in sorted(stories, key=lambda story: (-story.seconds, story.name)):
         if not story.needs_own_guest:

@@ -128,7 +128,7 @@ void ExportsLines::FindAll() {
 bool ExportsLines::FindChanged(const ExportsLines& previous) {
   const Common common = CommonLines(previous.text_, text_);
   const std::size_t tail_begin = text_.size() - common.tail;
-  const auto up_to_tail = std::string_view(text_).substr(0, tail_begin);
+  const auto up_to_tail = std::string_view{text_}.substr(0, tail_begin);
   if (!IsPlain(up_to_tail.substr(common.head))) return false;
 
   const auto begins_before = [](const ExportSpan& line, std::size_t position) { return line.begin < position; };

@@ -24,7 +24,7 @@ class ExportsLines {
   const ExportSpans& spans() const { return spans_; }
 
   std::string_view TextOf(const ExportSpan& line) const {
-    return std::string_view(text_).substr(line.begin, line.end - line.begin);
+    return std::string_view{text_}.substr(line.begin, line.end - line.begin);
   }
 
   // The numbers of lines at the beginning and at the end that have the same bytes as those of `previous`. Zero if

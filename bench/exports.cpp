@@ -102,8 +102,7 @@ void LoadShareFirst(benchmark::State& state, long shares) {
 // The file has been loaded before; the floor is one call of stat(2).
 void LoadUnchangedShare(benchmark::State& state, long shares) {
   const Box box(shares);
-  std::this_thread::sleep_for(
-      std::chrono::milliseconds(20));  // a document is not cached while its file is as new as the clock tick
+  std::this_thread::sleep_for(std::chrono::milliseconds(20));  // a file of the current clock tick is not cached
   Load(box);
   for (auto step : state) benchmark::DoNotOptimize(Load(box));
 }

@@ -1,4 +1,4 @@
-// What a server asks of the platform when it starts. Our own addition to the contract; no module uses it.
+// The platform operation of a server's start. Our own addition to the contract; no module uses it.
 #ifndef VORN_PLATFORM_RECOVERY_H
 #define VORN_PLATFORM_RECOVERY_H
 

@@ -1,4 +1,4 @@
-// vornd: joins the parts, in the order in which they need each other.
+// vornd: constructs the parts in the order of their dependencies, and runs the server.
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <syslog.h>
@@ -44,7 +44,7 @@ constexpr std::size_t kBodiesOfPeer = std::size_t{4} * 1024 * 1024;
 constexpr std::size_t kMemory = std::size_t{48} * 1024 * 1024;
 constexpr std::chrono::seconds kStopLimit{10};  // for running calls, after SIGTERM
 
-// systemd puts standard error into the log that syslog(3) ends in: each line would be there twice.
+// systemd copies standard error into the journal, which also receives syslog(3): each line would be logged twice.
 bool StartedBySystemd() {
   const char* pid = std::getenv("SYSTEMD_EXEC_PID");
   return pid != nullptr && pid == std::to_string(getpid());
@@ -53,7 +53,7 @@ bool StartedBySystemd() {
 // Notifies systemd if it started this process with Type=notify (sd_notify(3)); otherwise does nothing.
 void Notify(const char* state) { sd_notify(0, state); }
 
-// Beside the program where it is installed, else where it was built.
+// Returns the module folder of the build tree if there is one, otherwise that of the installation.
 std::string DefaultModuleFolder() {
   std::error_code failure;
   const auto prefix = std::filesystem::read_symlink("/proc/self/exe", failure).parent_path().parent_path();
@@ -138,8 +138,8 @@ int Serve(const Options& options) {
   return EXIT_SUCCESS;
 }
 
-// The root without links and dots. The platform library reads it from VORN_ROOT, the first time
-// when it is loaded; there are no threads yet.
+// Exports the canonical root in VORN_ROOT, where the platform library reads it, for the first time when it is
+// loaded. There are no threads yet.
 bool SettleRoot(Options* options) {
   std::error_code failure;
   options->root = std::filesystem::canonical(options->root, failure).string();

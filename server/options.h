@@ -15,8 +15,8 @@ struct Options {
   std::vector<std::string> listen;      // empty: the Unix socket below the root
 };
 
-// The options, or the status to exit with when there is nothing more to do: help and version have
-// been printed (0), or what is wrong with the command line (2).
+// Returns the options, or the exit status if the program must end: 0 after printing help or version, 2 after
+// printing an error of the command line.
 std::variant<Options, int> ParseOptions(int argc, const char* const* argv);
 
 }  // namespace vorn::server

@@ -18,7 +18,7 @@ struct FreeText {
   void operator()(char* text) const { std::free(text); }
 };
 
-// The folder `name` of `parent`, made if it was missing, with links followed. Empty with errno set.
+// Opens the folder `name` of `parent`, and creates it if it is missing. Follows links. Empty with errno set on failure.
 std::string MakeFolder(const std::string& parent, const char* name) {
   std::string path = parent == "/" ? "" : parent;
   path.append("/").append(name);

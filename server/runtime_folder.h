@@ -1,4 +1,4 @@
-// ROOT/run/vorn, the folder that the server keeps its socket and its uploads in.
+// ROOT/run/vorn, the folder of the server's socket and uploads.
 #ifndef VORN_SERVER_RUNTIME_FOLDER_H
 #define VORN_SERVER_RUNTIME_FOLDER_H
 
@@ -9,11 +9,11 @@
 
 namespace vorn::server {
 
-// One server at a time has it; a killed one leaves no claim behind (flock(2)).
+// One server at a time owns the folder. The kernel releases the lock when the process dies (flock(2)).
 class RuntimeFolder {
  public:
-  // Makes the folder below `root`, a canonical path, and claims it. None on failure (another server
-  // has it, for one); `error` then says why.
+  // Creates the folder below `root`, a canonical path, and locks it. Returns std::nullopt on failure, for
+  // example if another server owns it; `error` then has the reason.
   static std::optional<RuntimeFolder> Claim(const std::string& root, std::string* error);
 
   const std::string& path() const { return path_; }
@@ -22,7 +22,7 @@ class RuntimeFolder {
   RuntimeFolder(std::string path, UniqueFd folder);
 
   std::string path_;
-  UniqueFd folder_;  // holds the claim
+  UniqueFd folder_;  // owns the lock
 };
 
 }  // namespace vorn::server

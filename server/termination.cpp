@@ -10,7 +10,7 @@
 namespace vorn::server {
 namespace {
 
-sem_t terminated;  // one of the few things that a signal handler may touch
+sem_t terminated;  // sem_post(3) is async-signal-safe
 volatile std::sig_atomic_t signals = 0;
 
 void OnSignal(int number) {

@@ -19,7 +19,7 @@ namespace vorn::server {
 // platform operation, too, because a caller can do the same about both.
 constexpr int kInternalFailure = 2302;
 
-// The sentences that the platform added to a call.
+// The reasons and warnings that the platform added to a call.
 struct Remarks {
   std::vector<std::string> reasons;   // why operations of a failed call failed
   std::vector<std::string> warnings;  // what the caller should know besides the result

@@ -10,7 +10,8 @@ namespace {
 // A method that asks for all parameters in one object has a second copy of them in memory.
 constexpr std::size_t kCopies = 2;
 
-// From here on it pays to give memory back immediately: the tree of 20,000 values.
+// A request with at least this charge, for example a tree of 20,000 values, returns its memory to the system
+// immediately.
 constexpr std::size_t kMuchMemory = std::size_t{8} * 1024 * 1024;
 
 Response NotJson(int status, const std::string& error) {
@@ -37,7 +38,7 @@ Response ReservedName(std::string_view name) {
 
 Response JsonBody::TooLarge() { return Refusal(413, "The parameters are larger than 1 MiB."); }
 
-// The parameters have been destroyed by now.
+// The parameters have been destroyed before.
 JsonBody::~JsonBody() {
   if (charge_ && charge_->amount() >= kMuchMemory) ReturnFreeMemory();
 }

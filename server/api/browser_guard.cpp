@@ -16,7 +16,7 @@ bool IsPort(std::string_view text) {
   return text.size() <= 5 && std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; });
 }
 
-// Whether `host` is `name`, or `name` and a port. Both are in lower case.
+// Returns whether `host` is `name`, or `name` with a port. Both are in lower case.
 bool HasName(std::string_view host, std::string_view name) {
   if (host.substr(0, name.size()) != name) return false;
   const std::string_view rest = host.substr(name.size());
@@ -29,7 +29,7 @@ bool IsLoopback(std::string_view host) {
 
 bool HasPrefix(std::string_view text, std::string_view prefix) { return text.substr(0, prefix.size()) == prefix; }
 
-// In a URL the port of the scheme can be written or not.
+// A URL may contain the default port of its scheme or omit it.
 std::string_view WithoutPort(std::string_view host, std::string_view port) {
   const bool has_port = host.size() > port.size() && host.substr(host.size() - port.size()) == port;
   return has_port ? host.substr(0, host.size() - port.size()) : host;

@@ -1,4 +1,4 @@
-// Keeps the pages of other sites out, which a browser of an administrator would otherwise let use this server.
+// Refuses requests that an administrator's browser makes for pages of other sites (cross-site request forgery).
 #ifndef VORN_SERVER_BROWSER_GUARD_H
 #define VORN_SERVER_BROWSER_GUARD_H
 
@@ -8,19 +8,19 @@
 
 namespace vorn::server {
 
-// The names that this server has for browsers: localhost, 127.0.0.1 and [::1] over HTTP, and the given names over
-// HTTPS. Immutable.
+// The host names by which browsers reach this server: localhost, 127.0.0.1 and [::1] over HTTP, and the given names
+// over HTTPS. Immutable.
 class OwnNames {
  public:
   // Names have no port; an IPv6 address is in brackets. Upper and lower case are the same.
   explicit OwnNames(std::vector<std::string> names = {});
 
-  // Whether a Host header (RFC 9110, 7.2) has one of the names, with any port or none. A site whose name resolves to
-  // an address of this server has another name ("DNS rebinding").
+  // Returns whether a Host header (RFC 9110, 7.2) has one of the names, with any port or none. A site whose name
+  // resolves to an address of this server has another name ("DNS rebinding").
   bool Include(std::string_view host) const;
 
-  // Whether an Origin header (RFC 6454, 7) is the origin of this server itself, as a request with this Host header
-  // reached it: same scheme, host and port. Another port of this machine is another origin, and so is "null".
+  // Returns whether an Origin header (RFC 6454, 7) is the origin of this server itself, as a request with this Host
+  // header reached it: same scheme, host and port. Another port of this machine is another origin, and so is "null".
   bool AreOrigin(std::string_view origin, std::string_view host) const;
 
  private:
@@ -29,8 +29,8 @@ class OwnNames {
   std::vector<std::string> names_;
 };
 
-// Whether a Sec-Fetch-Site header (W3C Fetch Metadata) tells that the browser makes the request for a page of this
-// server or for the user: "same-origin" or "none".
+// Returns whether a Sec-Fetch-Site header (W3C Fetch Metadata) says that the browser makes the request for a page of
+// this server or for the user: "same-origin" or "none".
 bool IsOwnFetch(std::string_view site);
 
 }  // namespace vorn::server

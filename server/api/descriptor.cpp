@@ -8,7 +8,7 @@
 namespace vorn::server {
 namespace {
 
-// The error code that is the name of a member of "x-error-codes"; 0 if the name is not a number.
+// Returns the error code that a member name of "x-error-codes" denotes; 0 if the name is not a number.
 int ParseCode(const std::string& name) {
   int code = 0;
   const auto [end, failure] = std::from_chars(name.data(), name.data() + name.size(), code);
@@ -26,7 +26,7 @@ bool Fault(std::string* error, std::string text) {
   return false;
 }
 
-// Whether the operation has a request body that is a form (OpenAPI 3.1, "Request Body Object").
+// Returns whether the operation has a request body that is a form (OpenAPI 3.1, "Request Body Object").
 bool TakesForm(const Json::Value& operation) {
   const Json::Value& body = operation["requestBody"];
   return body.isObject() && body["content"].isObject() && body["content"].isMember("multipart/form-data");

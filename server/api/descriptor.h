@@ -28,7 +28,7 @@ class Descriptor {
     std::string text;
   };
 
-  // The description of a method. A method without a description may write and takes no file.
+  // Returns the description of a method. A method without a description may write and takes no file.
   struct Method {
     bool reads_only = false;
     bool takes_file = false;
@@ -45,7 +45,7 @@ class Descriptor {
   // `path` is the path that the method is called at: "/api/{api}/v{version}/{method}".
   Method MethodAt(const std::string& path) const;
 
-  // The paths of all methods that are described.
+  // Returns the paths of all described methods.
   std::vector<std::string> Paths() const;
 
  private:

@@ -13,7 +13,7 @@
 namespace vorn::server {
 namespace {
 
-// The parser copies each piece.
+// The size of a piece, because the parser copies each piece.
 constexpr std::size_t kPieceBytes = std::size_t{64} * 1024;
 
 }  // namespace

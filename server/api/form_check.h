@@ -13,7 +13,7 @@
 
 namespace vorn::server {
 
-// Finds everything that is wrong with a form, except for the content of its texts, before any of it is stored. Used by
+// Checks a form completely, except for the content of its text parts, before any of it is stored. Used by
 // the network thread: a piece costs time in proportion to its size, and no more than kMaxParts heads are read.
 class FormCheck : private PartReceiver {
  public:

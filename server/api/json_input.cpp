@@ -20,7 +20,7 @@ bool IsDigit(char c) { return c >= '0' && c <= '9'; }
 
 const std::uint8_t* Bytes(std::string_view text) { return reinterpret_cast<const std::uint8_t*>(text.data()); }
 
-// Where `text` stops being UTF-8; its size if it never does.
+// Returns the position of the first byte that is not UTF-8; the size of `text` if there is none.
 std::size_t Utf8End(std::string_view text) {
   const std::uint8_t* fault = u8_check(Bytes(text), text.size());
   return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
@@ -33,7 +33,7 @@ constexpr std::size_t kValueCost = 192;
 constexpr std::size_t kTextCost = 32;
 
 // Finds characters, numbers and strings that RFC 8259 does not allow and JsonCpp accepts even in its strict mode,
-// and bounds what JsonCpp would spend. Leaves the order of the tokens to JsonCpp.
+// and limits the memory and depth that JsonCpp would need. JsonCpp checks the order of the tokens.
 class LexicalCheck {
  public:
   explicit LexicalCheck(std::string_view text) : text_(text) {}
@@ -169,7 +169,7 @@ class LexicalCheck {
     return nullptr;
   }
 
-  // The value of "\uXXXX" at `at`; negative if there is none.
+  // Returns the value of "\uXXXX" at `at`; negative if there is no such escape.
   int CodeUnit(std::size_t at) const {
     if (text_.substr(std::min(at, text_.size()), 2) != "\\u") return -1;
     int value = 0;
@@ -204,7 +204,7 @@ std::unique_ptr<Json::CharReader> NewReader() {
   return std::unique_ptr<Json::CharReader>(builder.newCharReader());
 }
 
-// The first of JsonCpp's messages ("* Line 1, Column 2\n  Missing ...\n* ...") on one line.
+// Returns the first of JsonCpp's messages ("* Line 1, Column 2\n  Missing ...\n* ...") on one line.
 std::string FirstMessage(const std::string& messages) {
   const std::size_t place = messages.find("\n  ");
   if (messages.compare(0, 2, "* ") != 0 || place == std::string::npos) return messages;

@@ -1,4 +1,4 @@
-// JSON as strict as RFC 8259 defines it, and stricter where two readers could differ.
+// Strict JSON (RFC 8259). Also refuses constructs that two readers could interpret differently.
 #ifndef VORN_SERVER_JSON_INPUT_H
 #define VORN_SERVER_JSON_INPUT_H
 
@@ -14,7 +14,7 @@ namespace vorn::server {
 constexpr int kMaxJsonDepth = 64;
 constexpr std::size_t kMaxJsonValues = 100000;  // every object, array, string, number and literal counts
 
-// Why a text was refused: "Line 1, Column 7: ..." (columns are bytes, and both count from 1).
+// The reason why a text was refused: "Line 1, Column 7: ..." (columns are bytes, and both count from 1).
 struct JsonFault {
   std::string text;
   bool too_large = false;  // more than kMaxJsonValues values
@@ -45,7 +45,7 @@ class JsonText {
 // Checks and parses in one step.
 std::optional<Json::Value> ParseJsonObject(std::string_view text, std::string* error);
 
-// Whether `text` is UTF-8 without U+0000, and so can be a parameter.
+// Returns whether `text` is UTF-8 without U+0000; only such text can be a parameter.
 bool IsPlainUtf8(std::string_view text);
 
 }  // namespace vorn::server

@@ -5,7 +5,7 @@
 namespace vorn::server {
 namespace {
 
-// An arena of its own for each of a hundred threads would keep what each thread once needed.
+// With one arena per thread, a hundred threads would each retain their peak memory.
 constexpr int kArenas = 2;
 constexpr int kLargeBlock = 128 * 1024;  // also turns off the growth of this limit with each freed block
 

@@ -4,12 +4,13 @@
 
 namespace vorn::server {
 
-// Makes memory that is freed go back to the system: few arenas, and large blocks outside of them (mallopt(3)).
+// Configures the allocator to return freed memory to the system: few arenas, and large blocks outside of them
+// (mallopt(3)).
 // Called once, before any thread is started.
 void ConfigureAllocator();
 
-// Gives the free pages of all arenas back to the system (malloc_trim(3)). Takes some milliseconds, so it is worth
-// its time only after a call that has used much memory.
+// Returns the free pages of all arenas to the system (malloc_trim(3)). Takes some milliseconds, so it is called only
+// after a call that has used much memory.
 void ReturnFreeMemory();
 
 }  // namespace vorn::server

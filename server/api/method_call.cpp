@@ -19,7 +19,7 @@ constexpr std::size_t kSmallBody = 1024;
 
 JobSize SizeOf(const Body& body) { return body.size() > kSmallBody ? JobSize::kLarge : JobSize::kSmall; }
 
-// If even this answer finds no memory, the client gets the status alone.
+// If there is no memory for this answer either, the client gets only the status.
 Response NoAnswer(const Route& route, const char* reason) noexcept {
   try {
     syslog(LOG_ERR, "%s: no answer: %s", route.Name().c_str(), QuotedForLog(reason).c_str());
@@ -83,11 +83,11 @@ void Call::Work() {
   const auto begun = std::chrono::steady_clock::now();
   Response response;
   if (abandoned_) {
-    response.status = 503;  // nobody reads it
+    response.status = 503;  // the client has left
   } else {
     response = AnswerOf(route_, [this] { return Execute(); });
   }
-  body_.reset();  // before the client can see the answer
+  body_.reset();  // the uploads are removed before the client sees the answer
   response.begun = begun;
   const int status = response.status;
   if (!answer_.Give(std::move(response))) {

@@ -20,7 +20,7 @@
 namespace vorn::server {
 
 // A call whose client has left before a worker was free is not run. A call that is not done at its deadline is
-// answered with 504; the method goes on, and its end is logged when it comes. A call that has not begun by then, or
+// answered with 504; the method continues, and its end is logged. A call that has not begun by then, or
 // when the pool closes, is answered with 503.
 class Call : public Exchange, public Job, public std::enable_shared_from_this<Call> {
  public:

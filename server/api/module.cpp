@@ -18,7 +18,7 @@
 namespace vorn::server {
 namespace {
 
-// Far more than any module has: a table without a terminator ends here.
+// Limit for a table without a terminator; far more than the rows of any module.
 constexpr std::size_t kMaxRows = 4096;
 
 struct CloseLibrary {
@@ -77,7 +77,7 @@ std::optional<Module> LoadModule(const std::string& path, std::string* error) {
   }
   std::optional<std::vector<APIRow>> rows = ReadTable(library.get(), error);
   if (!rows) return std::nullopt;
-  // Its code may run on any thread until the very end of the process.
+  // The library is never unloaded: its code may run on any thread until the process ends.
   static_cast<void>(library.release());
   const std::string descriptor = std::filesystem::path(path).replace_extension(".json").string();
   return Module{path, std::move(*rows), ReadDescriptor(descriptor)};

@@ -17,8 +17,8 @@ struct Module {
   Descriptor descriptor;
 };
 
-// Loads every X.so of `folder`, in the order of their names. One that cannot be used is logged and
-// left out, and so is a faulty descriptor.
+// Loads every X.so of `folder`, in the order of their names. A module that cannot be used is
+// logged and skipped, and so is a faulty descriptor.
 std::vector<Module> LoadModules(const std::string& folder);
 
 }  // namespace vorn::server

@@ -12,7 +12,7 @@ namespace {
 constexpr std::string_view kLineBreak = "\r\n";
 constexpr std::string_view kBoundaryMarks = "'()+_,-./:=? ";
 
-// The part's head, from its header lines; none if they do not describe a part of a form.
+// Parses the header lines of a part. Returns std::nullopt if they do not describe a part of a form.
 std::optional<PartHead> ParsePartHead(std::string_view lines) {
   std::optional<HeaderValue> disposition;
   std::string type = "text/plain";
@@ -78,8 +78,8 @@ MultipartParser::Step MultipartParser::Advance() {
   return Step::kStop;
 }
 
-// Consumes what stands before the next boundary, and the boundary (kDone), or all that cannot be the
-// beginning of one (kNeedMore). `text` is what stood before it.
+// Consumes the data before the next boundary, and the boundary (kDone), or all data that cannot begin a
+// boundary (kNeedMore). Stores the data before the boundary in `text`.
 MultipartParser::Step MultipartParser::BoundaryBefore(std::string_view* text) {
   const std::size_t found = pending_.find(delimiter_);
   if (found != std::string_view::npos) {
@@ -100,7 +100,7 @@ MultipartParser::Step MultipartParser::SkipPreamble() {
   return step;
 }
 
-// Reads the rest of a boundary line: two hyphens after the last boundary, else blanks and the line break.
+// Reads the rest of a boundary line: two hyphens after the closing boundary, otherwise blanks and the line break.
 MultipartParser::Step MultipartParser::EndBoundary() {
   if (pending_.size() < 2) return Step::kNeedMore;
   if (pending_.substr(0, 2) == "--") {

@@ -1,4 +1,4 @@
-// multipart/form-data (RFC 7578), read as it comes.
+// An incremental parser of multipart/form-data (RFC 7578).
 #ifndef VORN_SERVER_MULTIPART_H
 #define VORN_SERVER_MULTIPART_H
 
@@ -14,8 +14,8 @@ struct PartHead {
   bool is_file = false;  // it has a file name, or a type that is not text/plain
 };
 
-// Receives the parts in their order: Begin, any number of Data, End, for each. False stops the
-// parser; whoever said so knows why.
+// Receives the parts in order: BeginPart, any number of PartData, and EndPart for each. Returning false stops
+// the parser; the receiver then has the reason.
 class PartReceiver {
  public:
   virtual ~PartReceiver() = default;
@@ -31,11 +31,11 @@ class MultipartParser {
   // `boundary` as the Content-Type gives it. The receiver must outlive this.
   MultipartParser(const std::string& boundary, PartReceiver& receiver);
 
-  // Whether a boundary is one (RFC 2046, 5.1.1).
+  // Returns whether the boundary is valid (RFC 2046, 5.1.1).
   static bool IsBoundary(std::string_view boundary);
 
-  // Takes the next piece; holds on to no more of it than could be a boundary or a part's head. False
-  // once the receiver has stopped it or error() is set.
+  // Parses the next piece. Buffers only data that could be a boundary or the head of a part. Returns
+  // false once the receiver has stopped it or error() is set.
   bool Feed(std::string_view piece);
 
   bool complete() const { return state_ == State::kEpilogue; }  // the closing boundary has come
@@ -58,8 +58,8 @@ class MultipartParser {
   const std::string delimiter_;
   PartReceiver& receiver_;
   State state_ = State::kPreamble;
-  std::string buffer_{"\r\n"};  // the first boundary may stand at the very beginning
-  std::string_view pending_;    // what is left of the buffer, during Feed
+  std::string buffer_{"\r\n"};  // the first boundary may be at the very beginning
+  std::string_view pending_;    // the unread part of the buffer, during Feed
   std::string error_;
 };
 

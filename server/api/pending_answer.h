@@ -1,4 +1,4 @@
-// An answer that several threads may give, and that is given once.
+// An answer that several threads may give; only the first one is sent.
 #ifndef VORN_SERVER_PENDING_ANSWER_H
 #define VORN_SERVER_PENDING_ANSWER_H
 
@@ -17,7 +17,7 @@ class PendingAnswer {
     answer_ = std::move(answer);
   }
 
-  // Answers with `response`. Returns false, without an effect, if somebody else has answered already.
+  // Answers with `response`. Returns false, without an effect, if an answer was given before.
   bool Give(Response response) {
     Answer answer;
     {

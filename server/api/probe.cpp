@@ -9,7 +9,7 @@ namespace {
 
 const char kLane = 0;
 
-// Not ready for lack of memory either.
+// A server without memory is not ready either.
 Response Unready(const char* text) noexcept {
   try {
     return Busy(text);

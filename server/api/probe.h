@@ -1,4 +1,4 @@
-// Whether the server is ready: an empty call runs through the threads of the methods that only read.
+// The readiness check: an empty call runs through the threads of the methods that only read.
 #ifndef VORN_SERVER_PROBE_H
 #define VORN_SERVER_PROBE_H
 

@@ -28,7 +28,7 @@ std::optional<Path> SplitPath(std::string_view path) {
   return Path{path.substr(0, first), path.substr(first + 1, second - first - 1), path.substr(second + 1)};
 }
 
-// "v2" is 2. None for anything but the one way to write a number.
+// Parses "v2" as 2. Returns std::nullopt for anything else, including leading zeros and signs.
 std::optional<int> ParseVersion(std::string_view text) {
   if (text.substr(0, 1) != "v") return std::nullopt;
   int version = 0;

@@ -1,4 +1,4 @@
-// From the path of a request to the row of a module's table.
+// Maps the path of a request to the row of a module's table.
 #ifndef VORN_SERVER_ROUTES_H
 #define VORN_SERVER_ROUTES_H
 
@@ -30,11 +30,11 @@ class Routes {
   // logged, and so is each path of a descriptor that belongs to none of its module's rows.
   explicit Routes(const std::vector<Module>& modules);
 
-  // The row of "/api/{api}/v{version}/{method}". Null when there is none: `unknown` then says which
-  // of the three is unknown.
+  // Returns the row of "/api/{api}/v{version}/{method}", or nullptr. `unknown` then says which of the
+  // three is unknown.
   const Route* Find(std::string_view path, std::string* unknown) const;
 
-  // All rows, as [{"api": ..., "version": ..., "method": ...}, ...].
+  // Returns all rows as [{"api": ..., "version": ..., "method": ...}, ...].
   Json::Value List() const;
 
  private:

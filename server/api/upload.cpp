@@ -15,7 +15,7 @@
 namespace vorn::server {
 namespace {
 
-// Whether the path is a folder that the server's user owns, and not a symbolic link.
+// Returns whether the path is a folder, not a symbolic link, that the server's user owns.
 bool IsPrivateFolder(const std::string& path) {
   struct stat there {};
   if (lstat(path.c_str(), &there) != 0) return false;

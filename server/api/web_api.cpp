@@ -55,7 +55,7 @@ bool IsUtf8(const HeaderValue& type) {
   return charset == type.parameters.end() || EqualsIgnoringCase(charset->second, "utf-8");
 }
 
-// A form is accepted by methods that take a file only: a page of another site can send one without asking first.
+// A form is accepted by methods that take a file only: a page of another site can send one without a CORS preflight.
 NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& parts) {
   if (!head.has_body) return std::make_unique<JsonBody>(parts.memory);
   const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
@@ -69,12 +69,12 @@ NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& part
                           std::string(head.content_type) + "\".");
 }
 
-// For logs: who sent the request, as far as the transport knows.
+// Returns the sender of the request for the log, as far as the transport knows it.
 std::string CallerOf(const Peer& peer) {
   return peer.credentials ? "uid " + std::to_string(peer.credentials->uid) : "";
 }
 
-// The first parameter of the query by name: no request has any.
+// Refuses a request with a query, and names its first parameter; no request accepts any.
 std::optional<Response> RefuseQuery(std::string_view query) {
   const std::string_view name = query.substr(0, query.find_first_of("=&"));
   if (query.empty()) return std::nullopt;
@@ -89,7 +89,7 @@ Response Options(const std::string& allowed) {
   return response;
 }
 
-// An answer that changes only with the program that gives it: a client may keep it and ask whether it has changed.
+// An answer that depends only on the program's version. Clients may cache it and revalidate it.
 Response Unchanging(Response response) {
   const std::string version = std::to_string(std::hash<std::string>()(response.body));
   response.headers.emplace_back("ETag", "W/\"" + version + "\"");

@@ -60,7 +60,7 @@ void WorkerPool::Close() {
 }
 
 // Wakes a thread that waits, or starts one. The vector has room for all threads, so it never reallocates. If no
-// thread can be started, the pool goes on with those it has.
+// thread can be started, the pool continues with the existing ones.
 void WorkerPool::EngageThread() {
   if (idle_ > 0) return wake_.notify_one();
   if (threads_.size() >= limits_.threads) return;
@@ -76,7 +76,7 @@ bool WorkerPool::MayTakeFrom(const Lane& lane) const {
   return !lane.queue.empty() && lane.running < share;
 }
 
-// Returns the lane whose last turn is the longest ago, of those whose next job may begin; nullptr if there is none.
+// Returns the least recently served lane whose next job may begin; nullptr if there is none.
 WorkerPool::Lane* WorkerPool::NextLane() {
   if (queued_ == 0 || !MayTake()) return nullptr;
   Lane* next = nullptr;
@@ -101,8 +101,8 @@ void WorkerPool::Work() {
   }
 }
 
-// Moves the first job of the lane to those that run. The next job may have been submitted to this thread, too: another
-// one takes it.
+// Moves the first job of the lane to the running jobs. This thread may have been woken for the next job as well, so
+// another thread is woken for it.
 WorkerPool::Entries::iterator WorkerPool::Begin(Lane* lane) {
   const auto entry = lane->queue.begin();
   entry->begun = Clock::now();

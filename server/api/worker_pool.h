@@ -1,4 +1,4 @@
-// The threads that entry functions run on.
+// The worker threads that run entry functions.
 #ifndef VORN_SERVER_WORKER_POOL_H
 #define VORN_SERVER_WORKER_POOL_H
 
@@ -32,14 +32,14 @@ class Job {
   virtual void Refuse() = 0;
 };
 
-// How much work a job is expected to be, as far as that is known before it begins.
+// The expected amount of work of a job, as far as it is known before the job begins.
 enum class JobSize { kSmall, kLarge };
 
 // The jobs of one owner (a method) and one size. The owner is identified by its address only.
 using LaneId = std::pair<const void*, JobSize>;
 
-// Runs the jobs of a lane in the order of their arrival, and takes the lanes by turns, so that the jobs that wait in
-// one lane delay no other lane:
+// Serves the lanes in round-robin order, and the jobs of a lane in FIFO order, so that waiting jobs of one lane do not
+// delay other lanes:
 //   - A lane has a share of the threads and of the queue.
 //   - Only a few threads work at the same time as long as jobs are short, because more of them would only compete
 //     for the same locks and caches. A job that has run for `long_after` counts as long, and a further thread
@@ -65,11 +65,11 @@ class WorkerPool {
   WorkerPool(const WorkerPool&) = delete;
   WorkerPool& operator=(const WorkerPool&) = delete;
 
-  // Takes a job that must be done `time` from now. Returns false, without calling any of the job's functions, if
+  // Submits a job that must be done `time` from now. Returns false, without calling any of the job's functions, if
   // the lane's share of the queue is used up or the pool is closed. Throws std::bad_alloc and has then no effect.
   bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
 
-  // Refuses the jobs that wait and all further ones. Running jobs go on. Does not wait.
+  // Refuses the jobs that wait and all further ones. Running jobs continue. Does not wait.
   void Close();
 
  private:

@@ -79,7 +79,7 @@ void AccessLog::Add(AccessRecord record) noexcept {
       return;
     }
   } catch (const std::bad_alloc&) {
-    // Counted below.
+    // The record is counted below.
   }
   ++counts_.dropped;
 }
@@ -99,7 +99,7 @@ void AccessLog::Write(const std::vector<AccessRecord>& records) noexcept {
   }
 }
 
-// The counts of a summary that finds no memory are part of the next one.
+// If there is no memory for a summary, its counts become part of the next one.
 void AccessLog::Work() {
   std::unique_lock<std::mutex> lock(mutex_);
   auto next_summary = std::chrono::steady_clock::now() + kSummaryInterval;

@@ -46,7 +46,7 @@ void Budget::Return(const std::string& peer, std::size_t amount) noexcept {
   const std::lock_guard<std::mutex> lock(mutex_);
   used_ -= amount;
   const auto held = by_peer_.find(peer);
-  if (held == by_peer_.end()) return;  // charged to no peer
+  if (held == by_peer_.end()) return;  // the charge has no peer
   held->second -= amount;
   if (held->second == 0) by_peer_.erase(held);
 }

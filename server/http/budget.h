@@ -1,4 +1,4 @@
-// A shared limit on something that requests hold, for example bytes of bodies.
+// A shared limit on a resource of requests, for example the bytes of their bodies.
 #ifndef VORN_SERVER_BUDGET_H
 #define VORN_SERVER_BUDGET_H
 

@@ -21,7 +21,7 @@ std::string_view TakeToken(std::string_view* rest) {
   return token;
 }
 
-// Takes `"..."`, which `rest` begins with, off its front.
+// Removes the quoted string at the front of `rest` and returns its content.
 std::optional<std::string> TakeQuoted(std::string_view* rest) {
   std::string text;
   for (std::size_t i = 1; i < rest->size(); ++i) {
@@ -43,7 +43,7 @@ std::optional<std::string> TakeParameterValue(std::string_view* rest) {
   return std::string(token);
 }
 
-// Takes `; name=value` off the front of `rest`.
+// Removes `; name=value` from the front of `rest`.
 bool TakeParameter(std::string_view* rest, HeaderValue* header) {
   if (rest->front() != ';') return false;
   *rest = TrimBlanks(rest->substr(1));

@@ -31,14 +31,14 @@ using Error = boost::system::error_code;
 using Executor = asio::io_context::executor_type;
 using Acceptor = asio::basic_socket_acceptor<Protocol, Executor>;
 
-// Descriptors that are not for connections: modules, workers and their files, the journal, the bus, a rest for
-// accept(2).
+// Descriptors reserved for other uses than connections: modules, workers and their files, the journal, the bus, and one
+// for accept(2).
 constexpr rlim_t kReservedDescriptors = 192;
 constexpr std::size_t kFewestConnections = 8;  // of a listener
 
-// Connections that are accepted before others are served again. While many clients send much, a turn of the others is
-// up to 128 pieces of 8 KiB; with only a few connections accepted in each, a good client waits behind bad ones to be
-// accepted.
+// The number of connections that are accepted before other events are handled. While many clients send
+// large requests, one round of the event loop reads up to 128 pieces of 8 KiB. If each round accepted only a few
+// connections, a new client would wait behind many others.
 constexpr int kAcceptedAtOnce = 32;
 
 bool IsExhaustion(int error) { return error == EMFILE || error == ENFILE || error == ENOBUFS || error == ENOMEM; }
@@ -59,7 +59,7 @@ HttpLimits FitToDescriptors(HttpLimits limits, const std::vector<Listener>& list
   return limits;
 }
 
-// All sessions, the sockets they come from and the clock they are held to. Everything but the constructor, the
+// All sessions, the listening sockets, and the timer of the deadlines. Everything but the constructor, the
 // destructor, Stop and the joins runs on the network thread.
 //
 // No function of this class that is called for many sessions allocates memory, and no operation of Asio has a result
@@ -166,7 +166,7 @@ void HttpServer::Engine::Open(Listener& listener) {
   doors_.push_back(std::move(door));
 }
 
-// Without memory an operation may not have begun, so all are begun again after an exception.
+// After std::bad_alloc an operation may not have been started, so all are started again.
 void HttpServer::Engine::Serve() {
   pthread_setname_np(pthread_self(), "network");
   for (;;) {
@@ -256,7 +256,7 @@ void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {
 }
 
 // Called after accept(2) has failed. Without a descriptor for the new connection, the most expendable one makes room.
-// Returns false if it is no use to try again before the next tick.
+// Returns false if another attempt is useless before the next tick.
 bool HttpServer::Engine::MakeRoom(int error) {
   if (error == ECONNABORTED || error == EINTR) return true;
   if (const auto now = Clock::now(); now - warned_ > std::chrono::minutes(1)) {
@@ -274,7 +274,7 @@ bool HttpServer::Engine::MakeRoom(int error) {
   return true;
 }
 
-// A session may leave while `step` is called with it.
+// `step` may remove the session that it is called with.
 template <typename Step>
 void HttpServer::Engine::ForEachSession(const Step& step) {
   for (auto next = sessions_.begin(); next != sessions_.end();) {
@@ -306,7 +306,7 @@ void HttpServer::Engine::OnWake() {
   if (end_wanted_) ForEachSession([](Session& session) { session.Close(); });
 }
 
-// Deadlines are checked once a second, and not at all while nobody is connected.
+// Checks the deadlines once a second while there are connections.
 void HttpServer::Engine::StartTimer() {
   if (ticking_) return;
   timer_.expires_after(std::chrono::seconds(1));
@@ -331,7 +331,7 @@ void HttpServer::Engine::OnStop() {
   if (sessions_.empty()) Finish();
 }
 
-// Leaves the network thread nothing to wait for.
+// Cancels everything that the network thread waits for, so that it ends.
 void HttpServer::Engine::Finish() {
   Error ignored;
   work_.reset();

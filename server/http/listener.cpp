@@ -24,7 +24,7 @@ constexpr std::string_view kUnixScheme = "unix:";
 constexpr std::string_view kRule = "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at";
 constexpr std::string_view kNoTcp = "TCP is for a trial root (--root) alone, because nobody can log in yet";
 
-// Any socket address; `size` is what is used of it.
+// Any socket address, with its size in bytes.
 struct SocketAddress {
   sockaddr_storage storage{};
   socklen_t size = 0;
@@ -91,7 +91,7 @@ std::optional<SocketAddress> UnixAddress(const std::string& path, std::string* e
   return SocketAddress::Of(address);
 }
 
-// The socket, bound and listening; none with errno set.
+// Returns the socket, bound and listening; an empty one with errno set on failure.
 UniqueFd BindAndListen(const SocketAddress& address) {
   UniqueFd socket(::socket(address.family(), SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
   const int on = 1;
@@ -105,13 +105,13 @@ UniqueFd BindAndListen(const SocketAddress& address) {
   return socket;
 }
 
-// Whether somebody accepts connections there.
+// Returns whether a server accepts connections at this path.
 bool IsServed(const SocketAddress& address) {
   const UniqueFd probe(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
   return probe && (connect(probe.get(), address.get(), address.size) == 0 || errno == EAGAIN);
 }
 
-// Removes a socket that its server left behind. False if what is there must stay.
+// Removes the socket file of a server that has ended. Returns false if the file must not be removed.
 bool ClearPath(const std::string& path, const SocketAddress& address, std::string* error) {
   struct stat there {};
   if (lstat(path.c_str(), &there) != 0) return true;  // binding says more
@@ -124,7 +124,7 @@ bool ClearPath(const std::string& path, const SocketAddress& address, std::strin
 std::optional<Listener> OpenUnix(const std::string& path, std::string* error) {
   const std::optional<SocketAddress> address = UnixAddress(path, error);
   if (!address || !ClearPath(path, *address, error)) return std::nullopt;
-  // At no moment may others connect.
+  // The umask gives the socket its mode when it is created, so other users can never connect.
   const mode_t before = umask(0117);
   UniqueFd socket = BindAndListen(*address);
   umask(before);

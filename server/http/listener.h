@@ -1,4 +1,4 @@
-// Where the server listens: Unix sockets, and loopback addresses for a trial.
+// Listening sockets: Unix sockets, and loopback addresses for a trial root.
 #ifndef VORN_SERVER_LISTENER_H
 #define VORN_SERVER_LISTENER_H
 
@@ -12,10 +12,10 @@
 
 namespace vorn::server {
 
-// A listening socket. One that was made at a path is removed from there with its object.
+// A listening socket. The destructor removes the socket file if this object created it.
 class Listener {
  public:
-  // `path` is empty unless the file is this object's to remove.
+  // `path` is the socket file to remove; empty if there is none.
   Listener(UniqueFd socket, int family, std::string name, std::string path);
   Listener(Listener&& other) noexcept;
   Listener& operator=(Listener&&) = delete;
@@ -32,15 +32,15 @@ class Listener {
   std::string path_;
 };
 
-// Opens `address`: "unix:/PATH" (mode 0660; a socket that nobody serves any more is replaced), or
+// Opens `address`: "unix:/PATH" (mode 0660; replaces the socket of a server that has ended), or
 // "127.0.0.1:PORT" and "[::1]:PORT" where `allow_tcp` (port 0 takes a free one). Nobody can log in
 // over TCP yet, so it is for trials alone. None on failure; `error` then says why.
 std::optional<Listener> OpenListener(std::string_view address, bool allow_tcp, std::string* error);
 
-// A listening socket that somebody else opened and that is now ours, under the same rules.
+// Adopts a listening socket that another program opened, under the same rules.
 std::optional<Listener> AdoptListener(UniqueFd socket, bool allow_tcp, std::string* error);
 
-// The sockets that systemd handed over (sd_listen_fds(3)), not yet checked.
+// Returns the sockets passed by systemd (sd_listen_fds(3)), not yet checked.
 std::vector<UniqueFd> TakeActivatedSockets();
 
 }  // namespace vorn::server

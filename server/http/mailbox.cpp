@@ -14,7 +14,7 @@ Mailbox::Mailbox() : event_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
 }
 
 Mailbox::~Mailbox() {
-  // One by one: a chain of owners would be destroyed by recursion.
+  // Destroys the letters in a loop, because destroying a chain of owners recurses once per letter.
   for (std::shared_ptr<Letter> letter = TakeAll(); letter;) letter = std::move(letter->next);
 }
 
@@ -27,7 +27,7 @@ void Mailbox::Send(std::shared_ptr<Letter> letter) noexcept {
   if (first) Wake();
 }
 
-// Writing fails only if the counter is at its maximum, and then the descriptor is readable.
+// write(2) fails only if the counter is at its maximum; the descriptor is readable in that case.
 void Mailbox::Wake() noexcept { (void)eventfd_write(event_.get(), 1); }
 
 void Mailbox::Deliver() {

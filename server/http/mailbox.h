@@ -1,4 +1,4 @@
-// Carries decisions from any thread to the network thread.
+// Passes decisions and responses from any thread to the network thread.
 #ifndef VORN_SERVER_MAILBOX_H
 #define VORN_SERVER_MAILBOX_H
 
@@ -12,15 +12,15 @@
 
 namespace vorn::server {
 
-// One delivery. It is allocated before it is needed, so that nothing can fail when the response is there.
+// One delivery. It is allocated before the call runs, so that sending the response cannot fail.
 struct Letter {
   std::function<void(std::optional<Response>)> deliver;  // called on the network thread, unless the server has ended
   std::optional<Response> response;
   std::shared_ptr<Letter> next;
 };
 
-// Letters outlive neither reason nor order: they are delivered in the order in which they were sent. The mailbox is
-// shared by the server and everybody who may still send, so a letter that is sent after the server's end is dropped.
+// Letters are delivered in the order in which they were sent. The server and all possible senders share ownership of
+// the mailbox; a letter that is sent after the server's end is dropped.
 class Mailbox {
  public:
   // Throws std::system_error if there is no descriptor left.

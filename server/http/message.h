@@ -1,4 +1,4 @@
-// The two halves of a conversation: the head of a request and the response to it.
+// The head of a request, and the response to it.
 #ifndef VORN_SERVER_MESSAGE_H
 #define VORN_SERVER_MESSAGE_H
 
@@ -30,7 +30,7 @@ struct Head {
   std::vector<std::pair<std::string_view, std::string_view>> headers;  // all, in the order sent
   Peer peer;
 
-  // The value of the first header of this name, which is compared without regard to case.
+  // Returns the value of the first header with this name; names are compared case-insensitively.
   std::optional<std::string_view> Header(std::string_view name) const;
   std::size_t Count(std::string_view name) const;
 };
@@ -60,7 +60,7 @@ struct Response {
   std::chrono::steady_clock::time_point begun{};
 };
 
-// The content of a regular file from its beginning; nullptr with errno set if it cannot be opened.
+// Returns a source of the content of a regular file; nullptr with errno set if it cannot be opened.
 std::shared_ptr<BodySource> OpenFileBody(const std::string& path);
 
 }  // namespace vorn::server

@@ -28,7 +28,7 @@ struct Peer {
   std::string ShareKey() const;
 };
 
-// The peer of a connected socket. An address that cannot be determined is "unknown".
+// Returns the peer of a connected socket. An address that cannot be determined is "unknown".
 Peer PeerOf(int socket);
 
 }  // namespace vorn::server

@@ -54,7 +54,7 @@ std::string_view View(beast::string_view text) { return {text.data(), text.size(
 
 bool Is(std::string_view text, std::string_view word) { return EqualsIgnoringCase(text, word); }
 
-// Where "http://authority" of an absolute target ends; 0 for other targets (RFC 9112, 3.2).
+// Returns the end of "http://authority" in an absolute target; 0 for other targets (RFC 9112, 3.2).
 std::size_t AuthorityEnd(std::string_view target, std::string_view* authority) {
   for (const std::string_view scheme : {"http://", "https://"}) {
     if (!Is(target.substr(0, scheme.size()), scheme)) continue;
@@ -65,7 +65,7 @@ std::size_t AuthorityEnd(std::string_view target, std::string_view* authority) {
   return 0;
 }
 
-// The first Transfer-Encoding that is not "chunked"; empty if there is none.
+// Returns the first Transfer-Encoding other than "chunked"; empty if there is none.
 std::string_view UnknownCoding(const Fields& fields) {
   std::string_view unknown;
   const auto range = fields.equal_range(http::field::transfer_encoding);
@@ -121,7 +121,7 @@ RequestReader::State RequestReader::Read(beast::flat_buffer& buffer) {
 }
 
 // Empty lines before a request are skipped (RFC 9112, 2.2), and a minor version above 1 is read as 1 (RFC 9110, 2.5).
-// False as long as the request line has not been received whole.
+// Returns false until the complete request line has been received.
 bool RequestReader::SkipToRequestLine(beast::flat_buffer& buffer) {
   for (;;) {
     auto* const text = static_cast<char*>(buffer.data().data());
@@ -155,12 +155,12 @@ RequestReader::State RequestReader::CheckHead() {
   sound_ = true;
   const std::string_view expected = View(parsing_->parser->get()[http::field::expect]);
   if (!expected.empty() && !Is(expected, "100-continue")) return Fail(417, "Only 100-continue can be expected.");
-  // An HTTP/1.0 client would take "100 Continue" for the answer.
+  // An HTTP/1.0 client would interpret "100 Continue" as the answer.
   expects_continue_ = !expected.empty() && !parsing_->parser->is_done() && !is_old();
   return state_ = parsing_->parser->is_done() ? State::kDone : State::kBody;
 }
 
-// Beast accepts what two readers of one connection could take for different requests.
+// Refuses ambiguous framing that Beast accepts: two readers of the connection could see different requests.
 std::optional<RequestReader::Fault> RequestReader::FindFault() const {
   const auto& request = parsing_->parser->get();
   const auto fault = [](int status, const char* text) { return Fault{status, text}; };

@@ -1,4 +1,4 @@
-// Requests as they arrive: framing by Boost.Beast, and the rules of RFC 9112 that Beast leaves to its user.
+// Incremental reading of requests: framing by Boost.Beast, and the rules of RFC 9112 that Beast does not enforce.
 #ifndef VORN_SERVER_REQUEST_READER_H
 #define VORN_SERVER_REQUEST_READER_H
 
@@ -45,8 +45,8 @@ class RequestReader {
   // Whether a byte of the request has been read.
   bool begun() const { return begun_; }
 
-  // Whether the next request can be read from the same connection: the head is sound, the request has been read to its
-  // end, and the client wishes so.
+  // Whether the next request can be read from the same connection: the head is valid, the request has been read to its
+  // end, and the client keeps the connection open.
   bool IsReusable() const;
 
   // Whether the client waits for "100 Continue" before it sends the body (RFC 9110, 10.1.1).
@@ -73,8 +73,8 @@ class RequestReader {
   Fault fault_;
   std::size_t head_bytes_ = 0;
   bool begun_ = false;
-  bool has_line_ = false;  // the request line has been seen whole
-  bool sound_ = false;     // the head is
+  bool has_line_ = false;  // the complete request line has been received
+  bool sound_ = false;     // the head is valid
   bool expects_continue_ = false;
 };
 

@@ -36,7 +36,7 @@ bool AcceptsGzip(std::string_view accepted) {
   return named || (any && !refused);
 }
 
-// Compares as If-None-Match does: a weak and a strong tag of one text are equal.
+// Weak comparison of entity tags, as If-None-Match requires (RFC 9110, 13.1.2).
 bool IsKnown(const std::string& known_versions, std::string_view tag) {
   const auto strong = [](std::string_view text) { return text.substr(0, 2) == "W/" ? text.substr(2) : text; };
   bool known = TrimBlanks(known_versions) == "*";

@@ -1,4 +1,4 @@
-// Responses as they are sent (RFC 9112), compressed and left out where the client asks for that.
+// Serialises responses (RFC 9112), compressed or without a body if the client asks for that.
 #ifndef VORN_SERVER_RESPONSE_WRITER_H
 #define VORN_SERVER_RESPONSE_WRITER_H
 
@@ -27,7 +27,7 @@ AnswerForm FormOf(const Head& head, bool is_old);
 // a large body if the client accepts that. Does not throw: without memory the answer stays as it is. Thread-safe.
 void Adapt(const AnswerForm& form, Response* response) noexcept;
 
-// How the end of a body is recognised.
+// The framing of a body.
 enum class Framing { kNone, kLength, kChunked, kClose };
 Framing FramingOf(const AnswerForm& form, const Response& response);
 

@@ -1,4 +1,4 @@
-// The seam between the transport and what answers its requests.
+// The interface between the transport and the service that answers requests.
 //
 // For each request the network thread calls Service::Begin, Exchange::Authorize, Exchange::Receive for each piece
 // of the body, and Exchange::Run, in this order. A Response at any step is the answer and ends the sequence.

@@ -39,7 +39,7 @@ Session::Session(SessionHost& host, std::unique_ptr<Stream> stream, Peer peer, s
       listener_(listener),
       reader_(host.limits().head_bytes) {}
 
-// A failure of one connection, out of memory for one, ends that connection and nothing else.
+// A failure of one connection, for example std::bad_alloc, ends only that connection.
 template <typename Step>
 void Session::Guard(const Step& step) {
   if (closed_) return;
@@ -168,7 +168,7 @@ void Session::OnRead(const Error& error, std::size_t bytes) {
   Advance();
 }
 
-// Goes as far as the bytes that have arrived allow.
+// Processes the bytes that have arrived.
 void Session::Advance() {
   if (phase_ == Phase::kIdle && buffer_.size() > 0) Enter(Phase::kHead);
   switch (reader_.Read(buffer_)) {
@@ -308,7 +308,7 @@ void Session::Finish() {
   Log();
   response_ = {};
   if (!keep_alive_) {
-    // A connection that is closed with unread bytes in it takes the answer along.
+    // Closing a connection with unread bytes resets it, and the client may lose the answer.
     Enter(Phase::kDrain);
     stream_->FinishSending();
     return Drain();
@@ -326,7 +326,7 @@ void Session::Drain() {
   Read();
 }
 
-// Without memory for it, a request has no record.
+// If there is no memory for the record, the request is not logged.
 void Session::Log() noexcept {
   if (host_.log() == nullptr) return;
   try {

@@ -36,7 +36,7 @@ class SessionHost {
   virtual void Forget(const std::shared_ptr<Session>& session) = 0;
 };
 
-// Lives on the network thread. Other threads know a session only through the letters of its mailbox.
+// Used on the network thread only. Other threads communicate with a session through letters of its mailbox.
 class Session : public std::enable_shared_from_this<Session> {
  public:
   using Clock = std::chrono::steady_clock;
@@ -46,10 +46,10 @@ class Session : public std::enable_shared_from_this<Session> {
 
   void Start();
 
-  // There is no room for the connection, which has just been accepted: it is answered with 503 and closed.
+  // Answers 503 and closes the connection, which was accepted beyond the limit.
   void TurnAway();
 
-  // The server stops: closes the connection now, or after the answer of the request that is running.
+  // Called when the server stops: closes the connection now, or after the answer to the running request.
   void Stop();
   void Close() noexcept;
 

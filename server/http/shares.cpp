@@ -5,7 +5,7 @@
 namespace vorn::server {
 namespace {
 
-// The most expendable connection of this address, or of all for nullptr.
+// Returns the most expendable connection of this address, or of all for nullptr.
 std::size_t Choose(const std::vector<ConnectionUse>& uses, const std::string_view* address) {
   std::size_t chosen = kNoConnection;
   for (std::size_t i = 0; i < uses.size(); ++i) {

@@ -1,4 +1,4 @@
-// Which connection must go when there are too many.
+// Chooses the connection to close when there are too many.
 #ifndef VORN_SERVER_SHARES_H
 #define VORN_SERVER_SHARES_H
 
@@ -9,19 +9,19 @@
 
 namespace vorn::server {
 
-// The activity of a connection, in the order in which connections are given up.
+// The activity of a connection, in the order in which connections are closed.
 enum class Activity {
   kEnding,   // answered for the last time
   kIdle,     // between two requests, or before the first
   kWaiting,  // for the client: to send the rest of a request or to take an answer
-  kWorking,  // the client waits for us; never given up
+  kWorking,  // the client waits for the server; never closed
 };
 
 // One connection of a listener.
 struct ConnectionUse {
   std::string_view share_key;  // Peer::ShareKey(), which must outlive this
   Activity activity = Activity::kIdle;
-  std::chrono::steady_clock::time_point since;  // of this activity; a byte now and then does not renew it
+  std::chrono::steady_clock::time_point since;  // of this activity; receiving single bytes does not renew it
 };
 
 // The connections that a listener may have.
@@ -30,7 +30,7 @@ struct ConnectionShare {
   std::size_t per_address;
 };
 
-// Whether a connection is given up before another one.
+// Returns whether `left` is closed before `right`.
 bool GoesFirst(const ConnectionUse& left, const ConnectionUse& right);
 
 constexpr std::size_t kNoConnection = static_cast<std::size_t>(-1);
@@ -40,7 +40,7 @@ constexpr std::size_t kNoConnection = static_cast<std::size_t>(-1);
 // there is room, or if the surplus consists of connections that are working.
 std::size_t SurplusOf(const std::vector<ConnectionUse>& uses, const ConnectionShare& share);
 
-// The most expendable of all, or kNoConnection.
+// Returns the index of the most expendable connection, or kNoConnection.
 std::size_t MostExpendable(const std::vector<ConnectionUse>& uses);
 
 }  // namespace vorn::server

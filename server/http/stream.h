@@ -1,4 +1,4 @@
-// The bytes of one connection. The transport needs no more of a connection, so another kind (TLS) is another Stream.
+// The byte stream of one connection. Another kind of connection, such as TLS, is another implementation of Stream.
 #ifndef VORN_SERVER_STREAM_H
 #define VORN_SERVER_STREAM_H
 
@@ -36,7 +36,7 @@ class Stream {
   // Ends the connection. Operations under way end with an error.
   virtual void Close() = 0;
 
-  // Whether the peer has closed its end.
+  // Returns whether the peer has closed its end.
   virtual bool PeerHasLeft() const = 0;
 };
 

@@ -194,7 +194,7 @@ Table ParseTable(const std::string& text) {
     const std::size_t tab = line.find('\t');
     const std::size_t open = line.find('(', tab);
     if (tab == std::string::npos || open == std::string::npos) continue;
-    // A line without a client and "*" admit everybody, and mountd takes the first of the two.
+    // A line without a client and "*" both admit every client; mountd uses the first of the two.
     const std::string client = Unescaped(line.substr(tab + 1, open - tab - 1));
     table[Unescaped(line.substr(0, tab))].emplace(client.empty() ? "*" : client,
                                                   ParseRow(line.substr(open + 1, line.size() - open - 2)));

@@ -437,7 +437,7 @@ TEST(IDMap, LosesNothingBetweenManyWriters) {
   EXPECT_EQ(root.Names("/etc"), std::vector<std::string>{"idmapd.conf"});
 }
 
-// The library itself takes minutes to start with so many; it is asked about fewer.
+// libnfsidmap needs minutes to load this number of mappings, so it reads a file with fewer.
 TEST(IDMap, HoldsAHundredThousandMappings) {
   const TemporaryRoot root;
   const auto principal = [](int number) { return "user" + std::to_string(number) + "@EXAMPLE"; };

@@ -306,7 +306,7 @@ const SetCase kSetCases[] = {
      1,
      R"({"enable_nfs": true, "write_size": 65536})",
      {"VORNNFSConfGet", "KLIBServiceIsEnabled nfsd", "VORNNFSConfSet", "VORNNFSUDPPrefSizeSet 8192 65536"}},
-    {"an equal write size of another JSON type is a change, of the read size none",
+    {"an equal number of another JSON type is a change of the write size, but not of the read size",
      1,
      R"({"enable_nfs": true, "read_size": 8192.0, "write_size": 16384.0})",
      {"VORNNFSConfGet", "KLIBServiceIsEnabled nfsd", "VORNNFSConfSet", "VORNNFSUDPPrefSizeSet 8192 16384"}},

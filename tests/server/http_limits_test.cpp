@@ -62,7 +62,7 @@ TEST_F(HttpTest, ABodyThatComesAtTheRequiredRateIsTaken) {
   EXPECT_EQ(client.Receive().status, 200);
 }
 
-// One client has the network thread for no longer than a piece takes.
+// One client occupies the network thread for one piece at a time.
 TEST_F(HttpTest, ABodyIsReadInPieces) {
   Start();
   Connection client = Connect();

@@ -112,7 +112,7 @@ TEST(JsonInput, AllowsItsNumberOfValuesAndNoMore) {
   EXPECT_FALSE(fault.too_large);
 }
 
-// mallinfo2(3) counts what the value takes.
+// mallinfo2(3) measures the memory of the value.
 TEST(JsonInput, BoundsTheMemoryOfTheValue) {
   const std::string texts[] = {ArrayOf(50000, "1"),
                                ArrayOf(50000, "[]"),

@@ -25,22 +25,15 @@ EXPORTFS_STOPS_AT = {"an option that does not exist", "a flavour that does not e
                      "an open quote", "a bad number", "an empty sec="}
 
 
-_PENDING = pytest.mark.pending("a faulty line above another share takes that share away at the next save")
-
-
 # The kernel server's programs and vornd complain about the faulty line itself.
 _COMPLAINTS = "^exportfs: |^vornd: |^rpc.mountd: No host name given with /srv/slip"
-
-
-def slips():
-    return [pytest.param(slip, marks=[_PENDING] if slip in EXPORTFS_STOPS_AT else []) for slip in SLIPS]
 
 
 def write_on_top(line):
     EXPORTS.write_text(line + EXPORTS.read_text(encoding="utf-8"), encoding="utf-8")
 
 
-@pytest.mark.parametrize("slip", slips())
+@pytest.mark.parametrize("slip", SLIPS)
 def test_a_save_beside_a_faulty_line_takes_nothing_from_anybody(box, client, other, slip):
     box.foresees(_COMPLAINTS)
     pathlib.Path("/srv/slip").mkdir(exist_ok=True)
@@ -56,7 +49,6 @@ def test_a_save_beside_a_faulty_line_takes_nothing_from_anybody(box, client, oth
     assert other.mounts("/srv/another"), "a save was answered with success, and the share is not served"
 
 
-@pytest.mark.pending("a save beside a faulty line is answered without a warning")
 @pytest.mark.parametrize("slip", sorted(EXPORTFS_STOPS_AT))
 def test_the_answer_and_the_log_name_the_faulty_line(box, client, slip):
     box.foresees(_COMPLAINTS)

@@ -4,8 +4,6 @@ import contextlib
 import os
 import pathlib
 
-import pytest
-
 HOSTS = pathlib.Path("/etc/hosts")
 
 
@@ -21,7 +19,6 @@ def name_server_away():
         HOSTS.write_text(before, encoding="ascii")
 
 
-@pytest.mark.pending("exportfs -r resolves every name of every rule and drops those that fail")
 def test_a_save_of_another_share_takes_nothing_from_a_client_with_a_name(box, client, other):
     box.foresees("Failed to resolve|^vornd: ")
     box.share("data")

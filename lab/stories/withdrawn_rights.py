@@ -95,7 +95,6 @@ def test_a_machine_that_leaves_a_netgroup_loses_its_right(box, client):
         wait_for(lambda: write_error(file) in REFUSED, "the machine keeps its right", limit=60)
 
 
-@pytest.mark.pending("a reload does nothing while the unit is inactive, though the kernel serves")
 def test_a_right_is_withdrawn_where_threads_run_without_the_unit(box, client):
     box.share("data")
     box.allow("data", {"client": client.address})

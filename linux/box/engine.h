@@ -19,8 +19,8 @@ class Engine {
   virtual Status Stop() = 0;   // also disables it
   virtual Status Restart() = 0;
 
-  // Applies the export rules that are stored now. A service that does not run has nothing to reload;
-  // that is a success.
+  // Applies the difference between the export rules that are in force and those that are stored now; everything else
+  // stays in force as it is. A service that does not serve has nothing to reload; that is a success.
   virtual Status Reload() = 0;
 };
 

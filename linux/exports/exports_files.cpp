@@ -49,12 +49,6 @@ Result<std::vector<SharedExportsFile>> OpenAllExports(Box& box) {
   return files;
 }
 
-ExportsVersion VersionOf(const std::vector<SharedExportsFile>& files) {
-  ExportsVersion version;
-  for (const SharedExportsFile& file : files) version.emplace_back(file->path, file->version);
-  return version;
-}
-
 std::vector<ExportsFileFault> FindExportFaults(const std::vector<SharedExportsFile>& files) {
   std::vector<ExportsFileFault> faults;
   for (const SharedExportsFile& file : files) {

@@ -37,10 +37,6 @@ Result<SharedExportsFile> OpenExportsFile(Box& box, const std::string& path);
 // others in the order of strverscmp(3). Like exportfs, it ignores other names and everything but regular files.
 Result<std::vector<SharedExportsFile>> OpenAllExports(Box& box);
 
-// Identifies one state of all files.
-using ExportsVersion = std::vector<std::pair<std::string, Version>>;
-ExportsVersion VersionOf(const std::vector<SharedExportsFile>& files);
-
 // A fault of a file, for an administrator.
 struct ExportsFileFault {
   std::string file;       // its location

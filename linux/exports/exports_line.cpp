@@ -50,6 +50,7 @@ class LineReader {
     const Found found = reader_.ReadWord(kLongestExportPath, &word_);
     if (found == Found::kNothing) return Fail("the line does not begin with a path");
     if (found == Found::kTooLong) return Fail("the path is too long, or a quotation mark has no partner");
+    if (HasOpenQuotation()) return Fail("a quotation mark has no partner");
     line_.path_end = reader_.word_end();
     line_.path = NormalExportPath(word_);
     return true;
@@ -88,13 +89,14 @@ class LineReader {
     return true;
   }
 
-  // exportfs cannot resolve a client that contains the rest of the file.
+  // Whether the word is the rest of the file, several lines of it. exportfs takes it for a path or a client.
+  bool HasOpenQuotation() const { return reader_.in_quotation() && word_.find('\n') != std::string::npos; }
+
   bool CheckWord(Found found) {
     if (found == Found::kTooLong) {
       return Fail("a client with its options is too long, or a quotation mark has no partner");
     }
-    const bool is_open = reader_.in_quotation() && word_.find('\n') != std::string::npos;
-    return !is_open || Fail("a quotation mark has no partner");
+    return !HasOpenQuotation() || Fail("a quotation mark has no partner");
   }
 
   bool Apply(ExportOptionReader* options, std::string_view list) {

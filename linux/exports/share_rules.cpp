@@ -11,12 +11,9 @@
 #include "exports_client.h"
 #include "exports_document.h"
 #include "exports_rule.h"
-#include "exports_table.h"
 
 namespace vorn {
 namespace {
-
-constexpr char kExportTable[] = "/var/lib/nfs/etab";
 
 // The rule of a client in a file of /etc/exports.d.
 struct ForeignEntry {
@@ -182,21 +179,6 @@ Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* 
   }
   if (Status status = writer.CheckForeign(); !status.ok()) return status;
   return WriteEntries(box, *files->front(), path, share, writer.entries(), RemovesAll(list));
-}
-
-Result<ExportsVersion> ReadExportsVersion(Box& box) {
-  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
-  if (!files.ok()) return files.status();
-  return VersionOf(*files);
-}
-
-Status CheckExportTable(Box& box, const ExportsVersion& reloaded) {
-  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
-  if (!files.ok()) return files.status();
-  if (VersionOf(*files) != reloaded) return {};
-  Result<StoredFile> table = box.Read(kExportTable);
-  if (!table.ok()) return table.status();
-  return CompareExportTable(*files, ExportsDocument(std::move(table->text)), BoxPaths(box.root()));
 }
 
 }  // namespace vorn

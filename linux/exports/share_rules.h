@@ -29,15 +29,6 @@ Result<std::vector<ExportRule>> ReadShareRules(Box& box, const std::string& file
 // FindExportFaults names such lines.
 Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* list);
 
-// Returns the version of the exports files, to be taken before a reload.
-Result<ExportsVersion> ReadExportsVersion(Box& box);
-
-// Compares the export table that exportfs(8) wrote (/var/lib/nfs/etab) with the exports files after a reload:
-// exportfs reports success even if it stopped half-way. Fails with kServiceFailed and a sentence that names the
-// line and what is wrong with it. Succeeds if the files are no longer in the state `reloaded`: the writer that
-// changed them reloads again.
-Status CheckExportTable(Box& box, const ExportsVersion& reloaded);
-
 }  // namespace vorn
 
 #endif  // VORN_LINUX_EXPORTS_SHARE_RULES_H

@@ -6,6 +6,7 @@
 #include <memory>
 #include <string>
 
+#include "apply_exports.h"
 #include "box.h"
 #include "engine.h"
 
@@ -16,6 +17,7 @@ struct SystemdOptions {
   std::string bus_address;  // of D-Bus; empty: the system bus
   std::string threads_file = "/proc/fs/nfsd/threads";
   std::chrono::seconds job_limit{120};  // for one job of systemd
+  ExportsEnvironment exports;
 };
 
 // Controls nfs-server.service through org.freedesktop.systemd1(5). `box` outlives the engine.

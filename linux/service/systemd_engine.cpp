@@ -11,7 +11,6 @@
 
 #include "configured_ports.h"
 #include "engines.h"
-#include "share_rules.h"
 
 namespace vorn {
 namespace {
@@ -213,13 +212,7 @@ class SystemdEngine : public Engine {
     return With([this](Manager& manager) { return BringUp(manager, "RestartUnit"); });
   }
 
-  Status Reload() override {
-    if (!HasThreads()) return {};
-    const Result<ExportsVersion> reloaded = ReadExportsVersion(box_);
-    if (!reloaded.ok()) return reloaded.status();
-    const Status status = With([](Manager& manager) { return manager.RunJob("ReloadUnit", kUnit); });
-    return status.ok() ? CheckExportTable(box_, *reloaded) : status;
-  }
+  Status Reload() override { return HasThreads() ? ApplyExports(box_, options_.exports) : Status(); }
 
  private:
   using Folders = std::vector<std::shared_ptr<const StoredFolder>>;
@@ -260,7 +253,9 @@ class SystemdEngine : public Engine {
     }
     if (Status status = RestartStatusDaemon(manager); !status.ok()) return WithPorts(status);
     if (Status status = manager.RunJob(method, kUnit); !status.ok()) return WithPorts(status);
-    return HasThreads() ? Status() : WithPorts(Failed(kUnit, "it started, but the kernel's server has no threads"));
+    if (!HasThreads()) return WithPorts(Failed(kUnit, "it started, but the kernel's server has no threads"));
+    // exportfs(8), which the unit runs, ignores what follows a faulty line, and hosts that it cannot resolve.
+    return ApplyExports(box_, options_.exports);
   }
 
   // Only a restart of rpc.statd(8) applies new ports of the status daemon and the lock manager. A daemon that does

@@ -376,12 +376,6 @@ TEST_F(Exports, HaveFaultsThatNameFileLineAndColumn) {
   EXPECT_EQ(faults[2].file, root.At("/etc/exports.d/a.exports"));
 }
 
-// Checks the table as after a reload of the present files.
-vorn::Status CheckTable() {
-  const auto reloaded = vorn::ReadExportsVersion(vorn::CurrentBox());
-  return reloaded.ok() ? vorn::CheckExportTable(vorn::CurrentBox(), *reloaded) : reloaded.status();
-}
-
 TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   const vorn::ExportfsJudge judge;
   if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
@@ -394,38 +388,9 @@ TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   const auto verdict = judge.Judge({File()}).front();
   EXPECT_EQ(verdict.status, 0);
   EXPECT_EQ(verdict.messages, "");
-  root.Write("/var/lib/nfs/etab", verdict.table);
-  EXPECT_TRUE(CheckTable().ok());
   EXPECT_THAT(verdict.table, HasSubstr("10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,all_squash,"));
   EXPECT_THAT(verdict.table, HasSubstr("anonuid=1024,anongid=100"));
   EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,secure,no_root_squash"));
-}
-
-TEST_F(Exports, AreComparedWithTheExportTable) {
-  root.Write(kFile, "/volume1/data *(rw)\n/volume1/link *(ro)\n");
-  root.Write("/volume1/data/file", "");
-  ASSERT_EQ(symlink("/volume1/data/..", root.At("/volume1/link").c_str()), 0);
-  root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n/volume1\t*(ro)\n");
-  EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
-  root.Write("/var/lib/nfs/etab", "/volume1/data\t*(rw)\n");
-  EXPECT_THAT(CheckTable().reason(), HasSubstr("/etc/exports:2:1: /volume1/link"));
-}
-
-TEST_F(Exports, AreNotComparedWithATableThatIsOlderThanTheirNextSave) {
-  root.Write(kFile, "/volume1/data *(rw)\n");
-  root.Write("/var/lib/nfs/etab", "");
-  const auto reloaded = vorn::ReadExportsVersion(vorn::CurrentBox());
-  ASSERT_TRUE(reloaded.ok());
-  EXPECT_FALSE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
-  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", MakeList({"10.0.0.1"}).get()), 0);
-  EXPECT_TRUE(vorn::CheckExportTable(vorn::CurrentBox(), *reloaded).ok());
-}
-
-TEST_F(ForeignExports, AreComparedWithTheExportTable) {
-  root.Write("/var/lib/nfs/etab", "/volume1/data\town(ro)\n/volume1/data\tzebra(ro)\n/volume1/zfs\t*(rw)\n");
-  EXPECT_TRUE(CheckTable().ok()) << CheckTable().reason();
-  root.Write("/var/lib/nfs/etab", "/volume1/data\town(ro)\n/volume1/data\tzebra(ro)\n");
-  EXPECT_THAT(CheckTable().reason(), HasSubstr("/etc/exports.d/b.exports:3:1: /volume1/zfs"));
 }
 
 TEST(VORNNFSRuleExtFree, TakesNull) { VORNNFSRuleExtFree(nullptr); }

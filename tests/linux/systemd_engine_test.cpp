@@ -13,7 +13,14 @@ using vorn::Status;
 
 class SystemdEngine : public testing::Test {
  protected:
-  SystemdEngine() { SetThreads("8\n"); }
+  SystemdEngine() {
+    SetThreads("8\n");
+    for (const char* cache : {"auth.unix.ip", "nfsd.export", "nfsd.fh"}) {
+      for (const char* file : {"content", "channel", "flush"}) {
+        folder_.Write(std::string("/caches/") + cache + "/" + file, "");
+      }
+    }
+  }
 
   void SetThreads(const char* text) { folder_.Write("/threads", text); }
 
@@ -22,6 +29,7 @@ class SystemdEngine : public testing::Test {
     options.bus_address = manager_.address();
     options.threads_file = folder_.At("/threads");
     options.job_limit = std::chrono::seconds(limit_);
+    options.exports.kernel_caches = folder_.At("/caches");
     return vorn::MakeSystemdEngine(vorn::CurrentBox(), options);
   }
 
@@ -37,11 +45,6 @@ const std::vector<std::string> kBringUp = {"Reload",
                                            "ResetFailedUnit nfs-server.service",
                                            "Subscribe",
                                            "TryRestartUnit rpc-statd.service replace"};
-
-// An export table in the format of exportfs(8).
-constexpr char kTable[] =
-    "/volume1/data\t10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,no_all_squash,no_subtree_check,"
-    "secure_locks,acl,no_pnfs,anonuid=65534,anongid=65534,sec=sys,rw,secure,root_squash,no_all_squash)\n";
 
 std::vector<std::string> Joined(std::vector<std::string> a, const std::vector<std::string>& b) {
   a.insert(a.end(), b.begin(), b.end());
@@ -118,20 +121,18 @@ TEST_F(SystemdEngine, FailsWithoutTheServersUnit) {
   EXPECT_THAT(Engine()->Restart().reason(), HasSubstr("RestartUnit nfs-server.service is refused"));
 }
 
-TEST_F(SystemdEngine, ReloadsAndFindsTheTableThatTheFileAsksFor) {
-  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n");
-  folder_.Write("/var/lib/nfs/etab", kTable);
+TEST_F(SystemdEngine, AppliesTheRulesWithoutTheUnit) {
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw)\n");
   const Status status = Engine()->Reload();
   EXPECT_TRUE(status.ok()) << status.reason();
-  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "ReloadUnit nfs-server.service replace"));
+  EXPECT_THAT(*folder_.Read("/var/lib/nfs/etab"), HasSubstr("/volume1/data\t10.0.0.1(rw,"));
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre());
 }
 
-TEST_F(SystemdEngine, NamesTheLineThatAReloadDidNotTake) {
-  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw,sync,no_subtree_check)\n\n/volume1/media 10.0.0.2(ro)\n");
-  folder_.Write("/var/lib/nfs/etab", kTable);
-  const Status status = Engine()->Reload();
-  EXPECT_EQ(status.code(), vorn::kServiceFailed);
-  EXPECT_THAT(status.reason(), HasSubstr("/etc/exports:3:1: /volume1/media"));
+TEST_F(SystemdEngine, AppliesWhatExportfsIgnoredAfterAStart) {
+  folder_.Write("/etc/exports", "/slip *(foo)\n/volume1/data 10.0.0.1(rw)\n");
+  EXPECT_TRUE(Engine()->Start().ok());
+  EXPECT_THAT(*folder_.Read("/var/lib/nfs/etab"), HasSubstr("/volume1/data\t10.0.0.1(rw,"));
 }
 
 TEST_F(SystemdEngine, HasNothingToReloadWhileTheKernelServerIsOff) {

@@ -1,0 +1,82 @@
+#include "apply_exports.h"
+
+#include <fstream>
+#include <iterator>
+#include <set>
+#include <utility>
+#include <vector>
+
+#include "box_paths.h"
+#include "export_table_file.h"
+#include "export_table_update.h"
+#include "exports_files.h"
+#include "notice.h"
+
+namespace vorn {
+namespace {
+
+using Files = std::vector<SharedExportsFile>;
+
+std::string ReadCache(const std::string& path) {
+  std::ifstream content(path);
+  return {std::istreambuf_iterator<char>(content), std::istreambuf_iterator<char>()};
+}
+
+// Brings the table up to the state of the files. Returns the difference.
+Result<ExportTableUpdate> UpdateTable(Box& box, const ExportsEnvironment& environment, const Files& files,
+                                      const HostAddresses& hosts, const std::set<std::string>& resolved) {
+  Result<ExportTableFile> table = ExportTableFile::Open(box);
+  if (!table.ok()) return table.status();
+  Result<ExportTableUpdate> update = PlanExportTable(files, table->text(), BoxPaths(box.root()), hosts, resolved);
+  if (!update.ok() || update->changed.empty()) return update;
+  if (Status status = table->Replace(update->text); !status.ok()) return status;
+  if (Status status = ForgetExports(environment.kernel_caches, *update); !status.ok()) return status;
+  return update;
+}
+
+void NameFaults(const Files& files) {
+  for (const SharedExportsFile& file : files) {
+    for (const ExportsFileFault& fault : FindExportFaults({file})) {
+      NoticeOnce(file->location, file->version,
+                 fault.sentence + "; this line must be mended: until then its exports stay as they are");
+    }
+  }
+}
+
+void NameUnknownHosts(const Files& files, const std::set<std::string>& names) {
+  for (const std::string& name : names) {
+    NoticeOnce(files.front()->location, files.front()->version,
+               "the host \"" + name + "\" of an export rule has no address now; the rule is not applied to it");
+  }
+}
+
+// Forgets the addresses of names that no rule has any more.
+void Prune(const std::set<std::string>& names, HostAddresses* hosts) {
+  for (auto host = hosts->begin(); host != hosts->end();) {
+    host = names.count(host->first) == 0 ? hosts->erase(host) : std::next(host);
+  }
+}
+
+}  // namespace
+
+Status ApplyExports(Box& box, const ExportsEnvironment& environment) {
+  const Result<Files> files = OpenAllExports(box);
+  if (!files.ok()) return files.status();
+  NameFaults(*files);
+  Result<HostAddresses> hosts = ReadExportHosts(box);
+  if (!hosts.ok()) return hosts.status();
+  AddServedHosts(ReadCache(environment.kernel_caches + "/auth.unix.ip/content"), &*hosts);
+  // Rules whose addresses are known are applied before the resolver is asked for others, which may take long.
+  Result<ExportTableUpdate> update = UpdateTable(box, environment, *files, *hosts, {});
+  if (!update.ok()) return update.status();
+  if (!update->unresolved.empty()) {
+    const std::set<std::string> resolved = ResolveExportHosts(update->unresolved, environment.resolve, &*hosts);
+    if (!resolved.empty()) update = UpdateTable(box, environment, *files, *hosts, resolved);
+    if (!update.ok()) return update.status();
+    NameUnknownHosts(*files, update->unresolved);
+  }
+  Prune(update->names, &*hosts);
+  return StoreExportHosts(box, *hosts);
+}
+
+}  // namespace vorn

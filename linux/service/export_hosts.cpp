@@ -1,0 +1,102 @@
+#include "export_hosts.h"
+
+#include <netdb.h>
+
+#include <algorithm>
+#include <array>
+#include <memory>
+#include <sstream>
+#include <utility>
+
+#include "configuration_lock.h"
+#include "exports_client.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kHostsFile[] = "/var/lib/vorn/export-hosts";
+
+struct FreeAddresses {
+  void operator()(addrinfo* list) const { freeaddrinfo(list); }
+};
+
+}  // namespace
+
+std::optional<std::vector<std::string>> ResolveHost(const std::string& name) {
+  addrinfo hints{};
+  hints.ai_socktype = SOCK_DGRAM;  // each address once
+  addrinfo* found = nullptr;
+  const int error = getaddrinfo(name.c_str(), nullptr, &hints, &found);
+  const std::unique_ptr<addrinfo, FreeAddresses> owner(found);
+  if (error == EAI_AGAIN || error == EAI_SYSTEM || error == EAI_FAIL) return std::nullopt;
+  std::vector<std::string> addresses;
+  for (const addrinfo* entry = found; error == 0 && entry != nullptr; entry = entry->ai_next) {
+    std::array<char, NI_MAXHOST> text{};
+    if (getnameinfo(entry->ai_addr, entry->ai_addrlen, text.data(), text.size(), nullptr, 0, NI_NUMERICHOST) == 0) {
+      addresses.emplace_back(text.data());
+    }
+  }
+  std::sort(addresses.begin(), addresses.end());
+  return addresses;
+}
+
+Result<HostAddresses> ReadExportHosts(Box& box) {
+  const Result<StoredFile> file = box.Read(kHostsFile);
+  if (!file.ok()) return file.status();
+  HostAddresses hosts;
+  std::istringstream lines(file->text);
+  for (std::string line; std::getline(lines, line);) {
+    std::istringstream words(line);
+    std::string name;
+    words >> name;
+    for (std::string address; words >> address;) hosts[name].push_back(address);
+  }
+  return hosts;
+}
+
+Status StoreExportHosts(Box& box, const HostAddresses& hosts) {
+  std::string text;
+  for (const auto& [name, addresses] : hosts) {
+    text += name;
+    for (const std::string& address : addresses) text += " " + address;
+    text += "\n";
+  }
+  const ConfigurationLock lock(box);
+  if (!lock.status().ok()) return lock.status();
+  const Result<StoredFile> before = box.Read(kHostsFile);
+  if (!before.ok()) return before.status();
+  return before->text == text ? Status() : box.Replace(kHostsFile, text, before->version);
+}
+
+void AddServedHosts(const std::string& cache_content, HostAddresses* hosts) {
+  HostAddresses served;
+  std::istringstream lines(cache_content);
+  for (std::string line; std::getline(lines, line);) {
+    std::istringstream words(line);
+    std::string kind;
+    std::string address;
+    std::string clients;
+    words >> kind >> address >> clients;
+    if (kind != "nfsd") continue;  // a comment, or an address without any right
+    std::istringstream names(clients);
+    for (std::string name; std::getline(names, name, ',');) {
+      if (IsExportHostName(name)) served[ExportClientKey(name)].push_back(address);
+    }
+  }
+  hosts->merge(served);
+}
+
+std::set<std::string> ResolveExportHosts(const std::set<std::string>& names, const HostResolver& resolve,
+                                         HostAddresses* hosts) {
+  std::set<std::string> resolved;
+  for (const std::string& name : names) {
+    std::optional<std::vector<std::string>> addresses = resolve(name);
+    if (!addresses) break;
+    if (addresses->empty()) continue;
+    (*hosts)[name] = std::move(*addresses);
+    resolved.insert(name);
+  }
+  return resolved;
+}
+
+}  // namespace vorn

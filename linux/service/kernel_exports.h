@@ -1,0 +1,31 @@
+// What the kernel's server remembers of the export table: the caches of sunrpc, in files below /proc/net/rpc.
+#ifndef VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
+#define VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
+
+#include <string>
+
+#include "export_table_update.h"
+#include "status.h"
+
+namespace vorn {
+
+constexpr char kKernelCaches[] = "/proc/net/rpc";
+
+// Makes the kernel's server forget the entries that the update concerns, so that it asks rpc.mountd(8) at the next
+// request: rights in the changed directories, in those below and above them, and, if a client is new in the table or
+// has left it, to which clients an address belongs. All other entries stay, so other requests are served without
+// rpc.mountd, which reads the whole table again first.
+//
+// An entry expires when it is written to the cache's `channel` with a time that has passed. All of a cache is flushed
+// if that fails. The cache of rights is also flushed if a file system has lost its last export: an expired entry keeps
+// a reference to its directory, and the file system could not be unmounted.
+//
+// `folder` is that of the caches (kKernelCaches).
+Status ForgetExports(const std::string& folder, const ExportTableUpdate& update);
+
+// Makes the kernel's server ask rpc.mountd again to which clients an address belongs.
+Status ForgetClients(const std::string& folder);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_SERVICE_KERNEL_EXPORTS_H

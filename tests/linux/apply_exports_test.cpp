@@ -1,0 +1,142 @@
+#include "apply_exports.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "call.h"
+#include "current_box.h"
+#include "temporary_root.h"
+
+namespace vorn {
+namespace {
+
+using testing::AllOf;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::Not;
+
+constexpr char kTable[] = "/var/lib/nfs/etab";
+constexpr char kCaches[] = "/proc/net/rpc";
+
+class ApplyExportsTest : public testing::Test {
+ protected:
+  ApplyExportsTest() {
+    for (const char* cache : {"auth.unix.ip", "nfsd.export", "nfsd.fh"}) {
+      for (const char* file : {"content", "channel", "flush"}) {
+        root_.Write(std::string(kCaches) + "/" + cache + "/" + file, "");
+      }
+    }
+  }
+
+  Status Apply() {
+    return ApplyExports(CurrentBox(), {root_.At(kCaches), [this](const std::string& name) {
+                                         asked_.push_back(name);
+                                         return addresses_;
+                                       }});
+  }
+
+  std::string Table() const { return root_.Read(kTable).value_or(""); }
+
+  TemporaryRoot root_;
+  VORN::CallContext call_{{}};
+  std::optional<std::vector<std::string>> addresses_ = std::vector<std::string>{"10.0.0.7"};
+  std::vector<std::string> asked_;
+};
+
+TEST_F(ApplyExportsTest, WritesTheTable) {
+  root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
+  const Status status = Apply();
+  EXPECT_TRUE(status.ok()) << status.reason();
+  EXPECT_THAT(Table(), HasSubstr("/a\t10.0.0.1(rw,"));
+  EXPECT_THAT(root_.Names("/var/lib/nfs"), ElementsAre(".etab.lock", "etab", "export-lock"));
+}
+
+TEST_F(ApplyExportsTest, LeavesATableAloneThatIsAsItShouldBe) {
+  root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
+  root_.Write(kTable, "/a\t10.0.0.1(rw)\n");
+  root_.Write("/proc/net/rpc/nfsd.export/content", "/a\t10.0.0.1(rw)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_EQ(Table(), "/a\t10.0.0.1(rw)\n");
+  EXPECT_EQ(root_.Read("/proc/net/rpc/nfsd.export/channel"), "");
+}
+
+TEST_F(ApplyExportsTest, HasTheKernelForgetWhatChanged) {
+  root_.Write("/etc/exports", "/a 10.0.0.1(ro)\n");
+  root_.Write(kTable, "/a\t10.0.0.1(rw)\n");
+  root_.Write("/proc/net/rpc/nfsd.export/content", "/a\t10.0.0.1(rw)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(*root_.Read("/proc/net/rpc/nfsd.export/channel"), HasSubstr("10.0.0.1 /a "));
+}
+
+TEST_F(ApplyExportsTest, WarnsOfEachFaultyLine) {
+  root_.Write("/etc/exports", "/slip *(foo)\n/a 10.0.0.1(rw)\n");
+  root_.Write(kTable, "/slip\t*(ro)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(Table(), AllOf(HasSubstr("/slip\t*(ro)\n"), HasSubstr("/a\t10.0.0.1(rw,")));
+  EXPECT_THAT(call_.warnings(), ElementsAre(AllOf(HasSubstr("/etc/exports:1:"), HasSubstr("must be mended"))));
+}
+
+TEST_F(ApplyExportsTest, ResolvesANewNameAndRemembersIt) {
+  root_.Write("/etc/exports", "/a host(rw)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(Table(), HasSubstr("/a\t10.0.0.7(rw,"));
+  EXPECT_EQ(root_.Read("/var/lib/vorn/export-hosts"), "host 10.0.0.7\n");
+  addresses_ = std::nullopt;
+  root_.Write("/etc/exports", "/a host(rw)\n/b 10.0.0.1(rw)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(asked_, ElementsAre("host"));
+  EXPECT_THAT(Table(), AllOf(HasSubstr("/a\t10.0.0.7(rw,"), HasSubstr("/b\t10.0.0.1(rw,")));
+  EXPECT_THAT(call_.warnings(), IsEmpty());
+}
+
+TEST_F(ApplyExportsTest, AppliesTheOtherRulesBeforeItAsksForANameThatMayTakeLong) {
+  root_.Write("/etc/exports", "/a host(rw)\n/b 10.0.0.1(rw)\n");
+  std::string table;
+  const Status status = ApplyExports(
+      CurrentBox(), {root_.At(kCaches), [&](const std::string&) -> std::optional<std::vector<std::string>> {
+                       table = Table();
+                       return std::nullopt;
+                     }});
+  EXPECT_TRUE(status.ok());
+  EXPECT_THAT(table, HasSubstr("/b\t10.0.0.1(rw,"));
+  EXPECT_THAT(call_.warnings(), ElementsAre(HasSubstr("\"host\"")));
+}
+
+TEST_F(ApplyExportsTest, AsksAResolverThatDoesNotAnswerOnce) {
+  root_.Write("/etc/exports", "/a host(rw) guest(rw) third(rw)\n");
+  addresses_ = std::nullopt;
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_EQ(asked_.size(), 1U);
+}
+
+TEST_F(ApplyExportsTest, KnowsAHostThatTheKernelServesByItsName) {
+  root_.Write("/etc/exports", "/a host.example(rw)\n/b 10.0.0.1(rw)\n");
+  root_.Write(kTable, "/a\thost.example(rw)\n");
+  root_.Write("/proc/net/rpc/auth.unix.ip/content", "#class IP domain\nnfsd 10.0.0.9 *,host.example\n");
+  addresses_ = std::nullopt;
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(Table(), AllOf(HasSubstr("/a\t10.0.0.9(rw,"), Not(HasSubstr("host.example"))));
+}
+
+TEST_F(ApplyExportsTest, ForgetsANameThatNoRuleHasAnyMore) {
+  root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
+  root_.Write("/var/lib/vorn/export-hosts", "host 10.0.0.7\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_EQ(root_.Read("/var/lib/vorn/export-hosts"), "");
+}
+
+TEST_F(ApplyExportsTest, RefusesATableThatItDoesNotUnderstand) {
+  root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
+  root_.Write(kTable, "nonsense\n");
+  EXPECT_EQ(Apply().code(), kSyntax);
+  EXPECT_EQ(Table(), "nonsense\n");
+}
+
+}  // namespace
+}  // namespace vorn

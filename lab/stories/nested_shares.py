@@ -60,6 +60,7 @@ def test_a_rule_of_an_inner_share_opens_nothing_of_the_outer_one(box, client, ot
 @pytest.fixture
 def inner_volume(box):
     """A share on a file system of its own, mounted below the share "outer"."""
+    box.foresees("the option crossmnt")
     inner = nested(box, "volume")
     run("modprobe", "loop")
     run("mkfs.ext4", "-q", "-F", "/tmp/nested", "4M")
@@ -82,7 +83,6 @@ def test_an_inner_volume_stays_closed_to_clients_of_the_outer_share_without_cros
         assert (volume / "file").exists()
 
 
-@pytest.mark.pending("nothing warns that crossmnt opens an inner volume whose own rule names another machine")
 def test_a_save_warns_of_an_inner_volume_that_crossmnt_opens(box, client, other, inner_volume):
     box.allow("volume", {"client": other.address})
     answer = api.answer("NFS.SharePrivilege", "save", share_name="outer",

@@ -22,6 +22,9 @@ class Engine {
   // Applies the difference between the export rules that are in force and those that are stored now; everything else
   // stays in force as it is. A service that does not serve has nothing to reload; that is a success.
   virtual Status Reload() = 0;
+
+  // Applies what the name services say now of the hosts and netgroups in the export rules.
+  virtual Status RefreshNames() = 0;
 };
 
 }  // namespace vorn

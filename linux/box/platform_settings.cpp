@@ -50,8 +50,9 @@ Result<PlatformSettings> PlatformSettings::Load(Box& box) {
   if (Status s = ReadWord(file, "service_engine", engines, &settings.engine); !s.ok()) return s;
   const Word<Kerberos> kerberos[] = {{"auto", Kerberos::kAuto}, {"yes", Kerberos::kYes}, {"no", Kerberos::kNo}};
   if (Status s = ReadWord(file, "kerberos", kerberos, &settings.kerberos); !s.ok()) return s;
-  const Word<bool> firewall[] = {{"yes", true}, {"no", false}};
-  if (Status s = ReadWord(file, "firewall", firewall, &settings.firewall); !s.ok()) return s;
+  const Word<bool> switches[] = {{"yes", true}, {"no", false}};
+  if (Status s = ReadWord(file, "firewall", switches, &settings.firewall); !s.ok()) return s;
+  if (Status s = ReadWord(file, "withdraw_left_shares", switches, &settings.withdraw_left_shares); !s.ok()) return s;
   settings.admin_account = file.document().Get(kSection, "admin_account").value_or(settings.admin_account);
   settings.guest_account = file.document().Get(kSection, "guest_account").value_or(settings.guest_account);
   return settings;

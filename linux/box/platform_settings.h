@@ -15,6 +15,8 @@ namespace vorn {
 // admin_account = NAME                        the account of the squash modes; default "admin"
 // guest_account = NAME                        default "nobody"
 // firewall = yes | no                         default: yes if the root is "/"
+// withdraw_left_shares = yes | no             default no; yes: a directory that is no share any more loses its export
+//                                             rules at the next save or start, instead of only being named in the log
 struct PlatformSettings {
   enum class Kerberos { kAuto, kYes, kNo };
   enum class EngineKind { kSystemd, kLocal };
@@ -24,6 +26,7 @@ struct PlatformSettings {
   std::string admin_account = "admin";
   std::string guest_account = "nobody";
   bool firewall = false;
+  bool withdraw_left_shares = false;
 
   // Reads the settings of the box. A value that is not in the list above is a failure that names it.
   static Result<PlatformSettings> Load(Box& box);

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "exports_client.h"
+#include "path_resolver.h"
 
 namespace vorn {
 namespace {
@@ -149,28 +150,6 @@ Result<TableText> ReadTable(std::string_view text, OptionLists* options) {
   }
   return table;
 }
-
-// Resolves the paths of many lines, most of which are in few folders.
-class PathResolver {
- public:
-  explicit PathResolver(const ExportPaths& paths) : paths_(paths) {}
-
-  std::string Resolve(const std::string& path) {
-    const std::size_t slash = path.rfind('/');
-    if (slash == std::string::npos || slash + 1 == path.size()) return paths_.Resolve(path);
-    const std::string parent = slash == 0 ? "/" : path.substr(0, slash);
-    auto known = folders_.find(parent);
-    if (known == folders_.end()) known = folders_.emplace(parent, paths_.FolderAt(parent)).first;
-    const ExportPaths::Folder& folder = known->second;
-    const std::string name = path.substr(slash + 1);
-    if (name == ".." || (folder.links != nullptr && folder.links->count(name) != 0)) return paths_.Resolve(path);
-    return (folder.path == "/" ? "" : folder.path) + "/" + name;
-  }
-
- private:
-  const ExportPaths& paths_;
-  std::unordered_map<std::string, ExportPaths::Folder> folders_;
-};
 
 // What the files say of one directory.
 struct Rules {

@@ -8,9 +8,11 @@
 
 #include "box_paths.h"
 #include "configuration_lock.h"
+#include "crossed_volumes.h"
 #include "exports_client.h"
 #include "exports_document.h"
 #include "exports_rule.h"
+#include "notice.h"
 
 namespace vorn {
 namespace {
@@ -178,7 +180,11 @@ Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* 
     if (Status status = writer.Add(*rule); !status.ok()) return status;
   }
   if (Status status = writer.CheckForeign(); !status.ok()) return status;
-  return WriteEntries(box, *files->front(), path, share, writer.entries(), RemovesAll(list));
+  const std::vector<ExportEntry>& entries = writer.entries();
+  const Status status = WriteEntries(box, *files->front(), path, share, entries, RemovesAll(list));
+  if (!status.ok()) return status;
+  for (const std::string& sentence : DescribeCrossedVolumes(box, *files, path, entries)) Notice(sentence);
+  return {};
 }
 
 }  // namespace vorn

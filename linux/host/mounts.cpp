@@ -94,4 +94,20 @@ Result<bool> HasUnexportableMount(Box& box, const std::string& path) {
   return own != nullptr && IsUnexportable(own, box.root().is_box());
 }
 
+Result<std::vector<std::string>> MountsBelow(Box& box, const std::string& path) {
+  const auto table = ReadMounts(box.root());
+  if (!table.ok()) return table.status();
+  std::vector<std::string> mounts;
+  if (!*table) return mounts;
+  const Iterator iterator(mnt_new_iter(MNT_ITER_FORWARD));
+  if (!iterator) return Status::System(ENOMEM, "mount table");
+  libmnt_fs* entry = nullptr;
+  while (mnt_table_next_fs(table->get(), iterator.get(), &entry) == 0) {
+    const char* target = mnt_fs_get_target(entry);
+    if (target != nullptr && target != path && IsBelow(target, path)) mounts.emplace_back(target);
+  }
+  std::sort(mounts.begin(), mounts.end());
+  return mounts;
+}
+
 }  // namespace vorn

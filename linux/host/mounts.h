@@ -3,6 +3,7 @@
 #define VORN_LINUX_HOST_MOUNTS_H
 
 #include <string>
+#include <vector>
 
 #include "box.h"
 #include "status.h"
@@ -12,6 +13,10 @@ namespace vorn {
 // Whether the file system of `path`, or that of a mount below it, is one that the kernel's NFS server cannot export: a
 // network file system, FUSE, one of the kernel's own, or one without file handles (exportfs support).
 Result<bool> HasUnexportableMount(Box& box, const std::string& path);
+
+// Returns the directories below `path` at which a file system is mounted, sorted. Empty for a trial root without a
+// mount table.
+Result<std::vector<std::string>> MountsBelow(Box& box, const std::string& path);
 
 }  // namespace vorn
 

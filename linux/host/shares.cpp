@@ -1,6 +1,7 @@
 #include "shares.h"
 
 #include <cerrno>
+#include <utility>
 
 #include "ini_file.h"
 
@@ -26,6 +27,15 @@ Result<std::string> FindSharePath(Box& box, const std::string& name) {
     if (share.key == name) return CanonicalPath(box.root(), **file, share);
   }
   return Status::Failure(ENOENT, "there is no shared folder \"" + name + "\"");
+}
+
+Result<std::vector<std::string>> ListSharePaths(Box& box) {
+  const Result<SharedIniFile> file = IniFile::Open(box, kFile);
+  if (!file.ok()) return file.status();
+  if (!(*file)->exists()) return Status::System(ENOENT, (*file)->location());
+  std::vector<std::string> paths;
+  for (IniEntry& share : (*file)->document().Entries(kSection)) paths.push_back(std::move(share.value));
+  return paths;
 }
 
 }  // namespace vorn

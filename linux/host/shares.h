@@ -3,6 +3,7 @@
 #define VORN_LINUX_HOST_SHARES_H
 
 #include <string>
+#include <vector>
 
 #include "box.h"
 #include "status.h"
@@ -12,6 +13,9 @@ namespace vorn {
 // The path of the share with this exact name: absolute, without links and dots, as exportfs(8) resolves it.
 // Fails with ENOENT if there is no such share.
 Result<std::string> FindSharePath(Box& box, const std::string& name);
+
+// Returns the paths of all shares as the file has them. Fails with ENOENT if there is no such file.
+Result<std::vector<std::string>> ListSharePaths(Box& box);
 
 }  // namespace vorn
 

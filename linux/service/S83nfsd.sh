@@ -5,6 +5,7 @@
 # S83nfsd.sh groups: waits where a service that has just stopped asking for groups must not begin yet.
 # S83nfsd.sh lockports: has the lock manager forget fixed ports that are no longer configured.
 # The service's unit calls these three before each start.
+# S83nfsd.sh forgetrights: has the kernel forget the rights that a save of export rules has changed.
 # On a trial root (VORN_ROOT) it only says what it would do.
 set -u
 
@@ -12,7 +13,7 @@ root=${VORN_ROOT:-/}
 root=${root%/}
 
 say() {
-	echo "S83nfsd: $*"
+	printf '%s\n' "S83nfsd: $*"
 }
 
 run() {
@@ -29,7 +30,7 @@ tell() {
 		say "would write $2 to $1"
 		return 0
 	fi
-	[ ! -e "$1" ] || echo "$2" >"$1"
+	[ ! -e "$1" ] || printf '%s\n' "$2" >"$1"
 }
 
 is_active() {
@@ -111,6 +112,18 @@ settle_groups() {
 	[ -n "$root" ] || : >"$mark"
 }
 
+# The platform library writes the entries, one per line. They concern directories in the mount namespace of
+# rpc.mountd(8), which vornd.service does not share.
+forget_rights() {
+	expired=$root/run/vorn/expired-rights
+	[ -e "$expired" ] || return 0
+	status=0
+	while IFS= read -r entry; do
+		tell /proc/net/rpc/nfsd.export/channel "$entry" || status=1
+	done <"$expired"
+	return "$status"
+}
+
 case "${1-}" in
 reloadidmap)
 	reload_idmap
@@ -124,8 +137,11 @@ groups)
 lockports)
 	lock_ports
 	;;
+forgetrights)
+	forget_rights
+	;;
 *)
-	echo "usage: $0 reloadidmap | transfersizes | groups | lockports" >&2
+	echo "usage: $0 reloadidmap | transfersizes | groups | lockports | forgetrights" >&2
 	exit 2
 	;;
 esac

@@ -10,6 +10,7 @@
 #include "export_table_file.h"
 #include "export_table_update.h"
 #include "exports_files.h"
+#include "left_shares.h"
 #include "notice.h"
 
 namespace vorn {
@@ -30,7 +31,8 @@ Result<ExportTableUpdate> UpdateTable(Box& box, const ExportsEnvironment& enviro
   Result<ExportTableUpdate> update = PlanExportTable(files, table->text(), BoxPaths(box.root()), hosts, resolved);
   if (!update.ok() || update->changed.empty()) return update;
   if (Status status = table->Replace(update->text); !status.ok()) return status;
-  if (Status status = ForgetExports(environment.kernel_caches, *update); !status.ok()) return status;
+  if (Status status = ForgetExports(environment.kernel_caches, *update, environment.write_rights); !status.ok())
+    return status;
   return update;
 }
 
@@ -59,7 +61,8 @@ void Prune(const std::set<std::string>& names, HostAddresses* hosts) {
 
 }  // namespace
 
-Status ApplyExports(Box& box, const ExportsEnvironment& environment) {
+Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::set<std::string>& resolved) {
+  if (Status status = CheckLeftShares(box); !status.ok()) return status;
   const Result<Files> files = OpenAllExports(box);
   if (!files.ok()) return files.status();
   NameFaults(*files);
@@ -67,11 +70,11 @@ Status ApplyExports(Box& box, const ExportsEnvironment& environment) {
   if (!hosts.ok()) return hosts.status();
   AddServedHosts(ReadCache(environment.kernel_caches + "/auth.unix.ip/content"), &*hosts);
   // Rules whose addresses are known are applied before the resolver is asked for others, which may take long.
-  Result<ExportTableUpdate> update = UpdateTable(box, environment, *files, *hosts, {});
+  Result<ExportTableUpdate> update = UpdateTable(box, environment, *files, *hosts, resolved);
   if (!update.ok()) return update.status();
   if (!update->unresolved.empty()) {
-    const std::set<std::string> resolved = ResolveExportHosts(update->unresolved, environment.resolve, &*hosts);
-    if (!resolved.empty()) update = UpdateTable(box, environment, *files, *hosts, resolved);
+    const std::set<std::string> found = ResolveExportHosts(update->unresolved, environment.resolve, &*hosts);
+    if (!found.empty()) update = UpdateTable(box, environment, *files, *hosts, found);
     if (!update.ok()) return update.status();
     NameUnknownHosts(*files, update->unresolved);
   }

@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_SERVICE_APPLY_EXPORTS_H
 #define VORN_LINUX_SERVICE_APPLY_EXPORTS_H
 
+#include <set>
 #include <string>
 
 #include "box.h"
@@ -14,6 +15,7 @@ namespace vorn {
 struct ExportsEnvironment {
   std::string kernel_caches = kKernelCaches;
   HostResolver resolve = ResolveHost;
+  RightsWriter write_rights;
 };
 
 // Writes the difference between the exports files and the table of what is exported into that table, under the locks
@@ -22,8 +24,10 @@ struct ExportsEnvironment {
 // What is served stays served, whatever the files have elsewhere: a faulty line changes nothing, and a host that the
 // resolver does not know, or a resolver that does not answer, takes nothing from a rule that is in force. The log and
 // the warnings of the call name each faulty line and each host without an address, and each exported directory that
-// is no share.
-Status ApplyExports(Box& box, const ExportsEnvironment& environment);
+// is no share any more (CheckLeftShares).
+//
+// `resolved` are the keys of host names whose remembered addresses are new.
+Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::set<std::string>& resolved = {});
 
 }  // namespace vorn
 

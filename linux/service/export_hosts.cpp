@@ -8,8 +8,8 @@
 #include <sstream>
 #include <utility>
 
-#include "configuration_lock.h"
 #include "exports_client.h"
+#include "state_file.h"
 
 namespace vorn {
 namespace {
@@ -61,11 +61,7 @@ Status StoreExportHosts(Box& box, const HostAddresses& hosts) {
     for (const std::string& address : addresses) text += " " + address;
     text += "\n";
   }
-  const ConfigurationLock lock(box);
-  if (!lock.status().ok()) return lock.status();
-  const Result<StoredFile> before = box.Read(kHostsFile);
-  if (!before.ok()) return before.status();
-  return before->text == text ? Status() : box.Replace(kHostsFile, text, before->version);
+  return StoreState(box, kHostsFile, text);
 }
 
 void AddServedHosts(const std::string& cache_content, HostAddresses* hosts) {

@@ -39,9 +39,10 @@ class Cache {
 
   Status Flush() const { return WriteLine("flush", std::to_string(std::time(nullptr))); }
 
-  Status ExpireEntries(const Expire& expire) const {
+  // Returns the lines that expire entries; nullopt if the entries cannot be read.
+  std::optional<std::vector<std::string>> Expired(const Expire& expire) const {
     std::ifstream content(folder_ + "/content");
-    if (!content) return Flush();
+    if (!content) return std::nullopt;
     std::vector<std::string> lines;
     for (std::string line; std::getline(content, line);) {
       const bool is_negative = line.substr(0, 2) == "# ";
@@ -51,8 +52,14 @@ class Cache {
       if (words.empty() || words[0][0] == '#') continue;  // the header
       if (const auto entry = expire(words, is_negative)) lines.push_back(*entry);
     }
-    for (const std::string& line : lines) {
-      // The entry may have gone meanwhile, or its directory may not exist any more.
+    return lines;
+  }
+
+  Status ExpireEntries(const Expire& expire) const {
+    const auto lines = Expired(expire);
+    if (!lines) return Flush();
+    for (const std::string& line : *lines) {
+      // The entry may have gone meanwhile.
       if (const Status status = WriteLine("channel", line); !status.ok() && status.code() != ENOENT) return Flush();
     }
     return {};
@@ -104,11 +111,15 @@ std::string Unescape(const std::string& word) {
 }
 
 // "/srv/data client(rw,...)"
-Status ForgetRights(const Cache& cache, const std::set<std::string>& changed) {
-  return cache.ExpireEntries([&changed](const Words& entry, bool /*is_negative*/) -> std::optional<std::string> {
+Status ForgetRights(const Cache& cache, const std::set<std::string>& changed, const RightsWriter& write) {
+  const auto lines = cache.Expired([&changed](const Words& entry, bool) -> std::optional<std::string> {
     if (entry.size() < 2 || !IsConcerned(Unescape(entry[0]), changed)) return std::nullopt;
     return entry[1].substr(0, entry[1].rfind('(')) + " " + entry[0] + " " + Past();
   });
+  if (!lines) return cache.Flush();
+  std::string text;
+  for (const std::string& line : *lines) text += line + "\n";
+  return text.empty() || write(text).ok() ? Status() : cache.Flush();
 }
 
 // The bytes of "0x01020304...", which shows words of 32 bits, as the channel takes them: "\x04030201..." on a
@@ -181,12 +192,12 @@ bool HasLeftVolume(const ExportTableUpdate& update) {
 
 }  // namespace
 
-Status ForgetExports(const std::string& folder, const ExportTableUpdate& update) {
+Status ForgetExports(const std::string& folder, const ExportTableUpdate& update, const RightsWriter& write_rights) {
   if (update.changed.empty()) return {};
   const Cache rights(folder, kRights);
   const Status addresses = ForgetAddresses(Cache(folder, kAddresses), update.clients);
   const Status handles = ForgetHandles(Cache(folder, kHandles), update);
-  const Status forgotten = HasLeftVolume(update) ? rights.Flush() : ForgetRights(rights, update.changed);
+  const Status forgotten = HasLeftVolume(update) ? rights.Flush() : ForgetRights(rights, update.changed, write_rights);
   return !addresses.ok() ? addresses : !handles.ok() ? handles : forgotten;
 }
 

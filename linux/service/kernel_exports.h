@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 #define VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 
+#include <functional>
 #include <string>
 
 #include "export_table_update.h"
@@ -10,6 +11,9 @@
 namespace vorn {
 
 constexpr char kKernelCaches[] = "/proc/net/rpc";
+
+// Writes lines to the channel of the rights (nfsd.export), one at a time.
+using RightsWriter = std::function<Status(const std::string& lines)>;
 
 // Makes the kernel's server forget the entries that the update concerns, so that it asks rpc.mountd(8) at the next
 // request: rights in the changed directories, in those below and above them, and, if a client is new in the table or
@@ -20,8 +24,9 @@ constexpr char kKernelCaches[] = "/proc/net/rpc";
 // if that fails. The cache of rights is also flushed if a file system has lost its last export: an expired entry keeps
 // a reference to its directory, and the file system could not be unmounted.
 //
-// `folder` is that of the caches (kKernelCaches).
-Status ForgetExports(const std::string& folder, const ExportTableUpdate& update);
+// `folder` is that of the caches (kKernelCaches). An entry of the rights refers to a directory in the mount namespace
+// of rpc.mountd, and only a process in that namespace can expire it: `write_rights` must write from there.
+Status ForgetExports(const std::string& folder, const ExportTableUpdate& update, const RightsWriter& write_rights);
 
 // Makes the kernel's server ask rpc.mountd again to which clients an address belongs.
 Status ForgetClients(const std::string& folder);

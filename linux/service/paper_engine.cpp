@@ -24,6 +24,7 @@ class PaperEngine : public Engine {
   Status Stop() override { return StoreState(kDisabled, "stopped and disabled"); }
   Status Restart() override { return LogAction("restarted"); }
   Status Reload() override { return LogAction("reloaded"); }
+  Status RefreshNames() override { return {}; }
 
  private:
   Status StoreState(const char* state, const char* action) {

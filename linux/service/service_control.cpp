@@ -59,4 +59,8 @@ Status ReloadService(Box& box, const std::string& service) {
   return Operate(box, service, [](Engine& engine) { return engine.Reload(); });
 }
 
+Status RefreshServiceNames(Box& box, const std::string& service) {
+  return Operate(box, service, [](Engine& engine) { return engine.RefreshNames(); });
+}
+
 }  // namespace vorn

@@ -17,6 +17,7 @@ Status StartService(Box& box, const std::string& service);
 Status StopService(Box& box, const std::string& service);
 Status RestartService(Box& box, const std::string& service);
 Status ReloadService(Box& box, const std::string& service);
+Status RefreshServiceNames(Box& box, const std::string& service);
 
 }  // namespace vorn
 

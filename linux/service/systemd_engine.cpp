@@ -11,6 +11,8 @@
 
 #include "configured_ports.h"
 #include "engines.h"
+#include "name_changes.h"
+#include "state_file.h"
 
 namespace vorn {
 namespace {
@@ -19,6 +21,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr char kUnit[] = "nfs-server.service";
 constexpr char kStatusDaemon[] = "rpc-statd.service";
+constexpr char kExpiredRights[] = "/run/vorn/expired-rights";
 constexpr char kDestination[] = "org.freedesktop.systemd1";
 constexpr char kManagerPath[] = "/org/freedesktop/systemd1";
 constexpr char kManager[] = "org.freedesktop.systemd1.Manager";
@@ -176,7 +179,10 @@ class Manager {
 
 class SystemdEngine : public Engine {
  public:
-  SystemdEngine(Box& box, SystemdOptions options) : box_(box), options_(std::move(options)) {}
+  SystemdEngine(Box& box, SystemdOptions options) : box_(box), options_(std::move(options)) {
+    if (options_.exports.write_rights) return;
+    options_.exports.write_rights = [this](const std::string& lines) { return WriteRights(lines); };
+  }
 
   Result<bool> IsEnabled() override {
     const Result<Folders> folders = ReadUnitFolders();
@@ -214,6 +220,10 @@ class SystemdEngine : public Engine {
 
   Status Reload() override { return HasThreads() ? ApplyExports(box_, options_.exports) : Status(); }
 
+  Status RefreshNames() override {
+    return HasThreads() ? ApplyNameChanges(box_, options_.exports, ReadNetgroup) : Status();
+  }
+
  private:
   using Folders = std::vector<std::shared_ptr<const StoredFolder>>;
 
@@ -236,6 +246,12 @@ class SystemdEngine : public Engine {
     const Result<std::string> state = (*manager)->UnitFileState(kUnit);
     if (!state.ok()) return state.status();
     return *state == "enabled" || *state == "enabled-runtime";
+  }
+
+  // vornd.service has a mount namespace of its own, so a unit without one writes the lines.
+  Status WriteRights(const std::string& lines) {
+    if (Status status = StoreState(box_, kExpiredRights, lines); !status.ok()) return status;
+    return With([](Manager& manager) { return manager.RunJob("StartUnit", "vorn-nfs-forget.service"); });
   }
 
   template <typename Steps>
@@ -294,7 +310,7 @@ class SystemdEngine : public Engine {
   }
 
   Box& box_;
-  const SystemdOptions options_;
+  SystemdOptions options_;
   std::mutex mutex_;
   Folders folders_;              // when enabled_ was asked for
   std::optional<bool> enabled_;  // by systemd

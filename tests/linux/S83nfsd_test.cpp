@@ -128,6 +128,21 @@ TEST(ReloadIDMap, OnlySaysOnATrialRootWhatItWouldDo) {
   EXPECT_THAT(root.Names(""), testing::IsEmpty());
 }
 
+TEST(ForgetRights, WritesEachEntryAsItIs) {
+  const TemporaryRoot root;
+  root.Write("/run/vorn/expired-rights", "10.0.0.1 /srv/a\\040b 1700000000\n10.0.0.1 / 1700000000\n");
+  const ProgramResult result = RunProgram({BOX_SCRIPT, "forgetrights"});
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_EQ(result.output,
+            "S83nfsd: would write 10.0.0.1 /srv/a\\040b 1700000000 to /proc/net/rpc/nfsd.export/channel\n"
+            "S83nfsd: would write 10.0.0.1 / 1700000000 to /proc/net/rpc/nfsd.export/channel\n");
+}
+
+TEST(ForgetRights, HasNothingToDoWithoutEntries) {
+  const TemporaryRoot root;
+  EXPECT_EQ(RunProgram({BOX_SCRIPT, "forgetrights"}).status, 0);
+}
+
 TEST(TransferSizes, GiveTheKernelTheLargerOne) {
   const struct {
     const char* configuration;

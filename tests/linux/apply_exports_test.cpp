@@ -5,6 +5,7 @@
 
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "call.h"
@@ -35,10 +36,18 @@ class ApplyExportsTest : public testing::Test {
   }
 
   Status Apply() {
-    return ApplyExports(CurrentBox(), {root_.At(kCaches), [this](const std::string& name) {
-                                         asked_.push_back(name);
-                                         return addresses_;
-                                       }});
+    return ApplyWith([this](const std::string& name) {
+      asked_.push_back(name);
+      return addresses_;
+    });
+  }
+
+  Status ApplyWith(HostResolver resolve) {
+    const auto write_rights = [this](const std::string& lines) {
+      root_.Write("/proc/net/rpc/nfsd.export/channel", lines);
+      return Status();
+    };
+    return ApplyExports(CurrentBox(), {root_.At(kCaches), std::move(resolve), write_rights});
   }
 
   std::string Table() const { return root_.Read(kTable).value_or(""); }
@@ -98,11 +107,10 @@ TEST_F(ApplyExportsTest, ResolvesANewNameAndRemembersIt) {
 TEST_F(ApplyExportsTest, AppliesTheOtherRulesBeforeItAsksForANameThatMayTakeLong) {
   root_.Write("/etc/exports", "/a host(rw)\n/b 10.0.0.1(rw)\n");
   std::string table;
-  const Status status = ApplyExports(
-      CurrentBox(), {root_.At(kCaches), [&](const std::string&) -> std::optional<std::vector<std::string>> {
-                       table = Table();
-                       return std::nullopt;
-                     }});
+  const Status status = ApplyWith([&](const std::string&) -> std::optional<std::vector<std::string>> {
+    table = Table();
+    return std::nullopt;
+  });
   EXPECT_TRUE(status.ok());
   EXPECT_THAT(table, HasSubstr("/b\t10.0.0.1(rw,"));
   EXPECT_THAT(call_.warnings(), ElementsAre(HasSubstr("\"host\"")));

@@ -61,9 +61,16 @@ class KernelExports : public testing::Test {
 
   bool IsFlushed(const std::string& cache) const { return !folder_.Read("/" + cache + "/flush").value_or("").empty(); }
 
-  Status Forget(const ExportTableUpdate& update) { return ForgetExports(folder_.directory(), update); }
+  Status Forget(const ExportTableUpdate& update) {
+    return ForgetExports(folder_.directory(), update, [this](const std::string& lines) {
+      if (!can_write_) return Status::Failure(kServiceFailed, "no unit");
+      folder_.Write("/nfsd.export/channel", lines);
+      return Status();
+    });
+  }
 
   TemporaryRoot folder_;
+  bool can_write_ = true;
 };
 
 ExportTableUpdate Changed(const std::string& path) {
@@ -134,14 +141,16 @@ TEST_F(KernelExports, ForgetsTheHandlesOfADirectoryThatHasLeft) {
 }
 
 TEST_F(KernelExports, FlushesACacheWhoseChannelCannotBeWritten) {
-  ASSERT_EQ(std::remove(folder_.At("/nfsd.export/channel").c_str()), 0);
-  folder_.Write("/nfsd.export/channel/file", "");
+  ASSERT_EQ(std::remove(folder_.At("/nfsd.fh/channel").c_str()), 0);
+  folder_.Write("/nfsd.fh/channel/file", "");
+  can_write_ = false;
   EXPECT_TRUE(Forget(Changed("/srv/data")).ok());
+  EXPECT_TRUE(IsFlushed("nfsd.fh"));
   EXPECT_TRUE(IsFlushed("nfsd.export"));
 }
 
 TEST_F(KernelExports, FailsWithoutTheKernelsCaches) {
-  EXPECT_FALSE(ForgetExports(folder_.At("/nowhere"), Changed("/srv/data")).ok());
+  EXPECT_FALSE(ForgetExports(folder_.At("/nowhere"), Changed("/srv/data"), nullptr).ok());
 }
 
 }  // namespace

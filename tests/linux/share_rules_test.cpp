@@ -12,6 +12,7 @@
 #include <string>
 #include <vector>
 
+#include "call.h"
 #include "captured_log.h"
 #include "core.h"
 #include "current_box.h"
@@ -391,6 +392,29 @@ TEST_F(Exports, AreReadByExportfsAsTheyWereMeant) {
   EXPECT_THAT(verdict.table, HasSubstr("10.0.0.1(rw,sync,wdelay,hide,nocrossmnt,secure,root_squash,all_squash,"));
   EXPECT_THAT(verdict.table, HasSubstr("anonuid=1024,anongid=100"));
   EXPECT_THAT(verdict.table, HasSubstr("sec=sys:krb5p,ro,secure,no_root_squash"));
+}
+
+TEST_F(Exports, WarnOfAVolumeThatCrossmntOpensToAnotherClient) {
+  root.Write("/proc/self/mountinfo", "100 1 0:100 / /volume1/data/inner rw shared:1 - ext4 source rw\n");
+  root.Write(kFile, "/volume1/data/inner 10.0.0.9(rw)\n");
+  const List list = MakeList({"10.0.0.1", "10.0.0.2"});
+  list->first->crossmnt = 1;
+  VORN::CallContext call({});
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  EXPECT_THAT(call.warnings(),
+              testing::ElementsAre("the option crossmnt of /volume1/data also opens /volume1/data/inner to 10.0.0.1, "
+                                   "which the rules of /volume1/data/inner do not name"));
+}
+
+TEST_F(Exports, DoNotWarnOfAVolumeWhoseRulesNameTheClientOrThatHasNone) {
+  root.Write("/proc/self/mountinfo", "100 1 0:100 / /volume1/data/inner rw shared:1 - ext4 source rw\n");
+  const List list = MakeList({"10.0.0.1"});
+  list->first->crossmnt = 1;
+  VORN::CallContext call({});
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  root.Write(kFile, "/volume1/data/inner 10.0.0.1(ro)\n");
+  ASSERT_EQ(VORNNFSRuleExtSetAll("/volume1/data", list.get()), 0);
+  EXPECT_THAT(call.warnings(), testing::IsEmpty());
 }
 
 TEST(VORNNFSRuleExtFree, TakesNull) { VORNNFSRuleExtFree(nullptr); }

@@ -129,6 +129,24 @@ TEST_F(SystemdEngine, AppliesTheRulesWithoutTheUnit) {
   EXPECT_THAT(manager_.TakeCalls(), ElementsAre());
 }
 
+TEST_F(SystemdEngine, HasAUnitOutsideOfItsNamespaceExpireTheRights) {
+  folder_.Write("/caches/nfsd.export/content", "/volume1/data\t10.0.0.1(ro)\n");
+  folder_.Write("/var/lib/nfs/etab", "/volume1/data\t10.0.0.1(ro)\n");
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw)\n");
+  EXPECT_TRUE(Engine()->Reload().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "StartUnit vorn-nfs-forget.service replace"));
+  EXPECT_THAT(*folder_.Read("/run/vorn/expired-rights"), HasSubstr("10.0.0.1 /volume1/data "));
+  EXPECT_EQ(folder_.Read("/caches/nfsd.export/flush"), "");
+}
+
+TEST_F(SystemdEngine, FlushesAllRightsWhereThatUnitFails) {
+  manager_.End("StartUnit vorn-nfs-forget.service", "failed");
+  folder_.Write("/caches/nfsd.export/content", "/volume1/data\t10.0.0.1(ro)\n");
+  folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw)\n");
+  EXPECT_TRUE(Engine()->Reload().ok());
+  EXPECT_NE(folder_.Read("/caches/nfsd.export/flush"), "");
+}
+
 TEST_F(SystemdEngine, AppliesWhatExportfsIgnoredAfterAStart) {
   folder_.Write("/etc/exports", "/slip *(foo)\n/volume1/data 10.0.0.1(rw)\n");
   EXPECT_TRUE(Engine()->Start().ok());

@@ -1,0 +1,47 @@
+#include "crossed_volumes.h"
+
+#include <set>
+
+#include "box_paths.h"
+#include "exports_client.h"
+#include "mounts.h"
+
+namespace vorn {
+namespace {
+
+std::set<std::string> ClientsOf(const std::vector<SharedExportsFile>& files, const std::string& path,
+                                const ExportPaths& paths) {
+  std::set<std::string> clients;
+  for (const SharedExportsFile& file : files) {
+    for (const ExportEntry& entry : file->document.Entries(path, paths)) clients.insert(ExportClientKey(entry.client));
+  }
+  return clients;
+}
+
+}  // namespace
+
+std::vector<std::string> DescribeCrossedVolumes(Box& box, const std::vector<SharedExportsFile>& files,
+                                                const std::string& path, const std::vector<ExportEntry>& entries) {
+  std::vector<std::string> crossing;
+  for (const ExportEntry& entry : entries) {
+    if (entry.options.crossmnt) crossing.push_back(entry.client);
+  }
+  if (crossing.empty()) return {};
+  const Result<std::vector<std::string>> volumes = MountsBelow(box, path);
+  if (!volumes.ok()) return {};
+  const BoxPaths paths(box.root());
+  std::vector<std::string> sentences;
+  for (const std::string& volume : *volumes) {
+    const std::set<std::string> clients = ClientsOf(files, volume, paths);
+    std::string opened;
+    for (const std::string& client : crossing) {
+      if (clients.count(ExportClientKey(client)) == 0) opened += (opened.empty() ? "" : ", ") + client;
+    }
+    if (clients.empty() || opened.empty()) continue;
+    sentences.push_back("the option crossmnt of " + path + " also opens " + volume + " to " + opened +
+                        ", which the rules of " + volume + " do not name");
+  }
+  return sentences;
+}
+
+}  // namespace vorn

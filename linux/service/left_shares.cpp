@@ -1,0 +1,88 @@
+#include "left_shares.h"
+
+#include <syslog.h>
+
+#include <set>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "box_paths.h"
+#include "exports_files.h"
+#include "exports_text.h"
+#include "path_resolver.h"
+#include "platform_settings.h"
+#include "share_rules.h"
+#include "shares.h"
+#include "state_file.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kExportedShares[] = "/var/lib/vorn/exported-shares";
+
+using Directories = std::set<std::string>;
+
+Result<Directories> ReadRemembered(Box& box) {
+  const Result<StoredFile> file = box.Read(kExportedShares);
+  if (!file.ok()) return file.status();
+  Directories remembered;
+  std::istringstream lines(file->text);
+  for (std::string line; std::getline(lines, line);) remembered.insert(line);
+  return remembered;
+}
+
+Status Remember(Box& box, const Directories& directories) {
+  std::string text;
+  for (const std::string& directory : directories) {
+    if (directory.find('\n') == std::string::npos) text += directory + "\n";
+  }
+  return StoreState(box, kExportedShares, text);
+}
+
+Status Withdraw(Box& box, const std::string& directory) {
+  Status status = WriteShareRules(box, directory, nullptr);
+  if (status.ok()) {
+    syslog(LOG_WARNING, "%s is no share any more; its export rules were removed", directory.c_str());
+  }
+  return status;
+}
+
+void NameLeft(const std::string& directory) {
+  syslog(LOG_WARNING, "%s is exported although it is no share any more; remove its line from %s, or set %s",
+         directory.c_str(), kExportsFile, "withdraw_left_shares = yes in /etc/vorn/platform.conf");
+}
+
+}  // namespace
+
+Status CheckLeftShares(Box& box) {
+  const Result<PlatformSettings> settings = PlatformSettings::Load(box);
+  if (!settings.ok()) return settings.status();
+  const Result<std::vector<std::string>> paths = ListSharePaths(box);
+  if (!paths.ok()) return paths.status().code() == ENOENT ? Status() : paths.status();
+  const Result<SharedExportsFile> file = OpenExportsFile(box, kExportsFile);
+  if (!file.ok()) return file.status();
+  const Result<Directories> remembered = ReadRemembered(box);
+  if (!remembered.ok()) return remembered.status();
+
+  const BoxPaths links(box.root());
+  PathResolver resolver(links);
+  Directories shares;
+  for (const std::string& path : *paths) shares.insert(resolver.Resolve(NormalExportPath(path)));
+  Directories exported;
+  for (const ExportLine& line : (*file)->document.Lines()) {
+    const std::string directory = resolver.Resolve(line.path);
+    if (shares.count(directory) != 0 || remembered->count(directory) != 0) exported.insert(directory);
+  }
+  for (const std::string& directory : exported) {
+    if (shares.count(directory) != 0) continue;
+    if (!settings->withdraw_left_shares) {
+      NameLeft(directory);
+    } else if (Status status = Withdraw(box, directory); !status.ok()) {
+      return status;
+    }
+  }
+  return Remember(box, exported);
+}
+
+}  // namespace vorn

@@ -1,0 +1,19 @@
+// Directories that stay exported although they are no shares any more.
+#ifndef VORN_LINUX_SERVICE_LEFT_SHARES_H
+#define VORN_LINUX_SERVICE_LEFT_SHARES_H
+
+#include "box.h"
+#include "status.h"
+
+namespace vorn {
+
+// A share that leaves shares.conf keeps its line in /etc/exports, and the API cannot change it any more. Names each
+// such directory in the log. With the setting withdraw_left_shares its rules are removed from /etc/exports.
+//
+// /var/lib/vorn/exported-shares remembers which exported directories are or were shares, so an administrator's own
+// lines about other directories are left alone. Nothing is concluded from a shares.conf that does not exist.
+Status CheckLeftShares(Box& box);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_SERVICE_LEFT_SHARES_H

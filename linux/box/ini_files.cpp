@@ -226,6 +226,13 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
   return in_force;
 }
 
+std::vector<const IniFile*> IniFiles::files() const {
+  std::vector<const IniFile*> files;
+  files.reserve(sources_.size());
+  for (const Source& source : sources_) files.push_back(source.file.get());
+  return files;
+}
+
 std::vector<std::shared_ptr<const void>> IniFiles::sources() const {
   std::vector<std::shared_ptr<const void>> files;
   files.reserve(sources_.size());

@@ -53,7 +53,10 @@ class IniFiles {
   // The settings of a section that are in force, in the order in which they are read.
   std::vector<IniFound> Settings(std::string_view section) const;
 
-  // The files that were read. Two readings with equal lists have equal settings.
+  // The files that were read, in reading order; the first one is the main file. They live as long as this object.
+  std::vector<const IniFile*> files() const;
+
+  // The same files as owners. Two readings with equal lists have equal settings.
   std::vector<std::shared_ptr<const void>> sources() const;
 
   // Fails with kSyntax, naming file and line, if a file includes itself, directly or through others. The programs of

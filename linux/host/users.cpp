@@ -20,7 +20,7 @@ Result<Accounts> ParseAccounts(StoredFile file) {
   if (file.text.empty()) return accounts;
   const std::unique_ptr<std::FILE, CloseFile> stream(fmemopen(file.text.data(), file.text.size(), "r"));
   if (stream == nullptr) return Status::System(errno, file.location);
-  std::vector<char> line(file.text.size() + 1);  // long enough for any line
+  std::vector<char> line(file.text.size() + 2);  // fgetpwent_r needs more than the longest line and a NUL byte
   passwd account{};
   passwd* found = nullptr;
   while (fgetpwent_r(stream.get(), &account, line.data(), line.size(), &found) == 0) {

@@ -62,8 +62,9 @@ struct IDMapChange {
 };
 
 // Changes the idmapd.conf at `path`: only what differs from what is in force. If a mapping is added or changed, the
-// method "static" becomes the first one; other mappings that take effect by this are logged and become warnings of
-// the call, one by one. Comments, foreign settings and lines that libnfsidmap ignores stay as they are.
+// method for static mappings (translation_methods.h) becomes the first one; other mappings that take effect by this are
+// logged and become warnings of the call, one by one. Comments, foreign settings and lines that libnfsidmap ignores
+// stay as they are.
 //
 // Before anything is written it fails
 // - with kRefusedText for a string that the file cannot represent, that libnfsidmap has no room for, that looks like

@@ -84,7 +84,15 @@ Status PutDomain(const std::string& domain, IniDocument* document) {
   return {};
 }
 
-Status PutMappings(const IDMap& now, const Plan& plan, IniDocument* document) {
+// Static mappings have an effect only through a method for them, and the first method that knows a principal decides.
+// Methods that are fine are changed only if the box has a better method for static mappings.
+Status PutMethods(const Box& box, const IDMap& now, IniDocument* document) {
+  const std::vector<std::string> methods = GSSMethods(now.files());
+  const std::string wanted = StaticMethod(box);
+  return methods.front() == wanted ? Status() : PutStaticFirst(methods, wanted, document);
+}
+
+Status PutMappings(const Box& box, const IDMap& now, const Plan& plan, IniDocument* document) {
   for (const Mapping& mapping : plan.put) {
     if (!MayBeStored(mapping))
       return Status::Failure(kRefusedText, "idmapd.conf(5) cannot represent a principal or its local name");
@@ -94,10 +102,7 @@ Status PutMappings(const IDMap& now, const Plan& plan, IniDocument* document) {
   for (const Mapping& mapping : plan.put) {
     document->Set(section, *IniKey::From(mapping.principal), *IniValue::From(mapping.local_name));
   }
-  // Static mappings have an effect only through the method "static", and the first method that knows a principal
-  // decides.
-  const std::vector<std::string> methods = GSSMethods(now.files());
-  return plan.put.empty() || IsStaticFirst(methods) ? Status() : PutStaticFirst(methods, document);
+  return plan.put.empty() ? Status() : PutMethods(box, now, document);
 }
 
 // ---------------------------------------------------------------------------------------------
@@ -177,16 +182,16 @@ void NoticeRevived(const IDMap& now, const Plan& plan) {
     const IniFound& stored = now.Stored(i);
     if (own.count(LowerAscii(stored.key)) != 0 || ++count > kMostNotices) continue;
     Notice(stored.Where() + ": the mapping " + pairs[i].first + " = " + pairs[i].second +
-           " takes effect, because the method \"static\" now comes first");
+           " takes effect, because static mappings now come first");
   }
   if (count > kMostNotices) Notice(std::to_string(count - kMostNotices) + " further mappings take effect");
 }
 
-Status PutChange(const IDMap& now, const IDMapChange& change, const Plan& plan, IniDocument* document) {
+Status PutChange(const Box& box, const IDMap& now, const IDMapChange& change, const Plan& plan, IniDocument* document) {
   if (change.domain) {
     if (Status status = PutDomain(*change.domain, document); !status.ok()) return status;
   }
-  return PutMappings(now, plan, document);
+  return PutMappings(box, now, plan, document);
 }
 
 }  // namespace
@@ -205,7 +210,7 @@ Status WriteIDMap(Box& box, const std::string& path, const IDMapChange& change) 
   }
   Result<IniEditor> file = IniEditor::Open(box, path);
   if (!file.ok()) return file.status();
-  if (Status status = PutChange(now, change, plan, &file->document()); !status.ok()) return status;
+  if (Status status = PutChange(box, now, change, plan, &file->document()); !status.ok()) return status;
   const Result<IniFiles> draft = IniFiles::Open(box, path, IniFiles::Draft{path, file->document().Text()});
   if (!draft.ok()) return draft.status();
   if (Status status = Verify(*draft, now, change, plan); !status.ok()) return status;

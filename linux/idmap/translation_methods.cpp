@@ -12,6 +12,7 @@ constexpr char kSection[] = "Translation";
 constexpr char kGSSMethods[] = "GSS-Methods";
 constexpr char kMethod[] = "Method";
 constexpr char kStatic[] = "static";
+constexpr char kCompiled[] = "vorn";
 
 // Splits a list as libnfsidmap does: at commas; blanks before a name do not count, and blanks after it do.
 std::vector<std::string> Split(std::string_view list) {
@@ -29,6 +30,8 @@ std::vector<std::string> ListOf(const IniFiles& files, const char* key) {
   const std::optional<IniFound> found = files.Find(kSection, key);
   return found ? Split(found->value) : std::vector<std::string>();
 }
+
+bool IsForStaticMappings(const std::string& method) { return method == kStatic || method == kCompiled; }
 
 bool Exists(const Box& box, const std::string& path) {
   const Result<std::string> location = box.root().Locate(path);
@@ -54,12 +57,28 @@ std::vector<std::string> GSSMethods(const IniFiles& files) {
   return methods;
 }
 
-bool IsStaticFirst(const std::vector<std::string>& methods) { return !methods.empty() && methods.front() == kStatic; }
+std::string StaticMethod(const Box& box) {
+  const std::string folder = PluginFolder(box);
+  return !folder.empty() && Exists(box, folder + "/" + kCompiled + ".so") ? kCompiled : kStatic;
+}
 
-Status PutStaticFirst(const std::vector<std::string>& methods, IniDocument* document) {
-  std::string list = kStatic;
-  for (const std::string& method : methods) {
-    if (method != kStatic) list += "," + method;
+bool IsStaticFirst(const std::vector<std::string>& methods) {
+  return !methods.empty() && IsForStaticMappings(methods.front());
+}
+
+bool UseOnlyCompiledMappings(const IniFiles& files) {
+  std::vector<std::string> methods = GSSMethods(files);
+  const bool is_first = methods.front() == kCompiled;
+  for (const char* key : {kMethod, kGSSMethods}) {
+    for (const std::string& method : ListOf(files, key)) methods.push_back(method);
+  }
+  return is_first && std::find(methods.begin(), methods.end(), kStatic) == methods.end();
+}
+
+Status PutStaticFirst(const std::vector<std::string>& methods, const std::string& method, IniDocument* document) {
+  std::string list = method;
+  for (const std::string& other : methods) {
+    if (!IsForStaticMappings(other)) list += "," + other;
   }
   const std::optional<IniValue> value = IniValue::From(list);
   if (!value) return Status::Failure(kSyntax, "the translation methods cannot be written back");

@@ -1,16 +1,19 @@
 #!/bin/sh
-# S83nfsd.sh reloadidmap: has the running NFS service forget what it knew of ID mappings and keytabs
-# and use the files as they are now.
+# S83nfsd.sh reloadidmap: makes the running NFS service use the ID mappings and the keytab that are stored now.
+# S83nfsd.sh idmapstart UNIT: prepares the settings that the daemon UNIT reads when it starts; the unit calls it.
 # S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured.
-# S83nfsd.sh groups: waits where a service that has just stopped asking for groups must not begin yet.
+# S83nfsd.sh groups: delays the start until pending group upcalls of the kernel have expired.
 # S83nfsd.sh lockports: has the lock manager forget fixed ports that are no longer configured.
-# The service's unit calls these three before each start.
+# The unit nfs-server calls the last three before each start.
 # S83nfsd.sh forgetrights: has the kernel forget the rights that a save of export rules has changed.
 # On a trial root (VORN_ROOT) it only says what it would do.
 set -u
 
 root=${VORN_ROOT:-/}
 root=${root%/}
+PATH=$PATH:/usr/vorn/sbin  # of idmap-compile
+idmap=/var/lib/vorn/idmap  # where idmap-compile writes
+keytab=/etc/nfs/krb5.keytab
 
 say() {
 	printf '%s\n' "S83nfsd: $*"
@@ -37,22 +40,38 @@ is_active() {
 	[ -z "$root" ] && systemctl -q is-active "$1"
 }
 
-# The daemon keeps the map it read when it started, and the kernel keeps its answers in the security
-# contexts of the clients: only both together make a change seen. nfsidmap(8), exportfs -f and a
-# restart of nfs-server leave established clients with the old map. A service that began without a
-# keytab began without the daemon, which is started now that there may be one.
+# Whether the running daemon UNIT has read the settings that are stored now.
+is_current() {
+	is_active "$1.service" && cmp -s "$idmap/settings" "$idmap/$1.settings"
+}
+
+# svcgssd reads a new keytab only when it starts.
+is_svcgssd_current() {
+	is_current rpc-svcgssd && [ -z "$(find "$keytab" -newer "$idmap/rpc-svcgssd.settings" 2>/dev/null)" ]
+}
+
+# The daemons follow the table of mappings that idmap-compile writes. They read all other settings when they start, and
+# are restarted if these have changed. The kernel keeps the daemons' answers in the security contexts of the clients
+# until it is told to forget them; nfsidmap(8), exportfs -f and a restart of nfs-server do not do that. A service that
+# started without a keytab started without svcgssd, which is started here when there is one.
 reload_idmap() {
 	status=0
+	run idmap-compile || status=1
 	if is_active gssproxy.service; then
 		say "gssproxy serves Kerberos here: it ignores the static mappings of idmapd.conf"
 		say "use auth_to_local_names in krb5.conf, or rpc.svcgssd instead"
 	elif is_active nfs-server.service; then
-		run systemctl restart rpc-svcgssd.service || status=1
+		is_svcgssd_current || run systemctl restart rpc-svcgssd.service || status=1
 	fi
-	run systemctl try-restart nfs-idmapd.service || status=1
+	is_current nfs-idmapd || run systemctl try-restart nfs-idmapd.service || status=1
 	tell /proc/net/rpc/auth.rpcsec.context/flush 1 || status=1
 	[ "$status" = 0 ] || say "the ID map was not taken up"
 	return "$status"
+}
+
+# The unit mounts the copy over /etc/idmapd.conf for its daemon. A failure leaves the copy of the start before.
+start_idmap() {
+	run idmap-compile && run cp "$idmap/settings" "$idmap/$1.new" && run mv -f "$idmap/$1.new" "$idmap/$1.settings"
 }
 
 # The kernel has one limit for both directions, which it takes only while its server has no threads.
@@ -128,6 +147,9 @@ case "${1-}" in
 reloadidmap)
 	reload_idmap
 	;;
+idmapstart)
+	start_idmap "${2:?UNIT}"
+	;;
 transfersizes)
 	transfer_sizes
 	;;
@@ -141,7 +163,7 @@ forgetrights)
 	forget_rights
 	;;
 *)
-	echo "usage: $0 reloadidmap | transfersizes | groups | lockports | forgetrights" >&2
+	echo "usage: $0 reloadidmap | idmapstart UNIT | transfersizes | groups | lockports | forgetrights" >&2
 	exit 2
 	;;
 esac

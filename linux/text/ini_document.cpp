@@ -99,6 +99,16 @@ std::string IniDocument::Text() const {
   return text.append(tail_);
 }
 
+std::string IniDocument::TextWithout(std::string_view section) const {
+  const SectionNumber number = Known(section);
+  std::string text;
+  for (const Line& line : lines_) {
+    const bool is_dropped = line.section == number && line.content.kind == IniLine::Kind::kAssignment;
+    if (number == kNoSection || !is_dropped) text += line.text;
+  }
+  return text.append(tail_);
+}
+
 const IniDocument::Line* IniDocument::FindLine(std::string_view section, std::string_view key) const {
   const auto found = deciding_.find(KeyId{Known(section), key});
   return found == deciding_.end() ? nullptr : &*found->second;

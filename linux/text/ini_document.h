@@ -54,6 +54,9 @@ class IniDocument {
 
   std::string Text() const;
 
+  // The text without the assignments of a section, also those in [section "argument"].
+  std::string TextWithout(std::string_view section) const;
+
   // The section name under which the lines before the first section header are found. In a file that is included
   // they belong to the section of the include line; elsewhere the reader ignores them.
   static constexpr std::string_view kInherited = "]";

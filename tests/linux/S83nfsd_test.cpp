@@ -19,8 +19,8 @@ constexpr char kLockPort[] = "/sys/fs/nfs/nlm_tcpport";
 constexpr char kLockUDPPort[] = "/sys/fs/nfs/nlm_udpport";
 constexpr char kMark[] = "/run/nfs-leaves-groups-alone";
 
-// A box in namespaces of its own: a systemctl that records its arguments, and files of the test in place of /proc and
-// /etc/nfs.conf.d.
+// A box in namespaces of its own: a systemctl that records its arguments, and the test's own /etc, /proc, /run and
+// /var/lib.
 class Box {
  public:
   Box() {
@@ -28,10 +28,14 @@ class Box {
                                         "\ncase \"$*\" in *is-active*) [ -e " + folder_.directory() +
                                         "/active/$3 ];; *) [ ! -e " + folder_.At("/broken") + " ];; esac\n");
     folder_.Write("/bin/sleep", "#!/bin/sh\necho \"sleep $*\" >>" + folder_.At("/calls") + "\n");
-    for (const char* program : {"/bin/systemctl", "/bin/sleep"}) chmod(folder_.At(program).c_str(), 0755);
+    folder_.Write("/bin/idmap-compile", "#!/bin/sh\necho compile >>" + folder_.At("/calls") + "\n[ ! -e " +
+                                            folder_.At("/uncompilable") + " ]\n");
+    for (const char* program : {"/bin/systemctl", "/bin/sleep", "/bin/idmap-compile"})
+      chmod(folder_.At(program).c_str(), 0755);
     folder_.Write("/run/empty", "");
-    folder_.Write("/conf.d/vorn.conf", "");
-    folder_.Write("/nfs.conf", "");
+    IsConfigured("");
+    folder_.Write("/etc/nfs.conf", "");
+    folder_.Write("/lib/vorn/idmap/settings", "stored\n");
     folder_.Write("/proc" + std::string(kFlush), "");
     folder_.Write("/proc" + std::string(kLimit), "");
     for (const char* port : {kLockPort, kLockUDPPort}) folder_.Write("/proc" + std::string(port), "32803\n");
@@ -40,9 +44,19 @@ class Box {
   void Runs(const std::string& unit) const { folder_.Write("/active/" + unit, ""); }
   void HasBrokenServices() const { folder_.Write("/broken", ""); }
   void HasNoKernelServer() const { RunProgram({"rm", "-r", folder_.At("/proc/fs"), folder_.At("/proc/net")}); }
+  void HasADamagedIDMap() const { folder_.Write("/uncompilable", ""); }
+  // A daemon that read these settings when it started. The settings "stored" are those that are stored now.
+  void HasRead(const std::string& unit, const std::string& settings) const {
+    Runs(unit + ".service");
+    folder_.Write("/lib/vorn/idmap/" + unit + ".settings", settings + "\n");
+  }
+  void HasANewKeytab() const {
+    folder_.Write("/etc/nfs/krb5.keytab", "");
+    RunProgram({"touch", "-d", "+1 hour", folder_.At("/etc/nfs/krb5.keytab")});
+  }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
   void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
-  void IsConfigured(const std::string& text) const { folder_.Write("/conf.d/vorn.conf", text); }
+  void IsConfigured(const std::string& text) const { folder_.Write("/etc/nfs.conf.d/vorn.conf", text); }
 
   bool LeavesGroupsAlone() const { return folder_.Read(kMark).has_value(); }
 
@@ -50,23 +64,17 @@ class Box {
     const std::string place = folder_.directory();
     std::vector<std::string> command = GetPrivateNamespaces().command;
     command.insert(command.end(), {"sh", "-ec",
-                                   "mount --bind " + place +
-                                       "/nfs.conf /etc/nfs.conf\n"
-                                       "mount --bind " +
-                                       place +
-                                       "/conf.d /etc/nfs.conf.d\n"
-                                       "mount --bind " +
-                                       place +
-                                       "/proc /proc\n"
-                                       "mount --bind " +
-                                       place +
-                                       "/run /run\n"
+                                   "for folder in etc proc run var/lib; do mount --bind " + place +
+                                       "/${folder##*/} /$folder; done\n"
                                        "PATH=" +
                                        place + "/bin:$PATH VORN_ROOT=/ exec " BOX_SCRIPT " " + word});
     return RunProgram(command);
   }
 
   std::string Calls() const { return folder_.Read("/calls").value_or(""); }
+  std::string SettingsOf(const std::string& unit) const {
+    return folder_.Read("/lib/vorn/idmap/" + unit + ".settings").value_or("");
+  }
   std::string Kernel(const char* file) const { return folder_.Read("/proc" + std::string(file)).value_or(""); }
 
  private:
@@ -79,16 +87,70 @@ TEST(ReloadIDMap, RestartsBothDaemonsAndThenHasTheKernelForgetItsAnswers) {
   const ProgramResult result = box.Run("reloadidmap");
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_EQ(box.Calls(),
-            "-q is-active gssproxy.service\n-q is-active nfs-server.service\n"
-            "restart rpc-svcgssd.service\ntry-restart nfs-idmapd.service\n");
+            "compile\n-q is-active gssproxy.service\n-q is-active nfs-server.service\n"
+            "-q is-active rpc-svcgssd.service\nrestart rpc-svcgssd.service\n"
+            "-q is-active nfs-idmapd.service\ntry-restart nfs-idmapd.service\n");
   EXPECT_EQ(box.Kernel(kFlush), "1\n");
+}
+
+TEST(ReloadIDMap, RestartsADaemonOnlyForWhatItReadsWhenItStarts) {
+  const struct {
+    const char* name;
+    const char* svcgssd;
+    const char* idmapd;
+    bool has_new_keytab;
+    bool restarts_svcgssd;
+    bool restarts_idmapd;
+  } cases[] = {{"nothing", "stored", "stored", false, false, false},
+               {"the settings of both", "old", "old", false, true, true},
+               {"the settings of idmapd", "stored", "old", false, false, true},
+               {"the keytab", "stored", "stored", true, true, false}};
+  for (const auto& c : cases) {
+    const Box box;
+    box.Runs("nfs-server.service");
+    box.HasRead("rpc-svcgssd", c.svcgssd);
+    box.HasRead("nfs-idmapd", c.idmapd);
+    if (c.has_new_keytab) box.HasANewKeytab();
+    const ProgramResult result = box.Run("reloadidmap");
+    EXPECT_EQ(result.status, 0) << c.name << result.errors;
+    const std::string calls = "\n" + box.Calls();
+    EXPECT_EQ(calls.find("\nrestart rpc-svcgssd.service\n") != std::string::npos, c.restarts_svcgssd) << calls;
+    EXPECT_EQ(calls.find("\ntry-restart nfs-idmapd.service\n") != std::string::npos, c.restarts_idmapd) << calls;
+    EXPECT_EQ(calls.rfind("\ncompile\n", 0), 0U) << "the table comes before the flush: " << calls;
+    EXPECT_EQ(box.Kernel(kFlush), "1\n") << c.name;
+  }
+}
+
+TEST(ReloadIDMap, FailsIfTheMapDoesNotCompile) {
+  const Box box;
+  box.HasADamagedIDMap();
+  EXPECT_EQ(box.Run("reloadidmap").status, 1);
+  EXPECT_EQ(box.Kernel(kFlush), "1\n");
+}
+
+TEST(StartIDMap, GivesTheDaemonTheSettingsThatAreStored) {
+  const Box box;
+  box.HasRead("nfs-idmapd", "old");
+  const ProgramResult result = box.Run("idmapstart nfs-idmapd");
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_EQ(box.SettingsOf("nfs-idmapd"), "stored\n");
+  EXPECT_EQ(box.Calls(), "compile\n");
+}
+
+TEST(StartIDMap, LeavesTheSettingsOfTheStartBeforeIfTheMapDoesNotCompile) {
+  const Box box;
+  box.HasRead("nfs-idmapd", "old");
+  box.HasADamagedIDMap();
+  EXPECT_NE(box.Run("idmapstart nfs-idmapd").status, 0);
+  EXPECT_EQ(box.SettingsOf("nfs-idmapd"), "old\n");
 }
 
 TEST(ReloadIDMap, StartsNoDaemonForAServiceThatIsOff) {
   const Box box;
   EXPECT_EQ(box.Run("reloadidmap").status, 0);
   EXPECT_EQ(box.Calls(),
-            "-q is-active gssproxy.service\n-q is-active nfs-server.service\ntry-restart nfs-idmapd.service\n");
+            "compile\n-q is-active gssproxy.service\n-q is-active nfs-server.service\n-q is-active nfs-idmapd.service\n"
+            "try-restart nfs-idmapd.service\n");
 }
 
 TEST(ReloadIDMap, SaysThatGssproxyIgnoresTheMap) {
@@ -98,7 +160,9 @@ TEST(ReloadIDMap, SaysThatGssproxyIgnoresTheMap) {
   const ProgramResult result = box.Run("reloadidmap");
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_THAT(result.output, HasSubstr("gssproxy serves Kerberos here"));
-  EXPECT_EQ(box.Calls(), "-q is-active gssproxy.service\ntry-restart nfs-idmapd.service\n");
+  EXPECT_EQ(
+      box.Calls(),
+      "compile\n-q is-active gssproxy.service\n-q is-active nfs-idmapd.service\ntry-restart nfs-idmapd.service\n");
   EXPECT_EQ(box.Kernel(kFlush), "1\n");
 }
 
@@ -123,6 +187,7 @@ TEST(ReloadIDMap, OnlySaysOnATrialRootWhatItWouldDo) {
   const ProgramResult result = RunProgram({BOX_SCRIPT, "reloadidmap"});
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_EQ(result.output,
+            "S83nfsd: would run: idmap-compile\n"
             "S83nfsd: would run: systemctl try-restart nfs-idmapd.service\n"
             "S83nfsd: would write 1 to /proc/net/rpc/auth.rpcsec.context/flush\n");
   EXPECT_THAT(root.Names(""), testing::IsEmpty());

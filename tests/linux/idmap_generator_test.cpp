@@ -12,6 +12,8 @@
 #include <stdexcept>
 
 #include "captured_log.h"
+#include "compiled_idmap.h"
+#include "current_box.h"
 #include "generated_case.h"
 #include "idmap_judge.h"
 #include "nfsconf.h"
@@ -109,6 +111,22 @@ Users AskLibraryForStatic(const TemporaryRoot& root) {
   root.Write(kLastFile, "[Translation]\nMethod = static\nGSS-Methods = static\n");
   Users users = AskLibrary(root);
   std::remove(root.At(kLastFile).c_str());
+  return users;
+}
+
+// The answers of the method "vorn" to a daemon, which reads the compiled table and the settings without the mappings.
+// libnfsidmap loads a method from its own folder; the path leads from there to the build folder.
+Users AskPlugin(const TemporaryRoot& root) {
+  const std::string text = root.Read(kFile).value_or("");
+  root.Write(kLastFile, "[Translation]\nMethod = nsswitch\nGSS-Methods = vorn\n");
+  if (!vorn::CompileIDMap(vorn::CurrentBox()).ok()) throw std::runtime_error("the ID map does not compile");
+  root.Write(kFile, root.Read(vorn::kDaemonSettingsFile).value_or(""));
+  root.Write(kLastFile, "[Translation]\nMethod = nsswitch\nGSS-Methods = ../../../../../../../.." VORN_PLUGIN
+                        "\n[vorn]\nMappings = " +
+                            root.At("/var/lib/vorn/idmap/mappings") + "\n");
+  Users users = AskLibrary(root);
+  std::remove(root.At(kLastFile).c_str());
+  root.Write(kFile, text);
   return users;
 }
 
@@ -226,6 +244,7 @@ void ExpectRefusal(const TemporaryRoot& root, const GeneratedFiles& files) {
 // Returns whether the change succeeded.
 bool RunChange(const TemporaryRoot& root, const GeneratedFiles& files, const Views& before, const Change& change) {
   const std::string text_before = AllText(root, files);
+  EXPECT_EQ(AskPlugin(root), before.stored) << "the plug-in";
   const Map map(VORNNFSIDMapGet());
   if (map == nullptr) {
     ADD_FAILURE() << "no record";

@@ -157,6 +157,51 @@ TEST(IDMap, StaticComesFirstAmongTheMethodsAndOthersStay) {
   }
 }
 
+// The method "vorn" is used where its plug-in is installed, and takes the place of "static".
+TEST(IDMap, MappingsUseTheMethodThatIsInstalled) {
+  const struct {
+    const char* before;
+    bool has_plugin;
+    const char* after;  // the value of GSS-Methods
+  } cases[] = {
+      {"", true, "vorn,nsswitch"},
+      {"GSS-Methods = static,nsswitch\n", true, "vorn,nsswitch"},
+      {"GSS-Methods = umich_ldap,vorn,static\n", true, "vorn,umich_ldap"},
+      {"GSS-Methods = vorn, nsswitch\n", true, "vorn, nsswitch"},
+      {"GSS-Methods = vorn,nsswitch\n", false, "static,nsswitch"},
+      {"GSS-Methods = vorn,static\n", false, "static"},
+  };
+  for (const auto& c : cases) {
+    const TemporaryRoot root;
+    root.Write("/usr/lib/libnfsidmap/static.so", "");
+    if (c.has_plugin) root.Write("/usr/lib/libnfsidmap/vorn.so", "");
+    root.Write(kFile, "[Translation]\n" + std::string(c.before));
+    ASSERT_EQ(Store({{"alice@X", "nobody"}}), 0);
+    const std::string text = root.Read(kFile).value_or("");
+    EXPECT_NE(text.find("GSS-Methods = " + std::string(c.after) + "\n"), std::string::npos) << text;
+  }
+}
+
+TEST(IDMap, OtherChangesDoNotExchangeTheMethod) {
+  const TemporaryRoot root;
+  root.Write("/usr/lib/libnfsidmap/vorn.so", "");
+  root.Write(kFile, "[Translation]\nGSS-Methods = static\n[Static]\na@X = nobody\nb@X = nobody\n");
+  ASSERT_EQ(Store({}, {"b@X"}), 0);
+  ASSERT_EQ(StoreDomain("example.com"), 0);
+  EXPECT_NE(root.Read(kFile).value_or("").find("GSS-Methods = static\n"), std::string::npos);
+}
+
+TEST(IDMap, ExchangingTheMethodSwitchesNothingOn) {
+  const TemporaryRoot root;
+  for (const char* method : {"vorn", "static", "nsswitch"}) {
+    root.Write("/usr/lib/libnfsidmap/" + std::string(method) + ".so", "");
+  }
+  root.Write(kFile, "[Translation]\nGSS-Methods = static\n[Static]\na@X = nobody\n");
+  VORN::CallContext call({});
+  ASSERT_EQ(Store({{"b@X", "nobody"}}), 0);
+  EXPECT_THAT(call.warnings(), IsEmpty());
+}
+
 TEST(IDMap, WithoutMappingsLeavesTheMethodsAlone) {
   const TemporaryRoot root;
   root.Write(kFile, "[Translation]\nGSS-Methods = nsswitch\n[Static]\na@X = nobody\n");

@@ -85,6 +85,13 @@ TEST(IniDocument, ReadsWhatNfsUtilsReads) {
   }
 }
 
+TEST(IniDocument, TextWithoutASectionKeepsEverythingButItsAssignments) {
+  const IniDocument document =
+      Parsed("k=0\n[a]\n# k=1\nk=1\nj \\\n = 2\n[b]\nk=1\n[A \"x\"]\nk=3\ninclude = f\n[a\nk=4\n[a]\nk=5");
+  EXPECT_EQ(document.TextWithout("a"), "k=0\n[a]\n# k=1\n[b]\nk=1\n[A \"x\"]\ninclude = f\n[a\nk=4\n[a]\nk=5");
+  EXPECT_EQ(document.TextWithout("none"), document.Text());
+}
+
 TEST(IniDocument, LeavesEverythingFromANulByteOnWithoutEffect) {
   const std::string_view text("[a]\nj=1\nk=v\0w\nl=2\n", 19);
   IniDocument document = Parsed(text);

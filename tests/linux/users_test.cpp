@@ -51,6 +51,14 @@ TEST(Users, AreThePeopleInTheOrderOfThePasswordFile) {
   EXPECT_THAT(All(), ElementsAre("zoe", "Alice", "\xc3\xa4nne", "last"));
 }
 
+TEST(Users, AreFoundInAFileOfOneLine) {
+  const TemporaryRoot root;
+  for (const char* ending : {"", "\n"}) {
+    root.Write("/etc/passwd", std::string("zoe:x:1000:100::/:/bin/sh") + ending);
+    EXPECT_THAT(All(), ElementsAre("zoe")) << ending;
+  }
+}
+
 TEST(Users, RangeIsThatOfLoginDefs) {
   const TemporaryRoot root;
   root.Write("/etc/passwd", kPasswd);

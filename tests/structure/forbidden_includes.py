@@ -23,7 +23,7 @@ ALLOWED = {
     "linux/settings": {"linux/status", "linux/system", "linux/text", "linux/box", "platform"},
     "linux/host": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "platform"},
     "linux/exports": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/host", "platform"},
-    "linux/idmap": {"linux/status", "linux/system", "linux/text", "linux/box"},
+    "linux/idmap": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/host", "linux/idmap/plugin"},
     "linux/kerberos": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "platform"},
     "linux/service": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/settings",
         "platform"},

@@ -1,4 +1,4 @@
-// What a daemon of NFS computes for many mappings: libnfsidmap with the method "vorn", beside libnfsidmap's own method
+// The cost of many mappings to a daemon of NFS: libnfsidmap with the method "vorn", beside libnfsidmap's own method
 // "static" with the same mappings (the peer). With "static" each change is a start of two daemons.
 #include <benchmark/benchmark.h>
 #include <sys/resource.h>

@@ -151,7 +151,7 @@ Result<TableText> ReadTable(std::string_view text, OptionLists* options) {
   return table;
 }
 
-// What the files say of one directory.
+// The rules of the files for one directory.
 struct Rules {
   std::vector<std::pair<const ExportEntry*, int>> entries;  // with the number of their options
   bool has_fault = false;

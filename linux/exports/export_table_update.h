@@ -1,4 +1,4 @@
-// What a change of the exports files changes in the table of what is exported.
+// The difference between the exports files and the table of what is exported.
 #ifndef VORN_LINUX_EXPORTS_EXPORT_TABLE_UPDATE_H
 #define VORN_LINUX_EXPORTS_EXPORT_TABLE_UPDATE_H
 

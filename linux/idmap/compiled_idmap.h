@@ -15,8 +15,8 @@
 
 namespace vorn {
 
-// What a daemon must be restarted for: idmapd.conf(5) without the mappings that the table has. Its first lines name
-// the versions of the other files that libnfsidmap reads.
+// The settings for which a daemon must be restarted: idmapd.conf(5) without the mappings that the table has. Its first
+// lines name the versions of the other files that libnfsidmap reads.
 inline constexpr char kDaemonSettingsFile[] = "/var/lib/vorn/idmap/settings";
 
 // Compiles what is stored now: writes the table (mapping_table.h) and kDaemonSettingsFile, each only if it changes.

@@ -21,10 +21,10 @@ struct ExportsEnvironment {
 // Writes the difference between the exports files and the table of what is exported into that table, under the locks
 // of exportfs(8), and makes the kernel's server forget what the difference concerns (ForgetExports).
 //
-// What is served stays served, whatever the files have elsewhere: a faulty line changes nothing, and a host that the
-// resolver does not know, or a resolver that does not answer, takes nothing from a rule that is in force. The log and
-// the warnings of the call name each faulty line and each host without an address, and each exported directory that
-// is no share any more (CheckLeftShares).
+// An export that is served stays served, whatever the files have elsewhere: a faulty line changes nothing, and a host
+// that the resolver does not know, or a resolver that does not answer, takes nothing from a rule that is in force. The
+// log and the warnings of the call name each faulty line and each host without an address, and each exported directory
+// that is no share any more (CheckLeftShares).
 //
 // `resolved` are the keys of host names whose remembered addresses are new.
 Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::set<std::string>& resolved = {});

@@ -1,4 +1,4 @@
-// What the kernel's server remembers of the export table: the caches of sunrpc, in files below /proc/net/rpc.
+// The parts of the export table that the kernel's server remembers: the caches of sunrpc, in files below /proc/net/rpc.
 #ifndef VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 #define VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 

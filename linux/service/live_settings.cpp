@@ -11,7 +11,6 @@
 namespace vorn {
 namespace {
 
-
 // The "-" ignores a failure: a size that the kernel refuses must not keep NFS from starting.
 constexpr char kDropInText[] =
     "# Kept by the NFS settings: gives the kernel what nfs.conf says and the daemons of NFS do not tell it.\n"
@@ -38,7 +37,8 @@ Status PrepareTransferSizes(Box& box) {
   if (!lock.status().ok()) return lock.status();
   const Result<StoredFile> before = box.Read(kDropInFile);
   if (!before.ok()) return before.status();
-  return before->text == kDropInText ? box.Confirm(kDropInFile) : box.Replace(kDropInFile, kDropInText, before->version);
+  return before->text == kDropInText ? box.Confirm(kDropInFile)
+                                     : box.Replace(kDropInFile, kDropInText, before->version);
 }
 
 Status ApplyTransferSizes(Box& box, int read_size, int write_size) {

@@ -157,7 +157,8 @@ Status PutDaemonPort(Box& box, const DaemonPort& daemon, const NFSConfRecord& re
     return {};
   }
   document->Remove(daemon.section, daemon.key);
-  const Result<NFSConfiguration> others = NFSConfiguration::Open(box, IniFiles::Draft{kNFSRecordFile, document->Text()});
+  const Result<NFSConfiguration> others =
+      NFSConfiguration::Open(box, IniFiles::Draft{kNFSRecordFile, document->Text()});
   if (!others.ok()) return others.status();
   if (PortInForce(*others, daemon) != 0) Put(document, daemon.section, daemon.key, NumberValue(0));
   return {};

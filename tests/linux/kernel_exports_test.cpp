@@ -47,7 +47,7 @@ class KernelExports : public testing::Test {
     folder_.Write("/" + cache + "/flush", "");
   }
 
-  // What was written to the channel, with "PAST" for a time that has passed.
+  // The lines that were written to the channel, with "PAST" for a time that has passed.
   std::vector<std::string> Expired(const std::string& cache) const {
     std::vector<std::string> lines;
     std::istringstream text(folder_.Read("/" + cache + "/channel").value_or(""));

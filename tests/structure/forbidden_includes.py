@@ -25,8 +25,8 @@ ALLOWED = {
     "linux/exports": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/host", "platform"},
     "linux/idmap": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/host", "linux/idmap/plugin"},
     "linux/kerberos": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "platform"},
-    "linux/service": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/settings",
-        "platform"},
+    "linux/service": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
+        "linux/settings", "platform"},
     "linux/contract": {
         "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
         "linux/idmap", "linux/kerberos", "linux/service", "platform"},

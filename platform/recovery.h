@@ -5,7 +5,8 @@
 namespace VORN {
 
 // Removes the temporary files that killed writers left beside the box's configuration files. Takes the configuration
-// lock of the box, so the temporary files of a writer that is at work stay. Returns 0, or -1 with the reason of the
+// lock of the box, so the temporary files of a writer that is at work stay. Does not wait for the lock, and fails if
+// another program owns it. Returns 0, or -1 with the reason of the
 // first failure in the error facility (core.h); the other files are cleaned up all the same. What is left then is
 // removed by the next change of its file.
 int RemoveLeftovers();

@@ -91,7 +91,7 @@ def test_the_package_creates_the_accounts_of_the_squash_modes(box, client, witho
 
 
 def test_a_lock_of_another_program_survives_a_restart(box):
-    del box
+    box.foresees("config.lock is locked by another process for too long")  # vornd looks for leftovers when it starts
     with open("/run/vorn/config.lock", "a", encoding="ascii") as held:
         fcntl.flock(held, fcntl.LOCK_EX)
         run("systemctl", "restart", "vornd")

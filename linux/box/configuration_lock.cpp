@@ -12,7 +12,6 @@
 namespace vorn {
 namespace {
 
-constexpr char kLockFile[] = "/run/vorn/config.lock";
 constexpr std::chrono::seconds kLockLimit{20};
 
 // The configuration context of one box.
@@ -34,7 +33,7 @@ Context* Find(const Box& box) {
 }
 
 Status TakeLock(Context* context) {
-  Result<std::unique_ptr<HeldLock>> lock = context->box->Lock(kLockFile, kLockLimit);
+  Result<std::unique_ptr<HeldLock>> lock = context->box->Lock(kConfigurationLockFile, kLockLimit);
   if (!lock.ok()) return lock.status();
   context->lock = std::move(*lock);
   return {};

@@ -9,6 +9,8 @@
 
 namespace vorn {
 
+constexpr char kConfigurationLockFile[] = "/run/vorn/config.lock";
+
 // The thread that constructs an object owns the box's configuration lock until it destroys it. Objects of
 // one thread nest; the outermost one is the configuration context, which also remembers the first version
 // read of each file (see FirstReads). In a call that may not write an object takes no lock and succeeds.

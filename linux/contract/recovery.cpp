@@ -1,5 +1,6 @@
 #include "recovery.h"
 
+#include <chrono>
 #include <utility>
 
 #include "configuration_lock.h"
@@ -18,7 +19,12 @@ namespace {
 // Every file that the platform replaces.
 constexpr const char* kFiles[] = {kExportsFile, kIDMapFile, kNFSRecordFile, kKeytabFile, kDropInFile, kFirewallFile};
 
+// Fails if the configuration lock is not free. A start must not wait for another program, and the next change of a file
+// removes its leftovers as well.
+Status CheckFree(Box& box) { return box.Lock(kConfigurationLockFile, std::chrono::milliseconds(100)).status(); }
+
 Status ConfirmFiles(Box& box) {
+  if (Status status = CheckFree(box); !status.ok()) return status;
   const ConfigurationLock lock(box);
   Status first = lock.status();
   if (!first.ok()) return first;

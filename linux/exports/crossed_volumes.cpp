@@ -35,11 +35,12 @@ std::vector<std::string> DescribeCrossedVolumes(Box& box, const std::vector<Shar
     const std::set<std::string> clients = ClientsOf(files, volume, paths);
     std::string opened;
     for (const std::string& client : crossing) {
-      if (clients.count(ExportClientKey(client)) == 0) opened += (opened.empty() ? "" : ", ") + client;
+      if (clients.count(ExportClientKey(client)) == 0) opened.append(opened.empty() ? "" : ", ").append(client);
     }
     if (clients.empty() || opened.empty()) continue;
-    sentences.push_back("the option crossmnt of " + path + " also opens " + volume + " to " + opened +
-                        ", which the rules of " + volume + " do not name");
+    std::string sentence = "the option crossmnt of ";
+    sentence.append(path).append(" also opens ").append(volume).append(" to ").append(opened);
+    sentences.push_back(sentence.append(", which the rules of ").append(volume).append(" do not name"));
   }
   return sentences;
 }

@@ -10,7 +10,8 @@ namespace {
 // Returns the path of a line as it is written, or an empty text if it is quoted or escaped.
 std::string_view PlainPath(const ExportsLines& lines, std::size_t line) {
   const ExportSpan& span = lines.spans()[line];
-  const auto rest = std::string_view(lines.text()).substr(span.path, span.end - span.path);
+  const std::string_view text = lines.text();
+  const std::string_view rest = text.substr(span.path, span.end - span.path);
   std::size_t end = 0;
   while (end < rest.size() && !ExportsReader::EndsWord(static_cast<unsigned char>(rest[end]))) {
     if (rest[end] == '"' || rest[end] == '\\') return {};

@@ -181,7 +181,7 @@ Status WriteShareRules(Box& box, const std::string& path, const ExportRuleList* 
   }
   if (Status status = writer.CheckForeign(); !status.ok()) return status;
   const std::vector<ExportEntry>& entries = writer.entries();
-  const Status status = WriteEntries(box, *files->front(), path, share, entries, RemovesAll(list));
+  Status status = WriteEntries(box, *files->front(), path, share, entries, RemovesAll(list));
   if (!status.ok()) return status;
   for (const std::string& sentence : DescribeCrossedVolumes(box, *files, path, entries)) Notice(sentence);
   return {};

@@ -38,7 +38,7 @@ FileStamp StampOf(const struct stat& file) {
 
 // Reads a file to its end. `size` is the size to expect.
 Result<std::string> ReadAll(int file, std::size_t size, const std::string& path) {
-  constexpr std::size_t kFurther = 64 * 1024;
+  constexpr std::size_t kFurther = std::size_t{64} << 10;
   std::string text(std::min(size, kLargestFile) + 1, '\0');  // one byte more, to see the end
   std::size_t filled = 0;
   for (;;) {

@@ -46,8 +46,8 @@ class CallContext {
   const std::vector<std::string>& warnings() const;  // what a caller should know of a call that succeeded
 
   // For the platform. A context keeps at most 32 sentences of a kind, of at most 1024 bytes each.
-  void AddReason(std::string sentence);
-  void AddWarning(std::string sentence);
+  void AddReason(const std::string& sentence);
+  void AddWarning(const std::string& sentence);
 
  private:
   CallDescription description_;

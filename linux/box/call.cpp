@@ -42,7 +42,7 @@ const std::vector<std::string>& CallContext::reasons() const { return reasons_; 
 const std::vector<std::string>& CallContext::warnings() const { return warnings_; }
 
 // A sentence may quote a file, which need not be UTF-8.
-void CallContext::AddReason(std::string sentence) { Add(vorn::ToValidUtf8(sentence), &reasons_); }
-void CallContext::AddWarning(std::string sentence) { Add(vorn::ToValidUtf8(sentence), &warnings_); }
+void CallContext::AddReason(const std::string& sentence) { Add(vorn::ToValidUtf8(sentence), &reasons_); }
+void CallContext::AddWarning(const std::string& sentence) { Add(vorn::ToValidUtf8(sentence), &warnings_); }
 
 }  // namespace VORN

@@ -136,7 +136,7 @@ class Run:
 
     def _wait(self, step, result, output):
         """Runs the command to its end, or kills it. Returns its exit status."""
-        # The other lanes wait for clocks and guests; the compilers of the main lane must not slow them down.
+        # The other lanes wait for clocks; the compilers of the main lane must not slow them down.
         prefix = ("nice", "-n", "10") if step.lane == "main" else ()
         with self._lock:
             process = subprocess.Popen(  # pylint: disable=consider-using-with

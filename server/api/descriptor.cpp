@@ -1,6 +1,8 @@
 #include "descriptor.h"
 
+#include <algorithm>
 #include <charconv>
+#include <initializer_list>
 #include <utility>
 
 #include "json_input.h"
@@ -17,6 +19,7 @@ int ParseCode(const std::string& name) {
 
 bool IsErrorCode(const Json::Value& entry) {
   if (!entry.isObject() || !entry["status"].isInt() || !entry["text"].isString()) return false;
+  if (!entry["parameters"].isNull() && !entry["parameters"].isBool()) return false;
   const int status = entry["status"].asInt();
   return status >= 400 && status <= 599;
 }
@@ -24,6 +27,17 @@ bool IsErrorCode(const Json::Value& entry) {
 bool Fault(std::string* error, std::string text) {
   *error = std::move(text);
   return false;
+}
+
+// Returns the value at the path of these members, or nullptr if there is none.
+const Json::Value* Find(const Json::Value& value, std::initializer_list<std::string_view> path) {
+  const Json::Value* found = &value;
+  for (const std::string_view name : path) {
+    if (!found->isObject()) return nullptr;
+    found = found->find(name.data(), name.data() + name.size());
+    if (found == nullptr) return nullptr;
+  }
+  return found;
 }
 
 // Returns whether the operation has a request body that is a form (OpenAPI 3.1, "Request Body Object").
@@ -35,11 +49,17 @@ bool TakesForm(const Json::Value& operation) {
 }  // namespace
 
 std::optional<Descriptor> Descriptor::Parse(std::string_view json, std::string* error) {
-  const std::optional<Json::Value> document = ParseJsonObject(json, error);
+  std::optional<Json::Value> document = ParseJsonObject(json, error);
   if (!document) return std::nullopt;
   Descriptor descriptor;
-  if (!descriptor.ReadErrorCodes((*document)["x-error-codes"], error)) return std::nullopt;
-  if (!descriptor.ReadPaths((*document)["paths"], error)) return std::nullopt;
+  descriptor.document_ = *std::move(document);
+  const Json::Value& read = descriptor.document_;
+  const Json::Value* schemas = Find(read, {"components", "schemas"});
+  if (!descriptor.ReadErrorCodes(read["x-error-codes"], error) ||
+      !descriptor.ReadSchemas(schemas == nullptr ? Json::Value() : *schemas, error) ||
+      !descriptor.ReadPaths(read["paths"], error)) {
+    return std::nullopt;
+  }
   return descriptor;
 }
 
@@ -52,7 +72,7 @@ bool Descriptor::ReadErrorCodes(const Json::Value& codes, std::string* error) {
       return Fault(error,
                    "x-error-codes: \"" + name + "\" needs a number for its name, a status of 400 to 599 and a text");
     }
-    codes_[code] = {entry["status"].asInt(), entry["text"].asString()};
+    codes_[code] = {entry["status"].asInt(), entry["text"].asString(), entry["parameters"].asBool()};
   }
   return true;
 }
@@ -67,7 +87,44 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
     if (!reads_only.isNull() && !reads_only.isBool()) {
       return Fault(error, "paths: \"" + path + "\": x-read-only is neither true nor false");
     }
+    if (!CheckContent(Find(operation, {"requestBody", "content"}), error) ||
+        !CheckContent(Find(operation, {"responses", "200", "content"}), error) ||
+        !CheckCodes(operation["x-error-codes"], error)) {
+      return Fault(error, "paths: \"" + path + "\": " + *error);
+    }
     methods_[path] = {reads_only.isBool() && reads_only.asBool(), TakesForm(operation)};
+  }
+  return true;
+}
+
+bool Descriptor::ReadSchemas(const Json::Value& schemas, std::string* error) {
+  if (!schemas.isNull() && !schemas.isObject()) return Fault(error, "components: schemas is not an object");
+  schemas_ = Schemas(schemas);
+  for (const std::string& name : schemas.getMemberNames()) {
+    if (!schemas_.Support(schemas[name], error)) return Fault(error, "schema \"" + name + "\": " + *error);
+  }
+  return true;
+}
+
+bool Descriptor::CheckContent(const Json::Value* content, std::string* error) const {
+  if (content == nullptr) return true;
+  if (!content->isObject()) return Fault(error, "a content is not an object");
+  return std::all_of(content->begin(), content->end(), [&](const Json::Value& media_type) {
+    const Json::Value* schema = Find(media_type, {"schema"});
+    return schema == nullptr || schemas_.Support(*schema, error);
+  });
+}
+
+bool Descriptor::CheckCodes(const Json::Value& codes, std::string* error) const {
+  if (codes.isNull()) return true;
+  if (!codes.isObject()) return Fault(error, "x-error-codes is not an object");
+  for (const std::string& name : codes.getMemberNames()) {
+    const Json::Value& entry = codes[name];
+    if (codes_.count(ParseCode(name)) == 0) return Fault(error, "the error code \"" + name + "\" is not described");
+    if (!entry.isObject() || !entry["when"].isString()) {
+      return Fault(error, "the error code \"" + name + "\" needs a text \"when\"");
+    }
+    if (entry.isMember("details") && !schemas_.Support(entry["details"], error)) return false;
   }
   return true;
 }
@@ -81,6 +138,12 @@ Descriptor::ErrorCode Descriptor::Describe(int code) const {
 Descriptor::Method Descriptor::MethodAt(const std::string& path) const {
   const auto found = methods_.find(path);
   return found == methods_.end() ? Method{} : found->second;
+}
+
+std::vector<std::string> Descriptor::ParameterFaults(const std::string& path, const Json::Value& parameters) const {
+  const Json::Value* schema =
+      Find(document_, {"paths", path, "post", "requestBody", "content", "application/json", "schema"});
+  return schema == nullptr ? std::vector<std::string>() : schemas_.Faults(parameters, *schema);
 }
 
 std::vector<std::string> Descriptor::Paths() const {

@@ -4,9 +4,14 @@
 //   - "paths": a path item for each method, under the path that the method is called at, for example
 //         "/api/VORN.Core.FileServ.NFS/v1/get": {"post": {"summary": "...", "x-read-only": true}}
 //     "x-read-only" (default false) declares that the method changes nothing. A request body with a content of
-//     type "multipart/form-data" declares that the method takes a file.
+//     type "multipart/form-data" declares that the method takes a file. The schemas of the request body and of the
+//     answer 200 use the keywords of schema.h; that of the answer describes "data" only, because the server adds the
+//     envelope. "x-error-codes" lists the codes that the method answers, each with "when" and, if it has details, their
+//     schema: {"2351": {"when": "...", "details": {...}}}
 //   - "x-error-codes": {"2301": {"status": 400, "text": "..."}}, the HTTP status of an error code and the text
-//     that an administrator reads.
+//     that an administrator reads. "parameters": true declares that the code is about the parameters: the server then
+//     adds what the schema of the request says about them. "causes" and "remedy" are for the documentation.
+//   - "components": {"schemas": {...}}, the named schemas, and "tags", as in OpenAPI.
 #ifndef VORN_SERVER_DESCRIPTOR_H
 #define VORN_SERVER_DESCRIPTOR_H
 
@@ -18,6 +23,8 @@
 #include <string_view>
 #include <vector>
 
+#include "schema.h"
+
 namespace vorn::server {
 
 // Immutable after Parse(), so any thread may read it.
@@ -26,6 +33,7 @@ class Descriptor {
   struct ErrorCode {
     int status;
     std::string text;
+    bool about_parameters = false;
   };
 
   // Returns the description of a method. A method without a description may write and takes no file.
@@ -48,10 +56,22 @@ class Descriptor {
   // Returns the paths of all described methods.
   std::vector<std::string> Paths() const;
 
+  // Returns what the schema of the method at `path` says against these parameters, see Schemas::Faults(). An empty list
+  // if there is no such schema.
+  std::vector<std::string> ParameterFaults(const std::string& path, const Json::Value& parameters) const;
+
+  // The whole document; null for an empty descriptor.
+  const Json::Value& document() const { return document_; }
+
  private:
   bool ReadErrorCodes(const Json::Value& codes, std::string* error);
   bool ReadPaths(const Json::Value& paths, std::string* error);
+  bool ReadSchemas(const Json::Value& schemas, std::string* error);
+  bool CheckContent(const Json::Value* content, std::string* error) const;
+  bool CheckCodes(const Json::Value& codes, std::string* error) const;
 
+  Json::Value document_;
+  Schemas schemas_;
   std::map<int, ErrorCode> codes_;
   std::map<std::string, Method> methods_;
 };

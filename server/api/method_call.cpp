@@ -6,6 +6,7 @@
 #include <string>
 #include <utility>
 #include <variant>
+#include <vector>
 
 #include "answer.h"
 #include "log_quote.h"
@@ -43,15 +44,23 @@ Response AnswerOf(const Route& route, Function function) noexcept {
   }
 }
 
+// Returns the reasons of a failed call: those of the platform. If it has none, and the code is about the parameters,
+// the description of the method says which ones are faulty.
+std::vector<std::string> ReasonsOf(const Route& route, const Descriptor::ErrorCode& code,
+                                   const VORN::CallContext& context, const VORN::APIRequest& request) {
+  if (!context.reasons().empty() || !code.about_parameters) return context.reasons();
+  return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
+}
+
 Response CallEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
   const VORN::CallContext context(std::move(description));
   VORN::APIRequest request(std::move(parameters));
   VORN::APIResponse response;
   route.row.handler(&request, &response);
   if (!response.answered()) return NoAnswer(route, "the method ended without one");
-  const Remarks remarks{context.reasons(), context.warnings()};
-  if (response.error() == 0) return Success(response.data(), remarks);
+  if (response.error() == 0) return Success(response.data(), {{}, context.warnings()});
   const Descriptor::ErrorCode code = route.descriptor->Describe(response.error());
+  const Remarks remarks{ReasonsOf(route, code, context, request), context.warnings()};
   return Failure(code.status, response.error(), code.text, response.data(), remarks);
 }
 

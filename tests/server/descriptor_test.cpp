@@ -28,13 +28,34 @@ TEST(Descriptor, WithoutCodesIsStillOne) {
 
 TEST(Descriptor, IsRefusedWhenFaulty) {
   for (const char* json :
-       {"", "[]", "{", R"({"x-error-codes": []})", R"({"x-error-codes": {"a": {"status": 400, "text": "x"}}})",
+       {"",
+        "[]",
+        "{",
+        R"({"x-error-codes": []})",
+        R"({"x-error-codes": {"a": {"status": 400, "text": "x"}}})",
         R"({"x-error-codes": {"1x": {"status": 400, "text": "x"}}})",
-        R"({"x-error-codes": {"0": {"status": 400, "text": "x"}}})", R"({"x-error-codes": {"1": 400}})",
-        R"({"x-error-codes": {"1": {"text": "x"}}})", R"({"x-error-codes": {"1": {"status": 200, "text": "x"}}})",
+        R"({"x-error-codes": {"0": {"status": 400, "text": "x"}}})",
+        R"({"x-error-codes": {"1": 400}})",
+        R"({"x-error-codes": {"1": {"text": "x"}}})",
+        R"({"x-error-codes": {"1": {"status": 200, "text": "x"}}})",
         R"({"x-error-codes": {"1": {"status": 600, "text": "x"}}})",
-        R"({"x-error-codes": {"1": {"status": 400, "text": 1}}})", R"({"paths": []})", R"({"paths": {"/a": 1}})",
-        R"({"paths": {"/a": {"get": {}}}})", R"({"paths": {"/a": {"post": {"x-read-only": "true"}}}})"}) {
+        R"({"x-error-codes": {"1": {"status": 400, "text": 1}}})",
+        R"({"paths": []})",
+        R"({"paths": {"/a": 1}})",
+        R"({"paths": {"/a": {"get": {}}}})",
+        R"({"paths": {"/a": {"post": {"x-read-only": "true"}}}})",
+        R"({"components": {"schemas": []}})",
+        R"({"components": {"schemas": {"A": {"maxLength": 1}}}})",
+        R"({"x-error-codes": {"1": {"status": 400, "text": "x", "parameters": "yes"}}})",
+        R"({"paths": {"/a": {"post": {"requestBody": {"content": []}}}}})",
+        R"({"paths": {"/a": {"post": {"requestBody": {"content": {"x": {"schema": {"maxLength": 1}}}}}}}})",
+        R"({"paths": {"/a": {"post": {"responses": {"200": {"content": {"x": {"schema": {"maxLength": 1}}}}}}}}})",
+        R"({"paths": {"/a": {"post": {"x-error-codes": []}}}})",
+        R"({"paths": {"/a": {"post": {"x-error-codes": {"1": {"when": "x"}}}}}})",
+        R"({"x-error-codes": {"1": {"status": 400, "text": "x"}},
+            "paths": {"/a": {"post": {"x-error-codes": {"1": {}}}}}})",
+        R"({"x-error-codes": {"1": {"status": 400, "text": "x"}},
+            "paths": {"/a": {"post": {"x-error-codes": {"1": {"when": "x", "details": {"maxLength": 1}}}}}}})"}) {
     std::string error;
     EXPECT_FALSE(Descriptor::Parse(json, &error)) << json;
     EXPECT_NE(error, "") << json;
@@ -54,6 +75,18 @@ TEST(Descriptor, TellsWhatAMethodDoes) {
   EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/set").takes_file);
   EXPECT_TRUE(descriptor->MethodAt("/api/A/v1/put").takes_file);
   EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/unknown").reads_only) << "an undescribed method may write";
+}
+
+TEST(Descriptor, TellsWhichParametersAreFaulty) {
+  std::string error;
+  const auto descriptor = Descriptor::Parse(R"({"paths": {"/a": {"post": {"requestBody": {"content": {
+      "application/json": {"schema": {"required": ["size"]}}}}}}, "/b": {"post": {}}}})",
+                                            &error);
+  ASSERT_TRUE(descriptor) << error;
+  const Json::Value none(Json::objectValue);
+  EXPECT_EQ(descriptor->ParameterFaults("/a", none), std::vector<std::string>{"\"size\" is missing."});
+  EXPECT_TRUE(descriptor->ParameterFaults("/b", none).empty());
+  EXPECT_TRUE(descriptor->ParameterFaults("/c", none).empty());
 }
 
 TEST(Descriptor, OfTheNfsModuleDescribesItsMethods) {
@@ -83,7 +116,9 @@ TEST(Descriptor, OfTheNfsModuleCoversItsCodes) {
     EXPECT_EQ(descriptor->Describe(code).text.find("error code"), std::string::npos) << code;
   }
   EXPECT_EQ(descriptor->Describe(2301).status, 400);
+  EXPECT_TRUE(descriptor->Describe(2301).about_parameters);
   EXPECT_EQ(descriptor->Describe(2302).status, 500);
+  EXPECT_FALSE(descriptor->Describe(2302).about_parameters);
 }
 
 }  // namespace

@@ -72,6 +72,33 @@ TEST(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
   EXPECT_EQ(VORN::CallContext::Current(), nullptr);
 }
 
+void RefuseParameters(VORN::APIRequest* request, VORN::APIResponse* response) {
+  if (request->GetParam("explain", false).asBool()) VORN::CallContext::Current()->AddReason("Too large.");
+  response->SetError(request->GetParam("code", 0).asInt(), {});
+}
+
+TEST(EntryFunction, IsAnsweredWithTheFaultyParameters) {
+  std::string error;
+  const auto descriptor = Descriptor::Parse(R"({
+      "x-error-codes": {"2301": {"status": 400, "text": "Wrong.", "parameters": true},
+                        "2302": {"status": 500, "text": "Failed."}},
+      "paths": {"/api/Api/v1/method": {"post": {"requestBody": {"content": {"application/json": {"schema": {
+          "required": ["size"]}}}}}}}})",
+                                            &error);
+  ASSERT_TRUE(descriptor) << error;
+  const auto run = [&descriptor](int code, bool explain) {
+    Json::Value parameters;
+    parameters["code"] = code;
+    parameters["explain"] = explain;
+    return RunEntryFunction({{"Api", 1, "method", RefuseParameters}, &*descriptor, {}}, parameters, {}).body;
+  };
+  EXPECT_EQ(run(2301, false),
+            R"({"success":false,"error":{"code":2301,"text":"Wrong.","reasons":["\"size\" is missing."]}})");
+  EXPECT_EQ(run(2301, true), R"({"success":false,"error":{"code":2301,"text":"Wrong.","reasons":["Too large."]}})")
+      << "the platform's own reasons come alone";
+  EXPECT_EQ(run(2302, false), R"({"success":false,"error":{"code":2302,"text":"Failed."}})");
+}
+
 // A body that reports its destruction.
 class TracedBody : public Body {
  public:

@@ -16,7 +16,7 @@ namespace vorn {
 namespace {
 
 constexpr std::size_t kMostSources = 1000;
-constexpr int kMostReferences = 16;
+constexpr char kEnvironment[] = "environment";
 
 // The names in the folder that are read.
 bool IsConfigurationFile(std::string_view name) {
@@ -80,8 +80,9 @@ std::string IniFound::Where() const { return file->location() + ":" + std::to_st
 Result<IniFiles> IniFiles::Open(Box& box, const std::string& path, const std::optional<Draft>& draft) {
   IniFiles files;
   if (Status status = files.AddAll(box, path, draft); !status.ok()) return status;
-  const Status& includes = files.CheckIncludes();
-  if (!includes.ok() && !draft) NoticeOnce(path, files.sources_.front().file->version(), includes.reason());
+  if (files.readable_.ok()) files.CheckReferences();
+  const Status& readable = files.CheckReadable();
+  if (!readable.ok() && !draft) NoticeOnce(path, files.sources_.front().file->version(), readable.reason());
   return files;
 }
 
@@ -139,11 +140,11 @@ Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft,
 }
 
 void IniFiles::Reject(const Source& source, const Opened* including, const std::string& why) {
-  if (!includes_.ok()) return;
+  if (!readable_.ok()) return;
   const std::string where = including == nullptr
                                 ? source.file->location()
                                 : including->source.file->location() + ":" + std::to_string(source.position.back());
-  includes_ = Status::Failure(kSyntax, where + ": " + why);
+  readable_ = Status::Failure(kSyntax, where + ": " + why);
 }
 
 Status IniFiles::AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft) {
@@ -178,19 +179,36 @@ std::optional<IniFound> IniFiles::FindStored(std::string_view section, std::stri
   return last->found;
 }
 
-std::optional<std::string_view> IniFiles::Resolve(std::string_view value) const {
-  for (int references = 0; !value.empty() && value.front() == '$'; ++references) {
-    const std::optional<IniFound> variable = FindStored("environment", value.substr(1));
-    if (!variable || references == kMostReferences) return std::nullopt;
+IniFiles::Resolved IniFiles::Resolve(std::string_view value) const {
+  std::set<std::string> passed;
+  while (!value.empty() && value.front() == '$') {
+    if (!passed.insert(LowerAscii(value)).second) return {std::nullopt, true};
+    const std::optional<IniFound> variable = FindStored(kEnvironment, value.substr(1));
+    if (!variable) return {};
     value = variable->stored;
   }
-  return value;
+  return {value};
+}
+
+// A variable that no value outside of [environment] refers to is never read.
+void IniFiles::CheckReferences() {
+  for (const Source& source : sources_) {
+    for (const IniReference& reference : source.file->document().References()) {
+      const bool is_inherited = reference.section == IniDocument::kInherited;
+      const std::string section = is_inherited ? source.inherited.value_or("") : reference.section;
+      const std::optional<IniFound> found = FindStored(section, reference.key);
+      if (section == kEnvironment || !found || !Resolve(found->stored).is_circular) continue;
+      readable_ = Status::Failure(kSyntax, found->Where() + ": the value of " + std::string(found->key) +
+                                               " refers to itself, and the programs of nfs-utils follow it forever");
+      return;
+    }
+  }
 }
 
 std::optional<IniFound> IniFiles::Find(std::string_view section, std::string_view key) const {
   std::optional<IniFound> found = FindStored(section, key);
   if (!found) return std::nullopt;
-  const std::optional<std::string_view> value = Resolve(found->stored);
+  const std::optional<std::string_view> value = Resolve(found->stored).value;
   if (!value) return std::nullopt;
   found->value = *value;
   return found;
@@ -215,7 +233,7 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
       if (!deciding || deciding->file != setting.file || deciding->line != setting.line) return true;
       if (!seen.insert(LowerAscii(setting.key)).second) return true;
     }
-    const std::optional<std::string_view> value = Resolve(setting.stored);
+    const std::optional<std::string_view> value = Resolve(setting.stored).value;
     setting.value = value.value_or("");
     return !value.has_value();
   };

@@ -30,10 +30,10 @@ struct IniFound {
 // of a key counts. A file that is missing or not a regular file is skipped, as the readers do.
 //
 // A file that includes itself is read once more for each section that it can begin in, which gives the values of
-// programs that read it to the end. They do not: see CheckIncludes.
+// programs that read it to the end. They do not: see CheckReadable.
 //
-// "$name" refers to a key of the section [environment]. The readers look for a variable of their own process first;
-// its value is unknown here.
+// "$name" refers to a key of the section [environment], whose value may be a reference again. The readers look for a
+// variable of their own process first; its value is unknown here.
 class IniFiles {
  public:
   // A text that takes the place of what is stored at `path`.
@@ -59,9 +59,10 @@ class IniFiles {
   // The same files as owners. Two readings with equal lists have equal settings.
   std::vector<std::shared_ptr<const void>> sources() const;
 
-  // Fails with kSyntax, naming file and line, if a file includes itself, directly or through others. The programs of
-  // nfs-utils then read it again until they crash, so nothing is in force. Opening logs the same sentence once.
-  const Status& CheckIncludes() const { return includes_; }
+  // Fails with kSyntax, naming file and line, if a program of nfs-utils cannot read the files to the end, so that
+  // nothing is in force: a file includes itself, directly or through others, or a value refers to itself in this way.
+  // Opening logs the same sentence once.
+  const Status& CheckReadable() const { return readable_; }
 
   // Fails with kChangedBehind if the configuration context of this thread has first read another version of one of
   // the files, or another list of files.
@@ -86,16 +87,23 @@ class IniFiles {
     bool Has(const Source& other) const;
   };
 
+  // What a value stands for; nullopt if it refers to nothing, or to itself.
+  struct Resolved {
+    std::optional<std::string_view> value;
+    bool is_circular = false;
+  };
+
   Status AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft);
   Status Add(Box& box, Source source, const std::optional<Draft>& draft, const Opened* including = nullptr);
   Status AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft);
   void Reject(const Source& source, const Opened* including, const std::string& why);
-  std::optional<std::string_view> Resolve(std::string_view value) const;
+  Resolved Resolve(std::string_view value) const;
+  void CheckReferences();
 
   std::string folder_;
   Version names_;  // stands for the list of files in the folder
   std::vector<Source> sources_;
-  Status includes_;
+  Status readable_;
 };
 
 }  // namespace vorn

@@ -203,7 +203,7 @@ Status WriteIDMap(Box& box, const std::string& path, const IDMapChange& change) 
   if (!read.ok()) return read.status();
   const IDMap& now = **read;
   if (Status status = now.files().CheckUnchanged(box); !status.ok()) return status;
-  if (const Status& status = now.files().CheckIncludes(); !status.ok()) return status;
+  if (const Status& status = now.files().CheckReadable(); !status.ok()) return status;
   const Plan plan = change.mappings == nullptr ? Plan() : Difference(now, *change.mappings);
   if (change.mappings != nullptr) {
     if (Status status = CheckCase(plan, *change.mappings); !status.ok()) return status;

@@ -38,8 +38,19 @@ Result<NFSConfiguration> NFSConfiguration::Open(Box& box, const std::optional<In
   return NFSConfiguration(std::move(*files), draft.has_value());
 }
 
+std::optional<IniFound> NFSConfiguration::Find(const char* section, const char* key) const {
+  std::optional<IniFound> found = files_.Find(section, key);
+  if (found || !files_.CheckReadable().ok()) return found;
+  const std::optional<IniFound> unresolved = files_.FindStored(section, key);
+  if (unresolved) {
+    Remark(*unresolved, "refers to " + std::string(unresolved->stored.substr(1)) +
+                            ", which [environment] does not define, and is ignored");
+  }
+  return found;
+}
+
 int NFSConfiguration::Port(const char* section, const char* key, int fallback) const {
-  const std::optional<IniFound> setting = files_.Find(section, key);
+  const std::optional<IniFound> setting = Find(section, key);
   if (!setting) return fallback;
   bool is_whole = false;
   const std::optional<int> port = LeadingNumber(std::string(setting->value), 10, kLargestPort, &is_whole);
@@ -49,7 +60,7 @@ int NFSConfiguration::Port(const char* section, const char* key, int fallback) c
 }
 
 bool NFSConfiguration::Switch(const char* section, const char* key, bool fallback) const {
-  const std::optional<IniFound> setting = files_.Find(section, key);
+  const std::optional<IniFound> setting = Find(section, key);
   if (!setting) return fallback;
   if (IsOneOf(setting->value, kYes)) return true;
   if (IsOneOf(setting->value, kNo)) return false;
@@ -58,7 +69,7 @@ bool NFSConfiguration::Switch(const char* section, const char* key, bool fallbac
 }
 
 int NFSConfiguration::Number(const char* section, const char* key, int fallback) const {
-  const std::optional<IniFound> setting = files_.Find(section, key);
+  const std::optional<IniFound> setting = Find(section, key);
   if (!setting) return fallback;
   bool is_whole = false;
   constexpr int kLargest = std::numeric_limits<int>::max();
@@ -69,7 +80,7 @@ int NFSConfiguration::Number(const char* section, const char* key, int fallback)
 }
 
 std::string NFSConfiguration::Text(const char* section, const char* key, std::size_t size) const {
-  const std::optional<IniFound> setting = files_.Find(section, key);
+  const std::optional<IniFound> setting = Find(section, key);
   if (!setting) return "";
   std::string text = ToValidUtf8(setting->value);
   if (text.size() < size) return text;

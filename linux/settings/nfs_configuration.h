@@ -38,6 +38,9 @@ class NFSConfiguration {
  private:
   NFSConfiguration(IniFiles files, bool is_draft) : files_(std::move(files)), is_draft_(is_draft) {}
 
+  // The setting in force. A reference to nothing becomes a remark.
+  std::optional<IniFound> Find(const char* section, const char* key) const;
+
   void Remark(const IniFound& setting, const std::string& why) const;
 
   IniFiles files_;

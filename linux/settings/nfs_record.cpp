@@ -280,7 +280,7 @@ Status WriteNFSRecord(Box& box, const NFSConfRecord& record) {
   const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
   if (!configuration.ok()) return configuration.status();
   if (Status status = configuration->files().CheckUnchanged(box); !status.ok()) return status;
-  if (const Status& status = configuration->files().CheckIncludes(); !status.ok()) return status;
+  if (const Status& status = configuration->files().CheckReadable(); !status.ok()) return status;
   const NFSConfRecord now = RecordOf(*configuration);
   if (Status status = Check(*configuration, now, record); !status.ok()) return status;
   Result<IniEditor> file = IniEditor::Open(box, kNFSRecordFile, kHeading);

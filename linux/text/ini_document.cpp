@@ -73,6 +73,7 @@ void IniDocument::Index(Place line) {
   if (line->content.value.empty()) return;
   if (line->content.kind == IniLine::Kind::kInclude) includes_.push_back(line);
   if (line->content.kind != IniLine::Kind::kAssignment) return;
+  has_reference_ = has_reference_ || line->content.value.front() == '$';
   const auto [found, is_new] = deciding_.try_emplace(KeyId{line->section, line->content.name}, line);
   line->decides = true;
   if (is_new) return;
@@ -157,6 +158,16 @@ std::vector<IniInclude> IniDocument::Includes() const {
     if (!line->has_argument) includes.back().section = sections_[line->section].name;
   }
   return includes;
+}
+
+std::vector<IniReference> IniDocument::References() const {
+  std::vector<IniReference> references;
+  if (!has_reference_) return references;
+  for (const Line& line : lines_) {
+    if (!line.decides || line.has_argument || line.content.value.front() != '$') continue;
+    references.push_back({sections_[line.section].name, line.content.name});
+  }
+  return references;
 }
 
 void IniDocument::Set(const IniSection& section, const IniKey& key, const IniValue& value) {

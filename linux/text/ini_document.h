@@ -36,6 +36,12 @@ struct IniInclude {
   int line = 0;
 };
 
+// A value "$name", which stands for that of another key.
+struct IniReference {
+  std::string section;
+  std::string_view key;
+};
+
 // If several lines give a key a value, the last one counts, over all blocks of a section. Lines without a value are
 // ignored, as by the reader. A line in a section with an argument, [name "argument"], hides what an earlier line gives
 // the same key in [name], because the reader keeps one value for both; such values cannot be asked for here.
@@ -76,6 +82,9 @@ class IniDocument {
   std::vector<IniEntry> Entries(std::string_view section) const;
 
   std::vector<IniInclude> Includes() const;
+
+  // The keys that have a reference as the value that counts. Takes constant time if the parsed text has no reference.
+  std::vector<IniReference> References() const;
 
   // Replaces the value on the line that counts. A new key is inserted after the last assignment of the section, a
   // new section at the end. Nothing is changed if the key has the value already, or if it is hidden.
@@ -142,6 +151,7 @@ class IniDocument {
   SectionNumber current_ = kNoSection;  // the section at the end
   bool current_has_argument_ = false;
   std::unordered_map<KeyId, Place, HashKeyId, SameKeyId> deciding_;  // the line that gives a key its value
+  bool has_reference_ = false;                                       // no edit adds one
   std::vector<Place> includes_;                                      // in order; no edit adds or removes one
   const char* line_end_ = "\n";
 };

@@ -3,6 +3,7 @@
 #include <dlfcn.h>
 #include <netdb.h>
 #include <pwd.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -56,12 +57,19 @@ void PrepareForChildren() {
   }();
 }
 
+// The library follows a value that refers to itself without a pause; the limit ends its process.
+void LimitCpuTime() {
+  constexpr rlimit kSeconds{1, 1};
+  setrlimit(RLIMIT_CPU, &kSeconds);
+}
+
 // Calls the library in a child process, because it reads its file only once per process.
 std::vector<std::string> Ask(const std::string& path, const std::function<void(std::ostream&)>& questions) {
   const TemporaryRoot scratch;
   PrepareForChildren();
   WaitForOtherThreads();
   ChildProcess child([&] {
+    LimitCpuTime();
     std::string file = path;
     nfs4_set_debug(0, Silent);
     if (nfs4_init_name_mapping(file.data()) != 0) return 1;

@@ -7,7 +7,8 @@
 #include <string>
 #include <vector>
 
-// The library ended its process. If it only refuses a file, the functions below throw std::runtime_error.
+// The library ended its process, or did not return. If it only refuses a file, the functions below throw
+// std::runtime_error.
 struct LibraryCrash : std::runtime_error {
   using std::runtime_error::runtime_error;
 };

@@ -329,6 +329,20 @@ TEST(IDMap, ReadsTheFilesOfTheFolderAndIncludes) {
   EXPECT_EQ(Stored(), (Pairs{{"b@X", "daemon"}, {"c@X", "daemon"}, {"A@x", "daemon"}}));
 }
 
+TEST(IDMap, RefusesAChangeWhileAValueRefersToItself) {
+  const TemporaryRoot root;
+  const std::string text = "[Translation]\nMethod = static\n[environment]\nx = $x\n[Static]\nalice@X = $x\n";
+  root.Write(kFile, text);
+  EXPECT_THROW(MapByLibrary(root.At(kFile), {"alice@X"}), LibraryCrash);
+  EXPECT_THAT(Stored(), IsEmpty());
+  TakeLog();
+  EXPECT_LT(Store({{"bob@X", "nobody"}}), 0);
+  const std::vector<LogLine> log = TakeLog();
+  ASSERT_FALSE(log.empty());
+  EXPECT_THAT(log.back().text, testing::HasSubstr("idmapd.conf:6: the value of alice@X refers to itself"));
+  EXPECT_EQ(root.Read(kFile), text);
+}
+
 TEST(IDMap, RefusesAChangeThatAnotherFileOverrides) {
   const TemporaryRoot root;
   const std::string text = "[Translation]\nGSS-Methods = static\n[Static]\na@X = nobody\n";

@@ -10,7 +10,7 @@
 
 namespace {
 
-[[maybe_unused]] const bool kRequired = RequirePrograms({"nfsconf"});
+[[maybe_unused]] const bool kRequired = RequirePrograms({"nfsconf", "prlimit"});
 
 std::string Unquoted(const std::string& value) {
   const bool quoted =
@@ -42,8 +42,10 @@ std::optional<std::string> DumpByNfsconf(const std::string& path) {
   return result.status == 0 ? std::optional<std::string>(std::move(result.output)) : std::nullopt;
 }
 
-std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key) {
-  std::string value = RunProgram({"nfsconf", "--file", path, "--get", section, key}).output;
-  if (!value.empty() && value.back() == '\n') value.pop_back();
-  return value;
+std::optional<std::string> GetByNfsconf(const std::string& path, const std::string& section, const std::string& key) {
+  constexpr char kCpuSeconds[] = "--cpu=1";  // the program follows a value that refers to itself without a pause
+  ProgramResult result = RunProgram({"prlimit", kCpuSeconds, "nfsconf", "--file", path, "--get", section, key});
+  if (result.status > 1) return std::nullopt;
+  if (!result.output.empty() && result.output.back() == '\n') result.output.pop_back();
+  return std::move(result.output);
 }

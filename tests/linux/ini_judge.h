@@ -19,7 +19,7 @@ IniContent ReadByNfsconf(std::string_view text);
 std::optional<std::string> DumpByNfsconf(const std::string& path);
 
 // Returns the value of a key in the file at `path` and the folder `path`.d, as the services read them; empty if the
-// key has no value.
-std::string GetByNfsconf(const std::string& path, const std::string& section, const std::string& key);
+// key has no value, nullopt if the program does not end, as it does if a value refers to itself.
+std::optional<std::string> GetByNfsconf(const std::string& path, const std::string& section, const std::string& key);
 
 #endif  // VORN_TESTS_LINUX_INI_JUDGE_H

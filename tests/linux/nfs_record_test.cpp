@@ -50,7 +50,7 @@ bool Same(const NFSConfRecord& a, const NFSConfRecord& b) {
 
 // Returns the value that the services read.
 std::string Judged(const TemporaryRoot& root, const char* section, const char* key) {
-  return GetByNfsconf(root.At("/etc/nfs.conf"), section, key);
+  return GetByNfsconf(root.At("/etc/nfs.conf"), section, key).value_or("(the program does not end)");
 }
 
 TEST(NFSConf, OfABoxWithoutFilesHasTheServicesDefaults) {
@@ -293,9 +293,11 @@ TEST(NFSConf, ReadsEachValueAsItsDaemonDoes) {
       {"[vorn]\n\nread-size = -1\n", &NFSConfRecord::read_size, 0, "vorn.conf:3: the value of read-size is not"},
       {"[vorn]\nwrite-size = 99999999999\n", &NFSConfRecord::write_size, 0, "vorn.conf:2: the value of write-size"},
       {"[nfsd]\nvers4 = maybe\n", &NFSConfRecord::enable_nfs_v4, 1, "vorn.conf:2: the value of vers4 is neither"},
-      {"[mountd]\nmanage-gids=$M\n", &NFSConfRecord::unix_pri_enable, 0, ""},
+      {"[mountd]\nmanage-gids=$M\n", &NFSConfRecord::unix_pri_enable, 0,
+       "vorn.conf:2: the value of manage-gids refers"},
       {"[mountd]\nmanage-gids=$M\n[environment]\nM=$N\nN=y\n", &NFSConfRecord::unix_pri_enable, 1, ""},
-      {"[mountd]\nmanage-gids=$M\n[environment]\nM=$M\n", &NFSConfRecord::unix_pri_enable, 0, ""},
+      {"[mountd]\nmanage-gids=$M\n[environment]\nM=$M\n", &NFSConfRecord::unix_pri_enable, 0,
+       "manage-gids refers to itself"},
   };
   for (const auto& c : cases) {
     const TemporaryRoot root;
@@ -308,6 +310,41 @@ TEST(NFSConf, ReadsEachValueAsItsDaemonDoes) {
     if (!log.empty()) {
       EXPECT_NE(log[0].text.find(c.remark), std::string::npos) << log[0].text;
     }
+  }
+}
+
+TEST(NFSConf, FollowsAChainOfReferencesToItsEnd) {
+  const TemporaryRoot root;
+  std::string text = "[statd]\nport = $v1\n[environment]\n";
+  for (int i = 1; i <= 30; ++i) text += "v" + std::to_string(i) + " = $V" + std::to_string(i + 1) + "\n";
+  root.Write("/etc/nfs.conf", text + "v31 = 4031\n");
+  EXPECT_EQ(Judged(root, "statd", "port"), "4031");
+  EXPECT_EQ(Get().statd_port, 4031);
+}
+
+TEST(NFSConf, RefusesAChangeWhileAValueRefersToItself) {
+  const struct {
+    const char* text;    // of /etc/nfs.conf
+    const char* reason;  // "": no value that is read refers to itself
+  } cases[] = {
+      {"[statd]\nport = $M\n[environment]\nM = $M\n", "/etc/nfs.conf:2: the value of port refers to itself"},
+      {"[x]\nc = 1\nk = $a\n[environment]\na = $b\nb = $A\n", "/etc/nfs.conf:3: the value of k refers to itself"},
+      {"[environment]\nM = $M\n[statd]\nport = $N\n", ""},
+      {"[environment]\nM = $M\n[statd]\nport = $M\nport = 4000\n", ""},
+      {"[environment]\nM = $M\n[environment \"x\"]\nM = 1\n[statd]\nport = $M\n", ""},
+  };
+  for (const auto& c : cases) {
+    const TemporaryRoot root;
+    root.Write("/etc/nfs.conf", c.text);
+    NFSConfRecord record = Get();
+    record.read_size = 4096;
+    TakeLog();
+    const bool is_done = VORNNFSConfSet(&record) >= 0;
+    ASSERT_EQ(is_done, *c.reason == '\0') << c.text;
+    if (is_done) continue;
+    EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
+    EXPECT_NE(TakeLog().back().text.find(c.reason), std::string::npos) << c.reason;
+    EXPECT_FALSE(root.Read(kFile).has_value());
   }
 }
 

@@ -56,6 +56,22 @@ class CallContext {
   CallContext* outer_;
 };
 
+// The configuration lock for a call whose reading and changing must be one step: like VornConf (core.h), but it says
+// whether the lock was taken. Construct it before the contexts of the calls, and destroy it in the same thread.
+class CallLock {
+ public:
+  CallLock();
+  ~CallLock();
+  CallLock(const CallLock&) = delete;
+  CallLock& operator=(const CallLock&) = delete;
+
+  // Whether the thread owns the configuration lock. If not, the error facility (core.h) and the log have the reason.
+  bool held() const;
+
+ private:
+  void* lock_;  // the platform's own
+};
+
 }  // namespace VORN
 
 #endif  // VORN_PLATFORM_CALL_H

@@ -20,7 +20,17 @@ std::unique_ptr<Json::StreamWriter> NewWriter() {
   return std::unique_ptr<Json::StreamWriter>(builder.newStreamWriter());
 }
 
-std::string Text(const Json::Value& value) {
+// `,"name":["...", ...]`, or an empty string if there are no sentences.
+std::string Member(std::string_view name, const std::vector<std::string>& sentences) {
+  if (sentences.empty()) return "";
+  Json::Value list(Json::arrayValue);
+  for (const std::string& sentence : sentences) list.append(sentence);
+  return ",\"" + std::string(name) + "\":" + WriteJson(list);
+}
+
+}  // namespace
+
+std::string WriteJson(const Json::Value& value) {
   // Constructing a writer costs more than most answers.
   static Reusable<Json::StreamWriter> writers(NewWriter);
   return writers.With([&value](Json::StreamWriter& writer) {
@@ -30,24 +40,16 @@ std::string Text(const Json::Value& value) {
   });
 }
 
-// `,"name":["...", ...]`, or an empty string if there are no sentences.
-std::string Member(std::string_view name, const std::vector<std::string>& sentences) {
-  if (sentences.empty()) return "";
-  Json::Value list(Json::arrayValue);
-  for (const std::string& sentence : sentences) list.append(sentence);
-  return ",\"" + std::string(name) + "\":" + Text(list);
-}
+Response Success(const Json::Value& data, const Remarks& remarks) { return SuccessWith(WriteJson(data), remarks); }
 
-}  // namespace
-
-Response Success(const Json::Value& data, const Remarks& remarks) {
-  return {200, R"({"success":true,"data":)" + Text(data) + Member("warnings", remarks.warnings) + "}", {}};
+Response SuccessWith(std::string_view data, const Remarks& remarks) {
+  return {200, R"({"success":true,"data":)" + std::string(data) + Member("warnings", remarks.warnings) + "}", {}};
 }
 
 Response Failure(int status, int code, std::string_view text, const Json::Value& details, const Remarks& remarks) {
   std::string body = R"({"success":false,"error":{"code":)" + std::to_string(code) + R"(,"text":)" +
-                     Text(Json::Value(text.data(), text.data() + text.size()));
-  if (!details.isNull()) body += R"(,"details":)" + Text(details);
+                     WriteJson(Json::Value(text.data(), text.data() + text.size()));
+  if (!details.isNull()) body += R"(,"details":)" + WriteJson(details);
   body += Member("reasons", remarks.reasons) + "}" + Member("warnings", remarks.warnings) + "}";
   return {status, std::move(body), {}};
 }

@@ -25,8 +25,12 @@ struct Remarks {
   std::vector<std::string> warnings;  // what the caller should know besides the result
 };
 
-// The answer of a method that succeeded. The reasons are ignored.
+// Compact JSON text in ASCII.
+std::string WriteJson(const Json::Value& value);
+
+// The answer of a method that succeeded. The reasons are ignored. `data` is JSON text.
 Response Success(const Json::Value& data, const Remarks& remarks = {});
+Response SuccessWith(std::string_view data, const Remarks& remarks);
 
 // The answer of a method that failed. `details` may be null.
 Response Failure(int status, int code, std::string_view text, const Json::Value& details = Json::Value(),

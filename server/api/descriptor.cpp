@@ -46,6 +46,22 @@ bool TakesForm(const Json::Value& operation) {
   return body.isObject() && body["content"].isObject() && body["content"].isMember("multipart/form-data");
 }
 
+bool IsListOfTexts(const Json::Value& list) {
+  return list.isArray() &&
+         std::all_of(list.begin(), list.end(), [](const Json::Value& item) { return item.isString(); });
+}
+
+// Reads "x-shown-by". Returns false if it is not as descriptor.h says.
+bool ReadShownBy(const Json::Value& shown_by, Descriptor::Method* method) {
+  if (shown_by.isNull()) return true;
+  if (!shown_by.isObject() || !shown_by["method"].isString()) return false;
+  const Json::Value& same = shown_by["same"];
+  if (!same.isNull() && !IsListOfTexts(same)) return false;
+  method->shown_by = shown_by["method"].asString();
+  for (const Json::Value& name : same) method->same.push_back(name.asString());
+  return true;
+}
+
 }  // namespace
 
 std::optional<Descriptor> Descriptor::Parse(std::string_view json, std::string* error) {
@@ -92,7 +108,13 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
         !CheckCodes(operation["x-error-codes"], error)) {
       return Fault(error, "paths: \"" + path + "\": " + *error);
     }
-    methods_[path] = {reads_only.isBool() && reads_only.asBool(), TakesForm(operation)};
+    Method method;
+    method.reads_only = reads_only.isBool() && reads_only.asBool();
+    method.takes_file = TakesForm(operation);
+    if (!ReadShownBy(operation["x-shown-by"], &method)) {
+      return Fault(error, "paths: \"" + path + "\": x-shown-by needs a method, and may have a list of parameters");
+    }
+    methods_[path] = std::move(method);
   }
   return true;
 }

@@ -8,6 +8,9 @@
 //     answer 200 use the keywords of schema.h; that of the answer describes "data" only, because the server adds the
 //     envelope. "x-error-codes" lists the codes that the method answers, each with "when" and, if it has details, their
 //     schema: {"2351": {"when": "...", "details": {...}}}
+//     "x-shown-by" names the reading method that shows what a changing method changes, and the parameters that must be
+//     the same in both:
+//         "x-shown-by": {"method": "VORN.Core.FileServ.NFS.SharePrivilege/v1/load", "same": ["share_name"]}
 //   - "x-error-codes": {"2301": {"status": 400, "text": "..."}}, the HTTP status of an error code and the text
 //     that an administrator reads. "parameters": true declares that the code is about the parameters: the server then
 //     adds what the schema of the request says about them. "causes" and "remedy" are for the documentation.
@@ -40,6 +43,8 @@ class Descriptor {
   struct Method {
     bool reads_only = false;
     bool takes_file = false;
+    std::string shown_by;           // "Api/v1/method"; empty if no method shows what this one changes
+    std::vector<std::string> same;  // names of parameters
   };
 
   // An empty descriptor: every error code has status 500 and a general text, no method is described.

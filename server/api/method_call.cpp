@@ -6,9 +6,9 @@
 #include <string>
 #include <utility>
 #include <variant>
-#include <vector>
 
 #include "answer.h"
+#include "entry_function.h"
 #include "log_quote.h"
 
 namespace vorn::server {
@@ -44,34 +44,14 @@ Response AnswerOf(const Route& route, Function function) noexcept {
   }
 }
 
-// Returns the reasons of a failed call: those of the platform. If it has none, and the code is about the parameters,
-// the description of the method says which ones are faulty.
-std::vector<std::string> ReasonsOf(const Route& route, const Descriptor::ErrorCode& code,
-                                   const VORN::CallContext& context, const VORN::APIRequest& request) {
-  if (!context.reasons().empty() || !code.about_parameters) return context.reasons();
-  return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
-}
-
-Response CallEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
-  const VORN::CallContext context(std::move(description));
-  VORN::APIRequest request(std::move(parameters));
-  VORN::APIResponse response;
-  route.row.handler(&request, &response);
-  if (!response.answered()) return NoAnswer(route, "the method ended without one");
-  if (response.error() == 0) return Success(response.data(), {{}, context.warnings()});
-  const Descriptor::ErrorCode code = route.descriptor->Describe(response.error());
-  const Remarks remarks{ReasonsOf(route, code, context, request), context.warnings()};
-  return Failure(code.status, response.error(), code.text, response.data(), remarks);
-}
-
 }  // namespace
 
-Response RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
-  return AnswerOf(route, [&] { return CallEntryFunction(route, std::move(parameters), std::move(description)); });
-}
-
-Call::Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription description, Environment environment)
-    : route_(route), body_(std::move(body)), description_(std::move(description)), environment_(environment) {
+Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
+    : route_(request.route),
+      body_(std::move(body)),
+      description_(std::move(request.description)),
+      if_match_(std::move(request.if_match)),
+      environment_(environment) {
   description_.method = route_.Id();
   description_.may_write = !route_.method.reads_only;
 }
@@ -108,7 +88,9 @@ Response Call::Execute() {
   std::variant<Json::Value, Response> parameters = body_->TakeParameters();
   if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
   description_.uploads = body_->Uploads();
-  return RunEntryFunction(route_, std::get<Json::Value>(std::move(parameters)), std::move(description_));
+  const Json::Value& object = std::get<Json::Value>(parameters);
+  if (!if_match_) return RunAndAnswer(route_, object, std::move(description_));
+  return RunIfUnchanged(route_, object, std::move(description_), *if_match_);
 }
 
 void Call::Expire(bool running) {

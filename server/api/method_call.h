@@ -8,6 +8,7 @@
 #include <chrono>
 #include <memory>
 #include <optional>
+#include <string>
 #include <string_view>
 
 #include "body.h"
@@ -30,9 +31,14 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
     std::chrono::milliseconds deadline;  // from the end of the body
   };
 
-  // `description` tells who calls; the call adds the method and the paths of the uploads. The route must outlive
-  // the call.
-  Call(const Route& route, std::unique_ptr<Body> body, VORN::CallDescription description, Environment environment);
+  // The parts of the head that a call needs. The route must outlive the call.
+  struct Request {
+    const Route& route;
+    VORN::CallDescription description;    // who calls; the call adds the method and the paths of the uploads
+    std::optional<std::string> if_match;  // the condition of a changing call, see RunIfUnchanged()
+  };
+
+  Call(Request request, std::unique_ptr<Body> body, Environment environment);
 
   std::optional<Response> Receive(std::string_view piece) override;
   void Run(Answer answer) override;
@@ -48,14 +54,11 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
   const Route& route_;
   std::unique_ptr<Body> body_;
   VORN::CallDescription description_;
+  const std::optional<std::string> if_match_;
   const Environment environment_;
   PendingAnswer answer_;
   std::atomic<bool> abandoned_{false};
 };
-
-// Runs the entry function in this thread, in a call context of this description, and returns its answer. Does not
-// throw: an exception (std::bad_alloc included) and a missing answer are logged and answered with kInternalFailure.
-Response RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description);
 
 }  // namespace vorn::server
 

@@ -53,6 +53,11 @@ Routes::Routes(const std::vector<Module>& modules) {
       if (Find(path, &unknown) == nullptr) syslog(LOG_ERR, "%s: descriptor: %s", module.path.c_str(), unknown.c_str());
     }
   }
+  for (auto& [api, versions] : apis_) {
+    for (auto& [version, methods] : versions) {
+      for (auto& [method, route] : methods) PairWithReader(&route);
+    }
+  }
 }
 
 void Routes::Add(const APIRow& row, const Module& module) {
@@ -60,6 +65,18 @@ void Routes::Add(const APIRow& row, const Module& module) {
   route.method = module.descriptor.MethodAt(std::string(kPrefix) + route.Id());
   const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, route);
   if (!added) syslog(LOG_ERR, "%s: %s is there already", module.path.c_str(), place->second.Name().c_str());
+}
+
+void Routes::PairWithReader(Route* route) const {
+  if (route->method.shown_by.empty()) return;
+  std::string unknown;
+  const Route* reader = Find(std::string(kPrefix) + route->method.shown_by, &unknown);
+  if (reader != nullptr && !reader->method.reads_only) unknown = "\"" + reader->Id() + "\" may change something.";
+  if (unknown.empty()) {
+    route->shown_by = reader;
+  } else {
+    syslog(LOG_ERR, "%s: x-shown-by: %s", route->Name().c_str(), unknown.c_str());
+  }
 }
 
 const Route* Routes::Find(std::string_view path, std::string* unknown) const {

@@ -20,6 +20,9 @@ struct Route {
   const Descriptor* descriptor;
   Descriptor::Method method;  // the descriptor's entry for it
 
+  // The reading method that shows what this method changes, or nullptr.
+  const Route* shown_by = nullptr;
+
   std::string Name() const;  // "Api v1 method", for the log
   std::string Id() const;    // "Api/v1/method", as in its path
 };
@@ -27,7 +30,8 @@ struct Route {
 class Routes {
  public:
   // The modules must outlive this. If two rows have the same name, the first one is used. The second one is
-  // logged, and so is each path of a descriptor that belongs to none of its module's rows.
+  // logged, and so are each path of a descriptor that belongs to none of its module's rows, and each x-shown-by that
+  // names no reading method.
   explicit Routes(const std::vector<Module>& modules);
 
   // Returns the row of "/api/{api}/v{version}/{method}", or nullptr. `unknown` then says which of the
@@ -42,6 +46,7 @@ class Routes {
   using Versions = std::map<int, Methods>;
 
   void Add(const APIRow& row, const Module& module);
+  void PairWithReader(Route* route) const;
 
   std::map<std::string, Versions, std::less<>> apis_;
 };

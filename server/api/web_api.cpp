@@ -74,6 +74,15 @@ std::string CallerOf(const Peer& peer) {
   return peer.credentials ? "uid " + std::to_string(peer.credentials->uid) : "";
 }
 
+// The value of If-Match, of all its lines (RFC 9110, 5.3).
+std::optional<std::string> IfMatchOf(const Head& head) {
+  std::optional<std::string> value;
+  for (const auto& [name, line] : head.headers) {
+    if (EqualsIgnoringCase(name, "If-Match")) value = value ? *value + "," + std::string(line) : std::string(line);
+  }
+  return value;
+}
+
 // Refuses a request with a query, and names its first parameter; no request accepts any.
 std::optional<Response> RefuseQuery(std::string_view query) {
   const std::string_view name = query.substr(0, query.find_first_of("=&"));
@@ -128,11 +137,14 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
 WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
-  VORN::CallDescription description;
-  description.caller = CallerOf(head.peer);
-  description.origin = head.peer.address;
+  Call::Request request{route, {}, IfMatchOf(head)};
+  if (request.if_match && route.shown_by == nullptr) {
+    return Refusal(400, "If-Match is for methods that change something which another method shows.");
+  }
+  request.description.caller = CallerOf(head.peer);
+  request.description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
-  return std::make_shared<Call>(route, std::get<std::unique_ptr<Body>>(std::move(body)), std::move(description),
+  return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
                                 Call::Environment{pool, limits_.call});
 }
 

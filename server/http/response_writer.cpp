@@ -16,6 +16,8 @@
 namespace vorn::server {
 namespace {
 
+constexpr std::string_view kCodedSuffix = "-gzip\"";
+
 // Whether the weight of an element of Accept-Encoding is zero: "gzip;q=0" (RFC 9110, 12.4.2).
 bool IsRefused(const HeaderValue& element) {
   const auto weight = element.parameters.find("q");
@@ -44,11 +46,21 @@ bool IsKnown(const std::string& known_versions, std::string_view tag) {
   return known;
 }
 
-const std::string* FindHeader(const Response& response, std::string_view name) {
-  for (const auto& [header, value] : response.headers) {
+std::string* FindHeader(Response& response, std::string_view name) {
+  for (auto& [header, value] : response.headers) {
     if (EqualsIgnoringCase(header, name)) return &value;
   }
   return nullptr;
+}
+
+const std::string* FindHeader(const Response& response, std::string_view name) {
+  return FindHeader(const_cast<Response&>(response), name);
+}
+
+// Another representation of the same data needs another strong tag (RFC 9110, 8.8.3.3).
+std::string CodedTag(const std::string& tag) {
+  if (tag.empty() || tag.front() != '"') return tag;
+  return tag.substr(0, tag.size() - 1) + std::string(kCodedSuffix);
 }
 
 // std::nullopt if zlib has no memory or the text does not become shorter.
@@ -78,6 +90,7 @@ std::optional<std::string> Gzip(const std::string& text) {
 void Compress(Response* response) {
   std::optional<std::string> packed = Gzip(response->body);
   if (!packed) return;
+  if (std::string* tag = FindHeader(*response, "ETag")) *tag = CodedTag(*tag);
   response->headers.emplace_back("Content-Encoding", "gzip");
   response->body = *std::move(packed);
 }
@@ -142,6 +155,12 @@ std::string WriteHead(const AnswerForm& form, const Response& response, bool kee
     AddLine(&head, "Content-Length", std::to_string(size));
   }
   return head.append("\r\n");
+}
+
+std::string UncodedTag(std::string_view tag) {
+  const std::size_t suffix = tag.size() - std::min(tag.size(), kCodedSuffix.size());
+  if (tag.substr(suffix) != kCodedSuffix) return std::string(tag);
+  return std::string(tag.substr(0, suffix)) + '"';
 }
 
 std::string HttpDate() {

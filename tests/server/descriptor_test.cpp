@@ -44,6 +44,10 @@ TEST(Descriptor, IsRefusedWhenFaulty) {
         R"({"paths": {"/a": 1}})",
         R"({"paths": {"/a": {"get": {}}}})",
         R"({"paths": {"/a": {"post": {"x-read-only": "true"}}}})",
+        R"({"paths": {"/a": {"post": {"x-shown-by": "A/v1/get"}}}})",
+        R"({"paths": {"/a": {"post": {"x-shown-by": {}}}}})",
+        R"({"paths": {"/a": {"post": {"x-shown-by": {"method": "A/v1/get", "same": "name"}}}}})",
+        R"({"paths": {"/a": {"post": {"x-shown-by": {"method": "A/v1/get", "same": [1]}}}}})",
         R"({"components": {"schemas": []}})",
         R"({"components": {"schemas": {"A": {"maxLength": 1}}}})",
         R"({"x-error-codes": {"1": {"status": 400, "text": "x", "parameters": "yes"}}})",
@@ -66,13 +70,15 @@ TEST(Descriptor, TellsWhatAMethodDoes) {
   std::string error;
   const auto descriptor = Descriptor::Parse(R"({"paths": {
       "/api/A/v1/get": {"post": {"x-read-only": true}},
-      "/api/A/v1/set": {"post": {"x-read-only": false, "requestBody": {"content": {"application/json": {}}}}},
+      "/api/A/v1/set": {"post": {"x-read-only": false, "x-shown-by": {"method": "A/v1/get", "same": ["name"]}, "requestBody": {"content": {"application/json": {}}}}},
       "/api/A/v1/put": {"post": {"requestBody": {"content": {"multipart/form-data": {}}}}}}})",
                                             &error);
   ASSERT_TRUE(descriptor) << error;
   EXPECT_TRUE(descriptor->MethodAt("/api/A/v1/get").reads_only);
   EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/set").reads_only);
   EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/set").takes_file);
+  EXPECT_EQ(descriptor->MethodAt("/api/A/v1/set").shown_by, "A/v1/get");
+  EXPECT_EQ(descriptor->MethodAt("/api/A/v1/set").same, std::vector<std::string>{"name"});
   EXPECT_TRUE(descriptor->MethodAt("/api/A/v1/put").takes_file);
   EXPECT_FALSE(descriptor->MethodAt("/api/A/v1/unknown").reads_only) << "an undescribed method may write";
 }

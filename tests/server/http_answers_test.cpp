@@ -81,6 +81,22 @@ TEST_F(HttpTest, AnAnswerFromAWorkerIsCompressedToo) {
   EXPECT_EQ(Unzip(reply.body), large);
 }
 
+TEST_F(HttpTest, ACompressedAnswerHasAStrongTagOfItsOwn) {
+  Start();
+  Connection client = Connect();
+  const struct {
+    const char* tag;
+    const char* packed;
+  } cases[] = {{"\"7\"", "\"7-gzip\""}, {"W/\"7\"", "W/\"7\""}};
+  for (const auto& c : cases) {
+    service_.SetFixed({200, std::string(5000, 'a'), {{"ETag", c.tag}}});
+    client.Send(GetWith(""));
+    EXPECT_EQ(client.Receive().headers["ETag"], c.tag);
+    client.Send(GetWith("Accept-Encoding: gzip\r\n"));
+    EXPECT_EQ(client.Receive().headers["ETag"], c.packed);
+  }
+}
+
 TEST_F(HttpTest, SmallAnswersAreNotCompressed) {
   Start();
   service_.SetFixed({200, std::string(1024, 'a')});

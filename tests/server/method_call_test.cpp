@@ -21,82 +21,12 @@ using std::chrono::milliseconds;
 void Echo(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(request->GetParam("", Json::Value()));
 }
-void Fail(VORN::APIRequest* /*request*/, VORN::APIResponse* response) { response->SetError(2351, "alice"); }
 void Silent(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) {}
 void Throw(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) { throw std::runtime_error("reason"); }
 void ThrowNumber(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) { throw 7; }
 void AnswerThenThrow(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   response->SetSuccess("half done");
   throw std::bad_alloc();
-}
-
-Response RunHandler(decltype(APIRow::handler) handler, const Json::Value& parameters = Json::objectValue) {
-  std::string error;
-  const auto descriptor = Descriptor::Parse(R"({"x-error-codes":{"2351":{"status":409,"text":"There."}}})", &error);
-  return RunEntryFunction({{"Api", 1, "method", handler}, &*descriptor, {}}, parameters, {});
-}
-
-TEST(EntryFunction, AnswersWithItsData) {
-  Json::Value parameters;
-  parameters["a"] = 1;
-  EXPECT_EQ(RunHandler(Echo, parameters).body, R"({"success":true,"data":{"a":1}})");
-}
-
-TEST(EntryFunction, FailsWithStatusAndTextOfItsCode) {
-  const Response response = RunHandler(Fail);
-  EXPECT_EQ(response.status, 409);
-  EXPECT_EQ(response.body, R"({"success":false,"error":{"code":2351,"text":"There.","details":"alice"}})");
-}
-
-TEST(EntryFunction, IsAnsweredForWhenItDoesNotAnswer) {
-  for (const auto handler : {Silent, Throw, ThrowNumber, AnswerThenThrow}) {
-    const Response response = RunHandler(handler);
-    EXPECT_EQ(response.status, 500);
-    EXPECT_NE(response.body.find("\"code\":2302"), std::string::npos) << response.body;
-  }
-}
-
-void AddRemarks(VORN::APIRequest* request, VORN::APIResponse* response) {
-  VORN::CallContext::Current()->AddReason("10.0.0.256 is not an address.");
-  VORN::CallContext::Current()->AddWarning("The reload failed.");
-  request->GetParam("fail", false).asBool() ? response->SetError(2351, {}) : response->SetSuccess({});
-}
-
-TEST(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
-  EXPECT_EQ(RunHandler(AddRemarks).body, R"({"success":true,"data":null,"warnings":["The reload failed."]})");
-  Json::Value parameters;
-  parameters["fail"] = true;
-  EXPECT_EQ(RunHandler(AddRemarks, parameters).body,
-            R"({"success":false,"error":{"code":2351,"text":"There.","reasons":["10.0.0.256 is not an address."]},)"
-            R"("warnings":["The reload failed."]})");
-  EXPECT_EQ(VORN::CallContext::Current(), nullptr);
-}
-
-void RefuseParameters(VORN::APIRequest* request, VORN::APIResponse* response) {
-  if (request->GetParam("explain", false).asBool()) VORN::CallContext::Current()->AddReason("Too large.");
-  response->SetError(request->GetParam("code", 0).asInt(), {});
-}
-
-TEST(EntryFunction, IsAnsweredWithTheFaultyParameters) {
-  std::string error;
-  const auto descriptor = Descriptor::Parse(R"({
-      "x-error-codes": {"2301": {"status": 400, "text": "Wrong.", "parameters": true},
-                        "2302": {"status": 500, "text": "Failed."}},
-      "paths": {"/api/Api/v1/method": {"post": {"requestBody": {"content": {"application/json": {"schema": {
-          "required": ["size"]}}}}}}}})",
-                                            &error);
-  ASSERT_TRUE(descriptor) << error;
-  const auto run = [&descriptor](int code, bool explain) {
-    Json::Value parameters;
-    parameters["code"] = code;
-    parameters["explain"] = explain;
-    return RunEntryFunction({{"Api", 1, "method", RefuseParameters}, &*descriptor, {}}, parameters, {}).body;
-  };
-  EXPECT_EQ(run(2301, false),
-            R"({"success":false,"error":{"code":2301,"text":"Wrong.","reasons":["\"size\" is missing."]}})");
-  EXPECT_EQ(run(2301, true), R"({"success":false,"error":{"code":2301,"text":"Wrong.","reasons":["Too large."]}})")
-      << "the platform's own reasons come alone";
-  EXPECT_EQ(run(2302, false), R"({"success":false,"error":{"code":2302,"text":"Failed."}})");
 }
 
 // A body that reports its destruction.
@@ -134,7 +64,7 @@ class CallTest : public testing::Test {
   ~CallTest() override { held = false; }
 
   std::shared_ptr<Call> NewCall(const Route& route, milliseconds deadline = std::chrono::hours(1)) {
-    return std::make_shared<Call>(route, std::make_unique<TracedBody>(&gone_), VORN::CallDescription{},
+    return std::make_shared<Call>(Call::Request{route, {}, {}}, std::make_unique<TracedBody>(&gone_),
                                   Call::Environment{pool_, deadline});
   }
   // Runs the call. The future receives its answer.
@@ -203,9 +133,18 @@ TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {
 }
 
 TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
-  const auto call = std::make_shared<Call>(echo_, std::make_unique<FailingBody>(), VORN::CallDescription{},
+  const auto call = std::make_shared<Call>(Call::Request{echo_, {}, {}}, std::make_unique<FailingBody>(),
                                            Call::Environment{pool_, std::chrono::hours(1)});
   EXPECT_EQ(Run(call).get().status, 500);
+}
+
+TEST_F(CallTest, IsAnsweredWhenItsMethodDoesNotAnswer) {
+  for (const auto handler : {Silent, Throw, ThrowNumber, AnswerThenThrow}) {
+    const Route route{{"Api", 1, "method", handler}, &descriptor_, {}};
+    const Response response = Run(NewCall(route)).get();
+    EXPECT_EQ(response.status, 500);
+    EXPECT_NE(response.body.find("\"code\":2302"), std::string::npos) << response.body;
+  }
 }
 
 }  // namespace

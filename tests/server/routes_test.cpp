@@ -35,6 +35,21 @@ TEST(Routes, KnowWhatTheDescriptorTellsOfAMethod) {
   EXPECT_FALSE(routes.Find("/api/Nfs/v1/set", &error)->method.reads_only);
 }
 
+TEST(Routes, PairAChangeWithTheMethodThatShowsIt) {
+  std::string error;
+  std::vector<Module> modules = TwoModules();
+  modules[0].descriptor = *Descriptor::Parse(R"({"paths": {
+      "/api/Nfs/v1/get": {"post": {"x-read-only": true}},
+      "/api/Nfs/v1/set": {"post": {"x-shown-by": {"method": "Nfs/v1/get"}}},
+      "/api/Nfs/v2/get": {"post": {"x-shown-by": {"method": "Nfs/v1/set"}}}}})",
+                                             &error);
+  const Routes routes(modules);
+  const Route* reader = routes.Find("/api/Nfs/v1/get", &error);
+  EXPECT_EQ(routes.Find("/api/Nfs/v1/set", &error)->shown_by, reader);
+  EXPECT_EQ(reader->shown_by, nullptr);
+  EXPECT_EQ(routes.Find("/api/Nfs/v2/get", &error)->shown_by, nullptr) << "a method that may change something";
+}
+
 TEST(Routes, OfTwoRowsWithOneNameTheFirstCounts) {
   const std::vector<Module> modules = TwoModules();
   std::string unknown;

@@ -69,6 +69,12 @@ TEST_F(WebApiTest, CallsAMethodByPost) {
   EXPECT_EQ(Begin(PostJson("Application/JSON; charset=utf-8")), 0);
 }
 
+TEST_F(WebApiTest, RefusesAConditionThatItCannotCheck) {
+  Head head = Post("/api/Nfs/v1/put");
+  head.headers.emplace_back("if-match", "*");
+  EXPECT_EQ(Begin(head), 400);
+}
+
 TEST_F(WebApiTest, RefusesOtherHttpMethodsAndSaysWhichIsAllowed) {
   Head head = Post("/api/Nfs/v1/get");
   for (const char* method : {"GET", "PUT", "DELETE", "post", "BREW"}) {

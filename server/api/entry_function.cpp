@@ -1,0 +1,127 @@
+#include "entry_function.h"
+
+#include <algorithm>
+#include <optional>
+#include <stdexcept>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "entity_tag.h"
+
+namespace vorn::server {
+namespace {
+
+Response AnswerWithTag(const Json::Value& parameters, const Outcome& outcome) {
+  const std::string data = WriteJson(outcome.data);
+  Response response = SuccessWith(data, outcome.remarks);
+  if (std::optional<std::string> tag = MakeEntityTag(parameters, data)) {
+    response.headers.emplace_back("ETag", *std::move(tag));
+  }
+  return response;
+}
+
+// The method that shows what a changing call would change, and what it answers to the caller.
+class PresentData {
+ public:
+  PresentData(const Route& changing, const Json::Value& parameters, VORN::CallDescription description)
+      : changing_(changing), parameters_(parameters), description_(std::move(description)) {
+    description_.method = changing.shown_by->Id();
+    description_.may_write = false;
+    description_.uploads.clear();
+  }
+
+  // Whether the tag is that of the present data, and the data is what this call would change.
+  bool Matches(const std::string& tag) {
+    const std::optional<Json::Value> parameters = ParametersOfTag(tag);
+    if (!parameters || !HasSameSubject(*parameters)) return false;
+    Read(*parameters);
+    return outcome_->code == 0 && MakeEntityTag(*parameters, WriteJson(outcome_->data)) == tag;
+  }
+
+  // The answer to a call whose condition does not hold. If the data cannot be read, it is the failure of the reading.
+  Response Refuse() {
+    if (!outcome_) Read(Subject());
+    if (outcome_->code != 0) return AnswerTo(*changing_.shown_by, *outcome_);
+    Response response =
+        Failure(412, 412, "This was changed meanwhile. The details are what is there now.", outcome_->data);
+    const std::optional<std::string> tag = MakeEntityTag(read_with_, WriteJson(outcome_->data));
+    if (tag) response.headers.emplace_back("ETag", *tag);
+    return response;
+  }
+
+ private:
+  void Read(const Json::Value& parameters) {
+    outcome_ = RunEntryFunction(*changing_.shown_by, parameters, description_);
+    read_with_ = parameters;
+  }
+
+  // The parameters that both methods have, for example the name of a share.
+  Json::Value Subject() const {
+    Json::Value subject(Json::objectValue);
+    for (const std::string& name : changing_.method.same) subject[name] = parameters_[name];
+    return subject;
+  }
+
+  bool HasSameSubject(const Json::Value& parameters) const {
+    const auto& names = changing_.method.same;
+    return std::all_of(names.begin(), names.end(),
+                       [&](const std::string& name) { return parameters[name] == parameters_[name]; });
+  }
+
+  const Route& changing_;
+  const Json::Value& parameters_;
+  VORN::CallDescription description_;
+  std::optional<Outcome> outcome_;  // of the last reading
+  Json::Value read_with_;           // its parameters
+};
+
+bool IsUnchanged(const IfMatch& condition, PresentData* present) {
+  return std::any_of(condition.tags.begin(), condition.tags.end(),
+                     [present](const std::string& tag) { return present->Matches(tag); });
+}
+
+// Returns the reasons of a failed call: those of the platform. If it has none, and the code is about the parameters,
+// the description of the method says which ones are faulty.
+std::vector<std::string> ReasonsOf(const Route& route, int code, const VORN::CallContext& context,
+                                   const VORN::APIRequest& request) {
+  if (!context.reasons().empty() || !route.descriptor->Describe(code).about_parameters) return context.reasons();
+  return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
+}
+
+}  // namespace
+
+Outcome RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
+  const VORN::CallContext context(std::move(description));
+  VORN::APIRequest request(std::move(parameters));
+  VORN::APIResponse response;
+  route.row.handler(&request, &response);
+  if (!response.answered()) throw std::runtime_error("the method ended without one");
+  if (response.error() == 0) return {0, response.data(), {{}, context.warnings()}};
+  return {
+      response.error(), response.data(), {ReasonsOf(route, response.error(), context, request), context.warnings()}};
+}
+
+Response AnswerTo(const Route& route, const Outcome& outcome) {
+  if (outcome.code == 0) return Success(outcome.data, outcome.remarks);
+  const Descriptor::ErrorCode code = route.descriptor->Describe(outcome.code);
+  return Failure(code.status, outcome.code, code.text, outcome.data, outcome.remarks);
+}
+
+Response RunAndAnswer(const Route& route, const Json::Value& parameters, VORN::CallDescription description) {
+  const Outcome outcome = RunEntryFunction(route, parameters, std::move(description));
+  const bool has_tag = route.method.reads_only && outcome.code == 0;
+  return has_tag ? AnswerWithTag(parameters, outcome) : AnswerTo(route, outcome);
+}
+
+Response RunIfUnchanged(const Route& route, const Json::Value& parameters, VORN::CallDescription description,
+                        std::string_view if_match) {
+  const VORN::CallLock lock;
+  if (!lock.held()) return Busy("Another change takes long. Try again soon.");
+  const IfMatch condition = ParseIfMatch(if_match);
+  PresentData present(route, parameters, description);
+  if (!condition.any && !IsUnchanged(condition, &present)) return present.Refuse();
+  return RunAndAnswer(route, parameters, std::move(description));
+}
+
+}  // namespace vorn::server

@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <ctime>
 #include <utility>
 
 #include "file_lock.h"
@@ -39,16 +38,6 @@ FileStamp StampFrom(const Version& version) {
   stamp.changed = static_cast<std::int64_t>(version.state[4]);
   return stamp;
 }
-
-// The clock of file timestamps, in nanoseconds since the epoch; it advances in ticks.
-std::int64_t FileClock() {
-  timespec now{};
-  clock_gettime(CLOCK_REALTIME_COARSE, &now);
-  return std::int64_t{now.tv_sec} * 1'000'000'000 + now.tv_nsec;
-}
-
-// Whether any change after the moment `now` gives another version. A missing file can only appear.
-bool IsSettled(const FileStamp& stamp, std::int64_t now) { return !stamp.exists || stamp.changed < now; }
 
 std::string PathBelow(const Root& root, const std::string& path) {
   return root.is_box() ? path : root.directory() + path;

@@ -13,7 +13,8 @@ namespace vorn {
 // A version is the file's device, inode, size, mtime and ctime (stat(2)), so an edit by any program gives a
 // new one. The limits of that check:
 //  - An edit within the clock tick (jiffy) of the version before, of the same size and in place, has the same
-//    version. Such a file is not "settled", so no reader keeps it; a writer may miss that one edit.
+//    version; so does one within the same second where the file system stores whole seconds. Such a file is not
+//    "settled" (IsSettled in files.h), so no reader keeps it; a writer may miss that one edit.
 //  - On a root that is not "/", a folder that becomes a symbolic link is noticed only if the file behind it
 //    differs; "absent" and "absent" do not differ. Nothing below a trial root does that while it is used.
 class FileStore : public Store {

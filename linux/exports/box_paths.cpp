@@ -4,7 +4,6 @@
 #include <sys/stat.h>
 
 #include <cstdint>
-#include <ctime>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -42,13 +41,6 @@ std::shared_ptr<const Names> ReadLinks(const std::string& location) {
   return links.empty() ? nullptr : std::make_shared<const Names>(std::move(links));
 }
 
-// The clock of file timestamps, in nanoseconds since the epoch; it advances in ticks.
-std::int64_t FileClock() {
-  timespec now{};
-  clock_gettime(CLOCK_REALTIME_COARSE, &now);
-  return std::int64_t{now.tv_sec} * 1'000'000'000 + now.tv_nsec;
-}
-
 // The links of folders, by their location on this system.
 class LinkCache {
  public:
@@ -58,8 +50,7 @@ class LinkCache {
     if (!stamp.ok() || !stamp->exists) return nullptr;
     if (const auto known = Find(location, *stamp)) return known->links;
     auto links = ReadLinks(location);
-    // A folder that changes once more in the same clock tick may keep its stamp.
-    if (stamp->changed < now) Keep(location, {*stamp, links});
+    if (IsSettled(*stamp, now)) Keep(location, {*stamp, links});
     return links;
   }
 

@@ -7,6 +7,7 @@
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <filesystem>
 
 #include "extended_attributes.h"
@@ -30,7 +31,9 @@ fs::path TemporaryPath(const fs::path& path, const std::string& ending) {
   return path.parent_path() / ("." + path.filename().string() + ".vorn-" + ending);
 }
 
-std::int64_t Nanoseconds(const timespec& time) { return std::int64_t{time.tv_sec} * 1'000'000'000 + time.tv_nsec; }
+constexpr std::int64_t kSecond = 1'000'000'000;  // in nanoseconds
+
+std::int64_t Nanoseconds(const timespec& time) { return time.tv_sec * kSecond + time.tv_nsec; }
 
 FileStamp StampOf(const struct stat& file) {
   return {true, file.st_dev, file.st_ino, file.st_size, Nanoseconds(file.st_mtim), Nanoseconds(file.st_ctim)};
@@ -185,6 +188,18 @@ Result<FileStamp> StampOfFile(const std::string& path) {
   if (lstat(path.c_str(), &file) == 0) return StampOf(file);
   if (errno == ENOENT || errno == ENOTDIR) return FileStamp{};
   return Status::System(errno, path);
+}
+
+std::int64_t FileClock() {
+  timespec now{};
+  clock_gettime(CLOCK_REALTIME_COARSE, &now);
+  return Nanoseconds(now);
+}
+
+bool IsSettled(const FileStamp& stamp, std::int64_t now) {
+  if (!stamp.exists) return true;  // it can only appear
+  const bool may_be_whole_seconds = stamp.changed % kSecond == 0;
+  return may_be_whole_seconds ? stamp.changed + kSecond <= now : stamp.changed < now;
 }
 
 Status WriteAll(int file, std::string_view text, const std::string& name) {

@@ -31,6 +31,14 @@ bool IsSameFile(const FileStamp& a, const FileStamp& b);
 // The stamp of the file or folder at `path` (lstat(2)); one that does not exist has a stamp that says so.
 Result<FileStamp> StampOfFile(const std::string& path);
 
+// The clock of file timestamps, in nanoseconds since the epoch. It advances in ticks (jiffies).
+std::int64_t FileClock();
+
+// Whether every change of the file after the moment `now` (FileClock()) gives it another stamp. Two changes within one
+// unit of its timestamps may have the same one. The unit is a tick of the clock, or a second where the file system
+// stores whole seconds (ext2, ext3, and ext4 with inodes of 128 bytes).
+bool IsSettled(const FileStamp& stamp, std::int64_t now);
+
 // Returns the kChangedBehind failure for a file that was edited between reading and writing.
 Status ChangedBehind(const std::string& path, const char* file = __builtin_FILE(), int line = __builtin_LINE());
 

@@ -344,5 +344,22 @@ TEST(RemoveLeftovers, TakesTheTemporaryFilesOfThatFileOnly) {
   RemoveLeftovers(root.At("/no/such/folder"));
 }
 
+TEST(IsSettled, WaitsForTheEndOfTheUnitOfTheTimestamp) {
+  constexpr std::int64_t kSecond = 1'000'000'000;
+  const struct {
+    const char* name;
+    FileStamp stamp;
+    std::int64_t now;
+    bool settled;
+  } cases[] = {
+      {"a missing file", {}, 0, true},
+      {"fine timestamps, the same tick", {true, 1, 2, 3, 4, 5 * kSecond + 7}, 5 * kSecond + 7, false},
+      {"fine timestamps, a later tick", {true, 1, 2, 3, 4, 5 * kSecond + 7}, 5 * kSecond + 8, true},
+      {"whole seconds, the same second", {true, 1, 2, 3, 4, 5 * kSecond}, 6 * kSecond - 1, false},
+      {"whole seconds, the next second", {true, 1, 2, 3, 4, 5 * kSecond}, 6 * kSecond, true},
+  };
+  for (const auto& c : cases) EXPECT_EQ(IsSettled(c.stamp, c.now), c.settled) << c.name;
+}
+
 }  // namespace
 }  // namespace vorn

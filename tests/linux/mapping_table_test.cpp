@@ -78,6 +78,24 @@ TEST(MappingFile, IsReadAgainWhenItIsReplaced) {
   }
 }
 
+// The number of a removed file's inode is soon given to another one, which may have the same size and be of the same
+// moment.
+TEST(MappingFile, KeepsTheInodeOfItsTableFromBeingUsedAgain) {
+  const TemporaryRoot root;
+  Replace(root, vorn::RenderMappingTable({{"a@X", "nobody"}}));
+  vorn::MappingFile file(root.At(kFile));
+  int error = -1;
+  ASSERT_NE(file.Current(&error), nullptr);
+  struct stat read {};
+  ASSERT_EQ(stat(root.At(kFile).c_str(), &read), 0);
+  for (int i = 0; i < 100; ++i) {
+    Replace(root, vorn::RenderMappingTable({{"a@X", "daemon"}}));
+    struct stat now {};
+    ASSERT_EQ(stat(root.At(kFile).c_str(), &now), 0);
+    ASSERT_NE(now.st_ino, read.st_ino);
+  }
+}
+
 TEST(MappingFile, StaysInForceWhenItDisappearsAndNotWhenItIsDamaged) {
   const TemporaryRoot root;
   Replace(root, vorn::RenderMappingTable({{"a@X", "nobody"}}));

@@ -8,20 +8,6 @@
 namespace vorn {
 namespace {
 
-class Descriptor {
- public:
-  explicit Descriptor(int number) : number_(number) {}
-  ~Descriptor() {
-    if (number_ >= 0) close(number_);
-  }
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  int number() const { return number_; }
-
- private:
-  const int number_;
-};
-
 bool IsSame(const timespec& a, const timespec& b) { return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec; }
 
 // The file is only ever replaced (rename(2)), so that one inode has one content.
@@ -43,6 +29,10 @@ int ReadAll(int file, std::string* text) {
 
 }  // namespace
 
+OpenFile::~OpenFile() {
+  if (number_ >= 0) close(number_);
+}
+
 const MappingTable* MappingFile::Current(int* error) {
   struct stat now {};
   *error = stat(path_.c_str(), &now) == 0 ? 0 : errno;
@@ -53,7 +43,7 @@ const MappingTable* MappingFile::Current(int* error) {
 }
 
 int MappingFile::Read() {
-  const Descriptor file(open(path_.c_str(), O_RDONLY | O_CLOEXEC));
+  OpenFile file(open(path_.c_str(), O_RDONLY | O_CLOEXEC));
   if (file.number() < 0) return errno;
   struct stat opened {};
   if (fstat(file.number(), &opened) != 0) return errno;
@@ -62,6 +52,7 @@ int MappingFile::Read() {
   std::optional<MappingTable> table = MappingTable::Parse(std::move(text));
   if (!table) return EBADMSG;
   table_ = std::move(table);
+  file_.Swap(&file);
   read_ = opened;
   return 0;
 }

@@ -6,10 +6,27 @@
 
 #include <optional>
 #include <string>
+#include <utility>
 
 #include "mapping_table.h"
 
 namespace vorn {
+
+// The owner of an open file, or of none.
+class OpenFile {
+ public:
+  OpenFile() = default;
+  explicit OpenFile(int number) : number_(number) {}
+  ~OpenFile();
+  OpenFile(const OpenFile&) = delete;
+  OpenFile& operator=(const OpenFile&) = delete;
+
+  int number() const { return number_; }
+  void Swap(OpenFile* other) { std::swap(number_, other->number_); }
+
+ private:
+  int number_ = -1;
+};
 
 // Reads the table again when another file has taken its path, which costs one stat(2) per question. Not thread-safe,
 // like libnfsidmap itself.
@@ -26,7 +43,8 @@ class MappingFile {
   int Read();
 
   const std::string path_;
-  struct stat read_ {};  // the file that table_ was read from
+  OpenFile file_;        // what table_ was read from; open, so that no later file gets its inode number
+  struct stat read_ {};  // of file_
   std::optional<MappingTable> table_;
 };
 

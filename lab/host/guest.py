@@ -130,11 +130,15 @@ def tell(job, arguments, make_guest, quiet=False):
 
 
 def end_on_signals():
-    """SIGTERM, SIGINT and SIGHUP end the guests and the run."""
+    """SIGTERM, SIGINT and SIGHUP end the guests and the run. So does the end of the process that started the run, which
+    may be flock(1) or a shell. Under nohup(1), which ignores SIGHUP, the run goes on."""
 
     def end(number, _frame):
         end_all()
         raise SystemExit(128 + number)
 
-    for number in (signal.SIGTERM, signal.SIGINT, signal.SIGHUP):
-        signal.signal(number, end)
+    signal.signal(signal.SIGTERM, end)
+    signal.signal(signal.SIGINT, end)
+    if signal.getsignal(signal.SIGHUP) != signal.SIG_IGN:
+        signal.signal(signal.SIGHUP, end)
+        process.end_with_parent(signal.SIGHUP)

@@ -11,14 +11,14 @@ _PR_SET_PDEATHSIG = 1
 _libc = ctypes.CDLL(None)
 
 
-def _end_with_parent():
-    """prctl(2): the child gets SIGTERM when the thread that started it ends, for whatever reason."""
-    _libc.prctl(_PR_SET_PDEATHSIG, signal.SIGTERM)
+def end_with_parent(number=signal.SIGTERM):
+    """prctl(2): this process gets the signal when the thread that started it ends, for whatever reason."""
+    _libc.prctl(_PR_SET_PDEATHSIG, number)
 
 
 def start(command, **options):
     """Popen; the child cleans up after itself when it gets SIGTERM."""
-    return subprocess.Popen(command, preexec_fn=_end_with_parent, **options)
+    return subprocess.Popen(command, preexec_fn=end_with_parent, **options)
 
 
 def build(command, log, **options):

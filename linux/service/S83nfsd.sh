@@ -45,9 +45,11 @@ is_current() {
 	is_active "$1.service" && cmp -s "$idmap/settings" "$idmap/$1.settings"
 }
 
-# svcgssd reads a new keytab only when it starts.
+# svcgssd reads a new keytab only when it starts. A keytab of the same moment as the start counts as new, because a file
+# system may store whole seconds.
 is_svcgssd_current() {
-	is_current rpc-svcgssd && [ -z "$(find "$keytab" -newer "$idmap/rpc-svcgssd.settings" 2>/dev/null)" ]
+	is_current rpc-svcgssd || return
+	[ ! -e "$keytab" ] || [ -n "$(find "$idmap/rpc-svcgssd.settings" -newer "$keytab")" ]
 }
 
 # The daemons follow the table of mappings that idmap-compile writes. They read all other settings when they start, and

@@ -50,9 +50,11 @@ class Box {
     Runs(unit + ".service");
     folder_.Write("/lib/vorn/idmap/" + unit + ".settings", settings + "\n");
   }
-  void HasANewKeytab() const {
+  // `age`, as touch(1) reads it, is relative to the start of svcgssd.
+  void HasAKeytab(const std::string& age) const {
     folder_.Write("/etc/nfs/krb5.keytab", "");
-    RunProgram({"touch", "-d", "+1 hour", folder_.At("/etc/nfs/krb5.keytab")});
+    RunProgram({"touch", "-r", folder_.At("/lib/vorn/idmap/rpc-svcgssd.settings"), "-d", age,
+                folder_.At("/etc/nfs/krb5.keytab")});
   }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
   void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
@@ -98,23 +100,26 @@ TEST(ReloadIDMap, RestartsADaemonOnlyForWhatItReadsWhenItStarts) {
     const char* name;
     const char* svcgssd;
     const char* idmapd;
-    bool has_new_keytab;
+    const char* keytab;
     bool restarts_svcgssd;
     bool restarts_idmapd;
-  } cases[] = {{"nothing", "stored", "stored", false, false, false},
-               {"the settings of both", "old", "old", false, true, true},
-               {"the settings of idmapd", "stored", "old", false, false, true},
-               {"the keytab", "stored", "stored", true, true, false}};
+  } cases[] = {{"nothing", "stored", "stored", nullptr, false, false},
+               {"the settings of both", "old", "old", nullptr, true, true},
+               {"the settings of idmapd", "stored", "old", nullptr, false, true},
+               {"a keytab from before the start", "stored", "stored", "-1 second", false, false},
+               {"a keytab of the moment of the start", "stored", "stored", "0 seconds", true, false},
+               {"a new keytab", "stored", "stored", "+1 second", true, false}};
   for (const auto& c : cases) {
     const Box box;
     box.Runs("nfs-server.service");
     box.HasRead("rpc-svcgssd", c.svcgssd);
     box.HasRead("nfs-idmapd", c.idmapd);
-    if (c.has_new_keytab) box.HasANewKeytab();
+    if (c.keytab != nullptr) box.HasAKeytab(c.keytab);
     const ProgramResult result = box.Run("reloadidmap");
     EXPECT_EQ(result.status, 0) << c.name << result.errors;
     const std::string calls = "\n" + box.Calls();
-    EXPECT_EQ(calls.find("\nrestart rpc-svcgssd.service\n") != std::string::npos, c.restarts_svcgssd) << calls;
+    EXPECT_EQ(calls.find("\nrestart rpc-svcgssd.service\n") != std::string::npos, c.restarts_svcgssd)
+        << c.name << calls;
     EXPECT_EQ(calls.find("\ntry-restart nfs-idmapd.service\n") != std::string::npos, c.restarts_idmapd) << calls;
     EXPECT_EQ(calls.rfind("\ncompile\n", 0), 0U) << "the table comes before the flush: " << calls;
     EXPECT_EQ(box.Kernel(kFlush), "1\n") << c.name;

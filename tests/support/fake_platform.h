@@ -8,11 +8,13 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
 #include "core.h"
 #include "nfsconf.h"
+#include "recorded_answers.h"
 #include "webapi.h"
 
 // A line that the module wrote to the system log.
@@ -123,7 +125,8 @@ struct Answer {
 // Parses strict JSON. Throws std::logic_error on a mistake in the test.
 Json::Value Parse(const std::string& json);
 
-// Calls an entry function, or another function with its parameters, with the JSON text `params`.
+// Calls an entry function, or another function with its parameters, with the JSON text `params`. The answers of entry
+// functions are recorded, see recorded_answers.h.
 template <typename Entry>
 Answer Call(Entry entry, const std::string& params) {
   VORN::APIRequest request(Parse(params));
@@ -135,6 +138,7 @@ Answer Call(Entry entry, const std::string& params) {
   }
   answer.code = response.answered() ? response.error() : -1;
   answer.data = response.data();
+  if constexpr (std::is_convertible_v<Entry, EntryFunction>) RecordAnswer(entry, Parse(params), answer);
   return answer;
 }
 

@@ -125,7 +125,8 @@ int Serve(const Options& options) {
   Budget bodies(kBodies, kBodiesOfPeer);
   Workers workers;
   const OwnNames names(options.host_names);
-  WebApi api({routes, *uploads, workers, memory, names});
+  const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
+  WebApi api({routes, *uploads, workers, memory, names, audit});
   const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   AccessLog log(StartedBySystemd() ? JournalSink() : SyslogSink());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});

@@ -51,7 +51,9 @@ Response Failure(int status, int code, std::string_view text, const Json::Value&
                      WriteJson(Json::Value(text.data(), text.data() + text.size()));
   if (!details.isNull()) body += R"(,"details":)" + WriteJson(details);
   body += Member("reasons", remarks.reasons) + "}" + Member("warnings", remarks.warnings) + "}";
-  return {status, std::move(body), {}};
+  Response response{status, std::move(body), {}};
+  response.error_code = code;
+  return response;
 }
 
 Response Refusal(int status, std::string_view text) { return Failure(status, status, text); }

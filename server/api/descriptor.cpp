@@ -162,9 +162,23 @@ Descriptor::Method Descriptor::MethodAt(const std::string& path) const {
   return found == methods_.end() ? Method{} : found->second;
 }
 
+const Json::Value* Descriptor::ParameterSchema(const std::string& path) const {
+  return Find(document_, {"paths", path, "post", "requestBody", "content", "application/json", "schema"});
+}
+
+Json::Value Descriptor::WithoutSecrets(const std::string& path, Json::Value parameters) const {
+  const Json::Value* schema = ParameterSchema(path);
+  const Json::Value* properties = schema == nullptr ? nullptr : Find(*schema, {"properties"});
+  if (properties == nullptr || !parameters.isObject()) return parameters;
+  for (const std::string& name : properties->getMemberNames()) {
+    const Json::Value* secret = Find(*properties, {name, "writeOnly"});
+    if (secret != nullptr && secret->asBool() && parameters.isMember(name)) parameters[name] = "(left out)";
+  }
+  return parameters;
+}
+
 std::vector<std::string> Descriptor::ParameterFaults(const std::string& path, const Json::Value& parameters) const {
-  const Json::Value* schema =
-      Find(document_, {"paths", path, "post", "requestBody", "content", "application/json", "schema"});
+  const Json::Value* schema = ParameterSchema(path);
   return schema == nullptr ? std::vector<std::string>() : schemas_.Faults(parameters, *schema);
 }
 

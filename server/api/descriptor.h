@@ -65,10 +65,17 @@ class Descriptor {
   // if there is no such schema.
   std::vector<std::string> ParameterFaults(const std::string& path, const Json::Value& parameters) const;
 
+  // Returns the parameters with "(left out)" in place of each member that the schema of the method declares as
+  // "writeOnly": a password or a key, which no log may have.
+  Json::Value WithoutSecrets(const std::string& path, Json::Value parameters) const;
+
   // The whole document; null for an empty descriptor.
   const Json::Value& document() const { return document_; }
 
  private:
+  // The schema of the parameters as JSON, or nullptr.
+  const Json::Value* ParameterSchema(const std::string& path) const;
+
   bool ReadErrorCodes(const Json::Value& codes, std::string* error);
   bool ReadPaths(const Json::Value& paths, std::string* error);
   bool ReadSchemas(const Json::Value& schemas, std::string* error);

@@ -71,12 +71,14 @@ void Call::Run(Answer answer) {
 void Call::Work() {
   const auto begun = std::chrono::steady_clock::now();
   Response response;
-  if (abandoned_) {
-    response.status = 503;  // the client has left
-  } else {
+  const bool run = !abandoned_;  // otherwise the client has left
+  if (run) {
     response = AnswerOf(route_, [this] { return Execute(); });
+  } else {
+    response.status = 503;
   }
   body_.reset();  // the uploads are removed before the client sees the answer
+  if (run && !route_.method.reads_only) Audit(response, begun);
   response.begun = begun;
   const int status = response.status;
   if (!answer_.Give(std::move(response))) {
@@ -89,8 +91,23 @@ Response Call::Execute() {
   if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
   description_.uploads = body_->Uploads();
   const Json::Value& object = std::get<Json::Value>(parameters);
-  if (!if_match_) return RunAndAnswer(route_, object, std::move(description_));
-  return RunIfUnchanged(route_, object, std::move(description_), *if_match_);
+  if (!route_.method.reads_only) {
+    audited_parameters_ = AuditedParameters(route_.descriptor->WithoutSecrets("/api/" + route_.Id(), object));
+  }
+  if (!if_match_) return RunAndAnswer(route_, object, description_);
+  return RunIfUnchanged(route_, object, description_, *if_match_);
+}
+
+// A change must not be undone by a lack of memory for its record; the access log still has a line for it.
+void Call::Audit(const Response& response, std::chrono::steady_clock::time_point begun) const noexcept {
+  try {
+    const auto duration = std::chrono::steady_clock::now() - begun;
+    environment_.audit({description_.caller, description_.origin, description_.method, audited_parameters_,
+                        response.status, response.error_code,
+                        std::chrono::duration_cast<std::chrono::microseconds>(duration)});
+  } catch (const std::exception&) {
+    syslog(LOG_ERR, "A call has no audit record: no memory");
+  }
 }
 
 void Call::Expire(bool running) {

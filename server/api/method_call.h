@@ -11,6 +11,7 @@
 #include <string>
 #include <string_view>
 
+#include "audit.h"
 #include "body.h"
 #include "call.h"
 #include "http.h"
@@ -25,9 +26,10 @@ namespace vorn::server {
 // when the pool closes, is answered with 503.
 class Call : public Exchange, public Job, public std::enable_shared_from_this<Call> {
  public:
-  // The objects that all calls share. Both must outlive the calls.
+  // The objects that all calls share. They must outlive the calls.
   struct Environment {
     WorkerPool& pool;
+    const AuditSink& audit;              // receives each call of a method that may change something
     std::chrono::milliseconds deadline;  // from the end of the body
   };
 
@@ -50,11 +52,13 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
 
  private:
   Response Execute();
+  void Audit(const Response& response, std::chrono::steady_clock::time_point begun) const noexcept;
 
   const Route& route_;
   std::unique_ptr<Body> body_;
   VORN::CallDescription description_;
   const std::optional<std::string> if_match_;
+  std::string audited_parameters_;  // of a call that may change something
   const Environment environment_;
   PendingAnswer answer_;
   std::atomic<bool> abandoned_{false};

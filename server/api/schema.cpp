@@ -36,6 +36,7 @@ bool IsType(const Json::Value& value) {
 bool IsListOf(const Json::Value& list, bool (*is_item)(const Json::Value&)) {
   return list.isArray() && !list.empty() && std::all_of(list.begin(), list.end(), is_item);
 }
+bool IsBool(const Json::Value& value) { return value.isBool(); }
 bool IsText(const Json::Value& value) { return value.isString(); }
 bool IsAnything(const Json::Value& /*value*/) { return true; }
 bool IsScalar(const Json::Value& value) { return !value.isArray() && !value.isObject(); }
@@ -89,6 +90,7 @@ constexpr Keyword kKeywords[] = {
     {"default", IsAnything},
     {"examples", IsList},
     {"contentMediaType", IsText},
+    {"writeOnly", IsBool},
     {"x-reason", IsText},
 };
 

@@ -2,7 +2,8 @@
 //
 //   checked:      type, enum, const, minimum, maximum, minLength (1 only), pattern ("^[^...]*$" only), required,
 //                 properties, items, anyOf, if, then, else, $ref ("#/components/schemas/NAME" only)
-//   not checked:  title, description, default, examples, contentMediaType
+//   not checked:  title, description, default, examples, contentMediaType,
+//                 writeOnly
 //   x-reason:     the end of the sentence about a value that matches no schema of "anyOf"; required beside it
 //
 // A member that is null counts as absent.

@@ -145,7 +145,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
   request.description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
   return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
-                                Call::Environment{pool, limits_.call});
+                                Call::Environment{pool, parts_.audit, limits_.call});
 }
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }

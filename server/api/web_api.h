@@ -9,6 +9,7 @@
 #include <string_view>
 #include <variant>
 
+#include "audit.h"
 #include "browser_guard.h"
 #include "budget.h"
 #include "http.h"
@@ -32,6 +33,7 @@ class WebApi : public Service {
     Workers& workers;
     Budget& memory;  // of parsed parameters
     const OwnNames& names;
+    const AuditSink& audit;
   };
 
   explicit WebApi(Parts parts);

@@ -55,8 +55,9 @@ struct Response {
   std::string_view content_type = "application/json";          // of static lifetime
   std::shared_ptr<BodySource> source{};                        // if not null, sent instead of `body`
 
-  // For the access log: the authenticated caller, and when a worker began with the call.
+  // For the logs: the authenticated caller, the error code (0 for success), and when a worker began with the call.
   std::string caller{};
+  int error_code = 0;
   std::chrono::steady_clock::time_point begun{};
 };
 

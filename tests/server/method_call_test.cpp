@@ -40,6 +40,14 @@ class TracedBody : public Body {
   bool* gone_;
 };
 
+// A body with these parameters.
+class FixedBody : public Body {
+ public:
+  FixedBody() : Body(1, JsonBody::TooLarge) {}
+  std::variant<Json::Value, Response> TakeParameters() override { return parameters; }
+  Json::Value parameters{Json::objectValue};
+};
+
 // A body whose parameters cannot be allocated.
 class FailingBody : public Body {
  public:
@@ -65,7 +73,7 @@ class CallTest : public testing::Test {
 
   std::shared_ptr<Call> NewCall(const Route& route, milliseconds deadline = std::chrono::hours(1)) {
     return std::make_shared<Call>(Call::Request{route, {}, {}}, std::make_unique<TracedBody>(&gone_),
-                                  Call::Environment{pool_, deadline});
+                                  Call::Environment{pool_, audit_, deadline});
   }
   // Runs the call. The future receives its answer.
   static std::future<Response> Run(const std::shared_ptr<Call>& call) {
@@ -85,6 +93,8 @@ class CallTest : public testing::Test {
   const Route echo_{{"Api", 1, "echo", Echo}, &descriptor_, {}};
   const Route hold_{{"Api", 1, "hold", Hold}, &descriptor_, {}};
   bool gone_ = false;
+  std::vector<AuditRecord> audited_;
+  const AuditSink audit_ = [this](const AuditRecord& record) { audited_.push_back(record); };
   WorkerPool pool_{OneOfALane()};
 };
 
@@ -134,8 +144,57 @@ TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {
 
 TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
   const auto call = std::make_shared<Call>(Call::Request{echo_, {}, {}}, std::make_unique<FailingBody>(),
-                                           Call::Environment{pool_, std::chrono::hours(1)});
+                                           Call::Environment{pool_, audit_, std::chrono::hours(1)});
   EXPECT_EQ(Run(call).get().status, 500);
+}
+
+TEST_F(CallTest, ThatMayChangeSomethingIsRecordedBeforeItsAnswer) {
+  std::promise<std::size_t> records_at_answer;
+  Call::Request request{echo_, {}, {}};
+  request.description.caller = "alice";
+  request.description.origin = "unix";
+  std::make_shared<Call>(std::move(request), std::make_unique<TracedBody>(&gone_),
+                         Call::Environment{pool_, audit_, std::chrono::hours(1)})
+      ->Run([&](const Response& /*response*/) { records_at_answer.set_value(audited_.size()); });
+  ASSERT_EQ(records_at_answer.get_future().get(), 1U);
+  EXPECT_EQ(audited_[0].caller, "alice");
+  EXPECT_EQ(audited_[0].origin, "unix");
+  EXPECT_EQ(audited_[0].method, "Api/v1/echo");
+  EXPECT_EQ(audited_[0].parameters, "{}");
+  EXPECT_EQ(audited_[0].status, 200);
+  EXPECT_EQ(audited_[0].code, 0);
+}
+
+TEST_F(CallTest, ThatFailsIsRecordedWithItsCode) {
+  const Route route{{"Api", 1, "method", Throw}, &descriptor_, {}};
+  Run(NewCall(route)).get();
+  ASSERT_EQ(audited_.size(), 1U);
+  EXPECT_EQ(audited_[0].status, 500);
+  EXPECT_EQ(audited_[0].code, 2302);
+}
+
+TEST_F(CallTest, ThatOnlyReadsIsNotRecorded) {
+  Route route = echo_;
+  route.method.reads_only = true;
+  Run(NewCall(route)).get();
+  EXPECT_TRUE(audited_.empty());
+}
+
+TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
+  std::string error;
+  const auto descriptor = Descriptor::Parse(R"({"paths": {"/api/Api/v1/echo": {"post": {"requestBody": {"content": {
+      "application/json": {"schema": {"properties": {"password": {"writeOnly": true}}}}}}}}}})",
+                                            &error);
+  ASSERT_TRUE(descriptor) << error;
+  const Route route{{"Api", 1, "echo", Echo}, &*descriptor, {}};
+  auto body = std::make_unique<FixedBody>();
+  body->parameters["password"] = "secret";
+  body->parameters["name"] = "alice";
+  const auto call = std::make_shared<Call>(Call::Request{route, {}, {}}, std::move(body),
+                                           Call::Environment{pool_, audit_, std::chrono::hours(1)});
+  EXPECT_NE(Run(call).get().body.find("secret"), std::string::npos) << "the method has the secret";
+  ASSERT_EQ(audited_.size(), 1U);
+  EXPECT_EQ(audited_[0].parameters, R"json({"name":"alice","password":"(left out)"})json");
 }
 
 TEST_F(CallTest, IsAnsweredWhenItsMethodDoesNotAnswer) {

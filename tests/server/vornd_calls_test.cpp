@@ -56,6 +56,14 @@ TEST_F(Calls, FailAsTheDescriptorSays) {
   EXPECT_FALSE(unknown.Envelope()["error"].isMember("details"));
 }
 
+TEST_F(Calls, ThatMayChangeSomethingAreAudited) {
+  Call("v1/fail", R"({"code": 2351})");
+  EXPECT_THAT(server_.log(), HasSubstr(R"(Test.Echo/v1/fail {"code":2351} failed with 2351, )"));
+  Call("v1/get", R"({"a": 1})");
+  EXPECT_THAT(server_.log(),
+              testing::Not(HasSubstr("audit: uid " + std::to_string(getuid()) + " unix Test.Echo/v1/get")));
+}
+
 TEST_F(Calls, OfABrokenMethodAreAnsweredAndLogged) {
   for (const char* method : {"v1/throw", "v1/throw_number", "v1/silent"}) {
     const Reply reply = Call(method);

@@ -60,7 +60,8 @@ class WebApiTest : public testing::Test {
   std::string error_;
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
   const OwnNames names_{{"nas.example"}};
-  WebApi api_{{routes_, *uploads_, workers_, memory_, names_}};
+  const AuditSink audit_ = [](const AuditRecord& /*record*/) {};
+  WebApi api_{{routes_, *uploads_, workers_, memory_, names_, audit_}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {

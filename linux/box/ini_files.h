@@ -87,7 +87,7 @@ class IniFiles {
     bool Has(const Source& other) const;
   };
 
-  // What a value stands for; nullopt if it refers to nothing, or to itself.
+  // Returns the value with its references replaced; nullopt if it refers to nothing, or to itself.
   struct Resolved {
     std::optional<std::string_view> value;
     bool is_circular = false;

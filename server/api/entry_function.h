@@ -12,7 +12,7 @@
 
 namespace vorn::server {
 
-// What an entry function reported.
+// The report of an entry function.
 struct Outcome {
   int code = 0;      // the error code; 0 for success
   Json::Value data;  // the result, or the details of the error

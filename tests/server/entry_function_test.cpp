@@ -22,7 +22,7 @@ void AddRemarks(VORN::APIRequest* request, VORN::APIResponse* response) {
   request->GetParam("fail", false).asBool() ? response->SetError(2351, {}) : response->SetSuccess({});
 }
 
-// What Load shows and Save changes: a number for each of two subjects.
+// A number for each of two subjects. Load shows it, and Save changes it.
 Json::Value stored(Json::objectValue);
 bool load_fails = false;
 

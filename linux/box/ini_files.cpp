@@ -221,6 +221,7 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
     const auto add = [&](std::string_view name) {
       const std::vector<IniSetting> own = source.file->document().Settings(name);
       contributing += source.file->document().HasSection(name) ? 1 : 0;
+      settings.reserve(settings.size() + own.size());
       for (const IniSetting& s : own) settings.push_back({s.key, s.value, s.value, source.file.get(), s.line});
     };
     if (source.inherited == LowerAscii(section)) add(IniDocument::kInherited);
@@ -238,6 +239,7 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
     return !value.has_value();
   };
   std::vector<IniFound> in_force;
+  in_force.reserve(settings.size());
   for (IniFound& setting : settings) {
     if (!is_void(setting)) in_force.push_back(setting);
   }

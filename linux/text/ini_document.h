@@ -4,7 +4,6 @@
 
 #include <cstdint>
 #include <deque>
-#include <list>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -55,7 +54,7 @@ class IniDocument {
  public:
   static IniDocument Parse(std::string_view text);
 
-  IniDocument(IniDocument&&) = default;  // the index refers to the lines: a document is moved, never copied
+  IniDocument(IniDocument&&) = default;  // the lines refer to the texts: a document is moved, never copied
   IniDocument& operator=(IniDocument&&) = default;
 
   std::string Text() const;
@@ -97,62 +96,70 @@ class IniDocument {
  private:
   IniDocument() = default;
 
-  struct Line;
-  using Lines = std::list<Line>;
-  using Place = Lines::iterator;
+  using Place = std::uint32_t;  // an index of lines_
+  static constexpr Place kNowhere = UINT32_MAX;
 
   using SectionNumber = std::uint32_t;
   static constexpr SectionNumber kNoSection = 0;  // assignments are ignored
 
+  // A line of the file. The lines form a list in file order through their indexes.
   struct Line {
     std::string_view text;
-    IniLine content;
-    int number = 0;
+    std::string_view name;
+    std::string_view value;
     SectionNumber section = kNoSection;  // of a line with meaning
-    bool has_argument = false;           // whether its section has one
-    bool decides = false;                // whether it gives its key the value that counts
-    std::optional<Place> earlier;        // the line before that gives the same key a value
+    int number = 0;
+    Place previous = kNowhere;
+    Place next = kNowhere;
+    Place earlier = kNowhere;  // the line before that gives the same key a value
+    IniLine::Kind kind = IniLine::Kind::kOther;
+    bool has_argument = false;  // whether its section has one
+    bool decides = false;       // whether it gives its key the value that counts
   };
+
+  // An entry of the hash table of keys, which is probed linearly.
+  struct Slot {
+    std::uint32_t hash = 0;  // of the key
+    Place line = kNowhere;   // that gives the key its value; kNowhere in an entry that was never used
+  };
+  static constexpr Place kRemoved = kNowhere - 1;
 
   struct Section {
-    std::string name;           // lower case; without an argument
-    std::optional<Place> last;  // its last assignment without an argument, or its header if it has no assignment
-  };
-
-  // A key of a section; compared without regard to case.
-  struct KeyId {
-    SectionNumber section;
-    std::string_view key;
-  };
-  struct HashKeyId {
-    std::size_t operator()(const KeyId& id) const;
-  };
-  struct SameKeyId {
-    bool operator()(const KeyId& a, const KeyId& b) const;
+    std::string name;       // lower case; without an argument
+    Place last = kNowhere;  // its last assignment without an argument, or its header if it has no assignment
   };
 
   void Append(std::string_view text);
   Line MakeLine(std::string_view text, SectionNumber section);
-  void Index(Place line);
+  void Index(Place place);
   SectionNumber NumberOf(std::string_view name);
   SectionNumber Known(std::string_view name) const;
-  const Line* FindLine(std::string_view section, std::string_view key) const;
-  void Replace(Place line, const IniValue& value);
+  Place FindPlace(SectionNumber section, std::string_view key) const;
+  void Replace(Place place, const IniValue& value);
   void Insert(SectionNumber section, const IniKey& key, const IniValue& value);
   SectionNumber AddSection(const IniSection& section);
-  void Erase(Place line);
+  void Erase(Place place);
+  void LinkAfter(Place before, Place place);
+  void Unlink(Place place);
+
+  std::size_t FindSlot(SectionNumber section, std::string_view key, std::uint32_t hash) const;
+  void Decide(Place place);
+  void Rehash(std::size_t keys);
 
   std::deque<std::string> texts_;  // the file, and the lines that were joined or changed; the views point into them
-  Lines lines_;                    // all complete lines
-  std::string_view tail_;          // the rest of the file, which the reader ignores
-  int line_number_ = 1;            // of the next line
+  std::vector<Line> lines_;        // all complete lines, also the erased ones
+  Place first_ = kNowhere;
+  Place last_ = kNowhere;
+  std::string_view tail_;                    // the rest of the file, which the reader ignores
+  int line_number_ = 1;                      // of the next line
   std::vector<Section> sections_{{"", {}}};  // by number; the first one is kNoSection
   std::unordered_map<std::string, SectionNumber> section_numbers_;
   SectionNumber current_ = kNoSection;  // the section at the end
   bool current_has_argument_ = false;
-  std::unordered_map<KeyId, Place, HashKeyId, SameKeyId> deciding_;  // the line that gives a key its value
-  bool has_reference_ = false;                                       // no edit adds one
-  std::vector<Place> includes_;                                      // in order; no edit adds or removes one
+  std::vector<Slot> slots_;  // their number is a power of two, and at least twice used_slots_
+  std::size_t used_slots_ = 0;
+  bool has_reference_ = false;   // no edit adds one
+  std::vector<Place> includes_;  // in order; no edit adds or removes one
   const char* line_end_ = "\n";
 };
 

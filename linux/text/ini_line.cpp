@@ -8,25 +8,33 @@ namespace vorn {
 namespace {
 
 // The reader distinguishes blanks (isblank(3)) from white space (isspace(3)).
-constexpr std::string_view kBlank = " \t";
-constexpr std::string_view kSpace = " \t\n\v\f\r";
+bool IsBlank(char c) { return c == ' ' || c == '\t'; }
+bool IsSpace(char c) { return c == ' ' || (c >= '\t' && c <= '\r'); }
 
 constexpr std::size_t kNone = std::string_view::npos;
 
-std::string_view TrimLeft(std::string_view text, std::string_view characters) {
-  const std::size_t begin = text.find_first_not_of(characters);
-  return begin == kNone ? text.substr(text.size()) : text.substr(begin);
+template <typename Is>
+std::string_view TrimLeft(std::string_view text, Is is_trimmed) {
+  const auto begin = std::find_if_not(text.begin(), text.end(), is_trimmed);
+  return text.substr(static_cast<std::size_t>(begin - text.begin()));
 }
 
-std::string_view TrimRight(std::string_view text, std::string_view characters) {
-  return text.substr(0, text.find_last_not_of(characters) + 1);
+template <typename Is>
+std::string_view TrimRight(std::string_view text, Is is_trimmed) {
+  const auto end = std::find_if_not(text.rbegin(), text.rend(), is_trimmed);
+  return text.substr(0, static_cast<std::size_t>(text.rend() - end));
+}
+
+std::string_view BeforeComment(std::string_view text) {
+  const auto end = std::find_if(text.begin(), text.end(), [](char c) { return c == '#' || c == ';'; });
+  return text.substr(0, static_cast<std::size_t>(end - text.begin()));
 }
 
 IniLine ReadSection(std::string_view line) {
   IniLine result;
   const std::size_t end = line.find(']');
   result.kind = end == kNone ? IniLine::Kind::kBadSection : IniLine::Kind::kSection;
-  std::string_view name = TrimLeft(line.substr(1, end == kNone ? kNone : end - 1), kBlank);
+  std::string_view name = TrimLeft(line.substr(1, end == kNone ? kNone : end - 1), IsBlank);
   const std::size_t quote = name.find('"');
   if (quote != kNone) {
     const std::string_view rest = name.substr(quote + 1);
@@ -34,13 +42,13 @@ IniLine ReadSection(std::string_view line) {
     if (close != kNone) result.argument = rest.substr(0, close);
     name = name.substr(0, quote);
   }
-  result.name = TrimRight(name, kBlank);
+  result.name = TrimRight(name, IsBlank);
   return result;
 }
 
 // Finds the value that begins at or behind `begin`.
 void ReadValue(std::string_view line, std::size_t begin, IniLine* result) {
-  const std::string_view text = TrimLeft(line.substr(begin), kBlank);
+  const std::string_view text = TrimLeft(line.substr(begin), IsBlank);
   result->value_begin = result->value_end = line.size() - text.size();
   if (text.empty()) return;
   if (text.front() == '"' || text.front() == '\'') {
@@ -50,19 +58,24 @@ void ReadValue(std::string_view line, std::size_t begin, IniLine* result) {
     result->value_end += close + 1;
     return;
   }
-  const std::string_view value = text.substr(0, text.find_first_of("#;"));
+  const std::string_view value = BeforeComment(text);
   // The reader never trims the first character: where lines end by "\r\n", an empty value reads as "\r".
-  result->value = value.substr(0, std::max(TrimRight(value, kSpace).size(), std::min(value.size(), std::size_t{1})));
+  result->value = value.substr(0, std::max(TrimRight(value, IsSpace).size(), std::min(value.size(), std::size_t{1})));
   result->value_end += result->value.size();
+}
+
+bool IsInclude(std::string_view name) {
+  constexpr std::string_view kInclude = "include";
+  return name.size() == kInclude.size() && LowerAscii(name) == kInclude;
 }
 
 IniLine ReadAssignment(std::string_view line, std::size_t begin) {
   IniLine result;
   const std::size_t equals = line.find('=', begin);
   if (equals == kNone) return result;
-  result.name = TrimRight(line.substr(begin, equals - begin), kBlank);
+  result.name = TrimRight(line.substr(begin, equals - begin), IsBlank);
   if (result.name.empty()) return result;
-  result.kind = LowerAscii(result.name) == "include" ? IniLine::Kind::kInclude : IniLine::Kind::kAssignment;
+  result.kind = IsInclude(result.name) ? IniLine::Kind::kInclude : IniLine::Kind::kAssignment;
   ReadValue(line, equals + 1, &result);
   return result;
 }
@@ -84,8 +97,8 @@ std::string JoinIniLine(std::string_view line) {
 
 IniLine ReadIniLine(std::string_view line) {
   line.remove_suffix(1);  // its line feed
-  const std::size_t begin = line.find_first_not_of(kSpace);
-  if (begin == kNone || line[begin] == '#' || line[begin] == ';') return {};
+  const std::size_t begin = line.size() - TrimLeft(line, IsSpace).size();
+  if (begin == line.size() || line[begin] == '#' || line[begin] == ';') return {};
   if (line[begin] == '[') return ReadSection(line.substr(begin));
   return ReadAssignment(line, begin);
 }

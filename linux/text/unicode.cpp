@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <cstdint>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 
 namespace vorn {
@@ -64,8 +65,16 @@ bool IsNormal(std::string_view text) {
   return normal != nullptr && text == std::string_view(reinterpret_cast<const char*>(normal.get()), size);
 }
 
+// Looks at eight bytes at a time.
 bool IsAscii(std::string_view text) {
-  return std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; });
+  std::uint64_t all = 0;
+  for (; text.size() >= sizeof all; text.remove_prefix(sizeof all)) {
+    std::uint64_t word = 0;
+    std::memcpy(&word, text.data(), sizeof word);
+    all |= word;
+  }
+  for (const char c : text) all |= static_cast<unsigned char>(c);
+  return (all & 0x8080808080808080U) == 0;
 }
 
 char UpperAscii(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
@@ -97,6 +106,7 @@ bool CaselessSubstring::IsIn(std::string_view text) const {
 }
 
 std::string ToValidUtf8(std::string_view text) {
+  if (IsAscii(text)) return std::string(text);
   std::string valid;
   while (const std::uint8_t* bad = u8_check(Bytes(text), text.size())) {
     const auto good = static_cast<std::size_t>(bad - Bytes(text));

@@ -128,7 +128,7 @@ int Serve(const Options& options) {
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
   WebApi api({routes, *uploads, workers, memory, names, audit});
   const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
-  AccessLog log(StartedBySystemd() ? JournalSink() : SyslogSink());
+  AccessLog log(StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO));
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
   Notify("READY=1");
   WaitForTermination();

@@ -1,6 +1,7 @@
 #include "worker_pool.h"
 
 #include <pthread.h>
+#include <sched.h>
 #include <syslog.h>
 
 #include <algorithm>
@@ -8,6 +9,17 @@
 #include <utility>
 
 namespace vorn::server {
+namespace {
+
+// The kernel does not let the calling thread interrupt the thread that wakes it (SCHED_BATCH, sched(7)). Otherwise each
+// call would interrupt the network thread before it has read the other requests that have arrived. A scheduling
+// policy that the administrator chose is kept.
+void YieldToWaker() {
+  const sched_param no_priority{};
+  if (sched_getscheduler(0) == SCHED_OTHER) sched_setscheduler(0, SCHED_BATCH, &no_priority);
+}
+
+}  // namespace
 
 WorkerPool::WorkerPool(Limits limits) : limits_(limits) {
   const std::lock_guard<std::mutex> lock(mutex_);
@@ -88,6 +100,7 @@ WorkerPool::Lane* WorkerPool::NextLane() {
 
 void WorkerPool::Work() {
   pthread_setname_np(pthread_self(), "worker");
+  YieldToWaker();
   std::unique_lock<std::mutex> lock(mutex_);
   while (!ending_) {
     Lane* const lane = NextLane();

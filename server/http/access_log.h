@@ -27,16 +27,19 @@ struct AccessRecord {
   std::chrono::microseconds worked{0};
 };
 
-// Writes records from a thread of its own, so that a slow journal delays no client. A record that finds the queue
-// full, and a record of status 503, is counted instead; the counts are written every ten seconds.
+// Writes records from a thread of its own, so that a slow journal delays no client. The thread collects the records of
+// a tenth of a second, because waking it for each of them would cost as much as writing it. A record that finds the
+// queue full, and a record of status 503, is counted instead; the counts are written every ten seconds.
 class AccessLog {
  public:
   struct Counts {
     std::uint64_t busy = 0;     // answers 503
     std::uint64_t dropped = 0;  // records without a line
   };
+  // All functions are called on the log's own thread.
   struct Sink {
     std::function<void(const AccessRecord&)> write;
+    std::function<void()> flush;  // the end of a batch of records; must not throw
     std::function<void(const Counts&)> summarize;
   };
 
@@ -59,7 +62,7 @@ class AccessLog {
   const Sink sink_;
   const std::size_t limit_;
   std::mutex mutex_;
-  std::condition_variable wake_;
+  std::condition_variable wake_;  // the first record, a queue that is half full, or the end
   std::vector<AccessRecord> queue_;
   Counts counts_;
   bool stopping_ = false;
@@ -72,8 +75,9 @@ std::string FormatRecord(const AccessRecord& record);
 // Writes to the systemd journal, in fields of their own (VORN_PEER, VORN_STATUS, ...; systemd.journal-fields(7)).
 AccessLog::Sink JournalSink();
 
-// Writes lines to syslog(3).
-AccessLog::Sink SyslogSink();
+// Writes lines to `descriptor`, which must outlive the log, with one write(2) for a batch. What cannot be written is
+// lost. The counts go to syslog(3).
+AccessLog::Sink LineSink(int descriptor);
 
 }  // namespace vorn::server
 

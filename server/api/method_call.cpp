@@ -61,7 +61,7 @@ std::optional<Response> Call::Receive(std::string_view piece) { return body_->Re
 void Call::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
-    if (environment_.pool.Submit({&route_, SizeOf(*body_)}, shared_from_this(), environment_.deadline)) return;
+    if (environment_.pool.Enqueue({&route_, SizeOf(*body_)}, shared_from_this(), environment_.deadline)) return;
     answer_.Give(Busy("Too many calls of this method are waiting. Try again soon."));
   } catch (const std::exception& exception) {
     answer_.Give(NoAnswer(route_, exception.what()));

@@ -40,6 +40,7 @@ class WebApi : public Service {
   WebApi(Parts parts, Limits limits);
 
   std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
+  void Dispatch() override { parts_.workers.Wake(); }
   Response Refuse(int status, std::string_view text) const override;
 
  private:

@@ -24,7 +24,7 @@ void YieldToWaker() {
 WorkerPool::WorkerPool(Limits limits) : limits_(limits) {
   const std::lock_guard<std::mutex> lock(mutex_);
   threads_.reserve(limits_.threads);
-  threads_.emplace_back([this] { Work(); });
+  StartThread();
   watch_ = std::thread([this] { Watch(); });
 }
 
@@ -41,6 +41,12 @@ WorkerPool::~WorkerPool() {
 }
 
 bool WorkerPool::Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
+  if (!Enqueue(lane, std::move(job), time)) return false;
+  Wake();
+  return true;
+}
+
+bool WorkerPool::Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
   const auto now = Clock::now();
   Entries one;
   one.push_back({nullptr, std::move(job), now + time, {}});
@@ -51,13 +57,18 @@ bool WorkerPool::Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::mill
   one.front().lane = &its_lane;
   its_lane.queue.splice(its_lane.queue.end(), one);
   ++queued_;
-  if (MayTake()) {
-    EngageThread();
-    WatchNoLaterThan(now + time);
-  } else {
-    WatchNoLaterThan(now + limits_.long_after);
-  }
+  WatchNoLaterThan(running_.size() < MostRunning() ? now + time : now + limits_.long_after);
   return true;
+}
+
+// The thread is notified after the lock is released; otherwise it would wake only to wait for the lock.
+void WorkerPool::Wake() {
+  bool engaged = false;
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    engaged = EngageThread();
+  }
+  if (engaged) wake_.notify_one();
 }
 
 void WorkerPool::Close() {
@@ -71,16 +82,29 @@ void WorkerPool::Close() {
   for (const Entry& entry : refused) entry.job->Refuse();
 }
 
-// Wakes a thread that waits, or starts one. The vector has room for all threads, so it never reallocates. If no
-// thread can be started, the pool continues with the existing ones.
-void WorkerPool::EngageThread() {
-  if (idle_ > 0) return wake_.notify_one();
-  if (threads_.size() >= limits_.threads) return;
+// A thread begins as a sleeping one that is to wake.
+void WorkerPool::StartThread() {
+  threads_.emplace_back([this] { Work(); });
+  ++idle_;
+  ++waking_;
+}
+
+// If a job may begin, starts a thread for it, or has a sleeping one wake and returns true: the caller then notifies
+// wake_. The vector has room for all threads, so it never reallocates. If no thread can be started, the pool continues
+// with the existing ones.
+bool WorkerPool::EngageThread() {
+  if (running_.size() + waking_ >= MostRunning() || NextLane() == nullptr) return false;
+  if (idle_ > waking_) {
+    ++waking_;
+    return true;
+  }
+  if (threads_.size() >= limits_.threads) return false;
   try {
-    threads_.emplace_back([this] { Work(); });
+    StartThread();
   } catch (const std::exception& error) {
     syslog(LOG_WARNING, "No further worker thread, going on with %zu: %s", threads_.size(), error.what());
   }
+  return false;
 }
 
 bool WorkerPool::MayTakeFrom(const Lane& lane) const {
@@ -90,7 +114,7 @@ bool WorkerPool::MayTakeFrom(const Lane& lane) const {
 
 // Returns the least recently served lane whose next job may begin; nullptr if there is none.
 WorkerPool::Lane* WorkerPool::NextLane() {
-  if (queued_ == 0 || !MayTake()) return nullptr;
+  if (queued_ == 0 || running_.size() >= MostRunning()) return nullptr;
   Lane* next = nullptr;
   for (auto& [id, lane] : lanes_) {
     if (MayTakeFrom(lane) && (next == nullptr || lane.turn < next->turn)) next = &lane;
@@ -101,21 +125,37 @@ WorkerPool::Lane* WorkerPool::NextLane() {
 void WorkerPool::Work() {
   pthread_setname_np(pthread_self(), "worker");
   YieldToWaker();
+  Entries ended;
   std::unique_lock<std::mutex> lock(mutex_);
-  while (!ending_) {
-    Lane* const lane = NextLane();
-    if (lane == nullptr) {
-      ++idle_;
-      wake_.wait(lock);
-      --idle_;
-      continue;
-    }
-    RunUnlocked(Begin(lane), &lock);
+  for (;;) {
+    wake_.wait(lock, [this] { return waking_ > 0 || ending_; });
+    if (ending_) return;
+    --waking_;
+    --idle_;
+    RunJobs(&lock, &ended);
+    ++idle_;
+    lock.unlock();
+    ended.clear();
+    lock.lock();
   }
 }
 
-// Moves the first job of the lane to the running jobs. This thread may have been woken for the next job as well, so
-// another thread is woken for it.
+// Runs jobs until there is none that may begin. Jobs are destroyed outside of the lock; to lock less often, each one
+// when the lock is released for the next one, and the last one by the caller.
+void WorkerPool::RunJobs(std::unique_lock<std::mutex>* lock, Entries* ended) {
+  while (Lane* const lane = NextLane()) {
+    const auto entry = Begin(lane);
+    const bool engaged = EngageThread();
+    lock->unlock();
+    if (engaged) wake_.notify_one();
+    ended->clear();
+    entry->job->Work();
+    lock->lock();
+    End(entry, ended);
+  }
+}
+
+// Moves the first job of the lane to the running jobs.
 WorkerPool::Entries::iterator WorkerPool::Begin(Lane* lane) {
   const auto entry = lane->queue.begin();
   entry->begun = Clock::now();
@@ -124,25 +164,14 @@ WorkerPool::Entries::iterator WorkerPool::Begin(Lane* lane) {
   ++lane->running;
   lane->turn = ++turn_;
   running_.splice(running_.end(), lane->queue, entry);
-  if (--queued_ > 0) {
-    if (NextLane() != nullptr) EngageThread();
-    WatchNoLaterThan(entry->begun + limits_.long_after);
-  }
+  if (--queued_ > 0) WatchNoLaterThan(entry->begun + limits_.long_after);
   return entry;
 }
 
-void WorkerPool::RunUnlocked(Entries::iterator entry, std::unique_lock<std::mutex>* lock) {
-  Job& job = *entry->job;
-  lock->unlock();
-  job.Work();
-  lock->lock();
+void WorkerPool::End(Entries::iterator entry, Entries* ended) {
   --entry->lane->running;
   if (entry->is_long) --long_jobs_;
-  Entries ended;
-  ended.splice(ended.end(), running_, entry);
-  lock->unlock();
-  ended.clear();  // destroys the job outside of the lock
-  lock->lock();
+  ended->splice(ended->end(), running_, entry);
 }
 
 void WorkerPool::WatchNoLaterThan(Clock::time_point time) {
@@ -182,7 +211,7 @@ void WorkerPool::MarkLongJobs(Clock::time_point now) {
     if (entry.is_long || now < entry.begun + limits_.long_after) continue;
     entry.is_long = true;
     ++long_jobs_;
-    if (NextLane() != nullptr) EngageThread();
+    if (EngageThread()) wake_.notify_one();
   }
 }
 

@@ -69,6 +69,11 @@ class WorkerPool {
   // the lane's share of the queue is used up or the pool is closed. Throws std::bad_alloc and has then no effect.
   bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
 
+  // As Submit(), but wakes no thread: the job waits for Wake() or for a thread that has just ended another job. For a
+  // caller that has several jobs to submit.
+  bool Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
+  void Wake();
+
   // Refuses the jobs that wait and all further ones. Running jobs continue. Does not wait.
   void Close();
 
@@ -92,12 +97,14 @@ class WorkerPool {
 
   void Work();
   void Watch();
-  bool MayTake() const { return running_.size() < limits_.short_threads + long_jobs_; }
+  std::size_t MostRunning() const { return limits_.short_threads + long_jobs_; }
   bool MayTakeFrom(const Lane& lane) const;
   Lane* NextLane();
-  void EngageThread();
+  void StartThread();
+  bool EngageThread();
+  void RunJobs(std::unique_lock<std::mutex>* lock, Entries* ended);
   Entries::iterator Begin(Lane* lane);
-  void RunUnlocked(Entries::iterator entry, std::unique_lock<std::mutex>* lock);
+  void End(Entries::iterator entry, Entries* ended);
   void WatchNoLaterThan(Clock::time_point time);
   void MarkLongJobs(Clock::time_point now);
   void ExpireUnlocked(Clock::time_point now, std::unique_lock<std::mutex>* lock);
@@ -114,7 +121,8 @@ class WorkerPool {
   std::uint64_t turn_ = 0;              // counts the jobs that were begun
   Entries running_;
   std::size_t long_jobs_ = 0;  // of running_
-  std::size_t idle_ = 0;       // threads that wait for a job
+  std::size_t idle_ = 0;       // threads that do not look for a job
+  std::size_t waking_ = 0;     // how many of the idle threads are to wake
   bool closed_ = false;
   bool ending_ = false;
   Clock::time_point next_watch_ = Clock::time_point::max();
@@ -125,6 +133,11 @@ class WorkerPool {
 // The methods that only read have threads of their own, which those that change something cannot take from them.
 struct Workers {
   explicit Workers(WorkerPool::Limits limits = {}) : reading(limits), changing(limits) {}
+
+  void Wake() {
+    reading.Wake();
+    changing.Wake();
+  }
 
   void Close() {
     reading.Close();

@@ -9,12 +9,14 @@
 #include <boost/asio/basic_socket_acceptor.hpp>
 #include <boost/asio/executor_work_guard.hpp>
 #include <boost/asio/posix/basic_stream_descriptor.hpp>
+#include <boost/asio/post.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <cerrno>
 #include <cstring>
 #include <ctime>
 #include <exception>
 #include <future>
+#include <new>
 #include <thread>
 #include <unordered_set>
 #include <utility>
@@ -80,6 +82,7 @@ class HttpServer::Engine : public SessionHost {
   const std::shared_ptr<Mailbox>& mailbox() override { return mailbox_; }
   bool stopping() const override { return stopping_; }
   const std::string& date() override;
+  void DispatchLater() override;
   void Forget(const std::shared_ptr<Session>& session) override;
 
  private:
@@ -119,6 +122,7 @@ class HttpServer::Engine : public SessionHost {
   std::uint64_t letter_count_ = 0;
   bool reading_letters_ = false;
   bool ticking_ = false;
+  bool dispatching_ = false;
   bool stopping_ = false;
   std::atomic<bool> stop_wanted_{false};
   std::atomic<bool> end_wanted_{false};
@@ -345,6 +349,20 @@ const std::string& HttpServer::Engine::date() {
     date_ = HttpDate();
   }
   return date_;
+}
+
+// Asio runs a posted handler after those whose events it has already taken from the kernel.
+void HttpServer::Engine::DispatchLater() {
+  if (dispatching_) return;
+  try {
+    asio::post(io_, [this] {
+      dispatching_ = false;
+      service_.Dispatch();
+    });
+    dispatching_ = true;
+  } catch (const std::bad_alloc&) {
+    service_.Dispatch();
+  }
 }
 
 HttpServer::HttpServer(Service& service, std::vector<Listener> listeners, HttpLimits limits, HttpParts parts)

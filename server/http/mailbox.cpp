@@ -19,11 +19,14 @@ Mailbox::~Mailbox() {
 }
 
 void Mailbox::Send(std::shared_ptr<Letter> letter) noexcept {
-  const std::lock_guard<std::mutex> lock(mutex_);
   Letter* const sent = letter.get();
-  const bool first = last_ == nullptr;
-  (first ? first_ : last_->next) = std::move(letter);
-  last_ = sent;
+  bool first = false;
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    first = last_ == nullptr;
+    (first ? first_ : last_->next) = std::move(letter);
+    last_ = sent;
+  }
   if (first) Wake();
 }
 

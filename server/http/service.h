@@ -49,6 +49,10 @@ class Service {
   // Called for each head, on the network thread.
   virtual std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) = 0;
 
+  // Called on the network thread after calls of Exchange::Run(), when every request that had arrived with theirs has
+  // been passed on: a service that wakes its threads here wakes them once for all of them. Must not throw.
+  virtual void Dispatch() {}
+
   // The answer to a request that the transport itself refuses, in the service's own format. `text` is a sentence
   // for the client. Called on the network thread.
   virtual Response Refuse(int status, std::string_view text) const = 0;

@@ -245,6 +245,7 @@ void Session::Run() {
     letter->response = std::move(response);
     mailbox->Send(letter);
   });
+  host_.DispatchLater();
 }
 
 void Session::OnAnswer(std::optional<Response> response) {

@@ -33,6 +33,7 @@ class SessionHost {
   virtual const std::shared_ptr<Mailbox>& mailbox() = 0;
   virtual bool stopping() const = 0;
   virtual const std::string& date() = 0;  // for the Date header
+  virtual void DispatchLater() = 0;       // calls Service::Dispatch() after the events that are pending
   virtual void Forget(const std::shared_ptr<Session>& session) = 0;
 };
 

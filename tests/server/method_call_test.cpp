@@ -76,9 +76,10 @@ class CallTest : public testing::Test {
                                   Call::Environment{pool_, audit_, deadline});
   }
   // Runs the call. The future receives its answer.
-  static std::future<Response> Run(const std::shared_ptr<Call>& call) {
+  std::future<Response> Run(const std::shared_ptr<Call>& call) {
     const auto promise = std::make_shared<std::promise<Response>>();
     call->Run([promise](Response response) { promise->set_value(std::move(response)); });
+    pool_.Wake();
     return promise->get_future();
   }
 
@@ -101,6 +102,7 @@ class CallTest : public testing::Test {
 TEST_F(CallTest, ReleasesItsBodyBeforeItAnswers) {
   std::promise<bool> gone_at_answer;
   NewCall(echo_)->Run([&](const Response& /*response*/) { gone_at_answer.set_value(gone_); });
+  pool_.Wake();
   EXPECT_TRUE(gone_at_answer.get_future().get());
 }
 
@@ -120,7 +122,7 @@ TEST_F(CallTest, IsRefusedWhenTooManyWait) {
 
 TEST_F(CallTest, IsAnsweredAtItsDeadline) {
   held = true;
-  auto running = Run(NewCall(hold_, milliseconds(1)));
+  auto running = Run(NewCall(hold_, std::chrono::seconds(2)));  // long enough for a worker to begin
   EXPECT_EQ(running.get().status, 504);
   EXPECT_EQ(held_calls, 1);
   auto waiting = Run(NewCall(hold_, milliseconds(1)));

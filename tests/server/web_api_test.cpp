@@ -244,6 +244,7 @@ TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {
   auto begun = api_.Begin(head);
   std::promise<std::string> answer;
   std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& response) { answer.set_value(response.body); });
+  api_.Dispatch();
   EXPECT_EQ(answer.get_future().get(), R"({"success":true,"data":"uid 1000 at unix"})");
 }
 

@@ -161,7 +161,7 @@ TEST_F(WorkerPoolTest, RefusesMoreThanALanesShareOfTheQueue) {
 
 TEST_F(WorkerPoolTest, TellsAJobThatItsDeadlineHasPassed) {
   WorkerPool pool(Limits(1, 1, 10));
-  SubmitHanging(pool, 0, milliseconds(1));
+  SubmitHanging(pool, 0, std::chrono::seconds(2));  // long enough for a worker to begin
   EXPECT_TRUE(Eventually([&] { return counts_.expired_running == 1; }));
   Submit(pool, 0, {}, milliseconds(1));  // its lane is busy
   EXPECT_TRUE(Eventually([&] { return counts_.expired_waiting == 1; }));

@@ -45,7 +45,7 @@ std::string Route::Name() const { return std::string(row.api) + " v" + std::to_s
 
 std::string Route::Id() const { return std::string(row.api) + "/v" + std::to_string(row.version) + "/" + row.method; }
 
-Routes::Routes(const std::vector<Module>& modules) {
+Routes::Routes(const std::vector<Module>& modules) : modules_(modules) {
   for (const Module& module : modules) {
     for (const APIRow& row : module.rows) Add(row, module);
     for (const std::string& path : module.descriptor.Paths()) {

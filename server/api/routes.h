@@ -41,6 +41,8 @@ class Routes {
   // Returns all rows as [{"api": ..., "version": ..., "method": ...}, ...].
   Json::Value List() const;
 
+  const std::vector<Module>& modules() const { return modules_; }
+
  private:
   using Methods = std::map<std::string, Route, std::less<>>;
   using Versions = std::map<int, Methods>;
@@ -48,6 +50,7 @@ class Routes {
   void Add(const APIRow& row, const Module& module);
   void PairWithReader(Route* route) const;
 
+  const std::vector<Module>& modules_;
   std::map<std::string, Versions, std::less<>> apis_;
 };
 

@@ -12,7 +12,9 @@
 #include "header_value.h"
 #include "method_call.h"
 #include "multipart.h"
+#include "openapi.h"
 #include "probe.h"
+#include "resources.h"
 
 namespace vorn::server {
 namespace {
@@ -106,18 +108,37 @@ Response Unchanging(Response response) {
   return response;
 }
 
+// A page without scripts; a browser loads nothing for it but the style sheet.
+Response File(std::string_view content, std::string_view type) {
+  Response response;
+  response.body = content;
+  response.content_type = type;
+  response.headers.emplace_back("Content-Security-Policy",
+                                "default-src 'none'; style-src 'self'; base-uri 'none'; "
+                                "form-action 'none'; frame-ancestors 'none'");
+  return response;
+}
+
 }  // namespace
 
 // The resources beside the methods. The network thread answers them, so it answers "/healthz" and "/healthz/live" as
 // long as the process is alive; only "/healthz/ready" asks the workers.
-const std::array<WebApi::Page, 4> WebApi::kPages = {{{"/api", &WebApi::List},
+const std::array<WebApi::Page, 7> WebApi::kPages = {{{"/api", &WebApi::List},
+                                                     {"/openapi.json", &WebApi::OpenApi},
+                                                     {"/docs", &WebApi::Docs},
+                                                     {"/docs.css", &WebApi::DocsStyle},
                                                      {"/healthz", &WebApi::Alive},
                                                      {"/healthz/live", &WebApi::Alive},
                                                      {"/healthz/ready", &WebApi::Ready}}};
 
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
 WebApi::WebApi(Parts parts, Limits limits)
-    : parts_(parts), limits_(limits), list_(Unchanging(Success(parts.routes.List()))) {}
+    : parts_(parts),
+      limits_(limits),
+      list_(Unchanging(Success(parts.routes.List()))),
+      open_api_(Unchanging(File(WriteJson(OpenApiDocument(parts.routes)), "application/json"))),
+      docs_(Unchanging(File(kDocsPage, "text/html; charset=utf-8"))),
+      docs_style_(Unchanging(File(kDocsStyle, "text/css; charset=utf-8"))) {}
 
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepOtherSitesOut(head, parts_.names)) return *std::move(refusal);
@@ -158,6 +179,9 @@ WebApi::Begun WebApi::BeginPage(const Page& page, const Head& head) const {
 }
 
 WebApi::Begun WebApi::List() const { return list_; }
+WebApi::Begun WebApi::OpenApi() const { return open_api_; }
+WebApi::Begun WebApi::Docs() const { return docs_; }
+WebApi::Begun WebApi::DocsStyle() const { return docs_style_; }
 
 WebApi::Begun WebApi::Alive() const { return Success(Json::Value()); }
 

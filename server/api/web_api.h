@@ -1,4 +1,4 @@
-// The resources of the server: the methods of the loaded modules, the list of them, and the health checks.
+// The resources of the server: the methods of the loaded modules, their list and description, and the health checks.
 #ifndef VORN_SERVER_WEB_API_H
 #define VORN_SERVER_WEB_API_H
 
@@ -51,17 +51,23 @@ class WebApi : public Service {
     std::string_view path;
     Begun (WebApi::*begin)() const;
   };
-  static const std::array<Page, 4> kPages;
+  static const std::array<Page, 7> kPages;
 
   Begun BeginPage(const Page& page, const Head& head) const;
   Begun List() const;
+  Begun OpenApi() const;
+  Begun Docs() const;
+  Begun DocsStyle() const;
   Begun Alive() const;
   Begun Ready() const;
   Begun BeginCall(const Route& route, const Head& head) const;
 
   const Parts parts_;
   const Limits limits_;
-  const Response list_;  // of the methods
+  const Response list_;        // of the methods
+  const Response open_api_;    // the description of the methods
+  const Response docs_;        // the documentation for people
+  const Response docs_style_;  // its style sheet
 };
 
 }  // namespace vorn::server

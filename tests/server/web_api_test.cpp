@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <future>
 
 #include "body.h"
@@ -89,7 +90,7 @@ TEST_F(WebApiTest, RefusesOtherHttpMethodsAndSaysWhichIsAllowed) {
 }
 
 TEST_F(WebApiTest, HasPagesForGet) {
-  for (const char* target : {"/api", "/healthz", "/healthz/live"}) {
+  for (const char* target : {"/api", "/openapi.json", "/docs", "/docs.css", "/healthz", "/healthz/live"}) {
     Head head = Post(target);
     EXPECT_EQ(Begin(head), 405) << target;
     head.method = "GET";
@@ -147,13 +148,25 @@ TEST_F(WebApiTest, UnknownQueryParametersAreRefusedByName) {
   EXPECT_EQ(Begin(unknown), 404);
 }
 
-TEST_F(WebApiTest, TheListOfMethodsHasAVersion) {
-  Head head = Post("/api");
+TEST_F(WebApiTest, UnchangingPagesHaveAVersion) {
+  for (const char* target : {"/api", "/openapi.json", "/docs", "/docs.css"}) {
+    Head head = Post(target);
+    head.method = "GET";
+    const auto first = std::get<Response>(api_.Begin(head));
+    const auto is_tag = [](const auto& header) { return header.first == "ETag"; };
+    EXPECT_EQ(std::count_if(first.headers.begin(), first.headers.end(), is_tag), 1) << target;
+    EXPECT_EQ(first.headers, std::get<Response>(api_.Begin(head)).headers) << target;
+  }
+}
+
+TEST_F(WebApiTest, TheDocumentationLoadsNothingButItsStyle) {
+  Head head = Post("/docs");
   head.method = "GET";
-  const auto first = std::get<Response>(api_.Begin(head));
-  ASSERT_FALSE(first.headers.empty());
-  EXPECT_EQ(first.headers[0].first, "ETag");
-  EXPECT_EQ(first.headers, std::get<Response>(api_.Begin(head)).headers);
+  const auto page = std::get<Response>(api_.Begin(head));
+  EXPECT_EQ(page.content_type, "text/html; charset=utf-8");
+  ASSERT_FALSE(page.headers.empty());
+  EXPECT_EQ(page.headers[0].first, "Content-Security-Policy");
+  EXPECT_EQ(page.headers[0].second.find("default-src 'none'; style-src 'self';"), 0U) << page.headers[0].second;
 }
 
 TEST_F(WebApiTest, KnowsNothingElse) {

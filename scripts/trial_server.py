@@ -1,0 +1,101 @@
+"""A vornd of the release build that serves a fresh trial root in a temporary folder, called over its Unix socket."""
+
+import http.client
+import json
+import pathlib
+import shutil
+import socket
+import subprocess
+import tempfile
+import time
+
+PROJECT = pathlib.Path(__file__).resolve().parent.parent
+VORND = PROJECT / "build/release/bin/vornd"
+PATIENCE = 60  # seconds until vornd serves, and until it has ended
+BOUNDARY = "trial-server-boundary"
+
+
+class UnixConnection(http.client.HTTPConnection):
+    """HTTP over a Unix socket."""
+
+    def __init__(self, path):
+        super().__init__("localhost", timeout=PATIENCE)
+        self._path = path
+
+    def connect(self):
+        self.sock = socket.socket(socket.AF_UNIX)
+        self.sock.settimeout(self.timeout)
+        self.sock.connect(str(self._path))
+
+
+class TrialServer:
+    """Serves until the end of the "with" statement."""
+
+    def __enter__(self):
+        self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))  # a short path: a socket has 107 bytes at most
+        self.root = self.folder / "root"
+        shutil.copytree(PROJECT / "scripts/trial", self.root)
+        services = self.root / "usr/vorn/etc/rc.sysv"
+        services.mkdir(parents=True)
+        shutil.copy(PROJECT / "linux/service/S83nfsd.sh", services)
+        self.socket = self.folder / "socket"
+        with open(self.folder / "log", "wb") as log:
+            self._process = subprocess.Popen(  # pylint: disable=consider-using-with
+                [VORND, "--root", self.root, "--listen", f"unix:{self.socket}"], stdout=log, stderr=log)
+        self._await()
+        return self
+
+    def __exit__(self, *_):
+        self._process.terminate()
+        self._process.wait(PATIENCE)
+        shutil.rmtree(self.folder)
+
+    def _await(self):
+        limit = time.monotonic() + PATIENCE
+        while True:
+            try:
+                return self.request("GET", "/healthz")
+            except OSError as failure:
+                if self._process.poll() is not None or time.monotonic() > limit:
+                    raise RuntimeError(f"vornd does not serve: {self.log()}") from failure
+                time.sleep(0.05)
+
+    def log(self):
+        return (self.folder / "log").read_text("utf-8", "replace")
+
+    def request(self, method, path, body=None, content_type="application/json"):
+        """The status, the content type and the body of the answer."""
+        connection = UnixConnection(self.socket)
+        connection.request(method, path, body, {"Content-Type": content_type} if body is not None else {})
+        response = connection.getresponse()
+        answer = response.read()
+        connection.close()
+        return response.status, response.getheader("Content-Type"), answer
+
+    def call(self, path, parameters):
+        """The status and the answer of a method."""
+        status, _, answer = self.request("POST", path, json.dumps(parameters))
+        return status, json.loads(answer)
+
+    def upload(self, path, name, content):
+        """The status and the answer of a method that takes a file in the part `name` of a form."""
+        head = f'--{BOUNDARY}\r\nContent-Disposition: form-data; name="{name}"; filename="upload"\r\n\r\n'
+        body = head.encode() + content + f"\r\n--{BOUNDARY}--\r\n".encode()
+        status, _, answer = self.request("POST", path, body, f"multipart/form-data; boundary={BOUNDARY}")
+        return status, json.loads(answer)
+
+    def keytab(self):
+        """The content of a keytab with one key, made by ktutil(1)."""
+        file = self.folder / "nfs.keytab"
+        commands = ["addent -password -p nfs/box.example@STORAGE.EXAMPLE -k 1 -e aes256-cts", "secret", f"wkt {file}"]
+        subprocess.run(["ktutil"], input="\n".join(commands) + "\n", text=True, check=True, capture_output=True)
+        return file.read_bytes()
+
+
+def try_example(server, path, operation, name):
+    """The status and the answer of the example request `name` of an operation of the OpenAPI document."""
+    (content_type, media), = operation["requestBody"]["content"].items()
+    value = media["examples"][name]["value"]
+    if content_type == "application/json":
+        return server.call(path, value)
+    return server.upload(path, next(iter(value)), server.keytab())

@@ -1,0 +1,169 @@
+#include "openapi.h"
+
+#include <syslog.h>
+
+#include <map>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "json_input.h"
+#include "resources.h"
+
+namespace vorn::server {
+namespace {
+
+constexpr char kJson[] = "application/json";
+
+Json::Value Base() {
+  std::string error;
+  std::optional<Json::Value> base = ParseJsonObject(kOpenApiBase, &error);
+  if (!base) syslog(LOG_ERR, "openapi.json: %s", error.c_str());
+  return base.value_or(Json::Value(Json::objectValue));
+}
+
+Json::Value Reference(const std::string& name) {
+  Json::Value reference;
+  reference["$ref"] = "#/components/" + name;
+  return reference;
+}
+
+// The schema of a whole answer. `member` is "data" or "error".
+Json::Value Envelope(bool success, const char* member, const Json::Value& schema) {
+  Json::Value envelope;
+  envelope["type"] = "object";
+  envelope["required"].append("success");
+  envelope["required"].append(member);
+  envelope["properties"]["success"]["type"] = "boolean";
+  envelope["properties"]["success"]["const"] = success;
+  envelope["properties"][member] = schema;
+  envelope["properties"]["warnings"] = Reference("schemas/Warnings");
+  return envelope;
+}
+
+// Adds the envelope to the description of a method's result.
+void WrapResult(bool reads_only, Json::Value* operation) {
+  Json::Value& response = (*operation)["responses"]["200"];
+  if (!response.isMember("description")) response["description"] = "The method succeeded.";
+  if (reads_only) response["headers"]["ETag"] = Reference("headers/ETag");
+  Json::Value& content = response["content"][kJson];
+  const Json::Value schema = content.get("schema", Json::objectValue);
+  content["schema"] = Envelope(true, "data", schema);
+  for (Json::Value& example : content["examples"]) {
+    const Json::Value data = example["value"];
+    example["value"] = Json::objectValue;
+    example["value"]["success"] = true;
+    example["value"]["data"] = data;
+  }
+  if (content["examples"].empty()) content.removeMember("examples");
+}
+
+// An error code with which a method may be answered.
+struct Code {
+  int code;
+  std::string when;
+  Json::Value details;  // a schema; null if the code has none
+};
+
+// A response with these codes.
+Json::Value FailureResponse(const std::vector<Code>& codes) {
+  Json::Value error;
+  error["type"] = "object";
+  error["required"].append("code");
+  error["required"].append("text");
+  error["properties"]["code"]["type"] = "integer";
+  error["properties"]["text"] = Reference("schemas/ErrorText");
+  error["properties"]["reasons"] = Reference("schemas/Reasons");
+  std::string description;
+  for (const Code& code : codes) {
+    error["properties"]["code"]["enum"].append(code.code);
+    if (!code.details.isNull()) error["properties"]["details"] = code.details;
+    description += (description.empty() ? "" : " ") + std::to_string(code.code) + ": " + code.when;
+  }
+  Json::Value response;
+  response["description"] = description;
+  response["content"][kJson]["schema"] = Envelope(false, "error", error);
+  return response;
+}
+
+// Whether a response of the server itself is one to calls of this method; openapi.json says so in "x-methods".
+bool Concerns(const Json::Value& response, const Route& route) {
+  const std::string methods = response["x-methods"].asString();
+  return methods == "all" || (methods == "changing" && route.shown_by != nullptr);
+}
+
+class Document {
+ public:
+  Document() : document_(Base()), responses_(document_["components"]["responses"]) {}
+
+  void Add(const Module& module, const Routes& routes) {
+    const Json::Value& described = module.descriptor.document();
+    if (described.isNull() || !AddSchemas(module.path, described["components"]["schemas"])) return;
+    for (const Json::Value& tag : described["tags"]) document_["tags"].append(tag);
+    for (const std::string& path : module.descriptor.Paths()) {
+      std::string unknown;
+      const Route* route = routes.Find(path, &unknown);
+      if (route == nullptr || route->descriptor != &module.descriptor) continue;
+      document_["paths"][path]["post"] = Operation(described["paths"][path]["post"], *route);
+    }
+  }
+
+  const Json::Value& value() const { return document_; }
+
+ private:
+  // Adds all schemas of a module, or none.
+  bool AddSchemas(const std::string& module, const Json::Value& schemas) {
+    Json::Value& all = document_["components"]["schemas"];
+    for (const std::string& name : schemas.getMemberNames()) {
+      if (!all.isMember(name) || all[name] == schemas[name]) continue;
+      syslog(LOG_ERR, "%s: left out of /openapi.json: there is another schema \"%s\"", module.c_str(), name.c_str());
+      return false;
+    }
+    for (const std::string& name : schemas.getMemberNames()) all[name] = schemas[name];
+    return true;
+  }
+
+  Json::Value Operation(Json::Value operation, const Route& route) const {
+    operation["operationId"] = route.Id();
+    if (route.shown_by != nullptr) operation["parameters"].append(Reference("parameters/IfMatch"));
+    WrapResult(route.method.reads_only, &operation);
+    AddFailures(route, &operation);
+    return operation;
+  }
+
+  // Adds a response for each status: those of the method's error codes, and those of the server itself.
+  void AddFailures(const Route& route, Json::Value* operation) const {
+    std::map<int, std::vector<Code>> codes;
+    const Json::Value& listed = (*operation)["x-error-codes"];
+    for (const std::string& name : listed.getMemberNames()) {
+      const int code = std::stoi(name);
+      codes[route.descriptor->Describe(code).status].push_back(
+          {code, listed[name]["when"].asString(), listed[name]["details"]});
+    }
+    Json::Value& responses = (*operation)["responses"];
+    for (const std::string& name : responses_.getMemberNames()) {  // "Status400"
+      if (!Concerns(responses_[name], route)) continue;
+      const std::string status = name.substr(std::string("Status").size());
+      const auto of_method = codes.find(std::stoi(status));
+      if (of_method == codes.end()) {
+        responses[status] = Reference("responses/" + name);
+      } else if (!responses_[name].isMember("x-code")) {  // its code is among those of the method
+        of_method->second.push_back({of_method->first, responses_[name]["description"].asString(), {}});
+      }
+    }
+    for (const auto& [status, each] : codes) responses[std::to_string(status)] = FailureResponse(each);
+  }
+
+  Json::Value document_;
+  const Json::Value responses_;  // of the server itself
+};
+
+}  // namespace
+
+Json::Value OpenApiDocument(const Routes& routes) {
+  Document document;
+  for (const Module& module : routes.modules()) document.Add(module, routes);
+  return document.value();
+}
+
+}  // namespace vorn::server

@@ -37,7 +37,7 @@ namespace vorn::server {
 namespace {
 
 // The memory that the bodies of all requests may have, and those of one address.
-constexpr std::size_t kBodies = std::size_t{16} * 1024 * 1024;
+constexpr std::size_t kBodies = std::size_t{12} * 1024 * 1024;
 constexpr std::size_t kBodiesOfPeer = std::size_t{4} * 1024 * 1024;
 
 // The memory of the parsed parameters of all requests. The most expensive single call takes 42 MiB of it.

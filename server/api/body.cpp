@@ -1,5 +1,7 @@
 #include "body.h"
 
+#include <algorithm>
+
 #include "answer.h"
 #include "json_input.h"
 #include "memory.h"
@@ -20,9 +22,14 @@ Response NotJson(int status, const std::string& error) {
 
 }  // namespace
 
+void Body::Announce(std::uint64_t length) {
+  announced_ = static_cast<std::size_t>(std::min<std::uint64_t>(length, most_bytes_));
+}
+
 std::optional<Response> Body::Receive(std::string_view piece) {
   if (piece.size() > most_bytes_ - text_.size()) return too_large_();
   if (auto refusal = Check(piece)) return refusal;
+  if (text_.capacity() < announced_) text_.reserve(announced_);
   text_ += piece;
   return std::nullopt;
 }

@@ -5,6 +5,7 @@
 #include <json/value.h>
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -23,10 +24,15 @@ class Body {
  public:
   virtual ~Body() = default;
 
+  // Sets the length that the sender declares. Its memory is allocated in one block at the first piece: a block that
+  // grows leaves holes in the heap, which the budget of bodies does not know.
+  void Announce(std::uint64_t length);
+
   // Checks and appends the next piece. A response refuses the request.
   std::optional<Response> Receive(std::string_view piece);
 
-  std::size_t size() const { return text_.size(); }  // bytes received
+  std::size_t size() const { return text_.size(); }        // bytes received
+  std::size_t memory() const { return text_.capacity(); }  // bytes allocated for them
 
   // Returns the parameter object, or a response that refuses the request. Called once, after the last piece.
   virtual std::variant<Json::Value, Response> TakeParameters() = 0;
@@ -45,6 +51,7 @@ class Body {
 
   const std::size_t most_bytes_;
   Response (*const too_large_)();
+  std::size_t announced_ = 0;
   std::string text_;
 };
 

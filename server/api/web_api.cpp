@@ -165,6 +165,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
   request.description.caller = CallerOf(head.peer);
   request.description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
+  std::get<std::unique_ptr<Body>>(body)->Announce(head.content_length);
   return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
                                 Call::Environment{pool, parts_.audit, limits_.call});
 }

@@ -49,6 +49,23 @@ TEST(JsonBody, HasALimit) {
   EXPECT_EQ(refusal->status, 413);
 }
 
+TEST(JsonBody, OccupiesTheMemoryOfItsDeclaredLengthAndNoMore) {
+  Budget memory(0, 0);
+  JsonBody body(memory);
+  body.Announce(300000);
+  EXPECT_LT(body.memory(), 100U) << "before anything has arrived";
+  for (int i = 0; i < 300; ++i) EXPECT_FALSE(body.Receive(std::string(1000, ' ')));
+  EXPECT_EQ(body.memory(), 300000U);
+}
+
+TEST(JsonBody, DoesNotTrustTheDeclaredLength) {
+  Budget memory(0, 0);
+  JsonBody body(memory);
+  body.Announce(UINT64_MAX);
+  EXPECT_FALSE(body.Receive(" "));
+  EXPECT_LE(body.memory(), JsonBody::kMaxBytes);
+}
+
 TEST(JsonBody, ChargesItsMemoryUntilItIsDestroyed) {
   Budget memory(10000, 10000);
   auto first = std::make_unique<JsonBody>(memory);

@@ -45,13 +45,13 @@ BREAKS = [
     Break("stall-at-each-save", "clients are not interrupted by a save", "save_under_load",
           "systemd-run --quiet --unit=freeze /usr/bin/python3 /lab/breaks/freeze"),
     Break("restart-at-each-save", "clients are not interrupted by a save", "save_under_load",
-          "mkdir -p /etc/systemd/system/nfs-server.service.d; printf '[Service]\\nExecReload=\\nExecReload=/bin/sh -c "
-          "\"systemctl --no-block restart nfs-server\"\\n' >/etc/systemd/system/nfs-server.service.d/break.conf; "
-          "systemctl daemon-reload"),
+          "systemd-run --quiet --unit=restarter --path-property=PathChanged=/etc/exports "
+          "systemctl --no-block restart nfs-server"),
     Break("rights-stay", "a withdrawn right ends immediately", "withdrawn_rights",
-          "mv /usr/sbin/exportfs /usr/sbin/exportfs.real; printf '#!/bin/sh\\n[ \"$1\" != -r ] || set -- -a\\n"
-          "exec exportfs.real \"$@\"\\n' >/usr/sbin/exportfs; chmod 755 /usr/sbin/exportfs",
-          select="without_a_rule"),
+          source=("ForgetExports(environment", "s/ForgetExports(environment.*write_rights)/"
+                  "(static_cast<void>(environment), Status())/"), select="without_a_rule"),
+    Break("read-only-stays", "a withdrawn right ends immediately", "withdrawn_rights",
+          f"sed -i 's/^\tforget_rights$/\texit 0/' {_SCRIPT}", select="read_only"),
     Break("firewall-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vorn-firewall"),
     Break("server-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vornd"),
     Break("firewall-not-loaded", "the firewall follows the ports", "ports", _preload("firewall"), select="firewall"),

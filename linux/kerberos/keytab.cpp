@@ -11,6 +11,7 @@
 #include "ini_text.h"
 #include "nfs_record.h"
 #include "nfsconf.h"
+#include "notice.h"
 #include "unicode.h"
 
 namespace vorn {
@@ -58,15 +59,33 @@ Status CheckPrincipal(const std::string& principal) {
   return Status::Failure(kRefusedText, "nfs.conf(5) cannot represent the principal " + principal);
 }
 
+// Clients use a ticket until it expires, and the service can only read it with the key for which it was made.
+void NameLostKeys(const std::string& former, const std::vector<KeytabKey>& keys) {
+  const Result<std::vector<KeytabKey>> before = ReadKeytab(former);
+  if (!before.ok()) return;  // there was none
+  for (const KeytabKey& lost : *before) {
+    const bool is_kept = std::any_of(keys.begin(), keys.end(), [&lost](const KeytabKey& key) {
+      return key.principal == lost.principal && key.version == lost.version;
+    });
+    if (is_kept) continue;
+    Notice("the new keytab has no key of version " + std::to_string(lost.version) + " of " + lost.principal +
+           ": tickets for it are refused until users sign in anew and rpc.gssd(8) of their machines is restarted; a "
+           "keytab with the former and the new keys interrupts nobody");
+    return;
+  }
+}
+
 // Keys are readable by root only, whatever the mode of an older file is.
-Status Install(Box& box, const std::string& content) {
+Status Install(Box& box, const std::string& content, const std::vector<KeytabKey>& keys) {
   const Result<std::string> location = box.root().Locate(kKeytabFile);
   if (!location.ok()) return location.status();
   if (Status status = CheckMayWrite(kKeytabFile); !status.ok()) return status;
   if (chmod(location->c_str(), kOwnerOnly) != 0 && errno != ENOENT) return Status::System(errno, *location);
   const Result<StoredFile> before = box.Read(kKeytabFile);
   if (!before.ok()) return before.status();
-  return box.Replace(kKeytabFile, content, before->version, kOwnerOnly);
+  const Status replaced = box.Replace(kKeytabFile, content, before->version, kOwnerOnly);
+  if (replaced.ok()) NameLostKeys(before->text, keys);
+  return replaced;
 }
 
 }  // namespace
@@ -81,7 +100,7 @@ Status ImportKeytab(Box& box, const std::string& path) {
   if (Status status = CheckPrincipal(principal); !status.ok()) return status;
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
-  const Status installed = Install(box, *content);
+  const Status installed = Install(box, *content, *keys);
   return installed.ok() ? StoreKerberosPrincipal(box, principal) : installed;
 }
 

@@ -71,14 +71,14 @@ admin ktremove -k )" +
   return Take(folder, "/keytab");
 }
 
-std::string EncodeEntry(const std::string& component, const std::string& realm, int enc_type) {
+std::string EncodeEntry(const std::string& component, const std::string& realm, int enc_type, int version) {
   std::string bytes;
   Append(&bytes, 1, 2);  // components
   AppendText(&bytes, realm);
   AppendText(&bytes, component);
   Append(&bytes, 1, 4);  // KRB5_NT_PRINCIPAL
   Append(&bytes, 0, 4);  // time
-  Append(&bytes, 1, 1);  // version
+  Append(&bytes, static_cast<std::uint32_t>(version), 1);
   Append(&bytes, static_cast<std::uint32_t>(enc_type), 2);
   AppendText(&bytes, std::string(16, 'k'));
   return bytes;

@@ -19,7 +19,7 @@ std::string MakeKeytab(const std::vector<MadeKey>& keys);
 std::string MakeKeytabOfARealm();
 
 // One entry, and a whole file of such: one key of `enc_type` (a number) for a principal of one component.
-std::string EncodeEntry(const std::string& component, const std::string& realm, int enc_type);
+std::string EncodeEntry(const std::string& component, const std::string& realm, int enc_type, int version = 1);
 std::string EncodeFile(const std::vector<std::string>& entries);
 
 // A file of version 0x0501 with one entry, in the byte order of this machine.

@@ -95,6 +95,26 @@ TEST_F(KeytabImport, ReplacesAnOlderKeytabWhoeverMayReadIt) {
   EXPECT_EQ(InstalledMode(), 0600U);
 }
 
+TEST_F(KeytabImport, WarnsOfAFormerKeyThatTheNewKeytabLacks) {
+  const std::string next = EncodeEntry("alice", "LAB.TEST", 17, 2);
+  ASSERT_EQ(Import(good_), 0);
+  const struct {
+    const char* name;
+    std::string content;
+    bool warns;
+  } cases[] = {{"the same keytab", good_, false},
+               {"the former key and a new one", EncodeFile({next, EncodeEntry("alice", "LAB.TEST", 17)}), false},
+               {"the new key alone", EncodeFile({next}), true},
+               {"the key of another principal", EncodeFile({EncodeEntry("bob", "LAB.TEST", 17, 2)}), true}};
+  for (const auto& c : cases) {
+    VORN::CallDescription description;
+    description.uploads = {root_.At(kUpload)};
+    const VORN::CallContext call(description);
+    ASSERT_EQ(Import(c.content), 0) << c.name;
+    EXPECT_EQ(call.warnings().size(), c.warns ? 1U : 0U) << c.name;
+  }
+}
+
 TEST_F(KeytabImport, RefusesWhatIsNoKeytabAndKeepsTheOneThatIsThere) {
   ASSERT_EQ(Import(good_), 0);
   for (const std::string& content :

@@ -3,6 +3,7 @@
 import contextlib
 import os
 import pathlib
+import signal
 
 from harness.network import BOX_ADDRESS
 from harness.programs import run
@@ -40,10 +41,12 @@ def found_realm():
     run("systemctl", "start", "krb5-kdc")
 
 
-def keytab(principal):
-    """Creates the principal. Returns the content of a keytab with new keys of it."""
+def keytab(principal, former=b""):
+    """Creates the principal. Returns a keytab with new keys of it, behind those of the keytab `former`."""
     path = pathlib.Path("/tmp/new.keytab")
     path.unlink(missing_ok=True)
+    if former:
+        path.write_bytes(former)
     _kadmin(f"addprinc -randkey {principal}")
     _kadmin(f"ktadd -k {path} {principal}")
     return path.read_bytes()
@@ -58,6 +61,10 @@ def sign_out(user):
     pathlib.Path(f"/tmp/krb5cc_{user.uid}").unlink(missing_ok=True)
 
 
+# As the service manager of a client runs it: it is started again when it ends.
+_GSSD = 'while :; do rpc.gssd -f -p "$1" -k "$2" & echo $! >"$3"; wait; done'
+
+
 @contextlib.contextmanager
 def joined(client):
     """Within the block, the machine is a client of the realm: its rpc.gssd(8) runs, with files of its own."""
@@ -66,6 +73,15 @@ def joined(client):
     pipes = f"/run/pipes-{client.name}"
     os.makedirs(pipes, exist_ok=True)
     client.run("mount", "-t", "rpc_pipefs", "sunrpc", pipes)
-    with client.running("rpc.gssd", "-f", "-p", pipes, "-k", str(path)):
+    with client.running("sh", "-c", _GSSD, "gssd", pipes, str(path), _gssd_process(client)):
         yield
     run("umount", pipes)
+
+
+def _gssd_process(client):
+    return f"/run/gssd-{client.name}.pid"
+
+
+def restart_gssd(client):
+    """Restarts the machine's rpc.gssd(8), which keeps the ticket of the machine itself until the ticket expires."""
+    os.kill(int(pathlib.Path(_gssd_process(client)).read_text(encoding="ascii")), signal.SIGTERM)

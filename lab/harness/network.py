@@ -84,7 +84,7 @@ class Client:
             wait_for(lambda: self.succeeds("rpcinfo", "-T", "tcp", "127.0.0.1", "status"), f"{self.name}: no rpc.statd")
             yield
 
-    def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=120):
+    def mount(self, path, version="4.2", options="", server=BOX_ADDRESS, timeout=300):
         """Where the exported folder is now mounted. Raises MountFailed.
 
         Soft, so that a story that goes wrong ends. An NFSv3 mount does not lock unless it is told to: the lock

@@ -5,8 +5,9 @@ import subprocess
 import time
 
 
-def wait_for(condition, what, limit=180):
-    """Waits until the condition holds; fails with `what` if it does not within `limit` seconds."""
+def wait_for(condition, what, limit=400):
+    """Waits until the condition holds; fails with `what` if it does not within `limit` seconds. An operation on a mount
+    may take a minute where the server does not answer, and several on a busy machine."""
     deadline = time.monotonic() + limit
     while not condition():
         assert time.monotonic() < deadline, what

@@ -3,6 +3,8 @@
 import itertools
 import os
 import pathlib
+import re
+import time
 
 import pytest
 
@@ -14,9 +16,9 @@ FLAVOURS = {"sys": "sys", "krb5": "kerberos", "krb5i": "kerberos_integrity", "kr
 CHOICES = [set(choice) for size in (1, 2) for choice in itertools.combinations(FLAVOURS, size)]
 
 
-@pytest.fixture(scope="module")
+@pytest.fixture
 def keytab(realm):
-    """The box's keytab; new keys would take away the tickets of earlier stories."""
+    """A keytab with new keys of the box. The KDC no longer issues tickets for former keys."""
     del realm
     return kerberos.keytab(f"nfs/{kerberos.SERVER}")
 
@@ -92,19 +94,50 @@ def test_the_id_map_decides_who_owns_a_file_and_changes_without_a_restart(box, k
         assert owner_of_a_new_file(mounted, "deleted", users.CAROL) == users.ALICE.uid
 
 
-def test_a_keytab_that_is_replaced_while_mounted_serves_who_signs_in_anew(box, kerberos_client, keytab):
-    """New keys take away the tickets that were made for the old ones: until a user has new tickets, access fails."""
-    box.foresees("rpc.svcgssd: ERROR: GSS-API: error in handle_nullreq")  # tickets for the old keys
+def seconds_since_renewal():
+    """The time since a client of NFSv4 has renewed its lease last."""
+    clients = [info.read_text(encoding="utf-8") for info in pathlib.Path("/proc/fs/nfsd/clients").glob("*/info")]
+    return min(int(re.search(r"seconds from last renew: (\d+)", info)[1]) for info in clients)
+
+
+def lease():
+    return int(pathlib.Path("/proc/fs/nfsd/nfsv4leasetime").read_text(encoding="ascii"))
+
+
+@pytest.fixture
+def mounted_share(box, kerberos_client, keytab):
+    """A share that alice uses over Kerberos."""
     box.share("data")
     import_keytab(keytab)
     box.allow("data", rule(kerberos_client, "krb5"))
     kerberos.sign_in(users.ALICE, "alice")
     with kerberos_client.mounted("/srv/data", server=kerberos.SERVER, options="sec=krb5") as mounted:
         assert owner_of_a_new_file(mounted, "before", users.ALICE) == users.ALICE.uid
-        import_keytab(kerberos.keytab(f"nfs/{kerberos.SERVER}"))
-        kerberos.sign_out(users.ALICE)
-        kerberos.sign_in(users.ALICE, "alice")
-        wait_for(lambda: may_create(mounted, users.ALICE), "a user with a new ticket is not let in")
+        yield mounted
+
+
+def test_a_keytab_with_the_former_keys_interrupts_nobody(keytab, mounted_share):
+    """Tickets for the former keys are accepted, those of the users and that of the machine, which renews the lease."""
+    imported = time.monotonic()
+    import_keytab(kerberos.keytab(f"nfs/{kerberos.SERVER}", former=keytab))
+    assert may_create(mounted_share, users.ALICE)
+    wait_for(lambda: seconds_since_renewal() < time.monotonic() - imported - lease(), "the lease is not renewed")
+    assert may_create(mounted_share, users.ALICE)
+
+
+def test_a_keytab_without_the_former_keys_serves_whoever_has_new_tickets(box, kerberos_client, mounted_share):
+    """Until then the service refuses the user's ticket and that of the machine, whose lease therefore ends."""
+    box.foresees("rpc.svcgssd: ERROR: GSS-API: error in handle_nullreq")  # tickets for the former keys
+    box.foresees("NFS: state manager|NFSv4: state recovery")  # of the client
+    box.foresees("the new keytab has no key of version")
+    import_keytab(kerberos.keytab(f"nfs/{kerberos.SERVER}"))
+    assert "tickets for it are refused until users sign in anew" in box.journal.text()
+    assert not may_create(mounted_share, users.ALICE)
+    wait_for(lambda: seconds_since_renewal() > lease(), "the machine's former ticket is accepted")
+    kerberos.sign_out(users.ALICE)
+    kerberos.sign_in(users.ALICE, "alice")
+    kerberos.restart_gssd(kerberos_client)
+    wait_for(lambda: may_create(mounted_share, users.ALICE), "a user with a new ticket is not let in")
 
 
 def may_create(mounted, user):

@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """contract_answers.py DESCRIPTOR FOLDER PROGRAM...: compares the answers of the module's tests with its descriptor.
 
 FOLDER has the file PROGRAM.jsonl of each test program that recorded answers (tests/support/recorded_answers.h). Of each

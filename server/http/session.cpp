@@ -276,7 +276,9 @@ void Session::Send(Response response) {
   charge_.reset();
   response_ = std::move(response);
   const Framing framing = FramingOf(form_, response_);
-  keep_alive_ = reader_.IsReusable() && framing != Framing::kClose && !host_.stopping();
+  // A client that sends more than can be served must not take the next place in a queue before those who wait.
+  const bool overloads = response_.status == 503;
+  keep_alive_ = reader_.IsReusable() && framing != Framing::kClose && !host_.stopping() && !overloads;
   ended_ = !response_.source || form_.is_head || framing == Framing::kNone;
   Enter(Phase::kWrite);
   text_ = WriteHead(form_, response_, keep_alive_, host_.date());

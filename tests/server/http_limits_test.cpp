@@ -140,6 +140,18 @@ TEST_F(HttpTest, AConnectionBeyondTheLimitIsAnswered503WhenAllOthersAreWorking) 
   EXPECT_EQ(second.Receive().body, "held");
 }
 
+// Otherwise a client that sends requests without pause would take each free place before the others.
+TEST_F(HttpTest, ABusyAnswerEndsTheConnection) {
+  Start();
+  service_.SetFixed({503, "busy"});
+  Connection client = Connect();
+  client.Send(Get("/fixed") + Get("/fixed"));
+  const Reply busy = client.Receive();
+  EXPECT_EQ(busy.status, 503);
+  EXPECT_EQ(busy.headers.at("Connection"), "close");
+  EXPECT_TRUE(client.IsClosedByServer()) << "the second request is not answered";
+}
+
 TEST_F(HttpTest, EachListenerHasItsOwnShare) {
   HttpLimits limits;
   limits.tcp_connections = {4, 4};

@@ -1,4 +1,5 @@
 // vornd: constructs the parts in the order of their dependencies, and runs the server.
+#include <grp.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <syslog.h>
@@ -19,16 +20,21 @@
 #include <vector>
 
 #include "access_log.h"
+#include "authenticator.h"
 #include "budget.h"
 #include "http.h"
 #include "listener.h"
 #include "memory.h"
 #include "module.h"
 #include "options.h"
+#include "password_checker.h"
 #include "recovery.h"
 #include "routes.h"
 #include "runtime_folder.h"
+#include "server_methods.h"
+#include "sessions.h"
 #include "termination.h"
+#include "token_store.h"
 #include "upload.h"
 #include "web_api.h"
 #include "worker_pool.h"
@@ -42,6 +48,7 @@ constexpr std::size_t kBodiesOfPeer = std::size_t{4} * 1024 * 1024;
 
 // The memory of the parsed parameters of all requests. The most expensive single call takes 42 MiB of it.
 constexpr std::size_t kMemory = std::size_t{48} * 1024 * 1024;
+constexpr const char* kHelperName = "vorn-pam-helper";
 constexpr std::chrono::seconds kStopLimit{10};  // for running calls, after SIGTERM
 
 // systemd copies standard error into the journal, which also receives syslog(3): each line would be logged twice.
@@ -53,13 +60,54 @@ bool StartedBySystemd() {
 // Notifies systemd if it started this process with Type=notify (sd_notify(3)); otherwise does nothing.
 void Notify(const char* state) { sd_notify(0, state); }
 
+// The folder of this program.
+std::filesystem::path ProgramFolder() {
+  std::error_code failure;
+  return std::filesystem::read_symlink("/proc/self/exe", failure).parent_path();
+}
+
 // Returns the module folder of the build tree if there is one, otherwise that of the installation.
 std::string DefaultModuleFolder() {
   std::error_code failure;
-  const auto prefix = std::filesystem::read_symlink("/proc/self/exe", failure).parent_path().parent_path();
+  const auto prefix = ProgramFolder().parent_path();
   const auto installed = prefix / VORN_MODULE_FOLDER;
   const auto built = prefix / "modules";
   return std::filesystem::is_directory(built, failure) ? built.string() : installed.string();
+}
+
+// The command of the program that checks passwords. In the build tree it is beside this program.
+std::vector<std::string> PasswordHelper(const Options& options) {
+  std::error_code failure;
+  const auto built = ProgramFolder() / kHelperName;
+  const auto installed = ProgramFolder().parent_path() / VORN_HELPER_FOLDER / kHelperName;
+  return {std::filesystem::exists(built, failure) ? built.string() : installed.string(), options.root,
+          options.administrators, options.readers};
+}
+
+// Returns the number of a group of this system; std::nullopt, which is logged, if there is none.
+std::optional<gid_t> GroupId(const std::string& name) {
+  if (const group* found = getgrnam(name.c_str()); found != nullptr) return found->gr_gid;
+  syslog(LOG_NOTICE, "There is no group %s: nobody has its rights", name.c_str());
+  return std::nullopt;
+}
+
+// The groups in a trial root are not those of the processes that connect to its socket.
+LocalGroups GroupsAtSocket(const Options& options) {
+  if (options.root != "/") return {};
+  return {GroupId(options.administrators), GroupId(options.readers)};
+}
+
+// Printed, never logged.
+void PrintSignInLink(const std::vector<Listener>& listeners, Sessions* sessions) {
+  const std::string code = sessions->NewCode(Sessions::Clock::now());
+  for (const Listener& listener : listeners) {
+    if (listener.family() == AF_UNIX) continue;
+    std::printf(
+        "Sign in once, within %lld minutes: http://%s/#code=%s\n",
+        static_cast<long long>(std::chrono::duration_cast<std::chrono::minutes>(sessions->limits().code).count()),
+        listener.name().c_str(), code.c_str());
+  }
+  std::fflush(stdout);
 }
 
 // The number of descriptors that this process may have open (getrlimit(2)).
@@ -106,7 +154,9 @@ int Serve(const Options& options) {
   const std::optional<RuntimeFolder> folder = RuntimeFolder::Claim(options.root, &error);
   std::optional<UploadFolder> uploads;
   if (folder) uploads = UploadFolder::Open(folder->path() + "/uploads", &error);
-  if (!uploads || !CatchTermination(&error)) {
+  std::optional<std::string> state;
+  if (uploads) state = MakeFolders(options.root, {"var", "lib", "vorn"}, &error);
+  if (!state || !CatchTermination(&error)) {
     syslog(LOG_ERR, "%s", error.c_str());
     return EXIT_FAILURE;
   }
@@ -120,13 +170,19 @@ int Serve(const Options& options) {
   std::optional<std::vector<Listener>> listeners = Listen(options, *folder);
   if (!listeners) return EXIT_FAILURE;
 
-  const Routes routes(modules);
+  TokenStore tokens(*state + "/tokens.json");
+  Sessions sessions(Sessions::Limits{});
+  PasswordChecker passwords(PasswordHelper(options), PasswordChecker::Limits{});
+  const Authenticator authenticator(tokens, sessions, GroupsAtSocket(options));
+  if (options.sign_in_link) PrintSignInLink(*listeners, &sessions);
+  Routes routes(modules);
+  AddServerMethods(tokens, sessions, &routes);
   Budget memory(kMemory, kMemory);
   Budget bodies(kBodies, kBodiesOfPeer);
   Workers workers;
   const OwnNames names(options.host_names);
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
-  WebApi api({routes, *uploads, workers, memory, names, audit});
+  WebApi api({routes, *uploads, workers, memory, names, audit, authenticator, {sessions, passwords}});
   const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   AccessLog log(StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO));
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
@@ -135,6 +191,7 @@ int Serve(const Options& options) {
   Notify("STOPPING=1");
   server.Stop();
   workers.Close();
+  passwords.Close();
   if (!server.JoinFor(kStopLimit)) EndWithRunningCalls();
   return EXIT_SUCCESS;
 }

@@ -29,8 +29,21 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
          "Accept requests and pages of https://NAME, which a proxy with TLS forwards; may be given several times")
       ->type_name("NAME")
       ->allow_extra_args(false);
+  app.add_option("--administrators", options.administrators, "Members of GROUP may do everything")
+      ->type_name("GROUP")
+      ->take_last()
+      ->capture_default_str();
+  app.add_option("--readers", options.readers, "Members of GROUP may call the methods that only read")
+      ->type_name("GROUP")
+      ->take_last()
+      ->capture_default_str();
+  app.add_flag("--sign-in-link", options.sign_in_link,
+               "With a --root of your own: print a link with which somebody can sign in once");
   try {
     app.parse(argc, argv);
+    if (options.sign_in_link && options.root == "/") {
+      throw CLI::ValidationError("--sign-in-link", "needs a --root of your own");
+    }
   } catch (const CLI::ParseError& error) {
     return app.exit(error) == 0 ? 0 : 2;
   }

@@ -33,14 +33,13 @@ bool IsBelow(const std::string& path, const std::string& root) {
 
 }  // namespace
 
-RuntimeFolder::RuntimeFolder(std::string path, UniqueFd folder) : path_(std::move(path)), folder_(std::move(folder)) {}
-
-std::optional<RuntimeFolder> RuntimeFolder::Claim(const std::string& root, std::string* error) {
+std::optional<std::string> MakeFolders(const std::string& root, std::initializer_list<const char*> names,
+                                       std::string* error) {
   std::string path = root;
-  for (const char* name : {"run", "vorn"}) {
-    path = MakeFolder(path, name);
+  for (const char* name : names) {
+    const std::string parent = std::exchange(path, MakeFolder(path, name));
     if (path.empty()) {
-      *error = root + ": /run/vorn cannot be made: " + std::strerror(errno);
+      *error = parent + ": " + name + " cannot be made: " + std::strerror(errno);
       return std::nullopt;
     }
     if (!IsBelow(path, root)) {
@@ -49,6 +48,15 @@ std::optional<RuntimeFolder> RuntimeFolder::Claim(const std::string& root, std::
       return std::nullopt;
     }
   }
+  return path;
+}
+
+RuntimeFolder::RuntimeFolder(std::string path, UniqueFd folder) : path_(std::move(path)), folder_(std::move(folder)) {}
+
+std::optional<RuntimeFolder> RuntimeFolder::Claim(const std::string& root, std::string* error) {
+  const std::optional<std::string> made = MakeFolders(root, {"run", "vorn"}, error);
+  if (!made) return std::nullopt;
+  const std::string& path = *made;
   UniqueFd folder(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (folder && flock(folder.get(), LOCK_EX | LOCK_NB) == 0) return RuntimeFolder(path, std::move(folder));
   *error = path + ": " + (errno == EWOULDBLOCK ? "another vornd serves this root" : std::strerror(errno));

@@ -2,12 +2,18 @@
 #ifndef VORN_SERVER_RUNTIME_FOLDER_H
 #define VORN_SERVER_RUNTIME_FOLDER_H
 
+#include <initializer_list>
 #include <optional>
 #include <string>
 
 #include "unique_fd.h"
 
 namespace vorn::server {
+
+// Creates ROOT/NAMES[0]/NAMES[1]/..., as far as they are missing, and returns its canonical path. Returns std::nullopt
+// on failure, for example if a link leads out of the root; `error` then has the reason. `root` is a canonical path.
+std::optional<std::string> MakeFolders(const std::string& root, std::initializer_list<const char*> names,
+                                       std::string* error);
 
 // One server at a time owns the folder. The kernel releases the lock when the process dies (flock(2)).
 class RuntimeFolder {

@@ -6,6 +6,8 @@
 #include <string_view>
 #include <vector>
 
+#include "header_value.h"
+
 namespace vorn::server {
 
 // The host names by which browsers reach this server: localhost, 127.0.0.1 and [::1] over HTTP, and the given names
@@ -18,6 +20,9 @@ class OwnNames {
   // Returns whether a Host header (RFC 9110, 7.2) has one of the names, with any port or none. A site whose name
   // resolves to an address of this server has another name ("DNS rebinding").
   bool Include(std::string_view host) const;
+
+  // Returns whether the Host header has one of the given names, which browsers reach over HTTPS only.
+  bool AreSecure(std::string_view host) const { return HasGivenName(LowerAscii(host)); }
 
   // Returns whether an Origin header (RFC 6454, 7) is the origin of this server itself, as a request with this Host
   // header reached it: same scheme, host and port. Another port of this machine is another origin, and so is "null".

@@ -114,6 +114,11 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
     if (!ReadShownBy(operation["x-shown-by"], &method)) {
       return Fault(error, "paths: \"" + path + "\": x-shown-by needs a method, and may have a list of parameters");
     }
+    const Json::Value& share = operation["x-share-parameter"];
+    if (!share.isNull() && (!share.isString() || share.asString().empty())) {
+      return Fault(error, "paths: \"" + path + "\": x-share-parameter is no name of a parameter");
+    }
+    method.share_parameter = share.asString();
     methods_[path] = std::move(method);
   }
   return true;

@@ -11,6 +11,8 @@
 //     "x-shown-by" names the reading method that shows what a changing method changes, and the parameters that must be
 //     the same in both:
 //         "x-shown-by": {"method": "VORN.Core.FileServ.NFS.SharePrivilege/v1/load", "same": ["share_name"]}
+//     "x-share-parameter" names the parameter with the shared folder that the method is about. A token for some shares
+//     can call only such methods.
 //   - "x-error-codes": {"2301": {"status": 400, "text": "..."}}, the HTTP status of an error code and the text
 //     that an administrator reads. "parameters": true declares that the code is about the parameters: the server then
 //     adds what the schema of the request says about them. "causes" and "remedy" are for the documentation.
@@ -45,6 +47,7 @@ class Descriptor {
     bool takes_file = false;
     std::string shown_by;           // "Api/v1/method"; empty if no method shows what this one changes
     std::vector<std::string> same;  // names of parameters
+    std::string share_parameter{};  // empty: it is not about one shared folder
   };
 
   // An empty descriptor: every error code has status 500 and a general text, no method is described.

@@ -44,16 +44,26 @@ Response AnswerOf(const Route& route, Function function) noexcept {
   }
 }
 
+// Compares the whole string: a module may take another spelling for the same folder, which is refused here.
+bool MayNameShare(const Caller& caller, const Route& route, const Json::Value& parameters) {
+  if (caller.shares.empty()) return true;
+  const Json::Value& share = parameters[route.method.share_parameter];
+  return share.isString() && Permits(caller.shares, share.asString());
+}
+
 }  // namespace
 
 Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
     : route_(request.route),
       body_(std::move(body)),
-      description_(std::move(request.description)),
+      caller_(std::move(request.caller)),
       if_match_(std::move(request.if_match)),
-      environment_(environment) {
+      environment_(environment),
+      answer_(caller_->name) {
+  description_.caller = caller_->name;
+  description_.origin = std::move(request.origin);
   description_.method = route_.Id();
-  description_.may_write = !route_.method.reads_only;
+  description_.may_write = caller_->role == Role::kAdministrator && !route_.method.reads_only;
 }
 
 std::optional<Response> Call::Receive(std::string_view piece) { return body_->Receive(piece); }
@@ -89,11 +99,13 @@ void Call::Work() {
 Response Call::Execute() {
   std::variant<Json::Value, Response> parameters = body_->TakeParameters();
   if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
-  description_.uploads = body_->Uploads();
   const Json::Value& object = std::get<Json::Value>(parameters);
+  if (!MayNameShare(*caller_, route_, object)) return Refusal(403, "This token is not for this shared folder.");
+  description_.uploads = body_->Uploads();
   if (!route_.method.reads_only) {
     audited_parameters_ = AuditedParameters(route_.descriptor->WithoutSecrets("/api/" + route_.Id(), object));
   }
+  if (route_.own) return route_.own(object, *caller_);
   if (!if_match_) return RunAndAnswer(route_, object, description_);
   return RunIfUnchanged(route_, object, description_, *if_match_);
 }

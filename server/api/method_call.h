@@ -14,6 +14,7 @@
 #include "audit.h"
 #include "body.h"
 #include "call.h"
+#include "caller.h"
 #include "http.h"
 #include "pending_answer.h"
 #include "routes.h"
@@ -33,10 +34,12 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
     std::chrono::milliseconds deadline;  // from the end of the body
   };
 
-  // The parts of the head that a call needs. The route must outlive the call.
+  // The parts of the head that a call needs. The caller may call this method; the call checks whether it may name the
+  // share of the parameters. The route must outlive the call.
   struct Request {
     const Route& route;
-    VORN::CallDescription description;    // who calls; the call adds the method and the paths of the uploads
+    CallerPtr caller;
+    std::string origin;                   // the caller's address
     std::optional<std::string> if_match;  // the condition of a changing call, see RunIfUnchanged()
   };
 
@@ -56,6 +59,7 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
 
   const Route& route_;
   std::unique_ptr<Body> body_;
+  const CallerPtr caller_;
   VORN::CallDescription description_;
   const std::optional<std::string> if_match_;
   std::string audited_parameters_;  // of a call that may change something

@@ -3,6 +3,7 @@
 #define VORN_SERVER_PENDING_ANSWER_H
 
 #include <mutex>
+#include <string>
 #include <utility>
 
 #include "http.h"
@@ -12,6 +13,9 @@ namespace vorn::server {
 // Thread-safe.
 class PendingAnswer {
  public:
+  // `caller` becomes the caller of the response, for the access log.
+  explicit PendingAnswer(std::string caller = {}) : caller_(std::move(caller)) {}
+
   void Await(Answer answer) {
     const std::lock_guard<std::mutex> lock(mutex_);
     answer_ = std::move(answer);
@@ -23,6 +27,7 @@ class PendingAnswer {
     {
       const std::lock_guard<std::mutex> lock(mutex_);
       answer.swap(answer_);
+      if (answer) response.caller.swap(caller_);
     }
     if (!answer) return false;
     answer(std::move(response));
@@ -32,6 +37,7 @@ class PendingAnswer {
  private:
   std::mutex mutex_;
   Answer answer_;
+  std::string caller_;
 };
 
 }  // namespace vorn::server

@@ -47,7 +47,7 @@ std::string Route::Id() const { return std::string(row.api) + "/v" + std::to_str
 
 Routes::Routes(const std::vector<Module>& modules) : modules_(modules) {
   for (const Module& module : modules) {
-    for (const APIRow& row : module.rows) Add(row, module);
+    for (const APIRow& row : module.rows) AddRow(row, module);
     for (const std::string& path : module.descriptor.Paths()) {
       std::string unknown;
       if (Find(path, &unknown) == nullptr) syslog(LOG_ERR, "%s: descriptor: %s", module.path.c_str(), unknown.c_str());
@@ -60,9 +60,10 @@ Routes::Routes(const std::vector<Module>& modules) : modules_(modules) {
   }
 }
 
-void Routes::Add(const APIRow& row, const Module& module) {
+void Routes::AddRow(const APIRow& row, const Module& module) {
   Route route{row, &module.descriptor, {}};
   route.method = module.descriptor.MethodAt(std::string(kPrefix) + route.Id());
+  route.for_readers = route.method.reads_only;
   const auto [place, added] = apis_[row.api][row.version].try_emplace(row.method, route);
   if (!added) syslog(LOG_ERR, "%s: %s is there already", module.path.c_str(), place->second.Name().c_str());
 }
@@ -77,6 +78,11 @@ void Routes::PairWithReader(Route* route) const {
   } else {
     syslog(LOG_ERR, "%s: x-shown-by: %s", route->Name().c_str(), unknown.c_str());
   }
+}
+
+void Routes::Add(const Route& route) {
+  const auto [place, added] = apis_[route.row.api][route.row.version].try_emplace(route.row.method, route);
+  if (!added) syslog(LOG_ERR, "A module has a method of the server itself: %s", place->second.Name().c_str());
 }
 
 const Route* Routes::Find(std::string_view path, std::string* unknown) const {

@@ -10,15 +10,22 @@
 #include <string_view>
 #include <vector>
 
+#include "caller.h"
+#include "message.h"
 #include "module.h"
 
 namespace vorn::server {
+
+// A method of the server itself. Called on a worker thread, with the parameters and the caller.
+using ServerMethod = std::function<Response(const Json::Value& parameters, const Caller& caller)>;
 
 // A method that can be called.
 struct Route {
   APIRow row;
   const Descriptor* descriptor;
   Descriptor::Method method;  // the descriptor's entry for it
+  bool for_readers = false;   // else for administrators alone
+  ServerMethod own{};         // not null: called instead of row.handler, which is null then
 
   // The reading method that shows what this method changes, or nullptr.
   const Route* shown_by = nullptr;
@@ -34,6 +41,9 @@ class Routes {
   // names no reading method.
   explicit Routes(const std::vector<Module>& modules);
 
+  // Adds a method of the server itself, unless there is one of this name. The names must live as long as this.
+  void Add(const Route& route);
+
   // Returns the row of "/api/{api}/v{version}/{method}", or nullptr. `unknown` then says which of the
   // three is unknown.
   const Route* Find(std::string_view path, std::string* unknown) const;
@@ -47,7 +57,7 @@ class Routes {
   using Methods = std::map<std::string, Route, std::less<>>;
   using Versions = std::map<int, Methods>;
 
-  void Add(const APIRow& row, const Module& module);
+  void AddRow(const APIRow& row, const Module& module);
   void PairWithReader(Route* route) const;
 
   const std::vector<Module>& modules_;

@@ -71,9 +71,23 @@ NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& part
                           std::string(head.content_type) + "\".");
 }
 
-// Returns the sender of the request for the log, as far as the transport knows it.
-std::string CallerOf(const Peer& peer) {
-  return peer.credentials ? "uid " + std::to_string(peer.credentials->uid) : "";
+Response Unauthenticated() {
+  Response response = Refusal(401, "Sign in first, or send a valid token.");
+  response.headers.emplace_back("WWW-Authenticate", "Bearer");
+  return response;
+}
+
+// Refuses a call that the caller may not make, whatever its parameters are. The share that they name is compared when
+// they have been read.
+std::optional<Response> RefuseCaller(const Caller& caller, const Route& route) {
+  if (caller.role != Role::kAdministrator && !route.for_readers) {
+    return Refusal(403, "This caller may read only.");
+  }
+  if (!Permits(caller.apis, route.row.api)) return Refusal(403, "This token is not for this API.");
+  if (!caller.shares.empty() && route.method.share_parameter.empty()) {
+    return Refusal(403, "This token is for methods of shared folders only.");
+  }
+  return std::nullopt;
 }
 
 // The value of If-Match, of all its lines (RFC 9110, 5.3).
@@ -100,6 +114,13 @@ Response Options(const std::string& allowed) {
   return response;
 }
 
+// Answers a request for a method that is not made with POST, or that has a query.
+std::optional<Response> RefuseOtherThanPost(const Head& head) {
+  if (head.method == "OPTIONS") return Options("POST");
+  if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
+  return RefuseQuery(head.query);
+}
+
 // An answer that depends only on the program's version. Clients may cache it and revalidate it.
 Response Unchanging(Response response) {
   const std::string version = std::to_string(std::hash<std::string>()(response.body));
@@ -123,13 +144,13 @@ Response File(std::string_view content, std::string_view type) {
 
 // The resources beside the methods. The network thread answers them, so it answers "/healthz" and "/healthz/live" as
 // long as the process is alive; only "/healthz/ready" asks the workers.
-const std::array<WebApi::Page, 7> WebApi::kPages = {{{"/api", &WebApi::List},
-                                                     {"/openapi.json", &WebApi::OpenApi},
-                                                     {"/docs", &WebApi::Docs},
-                                                     {"/docs.css", &WebApi::DocsStyle},
-                                                     {"/healthz", &WebApi::Alive},
-                                                     {"/healthz/live", &WebApi::Alive},
-                                                     {"/healthz/ready", &WebApi::Ready}}};
+const std::array<WebApi::Page, 7> WebApi::kPages = {{{"/api", false, &WebApi::List},
+                                                     {"/openapi.json", true, &WebApi::OpenApi},
+                                                     {"/docs", true, &WebApi::Docs},
+                                                     {"/docs.css", true, &WebApi::DocsStyle},
+                                                     {"/healthz", true, &WebApi::Alive},
+                                                     {"/healthz/live", true, &WebApi::Alive},
+                                                     {"/healthz/ready", true, &WebApi::Ready}}};
 
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
 WebApi::WebApi(Parts parts, Limits limits)
@@ -143,31 +164,49 @@ WebApi::WebApi(Parts parts, Limits limits)
 std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head) {
   if (auto refusal = KeepOtherSitesOut(head, parts_.names)) return *std::move(refusal);
   if (head.target == "*" && head.method == "OPTIONS") return Options("GET, HEAD, POST");
-  const auto page =
+  if (head.target == kSignInPath) return BeginSignIn(head);
+  const auto* page =
       std::find_if(kPages.begin(), kPages.end(), [&head](const Page& each) { return each.path == head.target; });
-  if (page != kPages.end()) return BeginPage(*page, head);
+  if (page == kPages.end()) page = nullptr;
+  if (page != nullptr && page->is_public) return BeginPage(*page, head);
+  const CallerPtr caller = parts_.authenticator.Identify(head, parts_.names.AreSecure(head.host.value_or("")));
+  if (!caller) return Unauthenticated();
+  Begun begun = BeginFor(caller, page, head);
+  if (auto* answer = std::get_if<Response>(&begun)) answer->caller = caller->name;
+  return begun;
+}
+
+WebApi::Begun WebApi::BeginFor(const CallerPtr& caller, const Page* page, const Head& head) const {
+  if (page != nullptr) return BeginPage(*page, head);
   std::string unknown;
   const Route* route = parts_.routes.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
-  if (head.method == "OPTIONS") return Options("POST");
-  if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
-  if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
-  return BeginCall(*route, head);
+  if (auto refusal = RefuseOtherThanPost(head)) return *std::move(refusal);
+  if (auto refusal = RefuseCaller(*caller, *route)) return *std::move(refusal);
+  return BeginCall(*route, caller, head);
 }
 
-WebApi::Begun WebApi::BeginCall(const Route& route, const Head& head) const {
+WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
-  Call::Request request{route, {}, IfMatchOf(head)};
+  Call::Request request{route, caller, head.peer.address, IfMatchOf(head)};
   if (request.if_match && route.shown_by == nullptr) {
     return Refusal(400, "If-Match is for methods that change something which another method shows.");
   }
-  request.description.caller = CallerOf(head.peer);
-  request.description.origin = head.peer.address;
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
   std::get<std::unique_ptr<Body>>(body)->Announce(head.content_length);
   return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
                                 Call::Environment{pool, parts_.audit, limits_.call});
+}
+
+WebApi::Begun WebApi::BeginSignIn(const Head& head) const {
+  if (auto refusal = RefuseOtherThanPost(head)) return *std::move(refusal);
+  const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
+  if (!type || type->value != "application/json" || !IsUtf8(*type)) {
+    return Refusal(415, "Signing in takes its parameters as application/json, in UTF-8.");
+  }
+  if (head.content_length > SignInCall::kMaxBytes) return SignInCall::TooLarge();
+  return std::make_shared<SignInCall>(parts_.sign_in, head.peer, parts_.names.AreSecure(head.host.value_or("")));
 }
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }

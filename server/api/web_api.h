@@ -10,10 +10,12 @@
 #include <variant>
 
 #include "audit.h"
+#include "authenticator.h"
 #include "browser_guard.h"
 #include "budget.h"
 #include "http.h"
 #include "routes.h"
+#include "sign_in_call.h"
 #include "upload.h"
 #include "worker_pool.h"
 
@@ -34,6 +36,8 @@ class WebApi : public Service {
     Budget& memory;  // of parsed parameters
     const OwnNames& names;
     const AuditSink& audit;
+    const Authenticator& authenticator;
+    SignInCall::Environment sign_in;
   };
 
   explicit WebApi(Parts parts);
@@ -46,13 +50,16 @@ class WebApi : public Service {
  private:
   using Begun = std::variant<std::shared_ptr<Exchange>, Response>;
 
-  // A resource that is read with GET.
+  // A resource that is read with GET. A public one needs no credentials.
   struct Page {
     std::string_view path;
+    bool is_public;
     Begun (WebApi::*begin)() const;
   };
   static const std::array<Page, 7> kPages;
 
+  Begun BeginFor(const CallerPtr& caller, const Page* page, const Head& head) const;
+  Begun BeginSignIn(const Head& head) const;
   Begun BeginPage(const Page& page, const Head& head) const;
   Begun List() const;
   Begun OpenApi() const;
@@ -60,7 +67,7 @@ class WebApi : public Service {
   Begun DocsStyle() const;
   Begun Alive() const;
   Begun Ready() const;
-  Begun BeginCall(const Route& route, const Head& head) const;
+  Begun BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const;
 
   const Parts parts_;
   const Limits limits_;

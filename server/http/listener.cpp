@@ -124,8 +124,9 @@ bool ClearPath(const std::string& path, const SocketAddress& address, std::strin
 std::optional<Listener> OpenUnix(const std::string& path, std::string* error) {
   const std::optional<SocketAddress> address = UnixAddress(path, error);
   if (!address || !ClearPath(path, *address, error)) return std::nullopt;
-  // The umask gives the socket its mode when it is created, so other users can never connect.
-  const mode_t before = umask(0117);
+  // Every local user may connect: the credentials of the peer, or a token, decide what it may do. The umask gives the
+  // socket its mode when it is created.
+  const mode_t before = umask(0111);
   UniqueFd socket = BindAndListen(*address);
   umask(before);
   if (socket) return Listener(std::move(socket), AF_UNIX, std::string(kUnixScheme) + path, path);

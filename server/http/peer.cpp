@@ -5,6 +5,7 @@
 #include <sys/socket.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdint>
 #include <cstring>
 #include <iterator>
@@ -34,6 +35,17 @@ Peer PeerAt(const in6_addr& address) {
   return peer;
 }
 
+// Linux 4.13 has this option; socket(7) does not describe it. With too little room it fails with ERANGE and tells the
+// size that is needed.
+std::vector<gid_t> GroupsOf(int socket) {
+  std::vector<gid_t> groups;
+  socklen_t size = 0;
+  if (getsockopt(socket, SOL_SOCKET, SO_PEERGROUPS, nullptr, &size) == 0 || errno != ERANGE) return groups;
+  groups.resize(size / sizeof(gid_t));
+  if (getsockopt(socket, SOL_SOCKET, SO_PEERGROUPS, groups.data(), &size) != 0) groups.clear();
+  return groups;
+}
+
 }  // namespace
 
 std::string Peer::ShareKey() const {
@@ -60,7 +72,7 @@ Peer PeerOf(int socket) {
     ucred credentials{};
     socklen_t length = sizeof credentials;
     if (getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &credentials, &length) == 0) {
-      peer.credentials = Peer::Credentials{credentials.pid, credentials.uid, credentials.gid};
+      peer.credentials = Peer::Credentials{credentials.pid, credentials.uid, credentials.gid, GroupsOf(socket)};
     }
   }
   return peer;

@@ -6,6 +6,7 @@
 
 #include <optional>
 #include <string>
+#include <vector>
 
 namespace vorn::server {
 
@@ -17,6 +18,7 @@ struct Peer {
     pid_t pid;
     uid_t uid;
     gid_t gid;
+    std::vector<gid_t> groups{};  // supplementary groups (SO_PEERGROUPS)
   };
 
   std::string address = "unix";  // "unix", or an IP address without its port: "192.0.2.7", "2001:db8::1"

@@ -113,6 +113,10 @@ std::string Post(const std::string& target, const std::string& json, const std::
          "Content-Length: " + std::to_string(json.size()) + "\r\n\r\n" + json;
 }
 
-std::string Get(const std::string& target) { return "GET " + target + " HTTP/1.1\r\nHost: localhost\r\n\r\n"; }
+std::string Get(const std::string& target, const std::string& more_headers) {
+  return "GET " + target + " HTTP/1.1\r\nHost: localhost\r\n" + more_headers + "\r\n";
+}
+
+std::string BearerHeader(const std::string& token) { return "Authorization: Bearer " + token + "\r\n"; }
 
 }  // namespace vorn::server

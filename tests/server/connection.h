@@ -51,7 +51,10 @@ class Connection {
 
 // Returns a POST request with a JSON body, or without a body.
 std::string Post(const std::string& target, const std::string& json = "", const std::string& more_headers = "");
-std::string Get(const std::string& target);
+std::string Get(const std::string& target, const std::string& more_headers = "");
+
+// "Authorization: Bearer ...", with its line break.
+std::string BearerHeader(const std::string& token);
 
 }  // namespace vorn::server
 

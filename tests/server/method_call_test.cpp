@@ -72,8 +72,8 @@ class CallTest : public testing::Test {
   ~CallTest() override { held = false; }
 
   std::shared_ptr<Call> NewCall(const Route& route, milliseconds deadline = std::chrono::hours(1)) {
-    return std::make_shared<Call>(Call::Request{route, {}, {}}, std::make_unique<TracedBody>(&gone_),
-                                  Call::Environment{pool_, audit_, deadline});
+    return std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}},
+                                  std::make_unique<TracedBody>(&gone_), Call::Environment{pool_, audit_, deadline});
   }
   // Runs the call. The future receives its answer.
   std::future<Response> Run(const std::shared_ptr<Call>& call) {
@@ -145,16 +145,17 @@ TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {
 }
 
 TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
-  const auto call = std::make_shared<Call>(Call::Request{echo_, {}, {}}, std::make_unique<FailingBody>(),
-                                           Call::Environment{pool_, audit_, std::chrono::hours(1)});
+  const auto call =
+      std::make_shared<Call>(Call::Request{echo_, std::make_shared<Caller>(), "unix", {}},
+                             std::make_unique<FailingBody>(), Call::Environment{pool_, audit_, std::chrono::hours(1)});
   EXPECT_EQ(Run(call).get().status, 500);
 }
 
 TEST_F(CallTest, ThatMayChangeSomethingIsRecordedBeforeItsAnswer) {
   std::promise<std::size_t> records_at_answer;
-  Call::Request request{echo_, {}, {}};
-  request.description.caller = "alice";
-  request.description.origin = "unix";
+  Caller caller;
+  caller.name = "alice";
+  Call::Request request{echo_, std::make_shared<Caller>(caller), "unix", {}};
   std::make_shared<Call>(std::move(request), std::make_unique<TracedBody>(&gone_),
                          Call::Environment{pool_, audit_, std::chrono::hours(1)})
       ->Run([&](const Response& /*response*/) { records_at_answer.set_value(audited_.size()); });
@@ -192,8 +193,8 @@ TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
   auto body = std::make_unique<FixedBody>();
   body->parameters["password"] = "secret";
   body->parameters["name"] = "alice";
-  const auto call = std::make_shared<Call>(Call::Request{route, {}, {}}, std::move(body),
-                                           Call::Environment{pool_, audit_, std::chrono::hours(1)});
+  const auto call = std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}},
+                                           std::move(body), Call::Environment{pool_, audit_, std::chrono::hours(1)});
   EXPECT_NE(Run(call).get().body.find("secret"), std::string::npos) << "the method has the secret";
   ASSERT_EQ(audited_.size(), 1U);
   EXPECT_EQ(audited_[0].parameters, R"json({"name":"alice","password":"(left out)"})json");

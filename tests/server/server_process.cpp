@@ -1,6 +1,7 @@
 #include "server_process.h"
 
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -10,6 +11,12 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
+#include <regex>
+
+#include "private_file.h"
+#include "secret.h"
+#include "token_file.h"
 
 namespace vorn::server {
 namespace {
@@ -24,9 +31,11 @@ UniqueFd OpenNotifySocket(const std::string& path) {
   return socket;
 }
 
-[[noreturn]] void Execute(const std::string& notify_path, const std::string& log_path, std::vector<std::string> words) {
+[[noreturn]] void Execute(const std::string& notify_path, const std::string& log_path, const std::string& output,
+                          std::vector<std::string> words) {
   const int log = open(log_path.c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
   dup2(log, STDERR_FILENO);
+  if (!output.empty()) dup2(open(output.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600), STDOUT_FILENO);
   setenv("NOTIFY_SOCKET", notify_path.c_str(), 1);
   unsetenv("SYSTEMD_EXEC_PID");
   std::vector<char*> arguments;
@@ -38,26 +47,51 @@ UniqueFd OpenNotifySocket(const std::string& path) {
 
 }  // namespace
 
-ServerProcess::ServerProcess(const Sandbox& sandbox, std::vector<std::string> arguments)
+ServerProcess::ServerProcess(const Sandbox& sandbox, std::vector<std::string> arguments, std::string output)
     : sandbox_(sandbox),
       notify_path_(sandbox.File("notify")),
-      log_path_(sandbox.File("log-" + std::to_string(rand()))) {
+      log_path_(sandbox.File("log-" + std::to_string(rand()))),
+      output_(std::move(output)) {
   notifications_ = OpenNotifySocket(notify_path_);
   if (arguments.empty()) arguments = {"--listen", "unix:" + socket(), "--listen", "127.0.0.1:0"};
+  StoreToken();
   arguments.insert(arguments.begin(), {VORND, "--root", sandbox.path(), "--modules", TEST_MODULES});
   Start(arguments);
   AwaitReady();
 }
 
 ServerProcess::~ServerProcess() {
-  if (HasEnded()) return;
-  Signal(SIGKILL);
-  Wait();
+  if (!HasEnded()) {
+    Signal(SIGKILL);
+    Wait();
+  }
+  const std::string text = log();
+  EXPECT_FALSE(std::regex_search(text, std::regex("vorn[sc]?_[0-9a-f]{16}"))) << "a secret is logged";
+  EXPECT_EQ(text.find(kPasswordMark), std::string::npos) << "a password is logged";
+}
+
+const std::string& ServerProcess::Token() {
+  static const std::string token = NewSecret(kTokenPrefix);
+  return token;
+}
+
+// A file that a test has written stays.
+void ServerProcess::StoreToken() const {
+  const std::string path = sandbox_.File("var/lib/vorn/tokens.json");
+  if (std::filesystem::exists(path)) return;
+  vorn::server::Token token;
+  token.id = "test";
+  token.name = "test";
+  token.role = Role::kAdministrator;
+  std::error_code ignored;
+  std::filesystem::create_directories(sandbox_.File("var/lib/vorn"), ignored);
+  std::string error;
+  (void)ReplacePrivateFile(path, FormatTokens({{DigestOf(Token()), token}}), &error);
 }
 
 void ServerProcess::Start(const std::vector<std::string>& arguments) {
   pid_ = fork();
-  if (pid_ == 0) Execute(notify_path_, log_path_, arguments);
+  if (pid_ == 0) Execute(notify_path_, log_path_, output_, arguments);
 }
 
 void ServerProcess::AwaitReady() {

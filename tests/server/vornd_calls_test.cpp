@@ -110,11 +110,13 @@ TEST_F(Calls, MayWriteUnlessTheDescriptorSaysThatTheyOnlyRead) {
 
 TEST_F(Calls, AreListed) {
   Connection client = server_.ConnectTcp();
-  client.Send(Get("/api"));
+  client.Send(Get("/api", ServerProcess::TokenHeader()));
   const Json::Value data = client.Receive().Envelope()["data"];
-  ASSERT_EQ(data.size(), 13U);
+  ASSERT_EQ(data.size(), 20U);
   EXPECT_EQ(data[12]["api"], "Test.Echo");
   EXPECT_EQ(data[12]["version"], 2);
+  EXPECT_EQ(data[13]["api"], "VORN.Server.Session");
+  EXPECT_EQ(data[19]["method"], "revoke");
   client.Send(Get("/healthz"));
   EXPECT_EQ(client.Receive().status, 200);
 }
@@ -137,7 +139,8 @@ TEST_F(Calls, OfManyParametersDoNotDelayOthersOfTheirMethod) {
   std::vector<Connection> large;
   for (int i = 0; i < 50; ++i) {
     large.push_back(server_.ConnectTcp());
-    large.back().Send(Post("/api/Test.Echo/v1/wait", Wait(i == 0 ? "first" : "later") + padding));
+    large.back().Send(
+        Post("/api/Test.Echo/v1/wait", Wait(i == 0 ? "first" : "later") + padding, ServerProcess::TokenHeader()));
   }
   EXPECT_TRUE(Eventually([&] { return HasBegun("first") || HasBegun("later"); }));
   sandbox_.Write("now", "");
@@ -195,7 +198,8 @@ TEST_F(Calls, InParallelEachGetTheirOwnAnswer) {
       Connection client = c % 2 == 0 ? server_.Connect() : server_.ConnectTcp();
       for (int i = 0; i < 100; ++i) {
         const int mine = c * 1000 + i;
-        client.Send(Post("/api/Test.Echo/v1/get", "{\"mine\": " + std::to_string(mine) + "}"));
+        client.Send(
+            Post("/api/Test.Echo/v1/get", "{\"mine\": " + std::to_string(mine) + "}", ServerProcess::TokenHeader()));
         if (client.Receive().Envelope()["data"]["mine"] == mine) ++right;
       }
     });

@@ -28,7 +28,7 @@ class Framing : public testing::Test {
 std::unique_ptr<Sandbox> Framing::sandbox_;
 std::unique_ptr<ServerProcess> Framing::server_;
 
-const std::string kEcho = "POST /api/Test.Echo/v1/get HTTP/1.1\r\n";
+const std::string kEcho = "POST /api/Test.Echo/v1/get HTTP/1.1\r\n" + ServerProcess::TokenHeader();
 const std::string kHost = "Host: localhost\r\n";
 const std::string kJson = "Content-Type: application/json\r\n";
 const std::string kHidden = "POST /api/Test.Echo/v1/fail HTTP/1.1\r\nHost: localhost\r\n\r\n";

@@ -51,7 +51,7 @@ TEST(Vornd, ListensThereByDefault) {
   EXPECT_EQ(StatusOf(server.Connect()), 200);
   struct stat there {};
   ASSERT_EQ(stat(server.socket().c_str(), &there), 0);
-  EXPECT_EQ(there.st_mode & 07777, 0660U);
+  EXPECT_EQ(there.st_mode & 07777, 0666U);
 }
 
 // Starts a call that runs until the sandbox has a file "release". Returns once the call is running.

@@ -26,7 +26,7 @@ class WebApiTest : public testing::Test {
     Head head;
     head.method = "POST";
     head.target = target;
-    head.peer.credentials = Peer::Credentials{1, 1000, 1000};  // at a Unix socket
+    head.peer.credentials = Peer::Credentials{1, 0, 0};  // at a Unix socket
     return head;
   }
   static Head PostJson(std::string_view type, std::uint64_t length = 2) {
@@ -62,7 +62,11 @@ class WebApiTest : public testing::Test {
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
   const OwnNames names_{{"nas.example"}};
   const AuditSink audit_ = [](const AuditRecord& /*record*/) {};
-  WebApi api_{{routes_, *uploads_, workers_, memory_, names_, audit_}};
+  TokenStore tokens_{sandbox_.File("tokens.json")};
+  Sessions sessions_{Sessions::Limits{}};
+  PasswordChecker passwords_{{"/bin/false"}, PasswordChecker::Limits{}};
+  const Authenticator authenticator_{tokens_, sessions_, {}};
+  WebApi api_{{routes_, *uploads_, workers_, memory_, names_, audit_, authenticator_, {sessions_, passwords_}}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {
@@ -213,7 +217,7 @@ TEST_F(WebApiTest, OverTcpOnlyItsOwnNamesAreServed) {
   EXPECT_EQ(Begin(head), 421);
   for (const char* host : {"localhost:8080", "nas.example"}) {
     head.host = host;
-    EXPECT_EQ(Begin(head), 0) << host;
+    EXPECT_EQ(Begin(head), 401) << host;
   }
 }
 
@@ -228,7 +232,7 @@ TEST_F(WebApiTest, PagesOfOtherSitesAndPortsAreKeptOut) {
   }
   head.host = "nas.example";
   head.headers = {{"origin", "https://nas.example"}};
-  EXPECT_EQ(Begin(head), 0);
+  EXPECT_EQ(Begin(head), 401) << "the peer is a proxy";
 }
 
 TEST_F(WebApiTest, RequestsThatABrowserMakesForOtherSitesAreRefused) {
@@ -258,7 +262,7 @@ TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {
   std::promise<std::string> answer;
   std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& response) { answer.set_value(response.body); });
   api_.Dispatch();
-  EXPECT_EQ(answer.get_future().get(), R"({"success":true,"data":"uid 1000 at unix"})");
+  EXPECT_EQ(answer.get_future().get(), R"({"success":true,"data":"uid 0 at unix"})");
 }
 
 }  // namespace

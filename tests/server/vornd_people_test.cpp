@@ -1,0 +1,400 @@
+// Authentication and authorisation by the real vornd and its helper program, on a trial root with accounts of its own.
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <ctime>
+#include <filesystem>
+#include <memory>
+#include <regex>
+#include <utility>
+
+#include "server_process.h"
+
+namespace vorn::server {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::steady_clock;
+using testing::HasSubstr;
+
+constexpr const char* kEcho = "/api/Test.Echo/v1/";
+constexpr const char* kSession = "/api/VORN.Server.Session/v1/";
+constexpr const char* kToken = "/api/VORN.Server.Token/v1/";
+constexpr const char* kSecureHost = "nas.example";  // of a proxy with TLS
+
+class People : public testing::Test {
+ protected:
+  enum class Way { kUnix, kTcp };
+
+  People() {
+    for (const char* folder : {"etc/pam.d"}) std::filesystem::create_directories(sandbox_.File(folder));
+    sandbox_.Write("etc/pam.d/vornd", "auth required " PAM_MODULE "\naccount required " PAM_MODULE "\n");
+    sandbox_.Write("etc/passwd",
+                   "alice:x:1001:100::/:/bin/sh\nbob:x:1002:100::/:/bin/sh\ncarol:x:1003:100::/:/bin/sh\n"
+                   "expired:x:1004:3001::/:/bin/sh\n");
+    sandbox_.Write("etc/group", "users:x:100:\nvorn-admin:x:3001:alice\nvorn-readonly:x:3002:bob\n");
+    Start();
+  }
+
+  void Start() {
+    server_.reset();
+    server_ = std::make_unique<ServerProcess>(
+        sandbox_, std::vector<std::string>{"--host-name", kSecureHost, "--listen", "127.0.0.1:0", "--listen",
+                                           "unix:" + sandbox_.File("run/vorn/vornd.sock")});
+    ASSERT_TRUE(server_->ready()) << server_->log();
+  }
+
+  void Stop() {
+    server_->Signal(SIGTERM);
+    EXPECT_EQ(server_->Wait(), 0) << server_->log();
+  }
+
+  Connection ConnectBy(Way way) const { return way == Way::kUnix ? server_->Connect() : server_->ConnectTcp(); }
+
+  Reply Call(Way way, const std::string& path, const std::string& json = "{}", const std::string& headers = "") const {
+    Connection client = ConnectBy(way);
+    client.Send(Post(path, json, headers));
+    return client.Receive();
+  }
+
+  // A call of the local administrator.
+  Reply Administer(const std::string& path, const std::string& json = "{}") const {
+    return Call(Way::kUnix, path, json);
+  }
+
+  // Makes a token; `more` has further members of the parameters.
+  std::string NewToken(const std::string& name, const std::string& role, const std::string& more = "") const {
+    const Reply reply = Administer(std::string(kToken) + "create",
+                                   R"({"name": ")" + name + R"(", "role": ")" + role + "\"" + more + "}");
+    EXPECT_EQ(reply.status, 200) << reply.body;
+    return reply.Envelope()["data"]["token"].asString();
+  }
+
+  static std::string Credentials(const std::string& account, const std::string& password) {
+    return R"({"account": ")" + account + R"(", "password": ")" + password + "\"}";
+  }
+
+  Reply SignIn(const std::string& account, const std::string& password, Way way = Way::kTcp) const {
+    return Call(way, std::string(kSession) + "sign_in", Credentials(account, password));
+  }
+
+  // Signs in with the right password and returns the header with the session.
+  std::string SignedIn(const std::string& account) const {
+    const Reply reply = SignIn(account, kPasswordMark + account);
+    EXPECT_EQ(reply.status, 200) << reply.body;
+    return BearerHeader(reply.Envelope()["data"]["token"].asString());
+  }
+
+  // A request as a proxy with TLS forwards it. Returns the reply.
+  Reply CallSecurely(const std::string& path, const std::string& json, const std::string& headers = "") const {
+    Connection client = server_->ConnectTcp();
+    client.Send("POST " + path + " HTTP/1.1\r\nHost: " + kSecureHost + "\r\nContent-Type: application/json\r\n" +
+                headers + "Content-Length: " + std::to_string(json.size()) + "\r\n\r\n" + json);
+    return client.Receive();
+  }
+
+  Sandbox sandbox_;
+  std::unique_ptr<ServerProcess> server_;
+};
+
+const std::string kGet = std::string(kEcho) + "get";          // only reads
+const std::string kContext = std::string(kEcho) + "context";  // may change something
+
+TEST_F(People, WithoutCredentialsReachOnlyTheHealthChecksOverLoopback) {
+  for (const std::string& path : {kGet, kContext, std::string("/api/No.Such/v1/get"), std::string(kToken) + "list"}) {
+    const Reply reply = Call(Way::kTcp, path);
+    EXPECT_EQ(reply.status, 401) << path;
+    EXPECT_EQ(reply.headers.at("WWW-Authenticate"), "Bearer");
+  }
+  Connection client = server_->ConnectTcp();
+  const std::pair<const char*, int> pages[] = {{"/api", 401}, {"/healthz", 200}, {"/healthz/ready", 200}};
+  for (const auto& [page, status] : pages) {
+    client.Send(Get(page));
+    EXPECT_EQ(client.Receive().status, status) << page;
+  }
+}
+
+TEST_F(People, AreRefusedBeforeTheirBodyIsRead) {
+  Connection client = server_->ConnectTcp();
+  client.Send("POST " + kGet +
+              " HTTP/1.1\r\nHost: localhost\r\nContent-Type: application/json\r\nContent-Length: 1000000\r\n"
+              "Expect: 100-continue\r\n\r\n");
+  EXPECT_EQ(client.Receive().status, 401);
+}
+
+TEST_F(People, AtTheUnixSocketAreAdministratorsIfTheyAreRoot) {
+  const Reply reply = Administer(kContext);
+  EXPECT_EQ(reply.status, 200);
+  EXPECT_EQ(reply.Envelope()["data"]["caller"], "uid " + std::to_string(geteuid()));
+  EXPECT_EQ(reply.Envelope()["data"]["may_write"], true);
+}
+
+// Other users can connect, and need a token as everybody else.
+TEST_F(People, AtTheUnixSocketWithoutRightsNeedAToken) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can become another user";
+  ASSERT_EQ(chmod(sandbox_.path().c_str(), 0755), 0);
+  const pid_t child = fork();
+  if (child == 0) {
+    if (setgid(40000) != 0 || setuid(40000) != 0) _exit(1);
+    if (Call(Way::kUnix, kGet).status != 401) _exit(2);
+    _exit(Call(Way::kUnix, kGet, "{}", ServerProcess::TokenHeader()).status == 200 ? 0 : 3);
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  // setgroups(2) was not called: the child has root's groups, none of which is the administrators'.
+  EXPECT_EQ(WEXITSTATUS(status), 0);
+}
+
+TEST_F(People, TokensOfReadersCallOnlyMethodsThatRead) {
+  const std::string header = BearerHeader(NewToken("monitor", "reader"));
+  for (const Way way : {Way::kUnix, Way::kTcp}) {
+    EXPECT_EQ(Call(way, kGet, "{}", header).status, 200);
+    EXPECT_EQ(Call(way, "/api/Test.Echo/v2/context", "{}", header).Envelope()["data"]["may_write"], false);
+    EXPECT_EQ(Call(way, kContext, "{}", header).status, 403);
+    EXPECT_EQ(Call(way, std::string(kToken) + "list", "{}", header).status, 403);
+    EXPECT_EQ(Call(way, std::string(kSession) + "list", "{}", header).status, 403);
+  }
+}
+
+TEST_F(People, ChangingCallsOfReadersDoNotBegin) {
+  const std::string header = BearerHeader(NewToken("monitor", "reader"));
+  const std::string begun = sandbox_.File("begun");
+  EXPECT_EQ(
+      Call(Way::kTcp, std::string(kEcho) + "wait", R"({"begun": ")" + begun + R"(", "release": "/dev/null"})", header)
+          .status,
+      403);
+  EXPECT_FALSE(std::filesystem::exists(begun));
+}
+
+TEST_F(People, TokensOfAdministratorsDoEverything) {
+  const std::string header = BearerHeader(NewToken("automation", "administrator"));
+  for (const Way way : {Way::kUnix, Way::kTcp}) {
+    const Reply reply = Call(way, kContext, "{}", header);
+    EXPECT_EQ(reply.Envelope()["data"]["caller"], "token automation");
+    EXPECT_EQ(reply.Envelope()["data"]["may_write"], true);
+    EXPECT_EQ(Call(way, std::string(kToken) + "list", "{}", header).status, 200);
+  }
+}
+
+TEST_F(People, TokensOfSomeApisCallNoOthers) {
+  const std::string header = BearerHeader(NewToken("echo", "administrator", R"(, "apis": ["Test.Echo"])"));
+  EXPECT_EQ(Call(Way::kTcp, kContext, "{}", header).status, 200);
+  EXPECT_EQ(Call(Way::kTcp, std::string(kToken) + "list", "{}", header).status, 403);
+}
+
+TEST_F(People, TokensOfSomeSharesNameNoOthers) {
+  const std::string header = BearerHeader(NewToken("music", "administrator", R"(, "shares": ["music", "films"])"));
+  const std::pair<const char*, int> cases[] = {{R"({"share": "music"})", 200},
+                                               {R"({"share": "films"})", 200},
+                                               {R"({"share": "data"})", 403},
+                                               {R"({"share": "Music"})", 403},
+                                               {R"({"share": ["music"]})", 403},
+                                               {R"({"share": null})", 403},
+                                               {"{}", 403}};
+  for (const auto& [json, status] : cases) EXPECT_EQ(Call(Way::kTcp, kGet, json, header).status, status) << json;
+  EXPECT_EQ(Call(Way::kTcp, kContext, R"({"share": "music"})", header).status, 403) << "its descriptor names no share";
+  EXPECT_EQ(Call(Way::kTcp, std::string(kToken) + "list", "{}", header).status, 403);
+}
+
+TEST_F(People, RevokedTokensAreStale) {
+  const std::string header = BearerHeader(NewToken("backup", "administrator"));
+  const Json::Value list = Administer(std::string(kToken) + "list").Envelope()["data"];
+  ASSERT_EQ(list.size(), 2U);
+  EXPECT_EQ(list[1]["name"], "backup");
+  EXPECT_FALSE(list[1].isMember("token"));
+  EXPECT_FALSE(list[1].isMember("digest"));
+  const std::string id = R"({"id": ")" + list[1]["id"].asString() + "\"}";
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 200);
+  EXPECT_EQ(Administer(std::string(kToken) + "revoke", id).status, 200);
+  EXPECT_EQ(Administer(std::string(kToken) + "revoke", id).status, 404);
+  for (const Way way : {Way::kUnix, Way::kTcp}) EXPECT_EQ(Call(way, kGet, "{}", header).status, 401);
+}
+
+TEST_F(People, TokensExpire) {
+  const std::string header = BearerHeader(NewToken("short", "reader", R"(, "expires_in": 1)"));
+  EXPECT_TRUE(Eventually([&] { return Call(Way::kTcp, kGet, "{}", header).status == 401; }));
+}
+
+TEST_F(People, TokensOutliveTheServerAndKnowTheirLastUse) {
+  const std::string header = BearerHeader(NewToken("backup", "reader"));
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 200);
+  Stop();
+  Start();
+  const Json::Value token = Administer(std::string(kToken) + "list").Envelope()["data"][1];
+  EXPECT_GT(token["last_used"].asInt64(), 0);
+  EXPECT_EQ(token["last_address"], "127.0.0.1");
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 200);
+  struct stat status {};
+  ASSERT_EQ(stat(sandbox_.File("var/lib/vorn/tokens.json").c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0600U);
+}
+
+TEST_F(People, TokensAreMadeFromWholeParametersOnly) {
+  for (const char* json :
+       {"{}", R"({"name": "a"})", R"({"name": "", "role": "reader"})", R"({"name": "a\nb", "role": "reader"})",
+        R"({"name": "a", "role": "root"})", R"({"name": "a", "role": "reader", "apis": []})",
+        R"({"name": "a", "role": "reader", "apis": ["No.Such"]})",
+        R"({"name": "a", "role": "reader", "apis": "Test.Echo"})", R"({"name": "a", "role": "reader", "shares": [""]})",
+        R"({"name": "a", "role": "reader", "shares": [1]})", R"({"name": "a", "role": "reader", "expires_in": 0})",
+        R"({"name": "a", "role": "reader", "expires_in": "1"})",
+        R"({"name": "a", "role": "reader", "share": ["data"]})"}) {
+    EXPECT_EQ(Administer(std::string(kToken) + "create", json).status, 400) << json;
+  }
+  EXPECT_EQ(Administer(std::string(kToken) + "create", R"({"name": "test", "role": "reader"})").status, 409);
+  EXPECT_EQ(Administer(std::string(kToken) + "list").Envelope()["data"].size(), 1U);
+}
+
+TEST_F(People, SignInWithAnAccountOfTheBox) {
+  for (const Way way : {Way::kUnix, Way::kTcp}) {
+    const Json::Value data = SignIn("alice", std::string(kPasswordMark) + "alice", way).Envelope()["data"];
+    EXPECT_EQ(data["account"], "alice");
+    EXPECT_EQ(data["role"], "administrator");
+    const std::string header = BearerHeader(data["token"].asString());
+    EXPECT_EQ(Call(way, kContext, "{}", header).Envelope()["data"]["caller"], "account alice");
+    EXPECT_EQ(Call(way, std::string(kSession) + "get", "{}", header).Envelope()["data"]["role"], "administrator");
+  }
+}
+
+TEST_F(People, OfTheReadersGroupOnlyRead) {
+  const std::string header = SignedIn("bob");
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 200);
+  EXPECT_EQ(Call(Way::kTcp, kContext, "{}", header).status, 403);
+  EXPECT_EQ(Call(Way::kTcp, std::string(kToken) + "create", R"({"name": "a", "role": "reader"})", header).status, 403);
+}
+
+TEST_F(People, OfNeitherGroupHaveNoSession) {
+  EXPECT_EQ(SignIn("carol", std::string(kPasswordMark) + "carol").status, 403);
+  EXPECT_EQ(Administer(std::string(kSession) + "list").Envelope()["data"].size(), 0U);
+}
+
+// The module of the test notices an unknown account at once and a wrong password only after 0.3 s.
+TEST_F(People, CannotTellAnUnknownAccountFromAWrongPassword) {
+  const auto attempt = [this](const char* account) {
+    const auto begin = steady_clock::now();
+    const Reply reply = SignIn(account, std::string(kPasswordMark) + "nobody");
+    EXPECT_GE(steady_clock::now() - begin, milliseconds(1000)) << account;
+    return std::pair(reply.status, reply.body);
+  };
+  const auto wrong = attempt("alice");
+  EXPECT_EQ(wrong.first, 401);
+  EXPECT_EQ(attempt("ghost"), wrong);
+  const Reply expired = SignIn("expired", std::string(kPasswordMark) + "expired");
+  EXPECT_EQ(std::pair(expired.status, expired.body), wrong);
+}
+
+TEST_F(People, WaitLongerAfterEachWrongPasswordButGetIn) {
+  for (int i = 0; i < 3; ++i) EXPECT_EQ(SignIn("alice", "wrong").status, 401);
+  const auto begin = steady_clock::now();
+  EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 200);
+  EXPECT_GE(steady_clock::now() - begin, milliseconds(1000));
+}
+
+TEST_F(People, AreNotHinderedByAPamModuleThatCrashesOrHangs) {
+  Connection hanging = server_->ConnectTcp();
+  hanging.Send(Post(std::string(kSession) + "sign_in", Credentials("hang", "x")));
+  EXPECT_EQ(SignIn("crash", "x").status, 503);
+  EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 200);
+  EXPECT_EQ(hanging.Receive().status, 503);
+  EXPECT_THAT(server_->log(), HasSubstr("its process is killed"));
+}
+
+TEST_F(People, AreToldWhenPamIsNotSetUp) {
+  std::filesystem::remove(sandbox_.File("etc/pam.d/vornd"));
+  EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 503);
+}
+
+TEST_F(People, SendWholeCredentials) {
+  for (const char* json : {"{}", R"({"account": "alice"})", R"({"account": "alice", "password": ""})",
+                           R"({"account": 1, "password": "x"})", R"({"account": "a\u0000b", "password": "x"})",
+                           R"({"account": "alice", "password": "x", "more": 1})", R"({"code": 1})", "{"}) {
+    EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "sign_in", json).status, 400) << json;
+  }
+  EXPECT_EQ(SignIn("alice", std::string(2000, 'x')).status, 400);
+  EXPECT_EQ(SignIn("alice", std::string(5000, 'x')).status, 413);
+}
+
+TEST_F(People, BehindTlsHaveACookie) {
+  const std::string sign_in = std::string(kSession) + "sign_in";
+  const Reply reply = CallSecurely(sign_in, Credentials("alice", std::string(kPasswordMark) + "alice"));
+  ASSERT_EQ(reply.status, 200) << reply.body;
+  EXPECT_FALSE(reply.Envelope()["data"].isMember("token"));
+  std::smatch cookie;
+  const std::string header = reply.headers.at("Set-Cookie");
+  ASSERT_TRUE(std::regex_match(header, cookie,
+                               std::regex("(__Host-vorn-session=(vorns_[0-9a-f]{72})); Path=/; Secure; HttpOnly; "
+                                          "SameSite=Strict")));
+  const std::string with_cookie = "Cookie: " + cookie[1].str() + "\r\n";
+  EXPECT_EQ(CallSecurely(kContext, "{}", with_cookie).status, 200);
+  EXPECT_EQ(CallSecurely(kContext, "{}", with_cookie + "Origin: https://nas.example\r\n").status, 200);
+  EXPECT_EQ(CallSecurely(kContext, "{}", with_cookie + "Origin: https://evil.example\r\n").status, 403);
+  EXPECT_EQ(CallSecurely(kContext, "{}", with_cookie + "Sec-Fetch-Site: cross-site\r\n").status, 403);
+  EXPECT_EQ(Call(Way::kTcp, kContext, "{}", with_cookie).status, 401) << "not without TLS";
+  EXPECT_EQ(Call(Way::kTcp, kContext, "{}", BearerHeader(cookie[2])).status, 401) << "a cookie is no token";
+  const Reply out = CallSecurely(std::string(kSession) + "sign_out", "{}", with_cookie);
+  EXPECT_THAT(out.headers.at("Set-Cookie"), HasSubstr("__Host-vorn-session=;"));
+  EXPECT_EQ(CallSecurely(kContext, "{}", with_cookie).status, 401);
+}
+
+TEST_F(People, WhoHaveSignedOutAreRefused) {
+  const std::string header = SignedIn("bob");
+  EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "sign_out", "{}", header).status, 200);
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 401);
+  EXPECT_EQ(Administer(std::string(kSession) + "sign_out").status, 409);
+}
+
+TEST_F(People, HaveSessionsThatAnAdministratorEnds) {
+  const std::string header = SignedIn("bob");
+  const Json::Value list = Administer(std::string(kSession) + "list").Envelope()["data"];
+  ASSERT_EQ(list.size(), 1U);
+  EXPECT_EQ(list[0]["account"], "bob");
+  EXPECT_EQ(list[0]["role"], "reader");
+  const std::string id = R"({"id": ")" + list[0]["id"].asString() + "\"}";
+  EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "end", id, header).status, 403) << "bob is no administrator";
+  EXPECT_EQ(Administer(std::string(kSession) + "end", id).status, 200);
+  EXPECT_EQ(Administer(std::string(kSession) + "end", id).status, 404);
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 401);
+}
+
+TEST_F(People, LoseTheirSessionsWhenTheServerEnds) {
+  const std::string header = SignedIn("alice");
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 200);
+  Stop();
+  Start();
+  EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 401);
+}
+
+TEST_F(People, DoNotDelayTheEndOfTheServer) {
+  Connection hanging = server_->ConnectTcp();
+  hanging.Send(Post(std::string(kSession) + "sign_in", Credentials("hang", "x")));
+  EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 200);
+  Stop();
+  EXPECT_EQ(server_->log().find("calls are still running"), std::string::npos);
+  EXPECT_EQ(hanging.Receive().status, 503);
+}
+
+// Vornd prints the link to its standard output, which is a file here.
+TEST(SignInLink, SignsInOnce) {
+  const Sandbox sandbox;
+  const std::string output = sandbox.File("output");
+  const ServerProcess server(sandbox, {"--sign-in-link", "--listen", "127.0.0.1:0"}, output);
+  ASSERT_TRUE(server.ready()) << server.log();
+  const std::string text = ReadWholeFile(output);
+  std::smatch link;
+  ASSERT_TRUE(std::regex_search(text, link, std::regex("http://127\\.0\\.0\\.1:[0-9]+/#code=(vornc_[0-9a-f]{72})\n")));
+  const std::string code = R"({"code": ")" + link[1].str() + "\"}";
+  Connection client = server.ConnectTcp();
+  const std::string sign_in = std::string(kSession) + "sign_in";
+  client.Send(Post(sign_in, code));
+  const Json::Value data = client.Receive().Envelope()["data"];
+  EXPECT_EQ(data["role"], "administrator");
+  client.Send(Post(kContext, "{}", BearerHeader(data["token"].asString())));
+  EXPECT_EQ(client.Receive().status, 200);
+  client.Send(Post(sign_in, code));
+  EXPECT_EQ(client.Receive().status, 401);
+}
+
+}  // namespace
+}  // namespace vorn::server

@@ -42,7 +42,11 @@ class TrialServer:
         with open(self.folder / "log", "wb") as log:
             self._process = subprocess.Popen(  # pylint: disable=consider-using-with
                 [VORND, "--root", self.root, "--listen", f"unix:{self.socket}"], stdout=log, stderr=log)
-        self._await()
+        try:
+            self._await()
+        except RuntimeError:
+            self.__exit__()
+            raise
         return self
 
     def __exit__(self, *_):

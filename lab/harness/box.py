@@ -104,8 +104,9 @@ class Box:
         self.journal.foresee(pattern)
 
     def set_up(self):
-        """Starts the service without exports."""
-        if self.threads() == 0:
+        """Starts the service without exports. An earlier story may have left it running and disabled, as it does with
+        a package that was purged while the service was off; the API then reloads nothing."""
+        if self.threads() == 0 or not succeeds("systemctl", "-q", "is-enabled", "nfs-server"):
             run("systemctl", "reset-failed")
             self.nfs(enable_nfs=True)
 

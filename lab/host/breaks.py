@@ -67,6 +67,9 @@ BREAKS = [
           _package("sed -i 's,^  remove_imported_keytab$,  rm -rf /etc/nfs /etc/vorn,' postrm"), select="purge"),
     Break("purge-takes-nothing", "a purge leaves nothing of ours", "package",
           _package("printf '#!/bin/sh\\n' >postrm"), select="purge"),
+    Break("lock-lost-at-restart", "the configuration lock of another program outlives a restart", "package",
+          "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nRuntimeDirectoryPreserve=no\\n' "
+          f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="lock_of_another"),
     Break("upgrade-restarts-nfs", "an upgrade leaves NFS alone", "package",
           _package("sed -i '$i systemctl restart nfs-server || true' postinst"), select="upgrade"),
 ]

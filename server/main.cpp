@@ -25,6 +25,7 @@
 #include "http.h"
 #include "listener.h"
 #include "memory.h"
+#include "metrics.h"
 #include "module.h"
 #include "options.h"
 #include "password_checker.h"
@@ -32,6 +33,7 @@
 #include "routes.h"
 #include "runtime_folder.h"
 #include "server_methods.h"
+#include "server_metrics.h"
 #include "sessions.h"
 #include "termination.h"
 #include "token_store.h"
@@ -182,9 +184,14 @@ int Serve(const Options& options) {
   Workers workers;
   const OwnNames names(options.host_names);
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
-  WebApi api({routes, *uploads, workers, memory, names, audit, authenticator, {sessions, passwords}});
-  const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   AccessLog log(StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO));
+  CallMetrics metrics;
+  const std::vector<MetricsSource> figures = {[&] {
+                                                return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
+                                              },
+                                              [&] { return QueueMetrics(workers); }, ProcessMetrics, VORN::ReadMetrics};
+  WebApi api({routes, *uploads, workers, memory, names, audit, metrics, figures, authenticator, {sessions, passwords}});
+  const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
   Notify("READY=1");
   WaitForTermination();

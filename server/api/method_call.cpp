@@ -72,10 +72,18 @@ void Call::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
     if (environment_.pool.Enqueue({&route_, SizeOf(*body_)}, shared_from_this(), environment_.deadline)) return;
-    answer_.Give(Busy("Too many calls of this method are waiting. Try again soon."));
+    Give(Busy("Too many calls of this method are waiting. Try again soon."));
   } catch (const std::exception& exception) {
-    answer_.Give(NoAnswer(route_, exception.what()));
+    Give(NoAnswer(route_, exception.what()));
   }
+}
+
+// Gives the answer, unless one was given before. Returns whether it was given.
+bool Call::Give(Response response) {
+  const int code = response.error_code;
+  const bool given = answer_.Give(std::move(response));
+  if (given) environment_.metrics.CountAnswer(route_, code);
+  return given;
 }
 
 void Call::Work() {
@@ -86,12 +94,13 @@ void Call::Work() {
     response = AnswerOf(route_, [this] { return Execute(); });
   } else {
     response.status = 503;
+    response.error_code = 503;
   }
   body_.reset();  // the uploads are removed before the client sees the answer
-  if (run && !route_.method.reads_only) Audit(response, begun);
+  if (run) Record(response, std::chrono::steady_clock::now() - begun);
   response.begun = begun;
   const int status = response.status;
-  if (!answer_.Give(std::move(response))) {
+  if (!Give(std::move(response))) {
     syslog(LOG_NOTICE, "%s: ended with status %d after its deadline", route_.Name().c_str(), status);
   }
 }
@@ -111,12 +120,13 @@ Response Call::Execute() {
 }
 
 // A change must not be undone by a lack of memory for its record; the access log still has a line for it.
-void Call::Audit(const Response& response, std::chrono::steady_clock::time_point begun) const noexcept {
+void Call::Record(const Response& response, std::chrono::nanoseconds duration) const noexcept {
+  const auto worked = std::chrono::duration_cast<std::chrono::microseconds>(duration);
+  environment_.metrics.AddDuration(route_, worked);
+  if (route_.method.reads_only) return;
   try {
-    const auto duration = std::chrono::steady_clock::now() - begun;
     environment_.audit({description_.caller, description_.origin, description_.method, audited_parameters_,
-                        response.status, response.error_code,
-                        std::chrono::duration_cast<std::chrono::microseconds>(duration)});
+                        response.status, response.error_code, worked});
   } catch (const std::exception&) {
     syslog(LOG_ERR, "A call has no audit record: no memory");
   }
@@ -124,17 +134,17 @@ void Call::Audit(const Response& response, std::chrono::steady_clock::time_point
 
 void Call::Expire(bool running) {
   if (!running) {
-    answer_.Give(AnswerOf(route_, [] { return Busy("The call has waited too long for others. Try again soon."); }));
+    Give(AnswerOf(route_, [] { return Busy("The call has waited too long for others. Try again soon."); }));
     return;
   }
   syslog(LOG_ERR, "%s: not done at its deadline", route_.Name().c_str());
-  answer_.Give(AnswerOf(route_, [] {
+  Give(AnswerOf(route_, [] {
     return Refusal(504, "The operation takes longer than expected. It goes on; the server's log tells when it ends.");
   }));
 }
 
 void Call::Refuse() {
-  answer_.Give(AnswerOf(route_, [] { return Busy("The server is stopping. Try again soon."); }));
+  Give(AnswerOf(route_, [] { return Busy("The server is stopping. Try again soon."); }));
 }
 
 }  // namespace vorn::server

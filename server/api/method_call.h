@@ -18,6 +18,7 @@
 #include "http.h"
 #include "pending_answer.h"
 #include "routes.h"
+#include "server_metrics.h"
 #include "worker_pool.h"
 
 namespace vorn::server {
@@ -30,7 +31,8 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
   // The objects that all calls share. They must outlive the calls.
   struct Environment {
     WorkerPool& pool;
-    const AuditSink& audit;              // receives each call of a method that may change something
+    const AuditSink& audit;  // receives each call of a method that may change something
+    CallMetrics& metrics;
     std::chrono::milliseconds deadline;  // from the end of the body
   };
 
@@ -55,7 +57,8 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
 
  private:
   Response Execute();
-  void Audit(const Response& response, std::chrono::steady_clock::time_point begun) const noexcept;
+  bool Give(Response response);
+  void Record(const Response& response, std::chrono::nanoseconds duration) const noexcept;
 
   const Route& route_;
   std::unique_ptr<Body> body_;

@@ -13,8 +13,8 @@
 #include "method_call.h"
 #include "multipart.h"
 #include "openapi.h"
-#include "probe.h"
 #include "resources.h"
+#include "worker_page.h"
 
 namespace vorn::server {
 namespace {
@@ -143,14 +143,15 @@ Response File(std::string_view content, std::string_view type) {
 }  // namespace
 
 // The resources beside the methods. The network thread answers them, so it answers "/healthz" and "/healthz/live" as
-// long as the process is alive; only "/healthz/ready" asks the workers.
-const std::array<WebApi::Page, 7> WebApi::kPages = {{{"/api", false, &WebApi::List},
+// long as the process is alive; "/healthz/ready" and "/metrics" ask the workers.
+const std::array<WebApi::Page, 8> WebApi::kPages = {{{"/api", false, &WebApi::List},
                                                      {"/openapi.json", true, &WebApi::OpenApi},
                                                      {"/docs", true, &WebApi::Docs},
                                                      {"/docs.css", true, &WebApi::DocsStyle},
                                                      {"/healthz", true, &WebApi::Alive},
                                                      {"/healthz/live", true, &WebApi::Alive},
-                                                     {"/healthz/ready", true, &WebApi::Ready}}};
+                                                     {"/healthz/ready", true, &WebApi::Ready},
+                                                     {"/metrics", false, &WebApi::Metrics}}};
 
 WebApi::WebApi(Parts parts) : WebApi(parts, Limits{}) {}
 WebApi::WebApi(Parts parts, Limits limits)
@@ -196,7 +197,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, con
   WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
   std::get<std::unique_ptr<Body>>(body)->Announce(head.content_length);
   return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
-                                Call::Environment{pool, parts_.audit, limits_.call});
+                                Call::Environment{pool, parts_.audit, parts_.metrics, limits_.call});
 }
 
 WebApi::Begun WebApi::BeginSignIn(const Head& head) const {
@@ -225,6 +226,16 @@ WebApi::Begun WebApi::DocsStyle() const { return docs_style_; }
 
 WebApi::Begun WebApi::Alive() const { return Success(Json::Value()); }
 
-WebApi::Begun WebApi::Ready() const { return std::make_shared<Probe>(parts_.workers.reading, limits_.ready); }
+WebApi::Begun WebApi::Ready() const {
+  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.ready, [] { return Success(Json::Value()); });
+}
+
+WebApi::Begun WebApi::Metrics() const {
+  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.call, [this] {
+    Response response{200, WriteMetrics(parts_.metrics, parts_.figures)};
+    response.content_type = "text/plain; version=0.0.4; charset=utf-8";
+    return response;
+  });
+}
 
 }  // namespace vorn::server

@@ -8,6 +8,7 @@
 #include <optional>
 #include <string_view>
 #include <variant>
+#include <vector>
 
 #include "audit.h"
 #include "authenticator.h"
@@ -15,6 +16,7 @@
 #include "budget.h"
 #include "http.h"
 #include "routes.h"
+#include "server_metrics.h"
 #include "sign_in_call.h"
 #include "upload.h"
 #include "worker_pool.h"
@@ -36,6 +38,8 @@ class WebApi : public Service {
     Budget& memory;  // of parsed parameters
     const OwnNames& names;
     const AuditSink& audit;
+    CallMetrics& metrics;
+    const std::vector<MetricsSource>& figures;  // for "/metrics", beside those of the calls
     const Authenticator& authenticator;
     SignInCall::Environment sign_in;
   };
@@ -56,7 +60,7 @@ class WebApi : public Service {
     bool is_public;
     Begun (WebApi::*begin)() const;
   };
-  static const std::array<Page, 7> kPages;
+  static const std::array<Page, 8> kPages;
 
   Begun BeginFor(const CallerPtr& caller, const Page* page, const Head& head) const;
   Begun BeginSignIn(const Head& head) const;
@@ -67,6 +71,7 @@ class WebApi : public Service {
   Begun DocsStyle() const;
   Begun Alive() const;
   Begun Ready() const;
+  Begun Metrics() const;
   Begun BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const;
 
   const Parts parts_;

@@ -71,6 +71,11 @@ void WorkerPool::Wake() {
   if (engaged) wake_.notify_one();
 }
 
+WorkerPool::Load WorkerPool::load() const {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return {queued_, running_.size()};
+}
+
 void WorkerPool::Close() {
   Entries refused;
   {

@@ -69,10 +69,16 @@ class WorkerPool {
   // the lane's share of the queue is used up or the pool is closed. Throws std::bad_alloc and has then no effect.
   bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
 
-  // As Submit(), but wakes no thread: the job waits for Wake() or for a thread that has just ended another job. For a
-  // caller that has several jobs to submit.
+  // Does what Submit() does, but wakes no thread: the job waits for Wake() or for a thread that has just ended another
+  // job. For a caller that has several jobs to submit.
   bool Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
   void Wake();
+
+  struct Load {
+    std::size_t waiting = 0;
+    std::size_t running = 0;
+  };
+  Load load() const;
 
   // Refuses the jobs that wait and all further ones. Running jobs continue. Does not wait.
   void Close();
@@ -113,7 +119,7 @@ class WorkerPool {
   Clock::time_point NextWatch() const;
 
   const Limits limits_;
-  std::mutex mutex_;
+  mutable std::mutex mutex_;
   std::condition_variable wake_;        // workers wait for a job
   std::condition_variable watch_wake_;  // the watch thread waits for the next deadline or stall
   std::map<LaneId, Lane> lanes_;        // all that have ever had a job

@@ -139,11 +139,12 @@ AccessLog::~AccessLog() {
 
 void AccessLog::Add(AccessRecord record) noexcept {
   const std::lock_guard<std::mutex> lock(mutex_);
-  if (record.status == 503) {
-    ++counts_.busy;
-    return;
-  }
   try {
+    ++statuses_[record.status];
+    if (record.status == 503) {
+      ++counts_.busy;
+      return;
+    }
     if (queue_.size() < limit_) {
       queue_.push_back(std::move(record));
       if (queue_.size() == 1 || queue_.size() == limit_ / 2) wake_.notify_one();
@@ -153,6 +154,11 @@ void AccessLog::Add(AccessRecord record) noexcept {
     // The record is counted below.
   }
   ++counts_.dropped;
+}
+
+std::map<int, std::uint64_t> AccessLog::Statuses() const {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return statuses_;
 }
 
 void AccessLog::Drop() noexcept {

@@ -7,6 +7,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -51,6 +52,9 @@ class AccessLog {
   // Thread-safe; does not wait and does not throw.
   void Add(AccessRecord record) noexcept;
 
+  // The number of answers by HTTP status since the start.
+  std::map<int, std::uint64_t> Statuses() const;
+
   // Counts a record that could not be made.
   void Drop() noexcept;
 
@@ -61,10 +65,11 @@ class AccessLog {
 
   const Sink sink_;
   const std::size_t limit_;
-  std::mutex mutex_;
+  mutable std::mutex mutex_;
   std::condition_variable wake_;  // the first record, a queue that is half full, or the end
   std::vector<AccessRecord> queue_;
   Counts counts_;
+  std::map<int, std::uint64_t> statuses_;
   bool stopping_ = false;
   std::thread thread_;
 };

@@ -45,6 +45,7 @@ class Budget {
   std::optional<Charge> Take(std::string_view peer, std::size_t amount);
 
   std::size_t used() const;
+  std::size_t total() const { return total_; }
 
  private:
   friend class Charge;

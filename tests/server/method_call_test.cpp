@@ -73,7 +73,8 @@ class CallTest : public testing::Test {
 
   std::shared_ptr<Call> NewCall(const Route& route, milliseconds deadline = std::chrono::hours(1)) {
     return std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}},
-                                  std::make_unique<TracedBody>(&gone_), Call::Environment{pool_, audit_, deadline});
+                                  std::make_unique<TracedBody>(&gone_),
+                                  Call::Environment{pool_, audit_, metrics_, deadline});
   }
   // Runs the call. The future receives its answer.
   std::future<Response> Run(const std::shared_ptr<Call>& call) {
@@ -94,6 +95,7 @@ class CallTest : public testing::Test {
   const Route echo_{{"Api", 1, "echo", Echo}, &descriptor_, {}};
   const Route hold_{{"Api", 1, "hold", Hold}, &descriptor_, {}};
   bool gone_ = false;
+  CallMetrics metrics_;
   std::vector<AuditRecord> audited_;
   const AuditSink audit_ = [this](const AuditRecord& record) { audited_.push_back(record); };
   WorkerPool pool_{OneOfALane()};
@@ -145,9 +147,9 @@ TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {
 }
 
 TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
-  const auto call =
-      std::make_shared<Call>(Call::Request{echo_, std::make_shared<Caller>(), "unix", {}},
-                             std::make_unique<FailingBody>(), Call::Environment{pool_, audit_, std::chrono::hours(1)});
+  const auto call = std::make_shared<Call>(Call::Request{echo_, std::make_shared<Caller>(), "unix", {}},
+                                           std::make_unique<FailingBody>(),
+                                           Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)});
   EXPECT_EQ(Run(call).get().status, 500);
 }
 
@@ -157,8 +159,9 @@ TEST_F(CallTest, ThatMayChangeSomethingIsRecordedBeforeItsAnswer) {
   caller.name = "alice";
   Call::Request request{echo_, std::make_shared<Caller>(caller), "unix", {}};
   std::make_shared<Call>(std::move(request), std::make_unique<TracedBody>(&gone_),
-                         Call::Environment{pool_, audit_, std::chrono::hours(1)})
+                         Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)})
       ->Run([&](const Response& /*response*/) { records_at_answer.set_value(audited_.size()); });
+  pool_.Wake();
   ASSERT_EQ(records_at_answer.get_future().get(), 1U);
   EXPECT_EQ(audited_[0].caller, "alice");
   EXPECT_EQ(audited_[0].origin, "unix");
@@ -193,8 +196,9 @@ TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
   auto body = std::make_unique<FixedBody>();
   body->parameters["password"] = "secret";
   body->parameters["name"] = "alice";
-  const auto call = std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}},
-                                           std::move(body), Call::Environment{pool_, audit_, std::chrono::hours(1)});
+  const auto call =
+      std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}}, std::move(body),
+                             Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)});
   EXPECT_NE(Run(call).get().body.find("secret"), std::string::npos) << "the method has the secret";
   ASSERT_EQ(audited_.size(), 1U);
   EXPECT_EQ(audited_[0].parameters, R"json({"name":"alice","password":"(left out)"})json");

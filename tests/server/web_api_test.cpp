@@ -61,12 +61,23 @@ class WebApiTest : public testing::Test {
   std::string error_;
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
   const OwnNames names_{{"nas.example"}};
+  CallMetrics metrics_;
+  const std::vector<MetricsSource> figures_;
   const AuditSink audit_ = [](const AuditRecord& /*record*/) {};
   TokenStore tokens_{sandbox_.File("tokens.json")};
   Sessions sessions_{Sessions::Limits{}};
   PasswordChecker passwords_{{"/bin/false"}, PasswordChecker::Limits{}};
   const Authenticator authenticator_{tokens_, sessions_, {}};
-  WebApi api_{{routes_, *uploads_, workers_, memory_, names_, audit_, authenticator_, {sessions_, passwords_}}};
+  WebApi api_{{routes_,
+               *uploads_,
+               workers_,
+               memory_,
+               names_,
+               audit_,
+               metrics_,
+               figures_,
+               authenticator_,
+               {sessions_, passwords_}}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {

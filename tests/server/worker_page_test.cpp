@@ -1,13 +1,16 @@
-#include "probe.h"
+#include "worker_page.h"
 
 #include <gtest/gtest.h>
 
 #include <future>
 
+#include "answer.h"
 #include "sandbox.h"
 
 namespace vorn::server {
 namespace {
+
+Response MakePage() { return Success(Json::Value()); }
 
 // A job that occupies the pool's only thread until `end` is ready.
 class Blocker : public Job {
@@ -21,13 +24,13 @@ class Blocker : public Job {
   const std::shared_future<void> end_;
 };
 
-int StatusOf(WorkerPool& pool, std::chrono::milliseconds time) {
+int StatusOf(WorkerPool& pool, std::chrono::milliseconds time, const std::function<Response()>& make = MakePage) {
   std::promise<int> status;
-  std::make_shared<Probe>(pool, time)->Run([&](const Response& answer) { status.set_value(answer.status); });
+  std::make_shared<WorkerPage>(pool, time, make)->Run([&](const Response& answer) { status.set_value(answer.status); });
   return status.get_future().get();
 }
 
-TEST(Probe, TellsWhetherAWorkerIsFreeInTime) {
+TEST(WorkerPage, IsMadeIfAWorkerIsFreeInTime) {
   WorkerPool::Limits limits;
   limits.threads = 1;
   WorkerPool pool(limits);
@@ -39,6 +42,11 @@ TEST(Probe, TellsWhetherAWorkerIsFreeInTime) {
   EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 200);
   pool.Close();
   EXPECT_EQ(StatusOf(pool, std::chrono::hours(1)), 503);
+}
+
+TEST(WorkerPage, ThatCannotBeMadeForLackOfMemoryIsAnswered503) {
+  WorkerPool pool{WorkerPool::Limits{}};
+  EXPECT_EQ(StatusOf(pool, std::chrono::hours(1), []() -> Response { throw std::bad_alloc(); }), 503);
 }
 
 }  // namespace

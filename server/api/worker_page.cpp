@@ -1,4 +1,4 @@
-#include "probe.h"
+#include "worker_page.h"
 
 #include <utility>
 
@@ -22,7 +22,7 @@ Response Unready(const char* text) noexcept {
 
 }  // namespace
 
-void Probe::Run(Answer answer) {
+void WorkerPage::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
     if (pool_.Submit({&kLane, JobSize::kSmall}, shared_from_this(), time_)) return;
@@ -31,16 +31,16 @@ void Probe::Run(Answer answer) {
   Refuse();
 }
 
-void Probe::Work() {
+void WorkerPage::Work() {
   try {
-    answer_.Give(Success(Json::Value()));
+    answer_.Give(make_());
   } catch (const std::bad_alloc&) {
     Refuse();
   }
 }
 
-void Probe::Expire(bool /*running*/) { answer_.Give(Unready("No worker was free in time.")); }
+void WorkerPage::Expire(bool /*running*/) { answer_.Give(Unready("No worker was free in time.")); }
 
-void Probe::Refuse() { answer_.Give(Unready("The server takes no calls.")); }
+void WorkerPage::Refuse() { answer_.Give(Unready("The server takes no calls.")); }
 
 }  // namespace vorn::server

@@ -181,7 +181,6 @@ int Serve(const Options& options) {
   AddServerMethods(tokens, sessions, &routes);
   Budget memory(kMemory, kMemory);
   Budget bodies(kBodies, kBodiesOfPeer);
-  Workers workers;
   const OwnNames names(options.host_names);
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
   AccessLog log(StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO));
@@ -189,7 +188,8 @@ int Serve(const Options& options) {
   const std::vector<MetricsSource> figures = {[&] {
                                                 return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
                                               },
-                                              [&] { return QueueMetrics(workers); }, ProcessMetrics, VORN::ReadMetrics};
+                                              ProcessMetrics, VORN::ReadMetrics};
+  Workers workers;  // after everything that a running call uses: its destructor waits for them
   WebApi api({routes, *uploads, workers, memory, names, audit, metrics, figures, authenticator, {sessions, passwords}});
   const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});

@@ -61,7 +61,7 @@ def sign_out(user):
     pathlib.Path(f"/tmp/krb5cc_{user.uid}").unlink(missing_ok=True)
 
 
-# As the service manager of a client runs it: it is started again when it ends.
+# The service manager of a client starts rpc.gssd again when it ends, and so does this.
 _GSSD = 'while :; do rpc.gssd -f -p "$1" -k "$2" & echo $! >"$3"; wait; done'
 
 

@@ -70,6 +70,21 @@ double ResidentBytes() {
   return resident * static_cast<double>(sysconf(_SC_PAGESIZE));
 }
 
+// The calls that wait for a thread, and those that run.
+std::vector<VORN::Metric> QueueMetrics(const Workers& workers) {
+  const WorkerPool::Load reading = workers.reading.load();
+  const WorkerPool::Load changing = workers.changing.load();
+  constexpr char kWaiting[] = "Calls that wait for a thread";
+  constexpr char kRunning[] = "Calls that run";
+  const auto gauge = [](const char* name, const char* help, const char* kind, std::size_t value) {
+    return VORN::Metric{name, help, Kind::kGauge, {{"kind", kind}}, static_cast<double>(value)};
+  };
+  return {gauge("vorn_calls_waiting", kWaiting, "reading", reading.waiting),
+          gauge("vorn_calls_waiting", kWaiting, "changing", changing.waiting),
+          gauge("vorn_calls_running", kRunning, "reading", reading.running),
+          gauge("vorn_calls_running", kRunning, "changing", changing.running)};
+}
+
 }  // namespace
 
 CallMetrics::CallMetrics()
@@ -119,8 +134,9 @@ void CallMetrics::AddDuration(const Route& route, std::chrono::microseconds dura
   }
 }
 
-std::string WriteMetrics(const CallMetrics& calls, const std::vector<MetricsSource>& sources) {
+std::string WriteMetrics(const CallMetrics& calls, const Workers& workers, const std::vector<MetricsSource>& sources) {
   std::vector<prometheus::MetricFamily> families = calls.Collect();
+  Append(QueueMetrics(workers), &families);
   for (const MetricsSource& read : sources) Append(read(), &families);
   std::ostringstream text;
   prometheus::TextSerializer().Serialize(text, families);
@@ -151,20 +167,6 @@ std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& 
                        static_cast<double>(budget.used())});
   }
   return metrics;
-}
-
-std::vector<VORN::Metric> QueueMetrics(const Workers& workers) {
-  const WorkerPool::Load reading = workers.reading.load();
-  const WorkerPool::Load changing = workers.changing.load();
-  constexpr char kWaiting[] = "Calls that wait for a thread";
-  constexpr char kRunning[] = "Calls that run";
-  const auto gauge = [](const char* name, const char* help, const char* kind, std::size_t value) {
-    return VORN::Metric{name, help, Kind::kGauge, {{"kind", kind}}, static_cast<double>(value)};
-  };
-  return {gauge("vorn_calls_waiting", kWaiting, "reading", reading.waiting),
-          gauge("vorn_calls_waiting", kWaiting, "changing", changing.waiting),
-          gauge("vorn_calls_running", kRunning, "reading", reading.running),
-          gauge("vorn_calls_running", kRunning, "changing", changing.running)};
 }
 
 std::vector<VORN::Metric> ProcessMetrics() {

@@ -58,15 +58,12 @@ class CallMetrics {
 // Reads some figures. Those of one name are adjacent. Thread-safe.
 using MetricsSource = std::function<std::vector<VORN::Metric>()>;
 
-// Returns the text of the page: the figures of the calls, then those of each source.
-std::string WriteMetrics(const CallMetrics& calls, const std::vector<MetricsSource>& sources);
+// Returns the text of the page: the figures of the calls and of the workers, then those of each source.
+std::string WriteMetrics(const CallMetrics& calls, const Workers& workers, const std::vector<MetricsSource>& sources);
 
 // The figures of the transport: answers by status, and the memory of these budgets.
 using NamedBudgets = std::vector<std::pair<std::string, const Budget&>>;
 std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& budgets);
-
-// The calls that wait for a worker, and those that run.
-std::vector<VORN::Metric> QueueMetrics(const Workers& workers);
 
 // The CPU time, memory and descriptors of this process, under the names that all exporters use.
 std::vector<VORN::Metric> ProcessMetrics();

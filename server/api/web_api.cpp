@@ -231,11 +231,13 @@ WebApi::Begun WebApi::Ready() const {
 }
 
 WebApi::Begun WebApi::Metrics() const {
-  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.call, [this] {
-    Response response{200, WriteMetrics(parts_.metrics, parts_.figures)};
+  // The page may be made when this object is gone; the parts live longer than the workers.
+  const auto make = [&calls = parts_.metrics, &workers = parts_.workers, &figures = parts_.figures] {
+    Response response{200, WriteMetrics(calls, workers, figures)};
     response.content_type = "text/plain; version=0.0.4; charset=utf-8";
     return response;
-  });
+  };
+  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.call, make);
 }
 
 }  // namespace vorn::server

@@ -138,7 +138,7 @@ class WorkerPool {
 
 // The methods that only read have threads of their own, which those that change something cannot take from them.
 struct Workers {
-  explicit Workers(WorkerPool::Limits limits = {}) : reading(limits), changing(limits) {}
+  explicit Workers(WorkerPool::Limits limits = {}) : changing(limits), reading(limits) {}
 
   void Wake() {
     reading.Wake();
@@ -150,8 +150,8 @@ struct Workers {
     changing.Close();
   }
 
-  WorkerPool reading;
   WorkerPool changing;
+  WorkerPool reading;  // destroyed first: a call that reads may ask for the load of both
 };
 
 }  // namespace vorn::server

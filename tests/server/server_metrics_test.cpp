@@ -20,7 +20,7 @@ TEST(Metrics, CountAnswersByMethodAndCode) {
   calls.CountAnswer(kGet, 0);
   calls.CountAnswer(kGet, 0);
   calls.CountAnswer(kSet, 2301);
-  const std::string text = WriteMetrics(calls, {});
+  const std::string text = WriteMetrics(calls, Workers(), {});
   EXPECT_THAT(text, HasSubstr("vorn_calls_total{api=\"Nfs\",code=\"0\",method=\"get\",version=\"1\"} 2\n"));
   EXPECT_THAT(text, HasSubstr("vorn_calls_total{api=\"Nfs\",code=\"2301\",method=\"set\",version=\"1\"} 1\n"));
 }
@@ -29,7 +29,7 @@ TEST(Metrics, HaveAHistogramOfDurations) {
   CallMetrics calls;
   calls.AddDuration(kGet, std::chrono::milliseconds(1));
   calls.AddDuration(kGet, std::chrono::seconds(2));
-  const std::string text = WriteMetrics(calls, {});
+  const std::string text = WriteMetrics(calls, Workers(), {});
   EXPECT_THAT(text, HasSubstr("vorn_call_duration_seconds_count{api=\"Nfs\",method=\"get\",version=\"1\"} 2\n"));
   EXPECT_THAT(text, HasSubstr("le=\"0.002\"} 1\n"));
   EXPECT_THAT(text, HasSubstr("le=\"5\"} 2\n"));
@@ -43,10 +43,14 @@ TEST(Metrics, OfSourcesHaveOneFamilyForEachName) {
         {"threads", "Threads", VORN::Metric::Kind::kGauge, {}, 9},
     };
   };
-  EXPECT_EQ(WriteMetrics(CallMetrics(), {source}),
-            "# HELP bytes_total Bytes\n# TYPE bytes_total counter\n"
-            "bytes_total{direction=\"read\"} 7\nbytes_total{direction=\"written\"} 8\n"
-            "# HELP threads Threads\n# TYPE threads gauge\nthreads 9\n");
+  EXPECT_THAT(WriteMetrics(CallMetrics(), Workers(), {source}),
+              testing::EndsWith("# HELP bytes_total Bytes\n# TYPE bytes_total counter\n"
+                                "bytes_total{direction=\"read\"} 7\nbytes_total{direction=\"written\"} 8\n"
+                                "# HELP threads Threads\n# TYPE threads gauge\nthreads 9\n"));
+}
+
+TEST(Metrics, OfTheWorkersCountTheCalls) {
+  EXPECT_THAT(WriteMetrics(CallMetrics(), Workers(), {}), HasSubstr("vorn_calls_waiting{kind=\"changing\"} 0\n"));
 }
 
 TEST(Metrics, OfTheProcessArePositive) {
@@ -62,7 +66,9 @@ TEST(Metrics, OfTheTransportCountStatusesAndBudgets) {
   }
   Budget budget(100, 100);
   const auto charge = budget.Take("", 30);
-  const std::string text = WriteMetrics(CallMetrics(), {[&] { return HttpMetrics(log, {{"bodies", budget}}); }});
+  const std::string text = WriteMetrics(CallMetrics(), Workers(), {[&] {
+                                          return HttpMetrics(log, {{"bodies", budget}});
+                                        }});
   EXPECT_THAT(text, HasSubstr("vorn_http_responses_total{status=\"200\"} 2\n"));
   EXPECT_THAT(text, HasSubstr("vorn_http_responses_total{status=\"503\"} 1\n"));
   EXPECT_THAT(text, HasSubstr("vorn_budget_bytes{budget=\"bodies\"} 100\n"));

@@ -141,8 +141,9 @@ class Run(TestCase):
         stand_in = self.stand_in()
         result = stand_in.run(project / "scripts/run", PORT="0")
         self.assertEqual(result.returncode, 0, result.stderr)
-        self.assertIn("too long for a Unix socket", result.stderr)
-        self.assertNotIn("unix:", stand_in.record("arguments"))
+        path = re.search(r"unix:(\S+)", stand_in.record("arguments")).group(1)
+        self.assertLessEqual(len(path), 107)
+        self.addCleanup(shutil.rmtree, pathlib.Path(path).parent)
 
     def test_listens_on_a_socket_where_its_path_fits(self):
         project = self.copy_project(self.folder / "p")

@@ -2,7 +2,9 @@
 
 import http.client
 import json
+import os
 import pathlib
+import re
 import shutil
 import socket
 import subprocess
@@ -10,7 +12,7 @@ import tempfile
 import time
 
 PROJECT = pathlib.Path(__file__).resolve().parent.parent
-VORND = PROJECT / "build/release/bin/vornd"
+VORND = os.environ.get("VORND", PROJECT / "build/release/bin/vornd")
 PATIENCE = 60  # seconds until vornd serves, and until it has ended
 BOUNDARY = "trial-server-boundary"
 
@@ -41,7 +43,8 @@ class TrialServer:
         self.socket = self.folder / "socket"
         with open(self.folder / "log", "wb") as log:
             self._process = subprocess.Popen(  # pylint: disable=consider-using-with
-                [VORND, "--root", self.root, "--listen", f"unix:{self.socket}"], stdout=log, stderr=log)
+                [VORND, "--root", self.root, "--listen", f"unix:{self.socket}", "--listen", "127.0.0.1:0"],
+                stdout=log, stderr=log)
         try:
             self._await()
         except RuntimeError:
@@ -63,6 +66,10 @@ class TrialServer:
                 if self._process.poll() is not None or time.monotonic() > limit:
                     raise RuntimeError(f"vornd does not serve: {self.log()}") from failure
                 time.sleep(0.05)
+
+    def address(self):
+        """Address and port of the TCP listener."""
+        return re.search(r"Listening at (127\.0\.0\.1:\d+)", self.log()).group(1)
 
     def log(self):
         return (self.folder / "log").read_text("utf-8", "replace")

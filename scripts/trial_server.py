@@ -43,7 +43,8 @@ class TrialServer:
         self.socket = self.folder / "socket"
         with open(self.folder / "log", "wb") as log:
             self._process = subprocess.Popen(  # pylint: disable=consider-using-with
-                [VORND, "--root", self.root, "--listen", f"unix:{self.socket}", "--listen", "127.0.0.1:0"],
+                [VORND, "--root", self.root, "--listen", f"unix:{self.socket}", "--listen", "127.0.0.1:0",
+                 "--sign-in-link"],
                 stdout=log, stderr=log)
         try:
             self._await()
@@ -73,6 +74,10 @@ class TrialServer:
 
     def log(self):
         return (self.folder / "log").read_text("utf-8", "replace")
+
+    def sign_in_code(self):
+        """The code that vornd has printed, which signs in once."""
+        return re.search("#code=(vornc_[0-9a-f]+)", self.log()).group(1)
 
     def request(self, method, path, body=None, content_type="application/json"):
         """The status, the content type and the body of the answer."""

@@ -168,7 +168,10 @@ Descriptor::Method Descriptor::MethodAt(const std::string& path) const {
 }
 
 const Json::Value* Descriptor::ParameterSchema(const std::string& path) const {
-  return Find(document_, {"paths", path, "post", "requestBody", "content", "application/json", "schema"});
+  const Json::Value* schema =
+      Find(document_, {"paths", path, "post", "requestBody", "content", "application/json", "schema"});
+  while (schema != nullptr && schema->isMember("$ref")) schema = schemas_.Target((*schema)["$ref"]);
+  return schema;
 }
 
 Json::Value Descriptor::WithoutSecrets(const std::string& path, Json::Value parameters) const {

@@ -76,7 +76,7 @@ class Descriptor {
   const Json::Value& document() const { return document_; }
 
  private:
-  // The schema of the parameters as JSON, or nullptr.
+  // The schema of the parameters as JSON, not a reference to it; nullptr if there is none.
   const Json::Value* ParameterSchema(const std::string& path) const;
 
   bool ReadErrorCodes(const Json::Value& codes, std::string* error);

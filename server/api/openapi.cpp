@@ -4,11 +4,13 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
 #include "json_input.h"
 #include "resources.h"
+#include "server_methods.h"
 
 namespace vorn::server {
 namespace {
@@ -42,10 +44,10 @@ Json::Value Envelope(bool success, const char* member, const Json::Value& schema
 }
 
 // Adds the envelope to the description of a method's result.
-void WrapResult(bool reads_only, Json::Value* operation) {
+void WrapResult(bool has_tag, Json::Value* operation) {
   Json::Value& response = (*operation)["responses"]["200"];
   if (!response.isMember("description")) response["description"] = "The method succeeded.";
-  if (reads_only) response["headers"]["ETag"] = Reference("headers/ETag");
+  if (has_tag) response["headers"]["ETag"] = Reference("headers/ETag");
   Json::Value& content = response["content"][kJson];
   const Json::Value schema = content.get("schema", Json::objectValue);
   content["schema"] = Envelope(true, "data", schema);
@@ -75,8 +77,9 @@ Json::Value FailureResponse(const std::vector<Code>& codes) {
   error["properties"]["text"] = Reference("schemas/ErrorText");
   error["properties"]["reasons"] = Reference("schemas/Reasons");
   std::string description;
+  std::set<int> numbers;  // a method of the server may describe a status that all methods answer
   for (const Code& code : codes) {
-    error["properties"]["code"]["enum"].append(code.code);
+    if (numbers.insert(code.code).second) error["properties"]["code"]["enum"].append(code.code);
     if (!code.details.isNull()) error["properties"]["details"] = code.details;
     description += (description.empty() ? "" : " ") + std::to_string(code.code) + ": " + code.when;
   }
@@ -96,14 +99,15 @@ class Document {
  public:
   Document() : document_(Base()), responses_(document_["components"]["responses"]) {}
 
-  void Add(const Module& module, const Routes& routes) {
-    const Json::Value& described = module.descriptor.document();
-    if (described.isNull() || !AddSchemas(module.path, described["components"]["schemas"])) return;
+  // Adds the methods of a descriptor; `name` is for the log.
+  void Add(const std::string& name, const Descriptor& descriptor, const Routes& routes) {
+    const Json::Value& described = descriptor.document();
+    if (described.isNull() || !AddSchemas(name, described["components"]["schemas"])) return;
     for (const Json::Value& tag : described["tags"]) document_["tags"].append(tag);
-    for (const std::string& path : module.descriptor.Paths()) {
+    for (const std::string& path : descriptor.Paths()) {
       std::string unknown;
       const Route* route = routes.Find(path, &unknown);
-      if (route == nullptr || route->descriptor != &module.descriptor) continue;
+      if (route == nullptr || route->descriptor != &descriptor) continue;
       document_["paths"][path]["post"] = Operation(described["paths"][path]["post"], *route);
     }
   }
@@ -111,12 +115,13 @@ class Document {
   const Json::Value& value() const { return document_; }
 
  private:
-  // Adds all schemas of a module, or none.
-  bool AddSchemas(const std::string& module, const Json::Value& schemas) {
+  // Adds all schemas of a descriptor, or none.
+  bool AddSchemas(const std::string& descriptor, const Json::Value& schemas) {
     Json::Value& all = document_["components"]["schemas"];
     for (const std::string& name : schemas.getMemberNames()) {
       if (!all.isMember(name) || all[name] == schemas[name]) continue;
-      syslog(LOG_ERR, "%s: left out of /openapi.json: there is another schema \"%s\"", module.c_str(), name.c_str());
+      syslog(LOG_ERR, "%s: left out of /openapi.json: there is another schema \"%s\"", descriptor.c_str(),
+             name.c_str());
       return false;
     }
     for (const std::string& name : schemas.getMemberNames()) all[name] = schemas[name];
@@ -126,7 +131,7 @@ class Document {
   Json::Value Operation(Json::Value operation, const Route& route) const {
     operation["operationId"] = route.Id();
     if (route.shown_by != nullptr) operation["parameters"].append(Reference("parameters/IfMatch"));
-    WrapResult(route.method.reads_only, &operation);
+    WrapResult(route.method.reads_only && !route.own, &operation);
     AddFailures(route, &operation);
     return operation;
   }
@@ -162,7 +167,8 @@ class Document {
 
 Json::Value OpenApiDocument(const Routes& routes) {
   Document document;
-  for (const Module& module : routes.modules()) document.Add(module, routes);
+  document.Add("VORN.Server.json", ServerDescriptor(), routes);
+  for (const Module& module : routes.modules()) document.Add(module.path, module.descriptor, routes);
   return document.value();
 }
 

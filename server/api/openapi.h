@@ -1,4 +1,5 @@
-// The OpenAPI 3.1 document of the server: openapi.json of this folder, and the descriptors of the modules.
+// The OpenAPI 3.1 document of the server: openapi.json of this folder, and the descriptors of
+// the server's own methods and of the modules.
 #ifndef VORN_SERVER_OPENAPI_H
 #define VORN_SERVER_OPENAPI_H
 

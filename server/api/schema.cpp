@@ -285,6 +285,8 @@ class Comparison {
 
 Schemas::Schemas(Json::Value named) : named_(std::move(named)) {}
 
+const Json::Value* Schemas::Target(const Json::Value& reference) const { return server::Target(named_, reference); }
+
 bool Schemas::Support(const Json::Value& schema, std::string* error) const {
   return SupportCheck(named_, error).Check(schema, 0);
 }

@@ -34,6 +34,9 @@ class Schemas {
   // and an empty list if all match; no more than kMostFaults. The schema must be supported.
   std::vector<std::string> Faults(const Json::Value& parameters, const Json::Value& schema) const;
 
+  // Returns the schema that the value of a "$ref" names; nullptr if there is none of that name.
+  const Json::Value* Target(const Json::Value& reference) const;
+
   const Json::Value& named() const { return named_; }
 
  private:

@@ -7,6 +7,7 @@
 #include <initializer_list>
 #include <optional>
 #include <set>
+#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -15,6 +16,7 @@
 #include "answer.h"
 #include "authenticator.h"
 #include "log_quote.h"
+#include "resources.h"
 
 namespace vorn::server {
 namespace {
@@ -24,8 +26,6 @@ constexpr const char* kSessionApi = "VORN.Server.Session";
 constexpr std::size_t kMaxNameBytes = 64;
 constexpr std::size_t kMaxListItems = 100;
 constexpr std::size_t kMaxItemBytes = 255;
-
-const Descriptor kNoDescriptor;
 
 // Parameters that are not accepted; the text is a sentence for the caller.
 struct Rejected {
@@ -245,13 +245,28 @@ ServerMethod Checked(ServerMethod method) {
 
 enum class Access { kReaders, kAdministrators };
 
-Route Row(const char* api, const char* name, bool reads_only, Access access, ServerMethod method) {
-  Descriptor::Method description;
-  description.reads_only = reads_only;
-  return {{api, 1, name, nullptr}, &kNoDescriptor, description, access == Access::kReaders, Checked(std::move(method))};
+Route Row(const char* api, const char* name, Access access, ServerMethod method) {
+  Route route{{api, 1, name, nullptr}, &ServerDescriptor(), {}, access == Access::kReaders, Checked(std::move(method))};
+  route.method = route.descriptor->MethodAt("/api/" + route.Id());
+  return route;
+}
+
+// Never called, because WebApi passes each call of this path to a SignInCall.
+Response SignIn(const Json::Value& /*parameters*/, const Caller& /*caller*/) {
+  throw std::logic_error("a sign-in was passed to a worker");
 }
 
 }  // namespace
+
+const Descriptor& ServerDescriptor() {
+  static const Descriptor descriptor = [] {
+    std::string error;
+    std::optional<Descriptor> parsed = Descriptor::Parse(kServerDescriptor, &error);
+    if (!parsed) syslog(LOG_ERR, "VORN.Server.json: %s", error.c_str());
+    return parsed.value_or(Descriptor());
+  }();
+  return descriptor;
+}
 
 void AddServerMethods(TokenStore& tokens, Sessions& sessions, Routes* routes) {
   std::set<std::string> apis;
@@ -259,18 +274,19 @@ void AddServerMethods(TokenStore& tokens, Sessions& sessions, Routes* routes) {
   using Values = Json::Value;
   const TokenMethods token(tokens, std::move(apis));
   const SessionMethods session(sessions);
-  routes->Add(Row(kTokenApi, "create", false, Access::kAdministrators,
+  routes->Add(Row(kTokenApi, "create", Access::kAdministrators,
                   [token](const Values& values, const Caller& caller) { return token.Create(values, caller); }));
-  routes->Add(Row(kTokenApi, "list", true, Access::kAdministrators,
+  routes->Add(Row(kTokenApi, "list", Access::kAdministrators,
                   [token](const Values& values, const Caller& /*caller*/) { return token.List(values); }));
-  routes->Add(Row(kTokenApi, "revoke", false, Access::kAdministrators,
+  routes->Add(Row(kTokenApi, "revoke", Access::kAdministrators,
                   [token](const Values& values, const Caller& caller) { return token.Revoke(values, caller); }));
-  routes->Add(Row(kSessionApi, "get", true, Access::kReaders, SessionMethods::Get));
-  routes->Add(Row(kSessionApi, "sign_out", false, Access::kReaders,
+  routes->Add(Row(kSessionApi, "sign_in", Access::kReaders, SignIn));
+  routes->Add(Row(kSessionApi, "get", Access::kReaders, SessionMethods::Get));
+  routes->Add(Row(kSessionApi, "sign_out", Access::kReaders,
                   [session](const Values& values, const Caller& caller) { return session.SignOut(values, caller); }));
-  routes->Add(Row(kSessionApi, "list", true, Access::kAdministrators,
+  routes->Add(Row(kSessionApi, "list", Access::kAdministrators,
                   [session](const Values& values, const Caller& /*caller*/) { return session.List(values); }));
-  routes->Add(Row(kSessionApi, "end", false, Access::kAdministrators,
+  routes->Add(Row(kSessionApi, "end", Access::kAdministrators,
                   [session](const Values& values, const Caller& caller) { return session.End(values, caller); }));
 }
 

@@ -1,4 +1,4 @@
-// client.ts SOCKET: calls all methods of a vornd on a trial root with a client whose types come from its OpenAPI document.
+// client.ts SOCKET CODE: calls all methods of a vornd on a trial root with a client whose types come from its OpenAPI document.
 // The compiler checks the types of all parameters and answers; each "@ts-expect-error" is a request or a use of an answer
 // that must not compile.
 import assert from 'node:assert/strict';
@@ -6,7 +6,7 @@ import { request } from 'node:http';
 import createClient from 'openapi-fetch';
 import type { paths } from './schema.js';
 
-const socketPath = process.argv[2];
+const [socketPath, code] = process.argv.slice(2); // the code signs in once
 const called = new Set<string>();
 
 // The function fetch() over the Unix socket, as the caller root or the server's own user.
@@ -164,6 +164,49 @@ async function revisions() {
   assert.equal((await change(false)).response.status, 412);
 }
 
+function bearer(token: string) {
+  return { headers: { authorization: `Bearer ${token}` } };
+}
+
+async function sessions() {
+  assert.ok(code);
+  const signedIn = dataOf(await client.POST('/api/VORN.Server.Session/v1/sign_in', { body: { code } }));
+  assert.ok(signedIn.token); // absent behind TLS
+  const session = bearer(signedIn.token);
+  const caller = dataOf(await client.POST('/api/VORN.Server.Session/v1/get', { body: {}, ...session }));
+  const role: 'reader' | 'administrator' = caller.role;
+  assert.equal(role, 'administrator');
+  const list = dataOf(await client.POST('/api/VORN.Server.Session/v1/list', { body: {} }));
+  assert.deepEqual(list.map(({ id }) => id), [caller.session]);
+  expectDone(await client.POST('/api/VORN.Server.Session/v1/sign_out', { body: {}, ...session }));
+  assert.equal((await client.POST('/api/VORN.Server.Session/v1/get', { body: {}, ...session })).response.status, 401);
+  const ended = await client.POST('/api/VORN.Server.Session/v1/end', { body: { id: String(caller.session) } });
+  assert.equal(ended.error?.error.code, 404);
+  // @ts-expect-error: the code is a string
+  const refused = await client.POST('/api/VORN.Server.Session/v1/sign_in', { body: { code: 1 } });
+  assert.equal(refused.response.status, 400);
+}
+
+async function tokens() {
+  const body = { name: 'typed', role: 'reader' as const, apis: ['VORN.Core.FileServ.NFS'] };
+  const created = dataOf(await client.POST('/api/VORN.Server.Token/v1/create', { body }));
+  const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {}, ...bearer(created.token) });
+  assert.equal(get.response.status, 200);
+  const listed = dataOf(await client.POST('/api/VORN.Server.Token/v1/list', { body: {} })).find(
+    ({ id }) => id === created.id,
+  );
+  assert.equal(listed?.expires, null);
+  // @ts-expect-error: the list has no secrets
+  assert.equal(listed?.token, undefined);
+  const again = await client.POST('/api/VORN.Server.Token/v1/create', { body });
+  assert.equal(again.error?.error.code, 409);
+  // @ts-expect-error: "root" is not a role
+  await client.POST('/api/VORN.Server.Token/v1/create', { body: { name: 'other', role: 'root' } });
+  expectDone(await client.POST('/api/VORN.Server.Token/v1/revoke', { body: { id: created.id } }));
+  const revoked = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {}, ...bearer(created.token) });
+  assert.equal(revoked.response.status, 401);
+}
+
 async function allPathsWereCalled() {
   const { data } = await client.GET('/openapi.json');
   assert.ok(data);
@@ -174,7 +217,7 @@ async function allPathsWereCalled() {
     [],
     'these methods were not called',
   );
-  assert.ok(all.length >= 15);
+  assert.ok(all.length >= 23);
   console.log(`client: ${String(all.length)} methods called`);
 }
 
@@ -185,4 +228,6 @@ await kerberos();
 await idMap();
 await sharePrivilege();
 await revisions();
+await sessions();
+await tokens();
 await allPathsWereCalled();

@@ -11,6 +11,8 @@
 
 #include "resources.h"
 #include "sandbox.h"
+#include "server_methods.h"
+#include "sign_in_call.h"
 
 namespace vorn::server {
 namespace {
@@ -110,6 +112,77 @@ TEST(OpenApi, LeavesOutAModuleWithASchemaOfTheSameName) {
   }
 }
 
+class OwnMethods : public testing::Test {
+ protected:
+  OwnMethods() { AddServerMethods(tokens_, sessions_, &routes_); }
+
+  const Sandbox sandbox_;
+  const std::vector<Module> none_;
+  TokenStore tokens_{sandbox_.File("tokens.json")};
+  Sessions sessions_{Sessions::Limits{}};
+  Routes routes_{none_};
+};
+
+TEST_F(OwnMethods, AreAllDescribed) {
+  const Json::Value document = OpenApiDocument(routes_);
+  EXPECT_EQ(routes_.List().size(), 8U);
+  EXPECT_EQ(ServerDescriptor().Paths().size(), 8U);
+  for (const Json::Value& row : routes_.List()) {
+    const std::string path = "/api/" + row["api"].asString() + "/v1/" + row["method"].asString();
+    EXPECT_TRUE(document["paths"][path].isMember("post")) << path;
+  }
+}
+
+// The reading methods of administrators are not for readers, so the descriptor alone does not say who may call.
+TEST_F(OwnMethods, TellWhetherTheyOnlyRead) {
+  std::string unknown;
+  for (const char* path : {"Session/v1/get", "Session/v1/list", "Token/v1/list"}) {
+    EXPECT_TRUE(routes_.Find(std::string("/api/VORN.Server.") + path, &unknown)->method.reads_only) << path;
+  }
+  for (const char* path : {"Session/v1/sign_out", "Session/v1/end", "Token/v1/create", "Token/v1/revoke"}) {
+    EXPECT_FALSE(routes_.Find(std::string("/api/VORN.Server.") + path, &unknown)->method.reads_only) << path;
+  }
+}
+
+TEST_F(OwnMethods, NeedCredentialsExceptToSignIn) {
+  const Json::Value document = OpenApiDocument(routes_);
+  EXPECT_EQ(document["security"].size(), 2U);
+  std::set<std::string> open;
+  for (const std::string& path : document["paths"].getMemberNames()) {
+    for (const Json::Value& operation : document["paths"][path]) {
+      if (!operation.isMember("security")) continue;
+      EXPECT_EQ(operation["security"], Json::Value(Json::arrayValue)) << path;
+      open.insert(path);
+    }
+  }
+  EXPECT_THAT(open, ElementsAre("/api/VORN.Server.Session/v1/sign_in", "/docs", "/healthz", "/healthz/live",
+                                "/healthz/ready", "/openapi.json"));
+}
+
+TEST_F(OwnMethods, HideTheirSecretsFromTheLog) {
+  Json::Value parameters;
+  for (const char* name : {"account", "password", "code"}) parameters[name] = name;
+  const Json::Value shown = ServerDescriptor().WithoutSecrets(std::string(kSignInPath), parameters);
+  EXPECT_EQ(shown["account"], "account");
+  EXPECT_EQ(shown["password"], "(left out)");
+  EXPECT_EQ(shown["code"], "(left out)");
+}
+
+// A status that the server also answers to all methods is listed once.
+TEST_F(OwnMethods, HaveEachErrorCodeOnce) {
+  const Json::Value document = OpenApiDocument(routes_);
+  const Json::Value& responses = document["paths"][std::string(kSignInPath)]["post"]["responses"];
+  const Json::Value& code =
+      responses["400"]["content"]["application/json"]["schema"]["properties"]["error"]["properties"]["code"];
+  EXPECT_EQ(code["enum"].size(), 1U);
+  EXPECT_TRUE(responses.isMember("429"));
+  for (const std::string& number : ServerDescriptor().document()["x-error-codes"].getMemberNames()) {
+    const Json::Value& status = document["components"]["responses"]["Status" + number];
+    if (status.isNull()) continue;
+    EXPECT_EQ(ServerDescriptor().Describe(std::stoi(number)).text, status["description"].asString());
+  }
+}
+
 // Returns the statuses of the refusals in the sources of the server.
 std::set<std::string> StatusesOfSources() {
   const std::regex refusal(R"((?:Refusal|Refuse|Failure|Fail|fault|Fault)[({](\d{3})\b)");
@@ -133,15 +206,16 @@ TEST(OpenApi, HasEveryStatusThatTheServerAnswers) {
 }
 
 TEST(Docs, DescribeEveryMethodAndEveryCode) {
-  const std::vector<Module> modules{Describe("A", ReadWholeFile(NFS_DESCRIPTOR))};
-  const Json::Value& descriptor = modules[0].descriptor.document();
+  const Module module = Describe("A", ReadWholeFile(NFS_DESCRIPTOR));
   const std::string page(kDocsPage);
-  for (const std::string& path : modules[0].descriptor.Paths()) {
-    EXPECT_THAT(page, HasSubstr(">" + path.substr(std::string("/api/").size()) + "</h3>"));
-  }
-  for (const std::string& code : descriptor["x-error-codes"].getMemberNames()) {
-    EXPECT_THAT(page, HasSubstr("id=\"error-" + code + "\""));
-    EXPECT_THAT(page, HasSubstr("href=\"#error-" + code + "\""));
+  for (const Descriptor* descriptor : {&module.descriptor, &ServerDescriptor()}) {
+    for (const std::string& path : descriptor->Paths()) {
+      EXPECT_THAT(page, HasSubstr(">" + path.substr(std::string("/api/").size()) + "</h3>"));
+    }
+    for (const std::string& code : descriptor->document()["x-error-codes"].getMemberNames()) {
+      EXPECT_THAT(page, HasSubstr("id=\"error-" + code + "\""));
+      EXPECT_THAT(page, HasSubstr("href=\"#error-" + code + "\""));
+    }
   }
   EXPECT_EQ(page.find("<script"), std::string::npos);
   EXPECT_EQ(page.find("style="), std::string::npos);

@@ -4,13 +4,19 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
+#include <cstdlib>
 #include <ctime>
 #include <filesystem>
+#include <fstream>
 #include <memory>
 #include <regex>
 #include <utility>
+#include <vector>
 
+#include "answer.h"
+#include "json_input.h"
 #include "server_process.h"
 
 namespace vorn::server {
@@ -24,6 +30,24 @@ constexpr const char* kEcho = "/api/Test.Echo/v1/";
 constexpr const char* kSession = "/api/VORN.Server.Session/v1/";
 constexpr const char* kToken = "/api/VORN.Server.Token/v1/";
 constexpr const char* kSecureHost = "nas.example";  // of a proxy with TLS
+
+// Records the answer of a method of the server itself, as tests/support/recorded_answers.h says, so that it can be
+// compared with the descriptor after the tests. Returns the reply.
+Reply Recorded(const std::string& path, const std::string& json, Reply reply) {
+  const char* const folder = std::getenv("VORN_RECORD_ANSWERS");
+  if (folder == nullptr || path.rfind("/api/VORN.Server.", 0) != 0 || reply.status == 0) return reply;
+  static std::ofstream file(std::string(folder) + "/" + program_invocation_short_name + ".jsonl");
+  const Json::Value envelope = reply.Envelope();
+  std::string error;
+  Json::Value line;
+  line["method"] = path.substr(std::string("/api/").size());
+  line["request"] = ParseJsonObject(json, &error).value_or(Json::Value());
+  line["code"] = reply.status == 200 ? Json::Value(0) : envelope["error"]["code"];
+  line["data"] = reply.status == 200 ? envelope["data"] : envelope["error"]["details"];
+  line["kerberos"] = true;
+  file << WriteJson(line) << std::endl;
+  return reply;
+}
 
 class People : public testing::Test {
  protected:
@@ -57,7 +81,7 @@ class People : public testing::Test {
   Reply Call(Way way, const std::string& path, const std::string& json = "{}", const std::string& headers = "") const {
     Connection client = ConnectBy(way);
     client.Send(Post(path, json, headers));
-    return client.Receive();
+    return Recorded(path, json, client.Receive());
   }
 
   // A call of the local administrator.
@@ -93,7 +117,7 @@ class People : public testing::Test {
     Connection client = server_->ConnectTcp();
     client.Send("POST " + path + " HTTP/1.1\r\nHost: " + kSecureHost + "\r\nContent-Type: application/json\r\n" +
                 headers + "Content-Length: " + std::to_string(json.size()) + "\r\n\r\n" + json);
-    return client.Receive();
+    return Recorded(path, json, client.Receive());
   }
 
   Sandbox sandbox_;
@@ -316,6 +340,44 @@ TEST_F(People, SendWholeCredentials) {
   EXPECT_EQ(SignIn("alice", std::string(5000, 'x')).status, 413);
 }
 
+// Four attempts on an account from one address wait at the same time, after three that need not wait.
+TEST_F(People, WhoTryTooManyPasswordsAtOnceAreToldToTryLater) {
+  const std::string sign_in = std::string(kSession) + "sign_in";
+  std::vector<Connection> attempts;
+  for (int i = 0; i < 8; ++i) {
+    attempts.push_back(server_->ConnectTcp());
+    attempts.back().Send(Post(sign_in, Credentials("hang", "x")));
+  }
+  EXPECT_TRUE(Eventually([&] {
+    const Reply reply = SignIn("hang", "x");
+    return reply.status == 429 && reply.headers.at("Retry-After") == "5";
+  }));
+}
+
+TEST_F(People, SendNoOtherParameters) {
+  const std::string header = SignedIn("alice");
+  for (const char* method : {"get", "sign_out", "list", "end"}) {
+    EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + method, R"({"more": 1})", header).status, 400) << method;
+  }
+  for (const char* method : {"create", "list", "revoke"}) {
+    EXPECT_EQ(Call(Way::kTcp, std::string(kToken) + method, R"({"more": 1})", header).status, 400) << method;
+  }
+}
+
+// A folder takes the place of the file, so that the file cannot be replaced.
+TEST_F(People, AreToldWhenTokensCannotBeStored) {
+  const std::string file = sandbox_.File("var/lib/vorn/tokens.json");
+  std::filesystem::remove(file);
+  std::filesystem::create_directories(file + "/in the way");
+  for (const auto& [method, json] :
+       {std::pair("create", R"({"name": "a", "role": "reader"})"), std::pair("revoke", R"({"id": "test"})")}) {
+    const Reply reply = Administer(std::string(kToken) + method, json);
+    EXPECT_EQ(reply.status, 500) << method;
+    EXPECT_EQ(reply.Envelope()["error"]["code"], 2302) << method;
+  }
+  EXPECT_EQ(Administer(std::string(kToken) + "list").Envelope()["data"].size(), 1U);
+}
+
 TEST_F(People, BehindTlsHaveACookie) {
   const std::string sign_in = std::string(kSession) + "sign_in";
   const Reply reply = CallSecurely(sign_in, Credentials("alice", std::string(kPasswordMark) + "alice"));
@@ -388,7 +450,7 @@ TEST(SignInLink, SignsInOnce) {
   Connection client = server.ConnectTcp();
   const std::string sign_in = std::string(kSession) + "sign_in";
   client.Send(Post(sign_in, code));
-  const Json::Value data = client.Receive().Envelope()["data"];
+  const Json::Value data = Recorded(sign_in, code, client.Receive()).Envelope()["data"];
   EXPECT_EQ(data["role"], "administrator");
   client.Send(Post(kContext, "{}", BearerHeader(data["token"].asString())));
   EXPECT_EQ(client.Receive().status, 200);

@@ -2,6 +2,7 @@
 
 #include <syslog.h>
 
+#include <algorithm>
 #include <exception>
 #include <utility>
 
@@ -67,7 +68,7 @@ void SignInCall::Run(Answer answer) {
   }
 }
 
-// Returns the answer, or std::nullopt if it is given later.
+// Returns the answer, or std::nullopt if it is given later. A parameter that is null counts as absent.
 std::optional<Response> SignInCall::Begin() {
   std::string error;
   const std::optional<Json::Value> parameters = ParseJsonObject(text_, &error);
@@ -75,8 +76,10 @@ std::optional<Response> SignInCall::Begin() {
   const Json::Value& account = (*parameters)["account"];
   const Json::Value& password = (*parameters)["password"];
   const Json::Value& code = (*parameters)["code"];
-  if (parameters->size() == 1 && code.isString()) return SignInByCode(code.asString());
-  if (parameters->size() == 2 && IsWanted(account, kMaxAccountBytes) && IsWanted(password, kMaxPasswordBytes)) {
+  const auto given = std::count_if(parameters->begin(), parameters->end(),
+                                   [](const Json::Value& parameter) { return !parameter.isNull(); });
+  if (given == 1 && code.isString()) return SignInByCode(code.asString());
+  if (given == 2 && IsWanted(account, kMaxAccountBytes) && IsWanted(password, kMaxPasswordBytes)) {
     SignInByPassword({account.asString(), password.asString(), peer_.address});
     return std::nullopt;
   }

@@ -154,6 +154,7 @@ TEST_F(People, AtTheUnixSocketAreAdministratorsIfTheyAreRoot) {
   EXPECT_EQ(reply.status, 200);
   EXPECT_EQ(reply.Envelope()["data"]["caller"], "uid " + std::to_string(geteuid()));
   EXPECT_EQ(reply.Envelope()["data"]["may_write"], true);
+  EXPECT_TRUE(Administer(std::string(kSession) + "get").Envelope()["data"]["session"].isNull());
 }
 
 // Other users can connect, and need a token as everybody else.
@@ -337,6 +338,9 @@ TEST_F(People, SendWholeCredentials) {
     EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "sign_in", json).status, 400) << json;
   }
   EXPECT_EQ(SignIn("alice", std::string(2000, 'x')).status, 400);
+  const std::string null_code =
+      R"({"account": "alice", "password": ")" + std::string(kPasswordMark) + R"(alice", "code": null})";
+  EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "sign_in", null_code).status, 200);
   EXPECT_EQ(SignIn("alice", std::string(5000, 'x')).status, 413);
 }
 

@@ -100,7 +100,7 @@ Json::Value ToJson(const std::vector<std::string>& list) {
 }
 
 // Times are seconds since 1970; one that has not come, or never will, is null.
-Json::Value TimeOrNull(std::int64_t time) { return time == 0 ? Json::Value() : Json::Value(Json::Int64(time)); }
+Json::Value TimeOrNull(std::int64_t time) { return time == 0 ? Json::Value() : Json::Value(Json::Int64{time}); }
 
 Json::Value ToJson(const Token& token) {
   Json::Value json;
@@ -109,7 +109,7 @@ Json::Value ToJson(const Token& token) {
   json["role"] = std::string(NameOf(token.role));
   json["apis"] = ToJson(token.apis);
   json["shares"] = ToJson(token.shares);
-  json["created"] = Json::Int64(token.created);
+  json["created"] = Json::Int64{token.created};
   json["expires"] = TimeOrNull(token.expires);
   json["last_used"] = TimeOrNull(token.last_used);
   json["last_address"] = token.last_address;
@@ -215,8 +215,8 @@ class SessionMethods {
       json["account"] = session.account;
       json["role"] = std::string(NameOf(session.role));
       json["address"] = session.address;
-      json["created"] = Json::Int64(session.created);
-      json["idle_seconds"] = Json::Int64(session.idle.count());
+      json["created"] = Json::Int64{session.created};
+      json["idle_seconds"] = Json::Int64{session.idle.count()};
     }
     return Success(list);
   }

@@ -131,8 +131,8 @@ Response SignInCall::NewSession(const std::string& account, Role role) const {
   Json::Value data;
   data["account"] = account;
   data["role"] = std::string(NameOf(role));
-  data["idle_seconds"] = Json::Int64(sessions.limits().idle.count());
-  data["lifetime_seconds"] = Json::Int64(sessions.limits().lifetime.count());
+  data["idle_seconds"] = Json::Int64{sessions.limits().idle.count()};
+  data["lifetime_seconds"] = Json::Int64{sessions.limits().lifetime.count()};
   if (!secure_) data["token"] = secret;
   Response response = Success(data);
   if (secure_) response.headers.emplace_back("Set-Cookie", SessionCookie(secret));

@@ -83,7 +83,7 @@ Status Install(Box& box, const std::string& content, const std::vector<KeytabKey
   if (chmod(location->c_str(), kOwnerOnly) != 0 && errno != ENOENT) return Status::System(errno, *location);
   const Result<StoredFile> before = box.Read(kKeytabFile);
   if (!before.ok()) return before.status();
-  const Status replaced = box.Replace(kKeytabFile, content, before->version, kOwnerOnly);
+  Status replaced = box.Replace(kKeytabFile, content, before->version, kOwnerOnly);
   if (replaced.ok()) NameLostKeys(before->text, keys);
   return replaced;
 }

@@ -41,6 +41,7 @@ class SpawnPlan {
   // Returns 0 or an error number.
   int Start(std::vector<std::string> command, pid_t* pid) const {
     std::vector<char*> arguments;
+    arguments.reserve(command.size() + 1);
     for (std::string& word : command) arguments.push_back(word.data());
     arguments.push_back(nullptr);
     return posix_spawn(pid, arguments[0], &actions_, &attributes_, arguments.data(), environ);

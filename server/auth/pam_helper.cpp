@@ -200,7 +200,8 @@ int Run(char** arguments) {
   std::string message(kMaxMessage, '\0');
   const ssize_t size = recv(STDIN_FILENO, message.data(), message.size(), 0);
   if (size <= 0) return EXIT_FAILURE;
-  std::optional<PasswordRequest> request = ParseRequest(std::string_view(message).substr(0, static_cast<size_t>(size)));
+  const std::string_view received = message;
+  std::optional<PasswordRequest> request = ParseRequest(received.substr(0, static_cast<std::size_t>(size)));
   Wipe(&message);
   if (!request) return EXIT_FAILURE;
   const std::string verdict = FormatVerdict(Judge(arguments, *std::move(request)));

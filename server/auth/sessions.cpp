@@ -39,7 +39,7 @@ void Sessions::RemoveLeastRecent(std::size_t limit, const std::string* account) 
 
 std::string Sessions::Begin(const std::string& account, Role role, const std::string& address, Carrier carrier,
                             Clock::time_point now) {
-  const std::string secret = NewSecret(kSessionPrefix);
+  std::string secret = NewSecret(kSessionPrefix);
   Session session{NewId(), account, role, address, std::time(nullptr)};
   auto caller = std::make_shared<Caller>();
   caller->name = account.empty() ? "sign-in link" : "account " + account;

@@ -56,9 +56,9 @@ Json::Value ToJson(const std::string& digest, const Token& token) {
   json["role"] = std::string(NameOf(token.role));
   json["apis"] = ToJson(token.apis);
   json["shares"] = ToJson(token.shares);
-  json["created"] = Json::Int64(token.created);
-  json["expires"] = Json::Int64(token.expires);
-  json["last_used"] = Json::Int64(token.last_used);
+  json["created"] = static_cast<Json::Int64>(token.created);
+  json["expires"] = static_cast<Json::Int64>(token.expires);
+  json["last_used"] = static_cast<Json::Int64>(token.last_used);
   json["last_address"] = token.last_address;
   return json;
 }

@@ -112,11 +112,11 @@ TEST_F(Calls, AreListed) {
   Connection client = server_.ConnectTcp();
   client.Send(Get("/api", ServerProcess::TokenHeader()));
   const Json::Value data = client.Receive().Envelope()["data"];
-  ASSERT_EQ(data.size(), 20U);
+  ASSERT_EQ(data.size(), 21U);
   EXPECT_EQ(data[12]["api"], "Test.Echo");
   EXPECT_EQ(data[12]["version"], 2);
   EXPECT_EQ(data[13]["api"], "VORN.Server.Session");
-  EXPECT_EQ(data[19]["method"], "revoke");
+  EXPECT_EQ(data[20]["method"], "revoke");
   client.Send(Get("/healthz"));
   EXPECT_EQ(client.Receive().status, 200);
 }

@@ -35,16 +35,9 @@ int Perform(ServiceAction action) {
 
 // Returns whether the value is to be stored. A stored switch is compared by truth, not by number.
 bool Differs(const Setting& setting, const Json::Value& given, int32_t stored) {
-  switch (setting.kind) {
-    case Setting::Kind::kSwitch:
-    case Setting::Kind::kSwitchShownAsInteger:
-      return given.asBool() != (stored != 0);
-    case Setting::Kind::kInteger:
-      return given.asInt() != stored;
-    case Setting::Kind::kIntegerComparedAsJson:
-      return given != Json::Value(stored);
-  }
-  return false;
+  if (setting.IsSwitch()) return given.asBool() != (stored != 0);
+  if (setting.kind == Setting::Kind::kInteger) return given.asInt() != stored;
+  return given != Json::Value(stored);
 }
 
 }  // namespace

@@ -1,13 +1,11 @@
 // vornd: constructs the parts in the order of their dependencies, and runs the server.
 #include <grp.h>
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <syslog.h>
 #include <systemd/sd-daemon.h>
 #include <unistd.h>
 
 #include <chrono>
-#include <climits>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
@@ -110,12 +108,6 @@ void PrintSignInLink(const std::vector<Listener>& listeners, Sessions* sessions)
         listener.name().c_str(), code.c_str());
   }
   std::fflush(stdout);
-}
-
-// The number of descriptors that this process may have open (getrlimit(2)).
-rlim_t DescriptorLimit() {
-  rlimit limit{};
-  return getrlimit(RLIMIT_NOFILE, &limit) == 0 ? limit.rlim_cur : FOPEN_MAX;
 }
 
 // A thread that runs a module's method cannot be ended, and destructors would wait for it. Files that are left are

@@ -58,6 +58,23 @@ Response Failure(int status, int code, std::string_view text, const Json::Value&
 
 Response Refusal(int status, std::string_view text) { return Failure(status, status, text); }
 
+Response Unauthenticated(std::string_view text) {
+  Response response = Refusal(401, text);
+  response.headers.emplace_back("WWW-Authenticate", "Bearer");
+  return response;
+}
+
+Response InternalFailure() noexcept {
+  try {
+    return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
+  } catch (...) {
+    Response response;
+    response.status = 500;
+    response.error_code = kInternalFailure;
+    return response;
+  }
+}
+
 Response Busy(std::string_view text) {
   Response response = Refusal(503, text);
   response.headers.emplace_back("Retry-After", "1");

@@ -39,6 +39,12 @@ Response Failure(int status, int code, std::string_view text, const Json::Value&
 // The answer of the server itself to a request that it does not carry out: the error code is the HTTP status.
 Response Refusal(int status, std::string_view text);
 
+// A refusal with status 401, which asks for a token or a session (RFC 6750, 3).
+Response Unauthenticated(std::string_view text);
+
+// The answer to a call that failed inside the server, with the code kInternalFailure. Without memory it has no body.
+Response InternalFailure() noexcept;
+
 // A refusal with status 503 and a Retry-After of one second.
 Response Busy(std::string_view text);
 

@@ -46,6 +46,12 @@ bool TakesForm(const Json::Value& operation) {
   return body.isObject() && body["content"].isObject() && body["content"].isMember("multipart/form-data");
 }
 
+// Returns whether no log may have the value of this property.
+bool IsSecret(const Json::Value& property) {
+  const Json::Value* write_only = Find(property, {"writeOnly"});
+  return write_only != nullptr && write_only->asBool();
+}
+
 bool IsListOfTexts(const Json::Value& list) {
   return list.isArray() &&
          std::all_of(list.begin(), list.end(), [](const Json::Value& item) { return item.isString(); });
@@ -119,6 +125,7 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
       return Fault(error, "paths: \"" + path + "\": x-share-parameter is no name of a parameter");
     }
     method.share_parameter = share.asString();
+    method.may_have_secrets = HasSecrets(path);
     methods_[path] = std::move(method);
   }
   return true;
@@ -174,13 +181,19 @@ const Json::Value* Descriptor::ParameterSchema(const std::string& path) const {
   return schema;
 }
 
+bool Descriptor::HasSecrets(const std::string& path) const {
+  const Json::Value* schema = ParameterSchema(path);
+  const Json::Value* properties = schema == nullptr ? nullptr : Find(*schema, {"properties"});
+  if (properties == nullptr) return false;
+  return std::any_of(properties->begin(), properties->end(), IsSecret);
+}
+
 Json::Value Descriptor::WithoutSecrets(const std::string& path, Json::Value parameters) const {
   const Json::Value* schema = ParameterSchema(path);
   const Json::Value* properties = schema == nullptr ? nullptr : Find(*schema, {"properties"});
   if (properties == nullptr || !parameters.isObject()) return parameters;
   for (const std::string& name : properties->getMemberNames()) {
-    const Json::Value* secret = Find(*properties, {name, "writeOnly"});
-    if (secret != nullptr && secret->asBool() && parameters.isMember(name)) parameters[name] = "(left out)";
+    if (IsSecret((*properties)[name]) && parameters.isMember(name)) parameters[name] = "(left out)";
   }
   return parameters;
 }

@@ -45,6 +45,7 @@ class Descriptor {
   struct Method {
     bool reads_only = false;
     bool takes_file = false;
+    bool may_have_secrets = true;   // whether a parameter is or may be "writeOnly"
     std::string shown_by;           // "Api/v1/method"; empty if no method shows what this one changes
     std::vector<std::string> same;  // names of parameters
     std::string share_parameter{};  // empty: it is not about one shared folder
@@ -78,6 +79,8 @@ class Descriptor {
  private:
   // The schema of the parameters as JSON, not a reference to it; nullptr if there is none.
   const Json::Value* ParameterSchema(const std::string& path) const;
+
+  bool HasSecrets(const std::string& path) const;
 
   bool ReadErrorCodes(const Json::Value& codes, std::string* error);
   bool ReadPaths(const Json::Value& paths, std::string* error);

@@ -24,12 +24,9 @@ JobSize SizeOf(const Body& body) { return body.size() > kSmallBody ? JobSize::kL
 Response NoAnswer(const Route& route, const char* reason) noexcept {
   try {
     syslog(LOG_ERR, "%s: no answer: %s", route.Name().c_str(), QuotedForLog(reason).c_str());
-    return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
-  } catch (...) {
-    Response response;
-    response.status = 500;
-    return response;
+  } catch (...) {  // no memory for the log
   }
+  return InternalFailure();
 }
 
 // Returns the result of `function`, or the answer to a call that ended with an exception.
@@ -42,6 +39,12 @@ Response AnswerOf(const Route& route, Function function) noexcept {
   } catch (...) {
     return NoAnswer(route, "an exception of unknown type");
   }
+}
+
+// Large parameters are copied only if something must be left out.
+std::string TextForAudit(const Route& route, const Json::Value& parameters) {
+  if (!route.method.may_have_secrets) return AuditedParameters(parameters);
+  return AuditedParameters(route.descriptor->WithoutSecrets("/api/" + route.Id(), parameters));
 }
 
 // Compares the whole string: a module may take another spelling for the same folder, which is refused here.
@@ -112,7 +115,7 @@ Response Call::Execute() {
   if (!MayNameShare(*caller_, route_, object)) return Refusal(403, "This token is not for this shared folder.");
   description_.uploads = body_->Uploads();
   if (!route_.method.reads_only) {
-    audited_parameters_ = AuditedParameters(route_.descriptor->WithoutSecrets("/api/" + route_.Id(), object));
+    audited_parameters_ = TextForAudit(route_, object);
   }
   if (route_.own) return route_.own(object, *caller_);
   if (!if_match_) return RunAndAnswer(route_, object, description_);

@@ -11,6 +11,8 @@
 #include <sstream>
 #include <utility>
 
+#include "http.h"
+
 namespace vorn::server {
 namespace {
 
@@ -53,12 +55,6 @@ double CountOpenDescriptors() {
   std::error_code failure;
   const std::filesystem::directory_iterator descriptors("/proc/self/fd", failure);
   return failure ? 0 : static_cast<double>(std::distance(begin(descriptors), end(descriptors)));
-}
-
-// The soft limit (getrlimit(2)).
-double DescriptorLimit() {
-  rlimit limit{};
-  return getrlimit(RLIMIT_NOFILE, &limit) == 0 ? static_cast<double>(limit.rlim_cur) : 0;
 }
 
 // The resident memory in bytes (proc_pid_statm(5)).
@@ -179,7 +175,11 @@ std::vector<VORN::Metric> ProcessMetrics() {
            SecondsOf(used.ru_utime) + SecondsOf(used.ru_stime)},
           {"process_resident_memory_bytes", "Resident memory of vornd", Kind::kGauge, {}, ResidentBytes()},
           {"process_open_fds", "Open descriptors of vornd", Kind::kGauge, {}, CountOpenDescriptors()},
-          {"process_max_fds", "Descriptors that vornd may have open", Kind::kGauge, {}, DescriptorLimit()}};
+          {"process_max_fds",
+           "Descriptors that vornd may have open",
+           Kind::kGauge,
+           {},
+           static_cast<double>(DescriptorLimit())}};
 }
 
 }  // namespace vorn::server

@@ -23,26 +23,12 @@ bool IsWanted(const Json::Value& value, std::size_t most_bytes) {
 }
 
 // The answer is the same for an unknown account, a wrong password and an account that may not be used.
-Response WrongPassword() {
-  Response response = Refusal(401, "The account or the password is wrong.");
-  response.headers.emplace_back("WWW-Authenticate", "Bearer");
-  return response;
-}
+Response WrongPassword() { return Unauthenticated("The account or the password is wrong."); }
 
 Response TooMany() {
   Response response = Refusal(429, "Too many people are signing in with this account or from this address.");
   response.headers.emplace_back("Retry-After", "5");
   return response;
-}
-
-Response NoAnswer() noexcept {
-  try {
-    return Failure(500, kInternalFailure, "The operation failed inside the server; its log says more.");
-  } catch (...) {
-    Response response;
-    response.status = 500;
-    return response;
-  }
 }
 
 }  // namespace
@@ -64,7 +50,7 @@ void SignInCall::Run(Answer answer) {
     if (auto response = Begin()) answer_.Give(*std::move(response));
   } catch (const std::exception& exception) {
     syslog(LOG_ERR, "A sign-in has no answer: %s", exception.what());
-    answer_.Give(NoAnswer());
+    answer_.Give(InternalFailure());
   }
 }
 
@@ -88,9 +74,7 @@ std::optional<Response> SignInCall::Begin() {
 
 Response SignInCall::SignInByCode(const std::string& code) {
   if (environment_.sessions.TakeCode(code, Sessions::Clock::now())) return NewSession("", Role::kAdministrator);
-  Response response = Refusal(401, "This code is not valid, no longer valid, or has been used.");
-  response.headers.emplace_back("WWW-Authenticate", "Bearer");
-  return response;
+  return Unauthenticated("This code is not valid, no longer valid, or has been used.");
 }
 
 void SignInCall::SignInByPassword(PasswordRequest request) {
@@ -99,7 +83,7 @@ void SignInCall::SignInByPassword(PasswordRequest request) {
                                  try {
                                    self->answer_.Give(self->AnswerTo(result));
                                  } catch (const std::exception&) {
-                                   self->answer_.Give(NoAnswer());
+                                   self->answer_.Give(InternalFailure());
                                  }
                                });
 }

@@ -71,12 +71,6 @@ NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& part
                           std::string(head.content_type) + "\".");
 }
 
-Response Unauthenticated() {
-  Response response = Refusal(401, "Sign in first, or send a valid token.");
-  response.headers.emplace_back("WWW-Authenticate", "Bearer");
-  return response;
-}
-
 // Refuses a call that the caller may not make, whatever its parameters are. The share that they name is compared when
 // they have been read.
 std::optional<Response> RefuseCaller(const Caller& caller, const Route& route) {
@@ -171,7 +165,7 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
   if (page == kPages.end()) page = nullptr;
   if (page != nullptr && page->is_public) return BeginPage(*page, head);
   const CallerPtr caller = parts_.authenticator.Identify(head, parts_.names.AreSecure(head.host.value_or("")));
-  if (!caller) return Unauthenticated();
+  if (!caller) return Unauthenticated("Sign in first, or send a valid token.");
   Begun begun = BeginFor(caller, page, head);
   if (auto* answer = std::get_if<Response>(&begun)) answer->caller = caller->name;
   return begun;

@@ -61,6 +61,11 @@ HttpLimits FitToDescriptors(HttpLimits limits, const std::vector<Listener>& list
   return limits;
 }
 
+rlim_t DescriptorLimit() {
+  rlimit limit{};
+  return getrlimit(RLIMIT_NOFILE, &limit) == 0 ? limit.rlim_cur : FOPEN_MAX;
+}
+
 // All sessions, the listening sockets, and the timer of the deadlines. Everything but the constructor, the
 // destructor, Stop and the joins runs on the network thread.
 //

@@ -47,6 +47,9 @@ struct HttpLimits {
 // The limits with as many connections as `descriptors` leaves room for, beside a reserve for the server's own files.
 HttpLimits FitToDescriptors(HttpLimits limits, const std::vector<Listener>& listeners, rlim_t descriptors);
 
+// The number of descriptors that this process may have open: the soft limit (getrlimit(2)).
+rlim_t DescriptorLimit();
+
 // The objects that a server shares with the rest of the program. They must outlive the server.
 struct HttpParts {
   Budget* bodies = nullptr;  // null: bodies are not charged

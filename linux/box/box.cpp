@@ -90,6 +90,11 @@ Status Box::Confirm(const std::string& path) {
   return status.ok() ? store_->Confirm(path) : status;
 }
 
+Status Box::SetMode(const std::string& path, unsigned mode) {
+  const Status status = CheckMayWrite(path);
+  return status.ok() ? store_->SetMode(path, mode) : status;
+}
+
 Result<std::unique_ptr<HeldLock>> Box::Lock(const std::string& name, std::chrono::milliseconds limit) {
   return store_->Lock(name, limit);
 }

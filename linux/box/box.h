@@ -82,6 +82,7 @@ class Box {
   Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode = 0644);
   Status Remove(const std::string& path, const Version& expected);
   Status Confirm(const std::string& path);
+  Status SetMode(const std::string& path, unsigned mode);
 
   // Takes a lock of the box.
   Result<std::unique_ptr<HeldLock>> Lock(const std::string& name, std::chrono::milliseconds limit);

@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstring>
 #include <utility>
 
@@ -111,6 +112,13 @@ Status FileStore::Remove(const std::string& path, const Version& expected) {
 Status FileStore::Confirm(const std::string& path) {
   const Result<std::string> location = Locate(path);
   return location.ok() ? ConfirmFile(*location) : location.status();
+}
+
+Status FileStore::SetMode(const std::string& path, unsigned mode) {
+  const Result<std::string> location = Locate(path);
+  if (!location.ok()) return location.status();
+  if (chmod(location->c_str(), mode) == 0 || errno == ENOENT) return {};
+  return Status::System(errno, *location);
 }
 
 Status FileStore::MakeFolder(const std::string& path) {

@@ -27,6 +27,7 @@ class FileStore : public Store {
   Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) override;
   Status Remove(const std::string& path, const Version& expected) override;
   Status Confirm(const std::string& path) override;
+  Status SetMode(const std::string& path, unsigned mode) override;
   Status MakeFolder(const std::string& path) override;
   Result<std::unique_ptr<HeldLock>> Lock(const std::string& name, std::chrono::milliseconds limit) override;
 

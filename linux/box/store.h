@@ -75,6 +75,9 @@ class Store {
   // Completes an interrupted Replace of a file that already has the wanted content.
   virtual Status Confirm(const std::string& path) = 0;
 
+  // Gives an existing file these permissions (chmod(2)). One that does not exist is no failure.
+  virtual Status SetMode(const std::string& path, unsigned mode) = 0;
+
   // Creates a folder and those above it.
   virtual Status MakeFolder(const std::string& path) = 0;
 

@@ -77,10 +77,7 @@ void NameLostKeys(const std::string& former, const std::vector<KeytabKey>& keys)
 
 // Keys are readable by root only, whatever the mode of an older file is.
 Status Install(Box& box, const std::string& content, const std::vector<KeytabKey>& keys) {
-  const Result<std::string> location = box.root().Locate(kKeytabFile);
-  if (!location.ok()) return location.status();
-  if (Status status = CheckMayWrite(kKeytabFile); !status.ok()) return status;
-  if (chmod(location->c_str(), kOwnerOnly) != 0 && errno != ENOENT) return Status::System(errno, *location);
+  if (Status status = box.SetMode(kKeytabFile, kOwnerOnly); !status.ok()) return status;
   const Result<StoredFile> before = box.Read(kKeytabFile);
   if (!before.ok()) return before.status();
   Status replaced = box.Replace(kKeytabFile, content, before->version, kOwnerOnly);

@@ -258,7 +258,7 @@ TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
 TEST(ExportsDocument, FindsTheClientsOfAPathInAllItsLines) {
   const ExportsDocument document("/a b(rw)\n/b x\n\"/a\" c d # more\n/a/ e b(ro)\n/a/c y\n//./a f\n");
   EXPECT_THAT(Clients(document, "/a"), ElementsAre("b", "c", "d", "e", "f"));
-  EXPECT_FALSE(document.Entries("/a", ExportPaths()).front().options.flavors.front().access.read_only);
+  EXPECT_FALSE(document.Entries("/a", ExportPaths()).at(0).options.flavors.at(0).access.read_only);
   EXPECT_THAT(Clients(document, "/a/"), ElementsAre("b", "c", "d", "e", "f"));
   EXPECT_THAT(Clients(document, "/"), ElementsAre());
 }

@@ -239,7 +239,7 @@ void ExpectRefusal(const TemporaryRoot& root, const GeneratedFiles& files) {
   ASSERT_NE(map, nullptr) << text_before;
   TakeLog();
   EXPECT_FALSE(Apply(map, {"", "eve@X", "daemon"})) << text_before;
-  EXPECT_THAT(TakeLog().back().text, testing::ContainsRegex("(includes|refers to) itself")) << text_before;
+  EXPECT_THAT(LastText(TakeLog()), testing::ContainsRegex("(includes|refers to) itself")) << text_before;
   EXPECT_EQ(AllText(root, files), text_before);
 }
 
@@ -256,7 +256,7 @@ bool RunChange(const TemporaryRoot& root, const GeneratedFiles& files, const Vie
   TakeLog();
   const bool done = Apply(map, change);
   const std::vector<LogLine> log = TakeLog();
-  SCOPED_TRACE((done ? "done\n" : "refused: " + (log.empty() ? "" : log.back().text) + "\n") + AllText(root, files));
+  SCOPED_TRACE((done ? "done\n" : "refused: " + LastText(log) + "\n") + AllText(root, files));
   if (!done) {
     EXPECT_EQ(AllText(root, files), text_before);
     return false;

@@ -203,7 +203,7 @@ void ExpectRefusal(const TemporaryRoot& root, const GeneratedFiles& files) {
   record.unix_pri_enable = record.unix_pri_enable == 0 ? 1 : 0;
   TakeLog();
   EXPECT_LT(VORNNFSConfSet(&record), 0) << text_before;
-  EXPECT_THAT(TakeLog().back().text, testing::ContainsRegex("(includes|refers to) itself")) << text_before;
+  EXPECT_THAT(LastText(TakeLog()), testing::ContainsRegex("(includes|refers to) itself")) << text_before;
   EXPECT_EQ(AllText(root, files), text_before);
 }
 
@@ -231,7 +231,7 @@ bool RunCase(unsigned number) {
   TakeLog();
   const bool done = VORNNFSConfSet(&record) >= 0;
   const std::vector<LogLine> log = TakeLog();
-  SCOPED_TRACE((done ? "done\n" : "refused: " + (log.empty() ? "" : log.back().text) + "\n") + AllText(root, files));
+  SCOPED_TRACE((done ? "done\n" : "refused: " + LastText(log) + "\n") + AllText(root, files));
   if (!done) {
     EXPECT_EQ(AllText(root, files), text_before);
     return false;

@@ -211,10 +211,7 @@ TEST_F(Exports, AreWrittenWhateverIsWrongWithOtherLines) {
   EXPECT_THAT(File(), HasSubstr("/x y(foo)\n/volume1/data a("));
 }
 
-std::string Reason() {
-  const auto log = TakeLog();
-  return log.empty() ? "" : log.back().text;
-}
+std::string Reason() { return LastText(TakeLog()); }
 
 TEST_F(Exports, ShowAClientThatIsNotUtf8AndRefuseToStoreIt) {
   const std::string file = "/volume1/data b\xe4r(rw) other(ro)\n";

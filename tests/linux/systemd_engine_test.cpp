@@ -192,7 +192,9 @@ TEST_F(SystemdEngine, StopsWhereACallIsRefused) {
     const Status status = vorn::MakeSystemdEngine(vorn::CurrentBox(), options)->Start();
     EXPECT_EQ(status.code(), vorn::kServiceFailed) << call;
     EXPECT_THAT(status.reason(), HasSubstr("is refused")) << call;
-    EXPECT_THAT(manager.TakeCalls().back(), HasSubstr(call)) << call;
+    const std::vector<std::string> calls = manager.TakeCalls();
+    ASSERT_FALSE(calls.empty()) << call;
+    EXPECT_THAT(calls.back(), HasSubstr(call)) << call;
   }
 }
 

@@ -96,6 +96,7 @@ TEST(NFSIDMap, LogsTheParametersOfTheFirstReadWithTheLineOfTheDriver) {
   for (const Entry entry : {NFSIDMapList, NFSIDMapCreate, NFSIDMapSet, NFSIDMapDelete}) {
     FakePlatform platform;
     EXPECT_EQ(Call(entry, R"({"suggestion": 1, "id": {}, "idmap": true, "x": "\n\u00e4"})").code, 2301);
+    ASSERT_FALSE(platform.log.empty());
     EXPECT_EQ(platform.log.back().text, "Request: {\"id\":{},\"idmap\":true,\"suggestion\":1,\"x\":\"\\n\\u00e4\"}\n");
     EXPECT_THAT(platform.calls, ElementsAre("GetParam", "SetError"));
     lines.insert(platform.log.back().line);

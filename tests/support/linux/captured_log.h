@@ -13,4 +13,7 @@ struct LogLine {
 // Returns the messages that all threads logged since the last call.
 std::vector<LogLine> TakeLog();
 
+// Returns the text of the last of these messages, or "(nothing was logged)".
+std::string LastText(const std::vector<LogLine>& log);
+
 #endif  // VORN_TESTS_SUPPORT_LINUX_CAPTURED_LOG_H

@@ -40,6 +40,12 @@ FileStamp StampFrom(const Version& version) {
   return stamp;
 }
 
+Result<Version> VersionAt(const std::string& location) {
+  const Result<FileStamp> stamp = StampOfFile(location);
+  if (!stamp.ok()) return stamp.status();
+  return VersionFrom(*stamp);
+}
+
 std::string PathBelow(const Root& root, const std::string& path) {
   return root.is_box() ? path : root.directory() + path;
 }
@@ -52,16 +58,18 @@ Result<std::string> FileStore::Locate(const std::string& path) const {
   if (!location.ok()) return location;
   const std::lock_guard lock(mutex_);
   if (*location == PathBelow(root_, path)) {
-    plain_paths_.insert(path);
+    plain_paths_[path] = std::make_shared<const std::string>(*location);
   } else {
     plain_paths_.erase(path);
   }
   return location;
 }
 
-bool FileStore::IsPlain(const std::string& path) const {
+// The location of a path without symbolic links; nullptr if it has some, or is not known yet.
+std::shared_ptr<const std::string> FileStore::KnownLocation(const std::string& path) const {
   const std::lock_guard lock(mutex_);
-  return plain_paths_.count(path) != 0;
+  const auto known = plain_paths_.find(path);
+  return known == plain_paths_.end() ? nullptr : known->second;
 }
 
 Result<StoredFile> FileStore::Read(const std::string& path) const {
@@ -74,16 +82,9 @@ Result<StoredFile> FileStore::Read(const std::string& path) const {
 }
 
 Result<Version> FileStore::VersionOf(const std::string& path) const {
-  if (IsPlain(path)) {
-    const Result<FileStamp> stamp = StampOfFile(PathBelow(root_, path));
-    if (!stamp.ok()) return stamp.status();
-    return VersionFrom(*stamp);
-  }
+  if (const std::shared_ptr<const std::string> location = KnownLocation(path)) return VersionAt(*location);
   const Result<std::string> location = Locate(path);
-  if (!location.ok()) return location.status();
-  const Result<FileStamp> stamp = StampOfFile(*location);
-  if (!stamp.ok()) return stamp.status();
-  return VersionFrom(*stamp);
+  return location.ok() ? VersionAt(*location) : location.status();
 }
 
 Result<StoredFolder> FileStore::List(const std::string& folder) const {

@@ -2,8 +2,10 @@
 #ifndef VORN_LINUX_BOX_FILE_STORE_H
 #define VORN_LINUX_BOX_FILE_STORE_H
 
+#include <memory>
 #include <mutex>
-#include <unordered_set>
+#include <string>
+#include <unordered_map>
 
 #include "root.h"
 #include "store.h"
@@ -33,12 +35,12 @@ class FileStore : public Store {
 
  private:
   Result<std::string> Locate(const std::string& path) const;
-  bool IsPlain(const std::string& path) const;
+  std::shared_ptr<const std::string> KnownLocation(const std::string& path) const;
 
   const Root root_;
   mutable std::mutex mutex_;
-  // Paths that were seen to lead to their file without a symbolic link: their version is one lstat(2).
-  mutable std::unordered_set<std::string> plain_paths_;
+  // The locations of paths that were seen to lead to their file without a symbolic link: their version is one lstat(2).
+  mutable std::unordered_map<std::string, std::shared_ptr<const std::string>> plain_paths_;
 };
 
 }  // namespace vorn

@@ -24,26 +24,38 @@ bool IsConfigurationFile(std::string_view name) {
   return name.front() != '.' && name.size() > kEnding.size() && name.substr(name.size() - kEnding.size()) == kEnding;
 }
 
-Result<std::vector<std::string>> NamesIn(Box& box, const std::string& folder) {
-  const Result<std::shared_ptr<const StoredFolder>> listed = box.List(folder);
-  if (!listed.ok()) return listed.status();
+// The names in a folder that are read, in their order, and a version that stands for this list.
+struct ReadNames {
   std::vector<std::string> names;
-  std::copy_if((*listed)->names.begin(), (*listed)->names.end(), std::back_inserter(names), IsConfigurationFile);
-  return names;
+  Version version;
+};
+
+ReadNames NamesOf(const StoredFolder& folder) {
+  ReadNames read;
+  std::copy_if(folder.names.begin(), folder.names.end(), std::back_inserter(read.names), IsConfigurationFile);
+  std::string text;
+  for (const std::string& name : read.names) text += name + "\n";
+  read.version.exists = true;
+  read.version.state = {read.names.size(), text.size(), std::hash<std::string>()(text), 0, 0};
+  return read;
 }
 
-// A version that stands for a list of names.
-Version VersionOf(const std::vector<std::string>& names) {
-  Version version;
-  version.exists = true;
-  std::string text;
-  for (const std::string& name : names) text += name + "\n";
-  version.state = {names.size(), text.size(), std::hash<std::string>()(text), 0, 0};
-  return version;
+Result<std::shared_ptr<const ReadNames>> NamesIn(Box& box, const std::string& folder) {
+  const Result<std::shared_ptr<const StoredFolder>> listed = box.List(folder);
+  if (!listed.ok()) return listed.status();
+  return box.Derive<ReadNames>(folder, {*listed}, [&] { return Result<ReadNames>(NamesOf(**listed)); });
 }
 
 // The path under which the list of a folder's names is remembered.
 std::string ListPath(const std::string& folder) { return folder + "/*.conf"; }
+
+// Inserts a name in the order of the readers, unless it is there.
+void Insert(std::string name, std::vector<std::string>* names) {
+  const auto place =
+      std::lower_bound(names->begin(), names->end(), name,
+                       [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; });
+  if (place == names->end() || *place != name) names->insert(place, std::move(name));
+}
 
 // The path in an include line: relative to the folder of the file, and optional if it begins with a hyphen.
 std::string IncludedPath(const std::string& including, std::string_view file) {
@@ -88,17 +100,15 @@ Result<IniFiles> IniFiles::Open(Box& box, const std::string& path, const std::op
 
 Status IniFiles::AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft) {
   folder_ = path + ".d";
-  Result<std::vector<std::string>> names = NamesIn(box, folder_);
-  if (!names.ok()) return names.status();
-  names_ = VersionOf(*names);
+  const Result<std::shared_ptr<const ReadNames>> read = NamesIn(box, folder_);
+  if (!read.ok()) return read.status();
+  names_ = (*read)->version;
   FirstReads::Note(box, ListPath(folder_), names_);
+  std::vector<std::string> names = (*read)->names;
   const bool is_new = draft && draft->path.compare(0, folder_.size() + 1, folder_ + "/") == 0;
-  if (is_new) names->push_back(draft->path.substr(folder_.size() + 1));
-  std::sort(names->begin(), names->end(),
-            [](const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; });
-  names->erase(std::unique(names->begin(), names->end()), names->end());
+  if (is_new) Insert(draft->path.substr(folder_.size() + 1), &names);
   if (Status status = Add(box, {path, nullptr, std::nullopt, {0}}, draft); !status.ok()) return status;
-  for (const std::string& name : *names) {
+  for (const std::string& name : names) {
     Source source{folder_ + "/", nullptr, std::nullopt, {static_cast<int>(sources_.size()) + 1}};
     source.path += name;
     if (Status status = Add(box, std::move(source), draft); !status.ok()) return status;
@@ -135,8 +145,8 @@ Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft,
     Reject(source, including, "more than " + std::to_string(kMostSources) + " files are included");
     return {};
   }
-  sources_.push_back(source);
-  return AddIncludes(box, {source, including}, draft);
+  sources_.push_back(std::move(source));
+  return AddIncludes(box, {sources_.back(), including}, draft);
 }
 
 void IniFiles::Reject(const Source& source, const Opened* including, const std::string& why) {
@@ -270,8 +280,8 @@ Status IniFiles::CheckUnchanged(Box& box) const {
 
 Status IniFiles::NoteOwnWrite(Box& box, const std::string& path) {
   const std::string folder = path.substr(0, path.rfind('/'));
-  const Result<std::vector<std::string>> names = NamesIn(box, folder);
-  if (names.ok()) FirstReads::Renew(box, ListPath(folder), VersionOf(*names));
+  const Result<std::shared_ptr<const ReadNames>> names = NamesIn(box, folder);
+  if (names.ok()) FirstReads::Renew(box, ListPath(folder), (*names)->version);
   return names.status();
 }
 

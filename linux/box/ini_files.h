@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_BOX_INI_FILES_H
 #define VORN_LINUX_BOX_INI_FILES_H
 
+#include <deque>
 #include <memory>
 #include <optional>
 #include <string>
@@ -101,8 +102,8 @@ class IniFiles {
   void CheckReferences();
 
   std::string folder_;
-  Version names_;  // stands for the list of files in the folder
-  std::vector<Source> sources_;
+  Version names_;               // stands for the list of files in the folder
+  std::deque<Source> sources_;  // a file that is being read stays where it is while others are added
   Status readable_;
 };
 

@@ -37,9 +37,14 @@ Status ReadWord(const IniFile& file, const char* key, const Word<T> (&words)[kSi
 }  // namespace
 
 Result<PlatformSettings> PlatformSettings::Load(Box& box) {
-  const Result<SharedIniFile> opened = IniFile::Open(box, "/etc/vorn/platform.conf");
-  if (!opened.ok()) return opened.status();
-  const IniFile& file = **opened;
+  const Result<SharedIniFile> file = IniFile::Open(box, "/etc/vorn/platform.conf");
+  if (!file.ok()) return file.status();
+  const auto settings = box.Derive<PlatformSettings>("", {*file}, [&] { return Read(box, **file); });
+  if (!settings.ok()) return settings.status();
+  return **settings;
+}
+
+Result<PlatformSettings> PlatformSettings::Read(const Box& box, const IniFile& file) {
   const EngineKind default_engine = IsBootedBySystemd(box) ? EngineKind::kSystemd : EngineKind::kLocal;
   PlatformSettings settings;
   settings.engine = default_engine;

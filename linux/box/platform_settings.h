@@ -5,6 +5,7 @@
 #include <string>
 
 #include "box.h"
+#include "ini_file.h"
 #include "status.h"
 
 namespace vorn {
@@ -30,6 +31,9 @@ struct PlatformSettings {
 
   // Reads the settings of the box. A value that is not in the list above is a failure that names it.
   static Result<PlatformSettings> Load(Box& box);
+
+ private:
+  static Result<PlatformSettings> Read(const Box& box, const IniFile& file);
 };
 
 }  // namespace vorn

@@ -16,7 +16,8 @@ const vorn::ExportPaths kPaths;
 
 std::size_t Faults(const vorn::ExportsDocument& document) {
   std::size_t faults = 0;
-  for (const vorn::ExportLine& line : document.Lines()) faults += line.fault ? 1 : 0;
+  const auto lines = document.Lines();
+  for (const vorn::ExportLine& line : *lines) faults += line.fault ? 1 : 0;
   return faults;
 }
 
@@ -45,7 +46,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::string_view client = input.substr(0, input.find('\n'));
   const vorn::ExportsDocument document{std::string(input.substr(client.size()))};
   std::vector<std::string> paths = {"/new"};
-  for (const vorn::ExportLine& line : document.Lines()) {
+  const auto lines = document.Lines();
+  for (const vorn::ExportLine& line : *lines) {
     Require(line.span.begin <= line.span.path && line.span.path < line.span.end);
     if (line.fault) Require(line.fault->position >= line.span.path && line.fault->position <= line.span.end);
     if (!line.path.empty() && paths.size() < 4) paths.push_back(line.path);

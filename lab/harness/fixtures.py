@@ -11,6 +11,7 @@ _PROMISE_BROKEN = (AssertionError, OSError, api.Refused, network.MountFailed, pr
 
 def pytest_addoption(parser):
     parser.addoption("--boot", default="1/1", help="the number of this boot of the disk: NUMBER/COUNT")
+    parser.addoption("--long", action="store_true", help="run the long stories, too")
 
 
 def _this_boot(config):
@@ -26,8 +27,12 @@ def _boot_of(item):
 def pytest_collection_modifyitems(config, items):
     """Selects the stories of this boot. A pending story must fail, and only with an assertion about the promise."""
     number, _ = _this_boot(config)
-    config.hook.pytest_deselected(items=[item for item in items if _boot_of(item) != number])
-    items[:] = [item for item in items if _boot_of(item) == number]
+
+    def is_selected(item):
+        return _boot_of(item) == number and (config.getoption("--long") or not item.get_closest_marker("long"))
+
+    config.hook.pytest_deselected(items=[item for item in items if not is_selected(item)])
+    items[:] = [item for item in items if is_selected(item)]
     for item in items:
         pending = item.get_closest_marker("pending")
         if pending:

@@ -29,9 +29,10 @@ def parse(arguments):
     parser.add_argument("--budget", type=float, metavar="MINUTES",
                         help="run as many stories as fit; --turn chooses which, and all turns together run every story")
     parser.add_argument("--turn", type=int, help="default: the number of commits")
+    parser.add_argument("--long", action="store_true", help="run the long stories, too, whose time no budget plans")
     parser.add_argument("--record", action="store_true", help="write the measured times to lab/times")
     chosen = parser.parse_args(arguments[:split])
-    chosen.pytest = arguments[split + 1:]
+    chosen.pytest = ["--long"] * chosen.long + arguments[split + 1:]
     chosen.machine = "vm" if chosen.vm else "uml"
     return chosen
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <memory>
 #include <optional>
 #include <unordered_map>
 #include <utility>
@@ -112,8 +113,8 @@ Grant MakeGrant(std::string client, int options) {
 // The path of a line of the table. Unusual bytes of it are escaped.
 std::string ReadTablePath(std::string_view text) {
   if (text.find_first_of("\\\"") == std::string_view::npos) return std::string(text);
-  const std::vector<ExportLine> lines = ExportsDocument(std::string(text) + " *(ro)\n").Lines();
-  return lines.size() == 1 ? lines.front().path : std::string(text);
+  const auto lines = ExportsDocument(std::string(text) + " *(ro)\n").Lines();
+  return lines->size() == 1 ? lines->front().path : std::string(text);
 }
 
 using Grants = std::vector<Grant>;
@@ -181,7 +182,7 @@ class Planner {
  private:
   void ReadFile(const ExportsFile& file) {
     lines_.push_back(file.document.Lines());
-    for (const ExportLine& line : lines_.back()) {
+    for (const ExportLine& line : *lines_.back()) {
       const std::string path = resolver_.Resolve(line.path);
       if (line.fault) {
         faulty_ += file.document.text().substr(line.span.begin, line.span.end - line.span.begin);
@@ -315,7 +316,7 @@ class Planner {
   const std::set<std::string>& resolved_;
   OptionLists options_;
   PathResolver resolver_{paths_};
-  std::vector<std::vector<ExportLine>> lines_;  // rules_ refers to their entries
+  std::vector<std::shared_ptr<const std::vector<ExportLine>>> lines_;  // rules_ refers to their entries
   std::unordered_map<std::string, Rules> rules_;
   std::vector<std::string> order_;                                // of the paths in the files
   std::string faulty_;                                            // the text of all faulty lines

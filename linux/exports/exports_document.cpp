@@ -55,6 +55,13 @@ bool IsSameLine(const ExportsLines& old, std::size_t a, const ExportsLines& now,
   return old.TextOf(line) == now.TextOf(now.spans()[b]);
 }
 
+std::vector<ExportLine> ReadLines(std::string_view text, const ExportSpans& spans) {
+  std::vector<ExportLine> lines;
+  lines.reserve(spans.size());
+  for (const ExportSpan& line : spans) lines.push_back(ReadExportLine(text, line));
+  return lines;
+}
+
 }  // namespace
 
 class ExportsDocument::Content {
@@ -67,6 +74,14 @@ class ExportsDocument::Content {
   }
 
   const ExportsLines& lines() const { return lines_; }
+
+  std::shared_ptr<const std::vector<ExportLine>> Read() const {
+    const std::lock_guard lock(mutex_);
+    if (auto known = read_.lock()) return known;
+    auto read = std::make_shared<const std::vector<ExportLine>>(ReadLines(lines_.text(), lines_.spans()));
+    read_ = read;
+    return read;
+  }
 
   // Returns the lines whose path leads to the directory `path`, in order.
   ExportSpans LinesOf(const std::string& path, const ExportPaths& paths) const {
@@ -85,6 +100,7 @@ class ExportsDocument::Content {
   const ExportsLines lines_;
   mutable std::mutex mutex_;
   mutable std::shared_ptr<const ExportsIndex> index_;  // made for the first search
+  mutable std::weak_ptr<const std::vector<ExportLine>> read_;
 };
 
 ExportsDocument::ExportsDocument(std::string text) : content_(std::make_shared<const Content>(std::move(text))) {}
@@ -94,14 +110,9 @@ ExportsDocument::ExportsDocument(std::string text, const ExportsDocument& previo
 
 const std::string& ExportsDocument::text() const { return content_->lines().text(); }
 
-std::vector<ExportLine> ExportsDocument::Lines() const { return Read(content_->lines().spans()); }
+std::shared_ptr<const std::vector<ExportLine>> ExportsDocument::Lines() const { return content_->Read(); }
 
-std::vector<ExportLine> ExportsDocument::Read(const ExportSpans& spans) const {
-  std::vector<ExportLine> lines;
-  lines.reserve(spans.size());
-  for (const ExportSpan& line : spans) lines.push_back(ReadExportLine(text(), line));
-  return lines;
-}
+std::vector<ExportLine> ExportsDocument::Read(const ExportSpans& spans) const { return ReadLines(text(), spans); }
 
 std::vector<ExportLine> ExportsDocument::LinesOf(const std::string& path, const ExportPaths& paths) const {
   return Read(content_->LinesOf(path, paths));

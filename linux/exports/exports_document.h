@@ -25,8 +25,9 @@ class ExportsDocument {
 
   const std::string& text() const;
 
-  // Returns every line in order. Lines after a fault are read as if there were no fault.
-  std::vector<ExportLine> Lines() const;
+  // Returns every line in order. Lines after a fault are read as if there were no fault. Callers share the result of an
+  // earlier call for as long as somebody owns it.
+  std::shared_ptr<const std::vector<ExportLine>> Lines() const;
 
   // Returns the lines whose path leads to the directory `path`, in order.
   std::vector<ExportLine> LinesOf(const std::string& path, const ExportPaths& paths) const;

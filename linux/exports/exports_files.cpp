@@ -52,7 +52,8 @@ Result<std::vector<SharedExportsFile>> OpenAllExports(Box& box) {
 std::vector<ExportsFileFault> FindExportFaults(const std::vector<SharedExportsFile>& files) {
   std::vector<ExportsFileFault> faults;
   for (const SharedExportsFile& file : files) {
-    for (const ExportLine& line : file->document.Lines()) {
+    const auto lines = file->document.Lines();
+    for (const ExportLine& line : *lines) {
       if (!line.fault) continue;
       faults.push_back({file->location, line.path, line.span.begin, line.span.end,
                         file->Place(line.fault->position) + ": " + line.fault->reason, line.fault->ends_file});

@@ -2,6 +2,7 @@
 
 #include <fstream>
 #include <iterator>
+#include <memory>
 #include <set>
 #include <utility>
 #include <vector>
@@ -17,6 +18,7 @@ namespace vorn {
 namespace {
 
 using Files = std::vector<SharedExportsFile>;
+using Lines = std::vector<std::shared_ptr<const std::vector<ExportLine>>>;
 
 std::string ReadCache(const std::string& path) {
   std::ifstream content(path);
@@ -52,6 +54,26 @@ void NameUnknownHosts(const Files& files, const std::set<std::string>& names) {
   }
 }
 
+Lines LinesOf(const Files& files) {
+  Lines lines;
+  for (const SharedExportsFile& file : files) lines.push_back(file->document.Lines());
+  return lines;
+}
+
+// Opens the files after the rules of former shares have been dealt with. `lines` owns the lines of the files, so that
+// all who ask for them share them.
+Result<Files> OpenWithoutLeftShares(Box& box, Lines* lines) {
+  Result<Files> files = OpenAllExports(box);
+  if (!files.ok()) return files;
+  *lines = LinesOf(*files);
+  const Result<bool> withdrawn = CheckLeftShares(box, files->front()->document);
+  if (!withdrawn.ok()) return withdrawn.status();
+  if (!*withdrawn) return files;
+  files = OpenAllExports(box);
+  if (files.ok()) *lines = LinesOf(*files);
+  return files;
+}
+
 // Forgets the addresses of names that no rule has any more.
 void Prune(const std::set<std::string>& names, HostAddresses* hosts) {
   for (auto host = hosts->begin(); host != hosts->end();) {
@@ -62,8 +84,8 @@ void Prune(const std::set<std::string>& names, HostAddresses* hosts) {
 }  // namespace
 
 Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::set<std::string>& resolved) {
-  if (Status status = CheckLeftShares(box); !status.ok()) return status;
-  const Result<Files> files = OpenAllExports(box);
+  Lines lines;
+  const Result<Files> files = OpenWithoutLeftShares(box, &lines);
   if (!files.ok()) return files.status();
   NameFaults(*files);
   Result<HostAddresses> hosts = ReadExportHosts(box);

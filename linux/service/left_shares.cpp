@@ -55,13 +55,11 @@ void NameLeft(const std::string& directory) {
 
 }  // namespace
 
-Status CheckLeftShares(Box& box) {
+Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports) {
   const Result<PlatformSettings> settings = PlatformSettings::Load(box);
   if (!settings.ok()) return settings.status();
   const Result<std::vector<std::string>> paths = ListSharePaths(box);
-  if (!paths.ok()) return paths.status().code() == ENOENT ? Status() : paths.status();
-  const Result<SharedExportsFile> file = OpenExportsFile(box, kExportsFile);
-  if (!file.ok()) return file.status();
+  if (!paths.ok()) return paths.status().code() == ENOENT ? Result<bool>(false) : paths.status();
   const Result<Directories> remembered = ReadRemembered(box);
   if (!remembered.ok()) return remembered.status();
 
@@ -70,19 +68,24 @@ Status CheckLeftShares(Box& box) {
   Directories shares;
   for (const std::string& path : *paths) shares.insert(resolver.Resolve(NormalExportPath(path)));
   Directories exported;
-  for (const ExportLine& line : (*file)->document.Lines()) {
+  const auto lines = exports.Lines();
+  for (const ExportLine& line : *lines) {
     const std::string directory = resolver.Resolve(line.path);
     if (shares.count(directory) != 0 || remembered->count(directory) != 0) exported.insert(directory);
   }
+  bool withdrawn = false;
   for (const std::string& directory : exported) {
     if (shares.count(directory) != 0) continue;
     if (!settings->withdraw_left_shares) {
       NameLeft(directory);
     } else if (Status status = Withdraw(box, directory); !status.ok()) {
       return status;
+    } else {
+      withdrawn = true;
     }
   }
-  return Remember(box, exported);
+  if (Status status = Remember(box, exported); !status.ok()) return status;
+  return withdrawn;
 }
 
 }  // namespace vorn

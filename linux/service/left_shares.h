@@ -3,6 +3,7 @@
 #define VORN_LINUX_SERVICE_LEFT_SHARES_H
 
 #include "box.h"
+#include "exports_document.h"
 #include "status.h"
 
 namespace vorn {
@@ -12,7 +13,9 @@ namespace vorn {
 //
 // /var/lib/vorn/exported-shares remembers which exported directories are or were shares, so an administrator's own
 // lines about other directories are left alone. Nothing is concluded from a shares.conf that does not exist.
-Status CheckLeftShares(Box& box);
+//
+// `exports` is the content of /etc/exports. Returns whether rules were removed from the file.
+Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports);
 
 }  // namespace vorn
 

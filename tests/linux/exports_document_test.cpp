@@ -25,7 +25,8 @@ using Table = std::map<std::pair<std::string, std::string>, std::string>;
 
 Table TableOf(const std::string& text) {
   Table table;
-  for (const ExportLine& line : ExportsDocument(text).Lines()) {
+  const auto lines = ExportsDocument(text).Lines();
+  for (const ExportLine& line : *lines) {
     for (ExportEntry entry : line.entries) {
       // The table has no client that exportfs(8) cannot resolve.
       if (!CheckExportClient(entry.client).ok()) continue;
@@ -432,7 +433,8 @@ TEST(ExportsDocument, TellsWhereALineIsNotUnderstoodAndWhy) {
   for (const FaultCase& c : cases) {
     const ExportsDocument document(c.text);
     std::vector<ExportFault> faults;
-    for (const ExportLine& line : document.Lines()) {
+    const auto lines = document.Lines();
+    for (const ExportLine& line : *lines) {
       if (line.fault) faults.push_back(*line.fault);
     }
     ASSERT_EQ(faults.size(), 1U) << c.text;
@@ -444,18 +446,29 @@ TEST(ExportsDocument, TellsWhereALineIsNotUnderstoodAndWhy) {
 
 TEST(ExportsDocument, ReadsTheLinesAfterAFault) {
   const auto lines = ExportsDocument("/b z(rw,foo) w\n/c v\n").Lines();
-  ASSERT_EQ(lines.size(), 2U);
-  EXPECT_EQ(lines[1].path, "/c");
+  ASSERT_EQ(lines->size(), 2U);
+  EXPECT_EQ((*lines)[1].path, "/c");
+}
+
+TEST(ExportsDocument, ReadsItsLinesOnceForAllWhoOwnThem) {
+  const ExportsDocument document("/a x\n");
+  const ExportsDocument copy = document;
+  auto lines = document.Lines();
+  EXPECT_EQ(copy.Lines(), lines);
+  const std::weak_ptr<const std::vector<ExportLine>> observed = lines;
+  lines.reset();
+  EXPECT_TRUE(observed.expired());
+  EXPECT_EQ(document.Lines()->size(), 1U);
 }
 
 TEST(ExportsDocument, HoldsTenThousandPathsInLinearTime) {
   std::string text;
   for (int i = 0; i < 10000; ++i) text += "/volume1/share" + std::to_string(i) + " 10.0.0.1(rw) 10.0.0.2(ro)\n";
   const ExportsDocument document(text);
-  EXPECT_EQ(document.Lines().size(), 10000U);
+  EXPECT_EQ(document.Lines()->size(), 10000U);
   const auto without = document.Replace("/volume1/share5000", {}, ExportPaths());
   ASSERT_TRUE(without.ok());
-  EXPECT_EQ(ExportsDocument(*without).Lines().size(), 9999U);
+  EXPECT_EQ(ExportsDocument(*without).Lines()->size(), 9999U);
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 
 #include "captured_log.h"
 #include "current_box.h"
+#include "exports_files.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -32,8 +33,11 @@ class LeftShares : public testing::Test {
   // Returns what was logged.
   std::string Check() {
     TakeLog();
-    const Status status = CheckLeftShares(CurrentBox());
-    EXPECT_TRUE(status.ok()) << status.reason();
+    const auto file = OpenExportsFile(CurrentBox(), kExports);
+    EXPECT_TRUE(file.ok()) << file.status().reason();
+    const Result<bool> withdrawn = CheckLeftShares(CurrentBox(), (*file)->document);
+    EXPECT_TRUE(withdrawn.ok()) << withdrawn.status().reason();
+    withdrawn_ = withdrawn.ok() && *withdrawn;
     std::string log;
     for (const LogLine& line : TakeLog()) log += line.text + "\n";
     return log;
@@ -42,12 +46,14 @@ class LeftShares : public testing::Test {
   std::string Exports() const { return root_.Read(kExports).value_or(""); }
 
   TemporaryRoot root_;
+  bool withdrawn_ = false;  // what the last check returned
 };
 
 TEST_F(LeftShares, AreNamedEachTimeAndStayExported) {
   for (int i = 0; i < 2; ++i) {
     const std::string log = Check();
     EXPECT_THAT(log, HasSubstr("/srv/left is exported although it is no share any more"));
+    EXPECT_FALSE(withdrawn_);
     EXPECT_THAT(log, testing::Not(HasSubstr("/own")));
     EXPECT_THAT(log, testing::Not(HasSubstr("/srv/data")));
   }
@@ -57,8 +63,10 @@ TEST_F(LeftShares, AreNamedEachTimeAndStayExported) {
 TEST_F(LeftShares, AreWithdrawnIfTheSettingSaysSo) {
   root_.Write("/etc/vorn/platform.conf", "[platform]\nwithdraw_left_shares = yes\n");
   EXPECT_THAT(Check(), HasSubstr("/srv/left is no share any more; its export rules were removed"));
+  EXPECT_TRUE(withdrawn_);
   EXPECT_EQ(Exports(), "/srv/data *(rw)\n/own *(ro)\n");
   EXPECT_EQ(Check(), "");
+  EXPECT_FALSE(withdrawn_);
 }
 
 TEST_F(LeftShares, AreSharesAgainWhenTheyReturn) {

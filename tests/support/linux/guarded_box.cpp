@@ -191,7 +191,8 @@ void CheckExports(const File& file, const std::string& now, Lines* faults) {
   CheckLines(file, now, IsExportOfOurs, 0, faults);
   const vorn::ExportsDocument before(file.text);
   const vorn::ExportsDocument after(now);
-  for (const vorn::ExportLine& line : after.Lines()) {
+  const auto lines = after.Lines();
+  for (const vorn::ExportLine& line : *lines) {
     if (line.fault) faults->push_back("exports: " + line.fault->reason);
   }
   const vorn::ExportPaths paths;

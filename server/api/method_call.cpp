@@ -18,6 +18,8 @@ namespace {
 // CPU time, so that even a full lane of small calls delays the next one by less than a quarter of a second.
 constexpr std::size_t kSmallBody = 1024;
 
+constexpr const char* kTooMany = "Too many calls of this method are waiting. Try again soon.";
+
 JobSize SizeOf(const Body& body) { return body.size() > kSmallBody ? JobSize::kLarge : JobSize::kSmall; }
 
 // If there is no memory for this answer either, the client gets only the status.
@@ -61,6 +63,8 @@ Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
       body_(std::move(body)),
       caller_(std::move(request.caller)),
       if_match_(std::move(request.if_match)),
+      turn_(std::move(request.turn)),
+      recent_requests_(request.recent_requests),
       environment_(environment),
       answer_(caller_->name) {
   description_.caller = caller_->name;
@@ -74,8 +78,11 @@ std::optional<Response> Call::Receive(std::string_view piece) { return body_->Re
 void Call::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
-    if (environment_.pool.Enqueue({&route_, SizeOf(*body_)}, shared_from_this(), environment_.deadline)) return;
-    Give(Busy("Too many calls of this method are waiting. Try again soon."));
+    if (environment_.pool.Enqueue({&route_, SizeOf(*body_)}, shared_from_this(), environment_.deadline,
+                                  {turn_, recent_requests_})) {
+      return;
+    }
+    Give(Busy(kTooMany));
   } catch (const std::exception& exception) {
     Give(NoAnswer(route_, exception.what()));
   }
@@ -146,8 +153,9 @@ void Call::Expire(bool running) {
   }));
 }
 
-void Call::Refuse() {
-  Give(AnswerOf(route_, [] { return Busy("The server is stopping. Try again soon."); }));
+void Call::Refuse(Refused why) {
+  const char* const text = why == Refused::kClosed ? "The server is stopping. Try again soon." : kTooMany;
+  Give(AnswerOf(route_, [text] { return Busy(text); }));
 }
 
 }  // namespace vorn::server

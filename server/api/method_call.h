@@ -25,7 +25,7 @@ namespace vorn::server {
 
 // A call whose client has left before a worker was free is not run. A call that is not done at its deadline is
 // answered with 504; the method continues, and its end is logged. A call that has not begun by then, or
-// when the pool closes, is answered with 503.
+// when the pool closes, or that is displaced by calls of others, is answered with 503.
 class Call : public Exchange, public Job, public std::enable_shared_from_this<Call> {
  public:
   // The objects that all calls share. They must outlive the calls.
@@ -43,6 +43,8 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
     CallerPtr caller;
     std::string origin;                   // the caller's address
     std::optional<std::string> if_match;  // the condition of a changing call, see RunIfUnchanged()
+    std::string turn{};                   // Sender::peer of the call
+    unsigned recent_requests = 0;         // Sender::recent_requests of the call
   };
 
   Call(Request request, std::unique_ptr<Body> body, Environment environment);
@@ -53,7 +55,7 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
 
   void Work() override;
   void Expire(bool running) override;
-  void Refuse() override;
+  void Refuse(Refused why) override;
 
  private:
   Response Execute();
@@ -65,6 +67,8 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
   const CallerPtr caller_;
   VORN::CallDescription description_;
   const std::optional<std::string> if_match_;
+  const std::string turn_;
+  const unsigned recent_requests_;
   std::string audited_parameters_;  // of a call that may change something
   const Environment environment_;
   PendingAnswer answer_;

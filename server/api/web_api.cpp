@@ -84,6 +84,13 @@ std::optional<Response> RefuseCaller(const Caller& caller, const Route& route) {
   return std::nullopt;
 }
 
+// The peer of a call in the order of turns: callers and addresses have turns of their own, and local processes, which
+// have no address.
+std::string TurnOf(const Peer& peer, std::string_view caller) {
+  std::string turn = peer.credentials ? "pid " + std::to_string(peer.credentials->pid) : peer.ShareKey();
+  return turn.append(1, '\0').append(caller);
+}
+
 // The value of If-Match, of all its lines (RFC 9110, 5.3).
 std::optional<std::string> IfMatchOf(const Head& head) {
   std::optional<std::string> value;
@@ -184,7 +191,8 @@ WebApi::Begun WebApi::BeginFor(const CallerPtr& caller, const Page* page, const 
 WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
-  Call::Request request{route, caller, head.peer.address, IfMatchOf(head)};
+  Call::Request request{
+      route, caller, head.peer.address, IfMatchOf(head), TurnOf(head.peer, caller->name), head.recent_requests};
   if (request.if_match && route.shown_by == nullptr) {
     return Refusal(400, "If-Match is for methods that change something which another method shows.");
   }

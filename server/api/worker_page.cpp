@@ -28,19 +28,19 @@ void WorkerPage::Run(Answer answer) {
     if (pool_.Submit({&kLane, JobSize::kSmall}, shared_from_this(), time_)) return;
   } catch (const std::bad_alloc&) {
   }
-  Refuse();
+  Refuse(Refused::kClosed);
 }
 
 void WorkerPage::Work() {
   try {
     answer_.Give(make_());
   } catch (const std::bad_alloc&) {
-    Refuse();
+    Refuse(Refused::kClosed);
   }
 }
 
 void WorkerPage::Expire(bool /*running*/) { answer_.Give(Unready("No worker was free in time.")); }
 
-void WorkerPage::Refuse() { answer_.Give(Unready("The server takes no calls.")); }
+void WorkerPage::Refuse(Refused /*why*/) { answer_.Give(Unready("The server takes no calls.")); }
 
 }  // namespace vorn::server

@@ -27,7 +27,7 @@ class WorkerPage : public Exchange, public Job, public std::enable_shared_from_t
 
   void Work() override;
   void Expire(bool running) override;
-  void Refuse() override;
+  void Refuse(Refused why) override;
 
  private:
   WorkerPool& pool_;

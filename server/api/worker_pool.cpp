@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <exception>
+#include <optional>
 #include <utility>
 
 namespace vorn::server {
@@ -40,25 +41,71 @@ WorkerPool::~WorkerPool() {
   watch_.join();
 }
 
-bool WorkerPool::Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
-  if (!Enqueue(lane, std::move(job), time)) return false;
+bool WorkerPool::Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time, const Sender& sender) {
+  if (!Enqueue(lane, std::move(job), time, sender)) return false;
   Wake();
   return true;
 }
 
-bool WorkerPool::Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time) {
+bool WorkerPool::Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time, const Sender& sender) {
   const auto now = Clock::now();
+  const Job* const submitted = job.get();
   Entries one;
-  one.push_back({nullptr, std::move(job), now + time, {}});
-  const std::lock_guard<std::mutex> lock(mutex_);
-  Lane& its_lane = lanes_[lane];
-  if (closed_ || its_lane.queue.size() >= limits_.lane_queue) return false;
-  its_lane.size = lane.second;
-  one.front().lane = &its_lane;
-  its_lane.queue.splice(its_lane.queue.end(), one);
-  ++queued_;
-  WatchNoLaterThan(running_.size() < MostRunning() ? now + time : now + limits_.long_after);
+  one.push_back({nullptr, std::move(job), sender.recent_requests, now + time, {}});
+  Entries surplus;
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    if (closed_) return false;
+    Lane& its_lane = lanes_[lane];
+    its_lane.size = lane.second;
+    one.front().lane = &its_lane;
+    Append(&its_lane, sender.peer, &one);
+    ++queued_;
+    if (its_lane.waiting > limits_.lane_queue) {
+      surplus = TakeSurplus(&its_lane);
+      --queued_;
+    }
+    WatchNoLaterThan(running_.size() < MostRunning() ? now + time : now + limits_.long_after);
+  }
+  if (surplus.empty()) return true;
+  if (surplus.front().job.get() == submitted) return false;
+  surplus.front().job->Refuse(Refused::kDisplaced);
   return true;
+}
+
+// Moves the only job of `job` to the end of the peer's queue.
+void WorkerPool::Append(Lane* lane, std::string_view peer, Entries* job) {
+  auto queue =
+      std::find_if(lane->peers.begin(), lane->peers.end(), [peer](const PeerQueue& each) { return each.peer == peer; });
+  if (queue == lane->peers.end()) queue = lane->peers.insert(queue, PeerQueue{std::string(peer), {}});
+  queue->jobs.splice(queue->jobs.end(), *job);
+  ++lane->waiting;
+}
+
+// Removes the job that has the weakest claim to its place in the lane's queue, and returns it.
+WorkerPool::Entries WorkerPool::TakeSurplus(Lane* lane) {
+  std::size_t most = 0;
+  for (const PeerQueue& queue : lane->peers) most = std::max(most, queue.jobs.size());
+  PeerQueues::iterator peer;
+  std::optional<Entries::iterator> chosen;
+  for (auto queue = lane->peers.begin(); queue != lane->peers.end(); ++queue) {
+    if (queue->jobs.size() < most) continue;
+    for (auto entry = queue->jobs.begin(); entry != queue->jobs.end(); ++entry) {
+      if (chosen && entry->recent_requests < (*chosen)->recent_requests) continue;
+      chosen = entry;
+      peer = queue;
+    }
+  }
+  return TakeFrom(lane, peer, *chosen);
+}
+
+// Removes a job from the queue of its peer, and the queue if it was the last one.
+WorkerPool::Entries WorkerPool::TakeFrom(Lane* lane, PeerQueues::iterator peer, Entries::iterator entry) {
+  Entries taken;
+  taken.splice(taken.end(), peer->jobs, entry);
+  --lane->waiting;
+  if (peer->jobs.empty()) lane->peers.erase(peer);
+  return taken;
 }
 
 // The thread is notified after the lock is released; otherwise it would wake only to wait for the lock.
@@ -81,10 +128,14 @@ void WorkerPool::Close() {
   {
     const std::lock_guard<std::mutex> lock(mutex_);
     closed_ = true;
-    for (auto& [id, lane] : lanes_) refused.splice(refused.end(), lane.queue);
+    for (auto& [id, lane] : lanes_) {
+      for (PeerQueue& queue : lane.peers) refused.splice(refused.end(), queue.jobs);
+      lane.peers.clear();
+      lane.waiting = 0;
+    }
     queued_ = 0;
   }
-  for (const Entry& entry : refused) entry.job->Refuse();
+  for (const Entry& entry : refused) entry.job->Refuse(Refused::kClosed);
 }
 
 // A thread begins as a sleeping one that is to wake.
@@ -114,7 +165,7 @@ bool WorkerPool::EngageThread() {
 
 bool WorkerPool::MayTakeFrom(const Lane& lane) const {
   const std::size_t share = lane.size == JobSize::kLarge ? limits_.large_threads : limits_.lane_threads;
-  return !lane.queue.empty() && lane.running < share;
+  return lane.waiting > 0 && lane.running < share;
 }
 
 // Returns the least recently served lane whose next job may begin; nullptr if there is none.
@@ -160,15 +211,18 @@ void WorkerPool::RunJobs(std::unique_lock<std::mutex>* lock, Entries* ended) {
   }
 }
 
-// Moves the first job of the lane to the running jobs.
+// Moves the first job of the peer that has the turn to the running jobs. The peer's next turn is after all others.
 WorkerPool::Entries::iterator WorkerPool::Begin(Lane* lane) {
-  const auto entry = lane->queue.begin();
+  const auto peer = lane->peers.begin();
+  const auto entry = peer->jobs.begin();
+  lane->peers.splice(lane->peers.end(), lane->peers, peer);
+  Entries taken = TakeFrom(lane, peer, entry);
+  running_.splice(running_.end(), taken);
   entry->begun = Clock::now();
   entry->is_long = lane->size == JobSize::kLarge;
   if (entry->is_long) ++long_jobs_;
   ++lane->running;
   lane->turn = ++turn_;
-  running_.splice(running_.end(), lane->queue, entry);
   if (--queued_ > 0) WatchNoLaterThan(entry->begun + limits_.long_after);
   return entry;
 }
@@ -222,14 +276,14 @@ void WorkerPool::MarkLongJobs(Clock::time_point now) {
 
 // Removes one job whose deadline has passed from its queue and returns it; nullptr if there is none.
 std::shared_ptr<Job> WorkerPool::TakeOverdue(Clock::time_point now) {
+  const auto overdue = [now](const Entry& waiting) { return now >= waiting.deadline; };
   for (auto& [id, lane] : lanes_) {
-    const auto entry = std::find_if(lane.queue.begin(), lane.queue.end(),
-                                    [now](const Entry& waiting) { return now >= waiting.deadline; });
-    if (entry == lane.queue.end()) continue;
-    std::shared_ptr<Job> job = std::move(entry->job);
-    lane.queue.erase(entry);
-    --queued_;
-    return job;
+    for (auto peer = lane.peers.begin(); peer != lane.peers.end(); ++peer) {
+      const auto entry = std::find_if(peer->jobs.begin(), peer->jobs.end(), overdue);
+      if (entry == peer->jobs.end()) continue;
+      --queued_;
+      return TakeFrom(&lane, peer, entry).front().job;
+    }
   }
   return nullptr;
 }
@@ -248,7 +302,9 @@ std::shared_ptr<Job> WorkerPool::MarkOverdue(Clock::time_point now) {
 WorkerPool::Clock::time_point WorkerPool::NextWatch() const {
   auto next = Clock::time_point::max();
   for (const auto& [id, lane] : lanes_) {
-    for (const Entry& entry : lane.queue) next = std::min(next, entry.deadline);
+    for (const PeerQueue& queue : lane.peers) {
+      for (const Entry& entry : queue.jobs) next = std::min(next, entry.deadline);
+    }
   }
   for (const Entry& entry : running_) {
     if (!entry.expired) next = std::min(next, entry.deadline);

@@ -10,11 +10,19 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <string>
+#include <string_view>
 #include <thread>
 #include <utility>
 #include <vector>
 
 namespace vorn::server {
+
+// Why a job is not run.
+enum class Refused {
+  kClosed,     // the pool was closed before the job began
+  kDisplaced,  // the queue is full, and the job's sender has a larger part of it than others
+};
 
 // A unit of work. Exactly one of Work() and Refuse() is called, or Expire(false). None of them may throw.
 class Job {
@@ -28,8 +36,14 @@ class Job {
   // may end at any moment; otherwise it is never called.
   virtual void Expire(bool running) = 0;
 
-  // The pool was closed before the job began.
-  virtual void Refuse() = 0;
+  // The job will not be run.
+  virtual void Refuse(Refused why) = 0;
+};
+
+// The sender of a job, as far as its turn depends on it.
+struct Sender {
+  std::string_view peer;         // senders with the same string share one place in the order of turns
+  unsigned recent_requests = 0;  // of the connection that sends the job, see Head
 };
 
 // The expected amount of work of a job, as far as it is known before the job begins.
@@ -38,9 +52,12 @@ enum class JobSize { kSmall, kLarge };
 // The jobs of one owner (a method) and one size. The owner is identified by its address only.
 using LaneId = std::pair<const void*, JobSize>;
 
-// Serves the lanes in round-robin order, and the jobs of a lane in FIFO order, so that waiting jobs of one lane do not
-// delay other lanes:
+// Serves the lanes in round-robin order, within a lane the peers in round-robin order, and the jobs of a peer in FIFO
+// order, so that waiting jobs of one lane do not delay other lanes, nor those of one peer the other peers:
 //   - A lane has a share of the threads and of the queue.
+//   - When a lane's share of the queue is full, a further job displaces one of the peer that has most jobs there. Of
+//     the jobs of that peer, the pool removes the one whose connection has sent most requests recently, and of several
+//     such jobs the last one. This may be the further job itself.
 //   - Only a few threads work at the same time as long as jobs are short, because more of them would only compete
 //     for the same locks and caches. A job that has run for `long_after` counts as long, and a further thread
 //     takes the next job. A large job counts as long from its beginning.
@@ -66,12 +83,13 @@ class WorkerPool {
   WorkerPool& operator=(const WorkerPool&) = delete;
 
   // Submits a job that must be done `time` from now. Returns false, without calling any of the job's functions, if
-  // the lane's share of the queue is used up or the pool is closed. Throws std::bad_alloc and has then no effect.
-  bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
+  // the lane's share of the queue is full and this job would be displaced, or if the pool is closed. Throws
+  // std::bad_alloc and has then no effect. Refuses the job that is displaced, on the calling thread.
+  bool Submit(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time, const Sender& sender = {});
 
   // Does what Submit() does, but wakes no thread: the job waits for Wake() or for a thread that has just ended another
   // job. For a caller that has several jobs to submit.
-  bool Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time);
+  bool Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time, const Sender& sender = {});
   void Wake();
 
   struct Load {
@@ -88,15 +106,22 @@ class WorkerPool {
   struct Entry {
     Lane* lane;
     std::shared_ptr<Job> job;
+    unsigned recent_requests;
     Clock::time_point deadline;
     Clock::time_point begun;
     bool is_long = false;
     bool expired = false;
   };
   using Entries = std::list<Entry>;
+  struct PeerQueue {
+    std::string peer;
+    Entries jobs;  // never empty
+  };
+  using PeerQueues = std::list<PeerQueue>;
   struct Lane {
     JobSize size = JobSize::kSmall;
-    Entries queue;
+    PeerQueues peers;         // those with waiting jobs; the first one has the next turn
+    std::size_t waiting = 0;  // jobs of all peers
     std::size_t running = 0;
     std::uint64_t turn = 0;  // when a job of the lane was last begun; see turn_
   };
@@ -109,6 +134,9 @@ class WorkerPool {
   void StartThread();
   bool EngageThread();
   void RunJobs(std::unique_lock<std::mutex>* lock, Entries* ended);
+  static void Append(Lane* lane, std::string_view peer, Entries* job);
+  static Entries TakeSurplus(Lane* lane);
+  static Entries TakeFrom(Lane* lane, PeerQueues::iterator peer, Entries::iterator entry);
   Entries::iterator Begin(Lane* lane);
   void End(Entries::iterator entry, Entries* ended);
   void WatchNoLaterThan(Clock::time_point time);

@@ -188,6 +188,7 @@ void Session::Advance() {
 void Session::BeginExchange() {
   Head head = reader_.MakeHead();
   head.peer = peer_;
+  head.recent_requests = requests_.Add(since_);
   form_ = FormOf(head, reader_.is_old());
   record_.method = head.method;
   record_.target = head.target;

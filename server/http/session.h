@@ -14,6 +14,7 @@
 #include "budget.h"
 #include "http.h"
 #include "mailbox.h"
+#include "recent_count.h"
 #include "request_reader.h"
 #include "response_writer.h"
 #include "stream.h"
@@ -109,6 +110,7 @@ class Session : public std::enable_shared_from_this<Session> {
   bool reading_ = false;     // a read is under way
   bool continuing_ = false;  // "100 Continue" is being written
 
+  RecentCount requests_;
   boost::beast::flat_buffer buffer_;
   RequestReader reader_;
   AnswerForm form_;

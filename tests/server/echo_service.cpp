@@ -49,7 +49,12 @@ EchoService::~EchoService() {
 std::variant<std::shared_ptr<Exchange>, Response> EchoService::Begin(const Head& head) {
   const std::lock_guard<std::mutex> lock(mutex_);
   ++heads_;
-  last_ = {std::string(head.target), std::string(head.query), std::string(head.host.value_or("")), head.peer, {}};
+  last_ = {std::string(head.target),
+           std::string(head.query),
+           std::string(head.host.value_or("")),
+           head.peer,
+           head.recent_requests,
+           {}};
   for (const auto& [name, value] : head.headers) last_.headers.emplace(name, value);
   if (head.target == "/no") return Response{404, "refused"};
   if (head.target == "/fixed") return fixed_;

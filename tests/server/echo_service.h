@@ -33,6 +33,7 @@ class EchoService : public Service {
     std::string query;
     std::string host;
     Peer peer;
+    unsigned recent_requests = 0;
     std::map<std::string, std::string> headers;
   };
 

@@ -9,6 +9,20 @@ namespace {
 
 using testing::HasSubstr;
 
+TEST_F(HttpTest, TellsTheServiceHowBusyAConnectionIs) {
+  Start();
+  Connection client = Connect();
+  std::string requests;
+  for (int i = 0; i < 64; ++i) requests += Post("/a", "{}");
+  client.Send(requests);
+  for (int i = 0; i < 64; ++i) ASSERT_EQ(client.Receive().status, 200);
+  EXPECT_GT(service_.last().recent_requests, 0U);
+  Connection other = Connect();
+  other.Send(Post("/a", "{}"));
+  other.Receive();
+  EXPECT_EQ(service_.last().recent_requests, 0U);
+}
+
 TEST_F(HttpTest, AnswersWithTheHeadersOfEveryAnswer) {
   Start();
   Connection client = Connect();

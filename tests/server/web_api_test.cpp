@@ -20,6 +20,12 @@ void Who(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
   response->SetSuccess(call.caller + " at " + call.origin);
 }
 
+std::shared_future<void> release;  // the end of Hold
+void Hold(VORN::APIRequest* /*request*/, VORN::APIResponse* response) {
+  release.wait();
+  response->SetSuccess({});
+}
+
 class WebApiTest : public testing::Test {
  protected:
   static Head Post(std::string_view target) {
@@ -45,6 +51,14 @@ class WebApiTest : public testing::Test {
     return std::holds_alternative<Response>(begun) ? std::get<Response>(begun).status : 0;
   }
 
+  // A pool in which one call of a method runs and two wait.
+  static WorkerPool::Limits FewOfALane() {
+    WorkerPool::Limits limits;
+    limits.lane_threads = 1;
+    limits.lane_queue = 2;
+    return limits;
+  }
+
   static Descriptor ParseDescriptor() {
     std::string error;
     return *Descriptor::Parse(
@@ -53,9 +67,11 @@ class WebApiTest : public testing::Test {
   }
 
   std::vector<Module> modules_{
-      {"a.so", {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}, {"Nfs", 1, "who", Who}}, ParseDescriptor()}};
+      {"a.so",
+       {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}, {"Nfs", 1, "who", Who}, {"Nfs", 1, "hold", Hold}},
+       ParseDescriptor()}};
   Routes routes_{modules_};
-  Workers workers_;
+  Workers workers_{FewOfALane()};
   Budget memory_{std::size_t{1} << 30, std::size_t{1} << 30};
   Sandbox sandbox_;
   std::string error_;
@@ -265,6 +281,34 @@ TEST_F(WebApiTest, TakesParametersInUtf8Only) {
   for (const char* charset : {"iso-8859-1", "utf-16", "\"\""}) {
     EXPECT_EQ(Begin(PostJson("application/json; charset=" + std::string(charset))), 415) << charset;
   }
+}
+
+TEST_F(WebApiTest, CallsOfAFewProcessesLeaveRoomToOthers) {
+  std::promise<void> end;
+  release = end.get_future().share();
+  const auto call = [this](pid_t pid, unsigned recent_requests) {
+    Head head = Post("/api/Nfs/v1/hold");
+    head.peer.credentials->pid = pid;
+    head.recent_requests = recent_requests;
+    auto begun = api_.Begin(head);
+    const auto status = std::make_shared<std::promise<int>>();
+    std::get<std::shared_ptr<Exchange>>(begun)->Run(
+        [status](const Response& answer) { status->set_value(answer.status); });
+    api_.Dispatch();
+    return status->get_future();
+  };
+  auto running = call(1, 0);
+  ASSERT_TRUE(Eventually([this] { return workers_.changing.load().running == 1; }));
+  auto first = call(1, 0);
+  auto busy = call(1, 1);
+  auto second = call(1, 0);
+  EXPECT_EQ(busy.get(), 503) << "its connection has sent most requests";
+  auto other = call(2, 9);
+  EXPECT_EQ(second.get(), 503) << "its process has most calls";
+  end.set_value();
+  EXPECT_EQ(running.get(), 200);
+  EXPECT_EQ(first.get(), 200);
+  EXPECT_EQ(other.get(), 200);
 }
 
 TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {

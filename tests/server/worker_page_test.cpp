@@ -18,7 +18,7 @@ class Blocker : public Job {
   explicit Blocker(std::shared_future<void> end) : end_(std::move(end)) {}
   void Work() override { end_.wait(); }
   void Expire(bool /*running*/) override {}
-  void Refuse() override {}
+  void Refuse(Refused /*why*/) override {}
 
  private:
   const std::shared_future<void> end_;

@@ -23,6 +23,7 @@ class TestJob : public Job {
   struct Counts {
     std::atomic<int> done{0};
     std::atomic<int> refused{0};
+    std::atomic<int> displaced{0};
     std::atomic<int> expired_waiting{0};
     std::atomic<int> expired_running{0};
   };
@@ -33,7 +34,7 @@ class TestJob : public Job {
     ++counts_.done;
   }
   void Expire(bool running) override { ++(running ? counts_.expired_running : counts_.expired_waiting); }
-  void Refuse() override { ++counts_.refused; }
+  void Refuse(Refused why) override { ++(why == Refused::kClosed ? counts_.refused : counts_.displaced); }
 
  private:
   Counts& counts_;
@@ -132,6 +133,59 @@ TEST_F(WorkerPoolTest, TakesTheLanesByTurns) {
   Release();
   EXPECT_TRUE(Eventually([&] { return counts_.done == 8; }));
   EXPECT_EQ(order, "abcabaa");
+}
+
+// A pool with one thread, whose only lane is held until Release(). The jobs record the order in which they run.
+class WorkerPoolPeersTest : public WorkerPoolTest {
+ protected:
+  WorkerPoolPeersTest() {
+    SubmitHanging(pool_, 0);
+    EXPECT_TRUE(Eventually([this] { return hanging_ == 1; }));
+  }
+  bool SubmitOf(const char* peer, char mark, unsigned recent_requests = 0) {
+    auto job = std::make_shared<TestJob>(counts_, [this, mark] { order_ += mark; });
+    return pool_.Submit({&kLanes[0], JobSize::kSmall}, std::move(job), hours(1), {peer, recent_requests});
+  }
+  std::string OrderOf(int jobs) {
+    Release();
+    EXPECT_TRUE(Eventually([&] { return counts_.done == 1 + jobs; }));
+    return order_;
+  }
+
+ private:
+  std::string order_;
+  WorkerPool pool_{Limits(1, 1, 4)};
+};
+
+TEST_F(WorkerPoolPeersTest, TakeTurns) {
+  SubmitOf("a", '1');
+  SubmitOf("a", '2');
+  SubmitOf("b", '3');
+  SubmitOf("c", '4');
+  EXPECT_EQ(OrderOf(4), "1342");
+}
+
+TEST_F(WorkerPoolPeersTest, WithMostJobsMakeRoomForOthers) {
+  for (const char mark : {'1', '2', '3'}) SubmitOf("a", mark);
+  EXPECT_TRUE(SubmitOf("b", '4', 9));
+  EXPECT_TRUE(SubmitOf("b", '5', 9)) << "displaces a job of a";
+  EXPECT_EQ(counts_.displaced, 1);
+  EXPECT_FALSE(SubmitOf("b", '6', 9)) << "would displace a job of b";
+  EXPECT_EQ(counts_.displaced, 1);
+  EXPECT_TRUE(SubmitOf("c", '7'));
+  EXPECT_EQ(counts_.displaced, 2);
+  EXPECT_EQ(OrderOf(4), "1472");
+}
+
+TEST_F(WorkerPoolPeersTest, LoseTheJobOfTheirBusiestConnection) {
+  SubmitOf("a", '1', 5);
+  SubmitOf("a", '2', 7);
+  SubmitOf("a", '3', 7);
+  SubmitOf("a", '4', 6);
+  EXPECT_TRUE(SubmitOf("a", '5', 0));
+  EXPECT_EQ(counts_.displaced, 1);
+  EXPECT_FALSE(SubmitOf("a", '6', 7)) << "the last one of several goes";
+  EXPECT_EQ(OrderOf(4), "1245");
 }
 
 TEST_F(WorkerPoolTest, LargeJobsLeaveTheShortThreadsToSmallJobsOfTheSameOwner) {

@@ -48,7 +48,7 @@ class FuzzedServer {
     path_ = std::string(folder) + "/socket";
     std::string error;
     std::vector<Listener> listeners;
-    listeners.push_back(*OpenListener("unix:" + path_, false, &error));
+    listeners.push_back(*OpenListener("unix:" + path_, &error));
     server_ = std::make_unique<HttpServer>(service_, std::move(listeners));
   }
   ~FuzzedServer() {

@@ -7,8 +7,10 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <ctime>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -19,7 +21,9 @@
 
 #include "access_log.h"
 #include "authenticator.h"
+#include "browser_guard.h"
 #include "budget.h"
+#include "configuration.h"
 #include "http.h"
 #include "listener.h"
 #include "memory.h"
@@ -42,14 +46,9 @@
 namespace vorn::server {
 namespace {
 
-// The memory that the bodies of all requests may have, and those of one address.
-constexpr std::size_t kBodies = std::size_t{12} * 1024 * 1024;
-constexpr std::size_t kBodiesOfPeer = std::size_t{4} * 1024 * 1024;
-
-// The memory of the parsed parameters of all requests. The most expensive single call takes 42 MiB of it.
-constexpr std::size_t kMemory = std::size_t{48} * 1024 * 1024;
 constexpr const char* kHelperName = "vorn-pam-helper";
 constexpr std::chrono::seconds kStopLimit{10};  // for running calls, after SIGTERM
+constexpr std::chrono::hours kLookAfter{12};    // between two looks after what changes with time
 
 // systemd copies standard error into the journal, which also receives syslog(3): each line would be logged twice.
 bool StartedBySystemd() {
@@ -59,6 +58,13 @@ bool StartedBySystemd() {
 
 // Notifies systemd if it started this process with Type=notify (sd_notify(3)); otherwise does nothing.
 void Notify(const char* state) { sd_notify(0, state); }
+
+void NotifyReloading() {
+  timespec now{};
+  clock_gettime(CLOCK_MONOTONIC, &now);
+  const auto microseconds = std::int64_t{now.tv_sec} * 1000000 + now.tv_nsec / 1000;
+  Notify(("RELOADING=1\nMONOTONIC_USEC=" + std::to_string(microseconds)).c_str());
+}
 
 // The folder of this program.
 std::filesystem::path ProgramFolder() {
@@ -76,12 +82,12 @@ std::string DefaultModuleFolder() {
 }
 
 // The command of the program that checks passwords. In the build tree it is beside this program.
-std::vector<std::string> PasswordHelper(const Options& options) {
+std::vector<std::string> PasswordHelper(const Options& options, const Settings& settings) {
   std::error_code failure;
   const auto built = ProgramFolder() / kHelperName;
   const auto installed = ProgramFolder().parent_path() / VORN_HELPER_FOLDER / kHelperName;
   return {std::filesystem::exists(built, failure) ? built.string() : installed.string(), options.root,
-          options.administrators, options.readers};
+          settings.administrators.name, settings.readers.name};
 }
 
 // Returns the number of a group of this system; std::nullopt, which is logged, if there is none.
@@ -92,9 +98,9 @@ std::optional<gid_t> GroupId(const std::string& name) {
 }
 
 // The groups in a trial root are not those of the processes that connect to its socket.
-LocalGroups GroupsAtSocket(const Options& options) {
+LocalGroups GroupsAtSocket(const Options& options, const Settings& settings) {
   if (options.root != "/") return {};
-  return {GroupId(options.administrators), GroupId(options.readers)};
+  return {GroupId(settings.administrators.name), GroupId(settings.readers.name)};
 }
 
 // Printed, never logged.
@@ -119,8 +125,7 @@ void PrintSignInLink(const std::vector<Listener>& listeners, Sessions* sessions)
   _exit(EXIT_SUCCESS);
 }
 
-std::optional<std::vector<Listener>> Listen(const Options& options, const RuntimeFolder& folder) {
-  const bool allow_tcp = options.root != "/";
+std::optional<std::vector<Listener>> Listen(const Settings& settings, const RuntimeFolder& folder) {
   std::vector<Listener> listeners;
   std::string error;
   const auto keep = [&](const std::string& name, std::optional<Listener> listener) {
@@ -133,60 +138,152 @@ std::optional<std::vector<Listener>> Listen(const Options& options, const Runtim
     return true;
   };
   for (UniqueFd& socket : TakeActivatedSockets()) {
-    if (!keep("Socket from systemd", AdoptListener(std::move(socket), allow_tcp, &error))) return std::nullopt;
+    if (!keep("Socket from systemd", AdoptListener(std::move(socket), &error))) return std::nullopt;
   }
-  std::vector<std::string> addresses = options.listen;
+  std::vector<std::string> addresses = settings.listen.each;
   if (addresses.empty() && listeners.empty()) addresses.push_back("unix:" + folder.path() + "/vornd.sock");
   for (const std::string& address : addresses) {
-    if (!keep("--listen " + address, OpenListener(address, allow_tcp, &error))) return std::nullopt;
+    if (!keep(address, OpenListener(address, &error))) return std::nullopt;
   }
   return listeners;
 }
 
-int Serve(const Options& options) {
+// The objects that a reload changes.
+struct Reloadable {
+  Sessions& sessions;
+  Authenticator& authenticator;
+  PasswordChecker& passwords;
+  OwnNames& names;
+};
+
+Sessions::Limits SessionLimits(const Settings& settings) {
+  Sessions::Limits limits;
+  limits.idle = settings.session_idle.time;
+  limits.lifetime = settings.session_lifetime.time;
+  limits.per_account = settings.sessions_per_account.number;
+  limits.total = settings.sessions.number;
+  return limits;
+}
+
+// Applies the settings that may change while the server runs.
+void Apply(const Options& options, const Settings& settings, const Reloadable& parts) {
+  setlogmask(LOG_UPTO(settings.log_level.priority));
+  parts.sessions.SetLimits(SessionLimits(settings));
+  parts.authenticator.SetGroups(GroupsAtSocket(options, settings));
+  parts.passwords.SetCommand(PasswordHelper(options, settings));
+  parts.names.Set(settings.host_names.each);
+}
+
+// Reads the configuration again. If it has a fault, nothing changes.
+void Reload(const Options& options, const Reloadable& parts, Settings* settings) {
+  NotifyReloading();
+  Configuration next = LoadConfiguration(options);
+  for (const std::string& fault : next.faults) syslog(LOG_ERR, "%s", fault.c_str());
+  if (next.faults.empty()) {
+    for (const std::string& key : NeedRestart(*settings, next.settings)) {
+      syslog(LOG_WARNING, "%s has changed, which only a restart applies", key.c_str());
+    }
+    Apply(options, next.settings, parts);
+    *settings = std::move(next.settings);
+    syslog(LOG_NOTICE, "The configuration was read again");
+  } else {
+    syslog(LOG_ERR, "The configuration is not applied; the previous one stays in force");
+  }
+  Notify("READY=1");
+}
+
+// Handles signals until the server is to end.
+void Attend(const Options& options, const Reloadable& parts, Settings settings) {
+  for (;;) {
+    switch (AwaitSignal(kLookAfter)) {
+      case Awaited::kTermination:
+        return;
+      case Awaited::kReload:
+        Reload(options, parts, &settings);
+        break;
+      case Awaited::kTime:
+        break;
+    }
+  }
+}
+
+AccessLog::Sink AccessSink(const Settings& settings) {
+  if (!settings.access_log)
+    return {[](const AccessRecord& /*record*/) {}, [] {}, [](const AccessLog::Counts& /*counts*/) {}};
+  return StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO);
+}
+
+// The folders that the server needs below its root.
+struct Folders {
+  RuntimeFolder runtime;
+  UploadFolder uploads;
+  std::string state;
+};
+
+std::optional<Folders> OpenFolders(const Options& options) {
   std::string error;
-  const std::optional<RuntimeFolder> folder = RuntimeFolder::Claim(options.root, &error);
+  std::optional<RuntimeFolder> runtime = RuntimeFolder::Claim(options.root, &error);
   std::optional<UploadFolder> uploads;
-  if (folder) uploads = UploadFolder::Open(folder->path() + "/uploads", &error);
+  if (runtime) uploads = UploadFolder::Open(runtime->path() + "/uploads", &error);
   std::optional<std::string> state;
   if (uploads) state = MakeFolders(options.root, {"var", "lib", "vorn"}, &error);
-  if (!state || !CatchTermination(&error)) {
-    syslog(LOG_ERR, "%s", error.c_str());
-    return EXIT_FAILURE;
-  }
+  if (state) return Folders{*std::move(runtime), *std::move(uploads), *std::move(state)};
+  syslog(LOG_ERR, "%s", error.c_str());
+  return std::nullopt;
+}
+
+std::vector<Module> LoadModulesOf(const Settings& settings) {
+  const std::string folder = settings.modules.path.empty() ? DefaultModuleFolder() : settings.modules.path;
+  std::vector<Module> modules = LoadModules(folder);
+  if (modules.empty()) syslog(LOG_ERR, "%s: there is no module to serve", folder.c_str());
+  return modules;
+}
+
+int Serve(const Options& options, const Settings& settings) {
+  const std::optional<Folders> folders = OpenFolders(options);
+  std::string error;
+  if (folders && !CatchSignals(&error)) syslog(LOG_ERR, "%s", error.c_str());
+  if (!folders || !error.empty()) return EXIT_FAILURE;
   (void)VORN::RemoveLeftovers();  // a failure is logged, and is no reason not to serve
-  const std::string module_folder = options.modules.empty() ? DefaultModuleFolder() : options.modules;
-  const std::vector<Module> modules = LoadModules(module_folder);
-  if (modules.empty()) {
-    syslog(LOG_ERR, "%s: there is no module to serve", module_folder.c_str());
-    return EXIT_FAILURE;
-  }
-  std::optional<std::vector<Listener>> listeners = Listen(options, *folder);
+  const std::vector<Module> modules = LoadModulesOf(settings);
+  if (modules.empty()) return EXIT_FAILURE;
+  std::optional<std::vector<Listener>> listeners = Listen(settings, folders->runtime);
   if (!listeners) return EXIT_FAILURE;
 
-  TokenStore tokens(*state + "/tokens.json");
-  Sessions sessions(Sessions::Limits{});
-  PasswordChecker passwords(PasswordHelper(options), PasswordChecker::Limits{});
-  const Authenticator authenticator(tokens, sessions, GroupsAtSocket(options));
+  TokenStore tokens(folders->state + "/tokens.json");
+  Sessions sessions(SessionLimits(settings));
+  PasswordChecker passwords(PasswordHelper(options, settings), PasswordChecker::Limits{});
+  Authenticator authenticator(tokens, sessions, {});
+  OwnNames names;
+  const Reloadable reloadable{sessions, authenticator, passwords, names};
+  Apply(options, settings, reloadable);
   if (options.sign_in_link) PrintSignInLink(*listeners, &sessions);
   Routes routes(modules);
   AddServerMethods(tokens, sessions, &routes);
-  Budget memory(kMemory, kMemory);
-  Budget bodies(kBodies, kBodiesOfPeer);
-  const OwnNames names(options.host_names);
+  Budget memory(settings.parameter_memory.bytes, settings.parameter_memory.bytes);
+  Budget bodies(settings.body_memory.bytes, settings.body_memory_per_address.bytes);
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
-  AccessLog log(StartedBySystemd() ? JournalSink() : LineSink(STDERR_FILENO));
+  AccessLog log(AccessSink(settings));
   CallMetrics metrics;
   const std::vector<MetricsSource> figures = {[&] {
                                                 return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
                                               },
                                               ProcessMetrics, VORN::ReadMetrics};
   Workers workers;  // after everything that a running call uses: its destructor waits for them
-  WebApi api({routes, *uploads, workers, memory, names, audit, metrics, figures, authenticator, {sessions, passwords}});
-  const HttpLimits limits = FitToDescriptors(HttpLimits{}, *listeners, DescriptorLimit());
+  WebApi api({routes,
+              folders->uploads,
+              workers,
+              memory,
+              names,
+              audit,
+              metrics,
+              figures,
+              authenticator,
+              {sessions, passwords}});
+  const HttpLimits limits = FitToDescriptors(HttpLimitsOf(settings), *listeners, DescriptorLimit());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
   Notify("READY=1");
-  WaitForTermination();
+  Attend(options, reloadable, settings);
   Notify("STOPPING=1");
   server.Stop();
   workers.Close();
@@ -208,6 +305,21 @@ bool SettleRoot(Options* options) {
   return false;
 }
 
+// Prints what is wrong with the configuration.
+int Check(const Options& options, const Configuration& configuration) {
+  for (const std::string& fault : configuration.faults) std::fprintf(stderr, "%s\n", fault.c_str());
+  if (!configuration.faults.empty()) return EXIT_FAILURE;
+  std::printf("%s: no fault\n", ConfigurationPath(options).c_str());
+  return EXIT_SUCCESS;
+}
+
+int Run(const Options& options) {
+  const Configuration configuration = LoadConfiguration(options);
+  if (options.check) return Check(options, configuration);
+  for (const std::string& fault : configuration.faults) syslog(LOG_ERR, "%s", fault.c_str());
+  return configuration.faults.empty() ? Serve(options, configuration.settings) : EXIT_FAILURE;
+}
+
 }  // namespace
 }  // namespace vorn::server
 
@@ -218,7 +330,7 @@ int main(int argc, char** argv) {
   ConfigureAllocator();
   openlog("vornd", LOG_PID | (StartedBySystemd() ? 0 : LOG_PERROR), LOG_DAEMON);
   auto& options = std::get<Options>(parsed);
-  const int status = SettleRoot(&options) ? Serve(options) : EXIT_FAILURE;
+  const int status = SettleRoot(&options) ? Run(options) : EXIT_FAILURE;
   closelog();
   return status;
 }

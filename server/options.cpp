@@ -6,8 +6,9 @@ namespace vorn::server {
 namespace {
 
 constexpr const char* kFooter =
-    "\nADDRESS is unix:/PATH or, with a --root of your own, 127.0.0.1:PORT or [::1]:PORT.\n"
-    "Without any, and without sockets from systemd, it is unix:ROOT/run/vorn/vornd.sock.";
+    "\nADDRESS is unix:/PATH, 127.0.0.1:PORT or [::1]:PORT.\n"
+    "Without any, and without sockets from systemd, it is unix:ROOT/run/vorn/vornd.sock.\n"
+    "The configuration file, which the options override, is described in vornd.conf(5).";
 
 }  // namespace
 
@@ -20,6 +21,10 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
       ->type_name("DIR")
       ->take_last()
       ->capture_default_str();
+  app.add_option("--config", options.config, "Read FILE instead of ROOT/etc/vorn/vornd.conf")
+      ->type_name("FILE")
+      ->take_last();
+  app.add_flag("--check", options.check, "Report what is wrong with the configuration, and end");
   app.add_option("--modules", options.modules, "Load the modules in DIR")->type_name("DIR")->take_last();
   app.add_option("--listen", options.listen, "Listen at ADDRESS; may be given several times")
       ->type_name("ADDRESS")
@@ -31,12 +36,10 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
       ->allow_extra_args(false);
   app.add_option("--administrators", options.administrators, "Members of GROUP may do everything")
       ->type_name("GROUP")
-      ->take_last()
-      ->capture_default_str();
+      ->take_last();
   app.add_option("--readers", options.readers, "Members of GROUP may call the methods that only read")
       ->type_name("GROUP")
-      ->take_last()
-      ->capture_default_str();
+      ->take_last();
   app.add_flag("--sign-in-link", options.sign_in_link,
                "With a --root of your own: print a link with which somebody can sign in once");
   try {

@@ -10,12 +10,16 @@ namespace vorn::server {
 
 struct Options {
   std::string root = "/";
-  std::string modules;                        // empty: where this program's modules are
-  std::vector<std::string> host_names;        // of this server, besides localhost
-  std::vector<std::string> listen;            // empty: the Unix socket below the root
-  std::string administrators = "vorn-admin";  // the group whose members may do everything
-  std::string readers = "vorn-readonly";      // the group whose members may call methods that only read
-  bool sign_in_link = false;                  // print a one-time link
+  std::string config;         // empty: ROOT/etc/vorn/vornd.conf, which may be missing
+  bool check = false;         // only check the configuration
+  bool sign_in_link = false;  // print a one-time link
+
+  // These override the configuration file, unless they are empty.
+  std::string modules;
+  std::vector<std::string> host_names;
+  std::vector<std::string> listen;
+  std::string administrators;
+  std::string readers;
 };
 
 // Returns the options, or the exit status if the program must end: 0 after printing help or version, 2 after

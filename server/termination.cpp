@@ -3,21 +3,31 @@
 #include <semaphore.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <csignal>
 #include <cstring>
+#include <ctime>
 
 namespace vorn::server {
 namespace {
 
-sem_t terminated;  // sem_post(3) is async-signal-safe
-volatile std::sig_atomic_t signals = 0;
+sem_t arrived;  // sem_post(3) is async-signal-safe
+std::atomic<bool> terminated{false};
+std::atomic<bool> reload_wanted{false};
+static_assert(std::atomic<bool>::is_always_lock_free, "only lock-free atomics may be used in a signal handler");
 
-void OnSignal(int number) {
+void OnTermination(int number) {
   const int saved = errno;
-  if (signals > 0) _exit(128 + number);
-  signals = 1;
-  sem_post(&terminated);
+  if (terminated.exchange(true)) _exit(128 + number);
+  sem_post(&arrived);
+  errno = saved;
+}
+
+void OnHangup(int /*number*/) {
+  const int saved = errno;
+  reload_wanted = true;
+  sem_post(&arrived);
   errno = saved;
 }
 
@@ -30,17 +40,24 @@ bool Handle(int number, void (*handler)(int)) {
 
 }  // namespace
 
-bool CatchTermination(std::string* error) {
-  if (sem_init(&terminated, 0, 0) == 0 && Handle(SIGTERM, OnSignal) && Handle(SIGINT, OnSignal) &&
-      Handle(SIGPIPE, SIG_IGN)) {
+bool CatchSignals(std::string* error) {
+  if (sem_init(&arrived, 0, 0) == 0 && Handle(SIGTERM, OnTermination) && Handle(SIGINT, OnTermination) &&
+      Handle(SIGHUP, OnHangup) && Handle(SIGPIPE, SIG_IGN)) {
     return true;
   }
   *error = std::string("signals: ") + std::strerror(errno);
   return false;
 }
 
-void WaitForTermination() {
-  while (sem_wait(&terminated) != 0 && errno == EINTR) {
+Awaited AwaitSignal(std::chrono::seconds limit) {
+  timespec end{};
+  clock_gettime(CLOCK_MONOTONIC, &end);
+  end.tv_sec += limit.count();
+  for (;;) {
+    const bool timed_out = sem_clockwait(&arrived, CLOCK_MONOTONIC, &end) != 0 && errno == ETIMEDOUT;
+    if (terminated) return Awaited::kTermination;
+    if (reload_wanted.exchange(false)) return Awaited::kReload;
+    if (timed_out) return Awaited::kTime;
   }
 }
 

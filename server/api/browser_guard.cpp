@@ -37,11 +37,16 @@ std::string_view WithoutPort(std::string_view host, std::string_view port) {
 
 }  // namespace
 
-OwnNames::OwnNames(std::vector<std::string> names) : names_(std::move(names)) {
-  for (std::string& name : names_) name = LowerAscii(name);
+OwnNames::OwnNames(std::vector<std::string> names) { Set(std::move(names)); }
+
+void OwnNames::Set(std::vector<std::string> names) {
+  for (std::string& name : names) name = LowerAscii(name);
+  const std::lock_guard<std::mutex> lock(mutex_);
+  names_ = std::move(names);
 }
 
 bool OwnNames::HasGivenName(std::string_view host) const {
+  const std::lock_guard<std::mutex> lock(mutex_);
   return std::any_of(names_.begin(), names_.end(), [host](const std::string& name) { return HasName(host, name); });
 }
 

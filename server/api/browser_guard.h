@@ -2,6 +2,7 @@
 #ifndef VORN_SERVER_BROWSER_GUARD_H
 #define VORN_SERVER_BROWSER_GUARD_H
 
+#include <mutex>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -11,11 +12,14 @@
 namespace vorn::server {
 
 // The host names by which browsers reach this server: localhost, 127.0.0.1 and [::1] over HTTP, and the given names
-// over HTTPS. Immutable.
+// over HTTPS. Thread-safe.
 class OwnNames {
  public:
   // Names have no port; an IPv6 address is in brackets. Upper and lower case are the same.
   explicit OwnNames(std::vector<std::string> names = {});
+
+  // Replaces the given names.
+  void Set(std::vector<std::string> names);
 
   // Returns whether a Host header (RFC 9110, 7.2) has one of the names, with any port or none. A site whose name
   // resolves to an address of this server has another name ("DNS rebinding").
@@ -31,7 +35,8 @@ class OwnNames {
  private:
   bool HasGivenName(std::string_view host) const;
 
-  std::vector<std::string> names_;
+  mutable std::mutex mutex_;
+  std::vector<std::string> names_;  // with mutex_
 };
 
 // Returns whether a Sec-Fetch-Site header (W3C Fetch Metadata) says that the browser makes the request for a page of

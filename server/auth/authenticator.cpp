@@ -67,10 +67,21 @@ CallerPtr Authenticator::CallerOfToken(const Head& head, std::string_view secret
   return tokens_.Use(secret, head.peer.address, std::time(nullptr));
 }
 
+void Authenticator::SetGroups(LocalGroups groups) {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  groups_ = groups;
+}
+
+LocalGroups Authenticator::groups() const {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return groups_;
+}
+
 CallerPtr Authenticator::CallerAtSocket(const Peer::Credentials& peer) const {
+  const LocalGroups groups = this->groups();
   const bool own = peer.uid == 0 || peer.uid == geteuid();
-  const bool administrator = own || BelongsTo(peer, groups_.administrators);
-  if (!administrator && !BelongsTo(peer, groups_.readers)) return nullptr;
+  const bool administrator = own || BelongsTo(peer, groups.administrators);
+  if (!administrator && !BelongsTo(peer, groups.readers)) return nullptr;
   auto caller = std::make_shared<Caller>();
   caller->name = "uid " + std::to_string(peer.uid);
   caller->role = administrator ? Role::kAdministrator : Role::kReader;

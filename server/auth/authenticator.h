@@ -4,6 +4,7 @@
 
 #include <sys/types.h>
 
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -29,6 +30,9 @@ class Authenticator {
   Authenticator(TokenStore& tokens, Sessions& sessions, LocalGroups groups)
       : tokens_(tokens), sessions_(sessions), groups_(groups) {}
 
+  // Concerns the requests that begin from now on.
+  void SetGroups(LocalGroups groups);
+
   // Returns the caller, or nullptr if the request has no valid credentials. A token or session in the head decides
   // alone; without one, the peer of a Unix socket does.
   //
@@ -37,12 +41,14 @@ class Authenticator {
   CallerPtr Identify(const Head& head, bool secure) const;
 
  private:
+  LocalGroups groups() const;
   CallerPtr CallerOfToken(const Head& head, std::string_view secret) const;
   CallerPtr CallerAtSocket(const Peer::Credentials& peer) const;
 
   TokenStore& tokens_;
   Sessions& sessions_;
-  const LocalGroups groups_;
+  mutable std::mutex mutex_;
+  LocalGroups groups_;  // with mutex_
 };
 
 // The Set-Cookie header (RFC 6265, 4.1; prefix "__Host-": RFC 6265bis, 4.1.3) that gives a browser this session, or

@@ -23,9 +23,9 @@ using Kind = PasswordVerdict::Kind;
 }  // namespace
 
 PasswordChecker::PasswordChecker(std::vector<std::string> command, Limits limits)
-    : command_(std::move(command)),
-      limits_(limits),
+    : limits_(limits),
       wake_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)),
+      command_(std::move(command)),
       throttle_(limits.throttle) {
   if (!wake_) throw std::system_error(errno, std::generic_category(), "eventfd");
   thread_ = std::thread([this] { Work(); });
@@ -34,6 +34,16 @@ PasswordChecker::PasswordChecker(std::vector<std::string> command, Limits limits
 PasswordChecker::~PasswordChecker() {
   Close();
   thread_.join();
+}
+
+void PasswordChecker::SetCommand(std::vector<std::string> command) {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  command_ = std::move(command);
+}
+
+std::vector<std::string> PasswordChecker::command() {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return command_;
 }
 
 void PasswordChecker::Close() {
@@ -150,7 +160,7 @@ void PasswordChecker::Advance(Attempt* attempt, Clock::time_point now) {
 
 void PasswordChecker::Begin(Attempt* attempt, Clock::time_point now) {
   std::string error;
-  std::optional<HelperProcess> process = HelperProcess::Start(command_, attempt->request, &error);
+  std::optional<HelperProcess> process = HelperProcess::Start(command(), attempt->request, &error);
   Wipe(&attempt->request.password);
   if (process) {
     attempt->process.emplace(*std::move(process));

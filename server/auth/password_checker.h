@@ -50,6 +50,9 @@ class PasswordChecker {
   PasswordChecker(const PasswordChecker&) = delete;
   PasswordChecker& operator=(const PasswordChecker&) = delete;
 
+  // Concerns the attempts whose process has not been started.
+  void SetCommand(std::vector<std::string> command);
+
   // Ends the helper processes. Attempts that are not done, and all further ones, are answered with kUnavailable. Does
   // not wait.
   void Close();
@@ -71,6 +74,7 @@ class PasswordChecker {
   };
   using Attempts = std::list<Attempt>;
 
+  std::vector<std::string> command();
   void Work();
   void Watch();
   static void AnswerAll(Attempts* attempts);
@@ -84,11 +88,11 @@ class PasswordChecker {
   std::size_t Running() const;
   void Wait();
 
-  const std::vector<std::string> command_;
   const Limits limits_;
   UniqueFd wake_;  // eventfd(2)
   std::mutex mutex_;
-  Attempts arrived_;  // with mutex_
+  std::vector<std::string> command_;  // with mutex_
+  Attempts arrived_;                  // with mutex_
   bool ending_ = false;
   Throttle throttle_;  // this and attempts_ are used by the thread alone
   Attempts attempts_;

@@ -12,6 +12,16 @@
 
 namespace vorn::server {
 
+Sessions::Limits Sessions::limits() const {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return limits_;
+}
+
+void Sessions::SetLimits(const Limits& limits) {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  limits_ = limits;
+}
+
 bool Sessions::IsOver(const Entry& entry, Clock::time_point now) const {
   return now - entry.used >= limits_.idle || now - entry.begun >= limits_.lifetime;
 }

@@ -41,7 +41,9 @@ class Sessions {
   };
 
   explicit Sessions(Limits limits) : limits_(limits) {}
-  const Limits& limits() const { return limits_; }
+  Limits limits() const;
+  // Also concerns the sessions that have begun.
+  void SetLimits(const Limits& limits);
 
   // Begins a session and returns its secret.
   std::string Begin(const std::string& account, Role role, const std::string& address, Carrier carrier,
@@ -75,8 +77,8 @@ class Sessions {
   void RemoveOver(Clock::time_point now);
   void RemoveLeastRecent(std::size_t limit, const std::string* account);
 
-  const Limits limits_;
-  std::mutex mutex_;
+  mutable std::mutex mutex_;
+  Limits limits_;
   Entries entries_;
   std::string code_digest_;  // empty: there is no code
   Clock::time_point code_end_;

@@ -22,7 +22,6 @@ namespace {
 
 constexpr std::string_view kUnixScheme = "unix:";
 constexpr std::string_view kRule = "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at";
-constexpr std::string_view kNoTcp = "TCP is for a trial root (--root) alone, because nobody can log in yet";
 
 // Any socket address, with its size in bytes.
 struct SocketAddress {
@@ -79,6 +78,8 @@ std::optional<SocketAddress> ParseTcp(std::string_view address) {
   }
   return std::nullopt;
 }
+
+bool IsUnix(std::string_view address) { return address.substr(0, kUnixScheme.size()) == kUnixScheme; }
 
 std::optional<SocketAddress> UnixAddress(const std::string& path, std::string* error) {
   sockaddr_un address{};
@@ -170,35 +171,33 @@ Listener::~Listener() {
   if (!path_.empty()) unlink(path_.c_str());
 }
 
-std::optional<Listener> OpenListener(std::string_view address, bool allow_tcp, std::string* error) {
-  error->clear();
-  if (address.substr(0, kUnixScheme.size()) == kUnixScheme) {
-    return OpenUnix(std::string(address.substr(kUnixScheme.size())), error);
+std::string FindAddressFault(std::string_view address) {
+  std::string error;
+  if (IsUnix(address)) {
+    (void)UnixAddress(std::string(address.substr(kUnixScheme.size())), &error);
+  } else if (!ParseTcp(address)) {
+    error = kRule;
   }
-  const std::optional<SocketAddress> tcp = ParseTcp(address);
-  if (!tcp) {
-    *error = kRule;
-    return std::nullopt;
-  }
-  if (!allow_tcp) {
-    *error = kNoTcp;
-    return std::nullopt;
-  }
-  UniqueFd socket = BindAndListen(*tcp);
-  if (socket) return AdoptListener(std::move(socket), allow_tcp, error);
+  return error;
+}
+
+std::optional<Listener> OpenListener(std::string_view address, std::string* error) {
+  *error = FindAddressFault(address);
+  if (!error->empty()) return std::nullopt;
+  if (IsUnix(address)) return OpenUnix(std::string(address.substr(kUnixScheme.size())), error);
+  UniqueFd socket = BindAndListen(*ParseTcp(address));
+  if (socket) return AdoptListener(std::move(socket), error);
   *error = SystemError(std::string(address));
   return std::nullopt;
 }
 
-std::optional<Listener> AdoptListener(UniqueFd socket, bool allow_tcp, std::string* error) {
+std::optional<Listener> AdoptListener(UniqueFd socket, std::string* error) {
   const SocketAddress address = LocalAddress(socket.get());
   std::string name = NameOf(address);
   if (sd_is_socket(socket.get(), AF_UNSPEC, SOCK_STREAM, 1) <= 0) {
     *error = "not a listening stream socket";
   } else if (name.empty()) {
     *error = kRule;
-  } else if (address.family() != AF_UNIX && !allow_tcp) {
-    *error = kNoTcp;
   } else {
     fcntl(socket.get(), F_SETFL, fcntl(socket.get(), F_GETFL) | O_NONBLOCK);
     return Listener(std::move(socket), address.family(), std::move(name), "");

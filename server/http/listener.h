@@ -1,4 +1,4 @@
-// Listening sockets: Unix sockets, and loopback addresses for a trial root.
+// Listening sockets: Unix sockets and loopback addresses.
 #ifndef VORN_SERVER_LISTENER_H
 #define VORN_SERVER_LISTENER_H
 
@@ -32,13 +32,15 @@ class Listener {
   std::string path_;
 };
 
-// Opens `address`: "unix:/PATH" (mode 0660; replaces the socket of a server that has ended), or
-// "127.0.0.1:PORT" and "[::1]:PORT" where `allow_tcp` (port 0 takes a free one). Nobody can log in
-// over TCP yet, so it is for trials alone. None on failure; `error` then says why.
-std::optional<Listener> OpenListener(std::string_view address, bool allow_tcp, std::string* error);
+// Returns why OpenListener() would refuse the syntax of `address`; empty if it would not.
+std::string FindAddressFault(std::string_view address);
+
+// Opens `address`: "unix:/PATH" (every local user may connect; replaces the socket of a server that has ended),
+// "127.0.0.1:PORT" or "[::1]:PORT" (port 0 takes a free one). Returns std::nullopt on failure; `error` then says why.
+std::optional<Listener> OpenListener(std::string_view address, std::string* error);
 
 // Adopts a listening socket that another program opened, under the same rules.
-std::optional<Listener> AdoptListener(UniqueFd socket, bool allow_tcp, std::string* error);
+std::optional<Listener> AdoptListener(UniqueFd socket, std::string* error);
 
 // Returns the sockets passed by systemd (sd_listen_fds(3)), not yet checked.
 std::vector<UniqueFd> TakeActivatedSockets();

@@ -114,8 +114,8 @@ void HttpTest::Start(const HttpLimits& limits, const HttpParts& parts) {
   static const std::string kHost = "127.0.0.1:";
   std::string error;
   std::vector<Listener> listeners;
-  listeners.push_back(*OpenListener("unix:" + path_, false, &error));
-  listeners.push_back(*OpenListener(kHost + "0", true, &error));
+  listeners.push_back(*OpenListener("unix:" + path_, &error));
+  listeners.push_back(*OpenListener(kHost + "0", &error));
   port_ = std::atoi(listeners[1].name().c_str() + kHost.size());
   server_ = std::make_unique<HttpServer>(service_, std::move(listeners), limits, parts);
 }

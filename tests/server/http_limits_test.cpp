@@ -207,8 +207,8 @@ TEST(FitToDescriptors, LeavesTheServersOwnFilesTheirReserve) {
   std::string error;
   const Sandbox sandbox;
   std::vector<Listener> listeners;
-  listeners.push_back(*OpenListener("unix:" + sandbox.File("s"), false, &error));
-  listeners.push_back(*OpenListener("127.0.0.1:0", true, &error));
+  listeners.push_back(*OpenListener("unix:" + sandbox.File("s"), &error));
+  listeners.push_back(*OpenListener("127.0.0.1:0", &error));
   const HttpLimits wanted;
   EXPECT_EQ(FitToDescriptors(wanted, listeners, 1100).tcp_connections.total, wanted.tcp_connections.total);
   for (const rlim_t descriptors : {300, 500, 1000}) {

@@ -13,17 +13,17 @@
 namespace vorn::server {
 namespace {
 
-std::string Refused(const std::string& address, bool allow_tcp = true) {
+std::string Refused(const std::string& address) {
   std::string error;
-  return OpenListener(address, allow_tcp, &error) ? "(opened)" : error;
+  return OpenListener(address, &error) ? "(opened)" : error;
 }
 
-TEST(Listener, OpensAUnixSocketForOwnerAndGroupAlone) {
+TEST(Listener, OpensAUnixSocketForAllLocalUsers) {
   const Sandbox sandbox;
   const std::string path = sandbox.File("s");
   std::string error;
   {
-    const auto listener = OpenListener("unix:" + path, false, &error);
+    const auto listener = OpenListener("unix:" + path, &error);
     ASSERT_TRUE(listener) << error;
     EXPECT_EQ(listener->name(), "unix:" + path);
     EXPECT_EQ(listener->family(), AF_UNIX);
@@ -39,8 +39,8 @@ TEST(Listener, ReplacesASocketWithoutAServer) {
   const Sandbox sandbox;
   const std::string address = "unix:" + sandbox.File("s");
   std::string error;
-  OpenListener(address, false, &error)->TakeSocket();
-  const auto gone = OpenListener(address, false, &error);
+  OpenListener(address, &error)->TakeSocket();
+  const auto gone = OpenListener(address, &error);
   EXPECT_TRUE(gone) << error;
 }
 
@@ -48,7 +48,7 @@ TEST(Listener, LeavesASocketThatIsServed) {
   const Sandbox sandbox;
   const std::string address = "unix:" + sandbox.File("s");
   std::string error;
-  const auto first = OpenListener(address, false, &error);
+  const auto first = OpenListener(address, &error);
   EXPECT_EQ(Refused(address), sandbox.File("s") + " is served by another program");
   EXPECT_TRUE(Connection::ToUnix(sandbox.File("s")).connected());
 }
@@ -60,13 +60,12 @@ TEST(Listener, LeavesAFileThatIsNoSocket) {
   EXPECT_EQ(ReadWholeFile(sandbox.File("s")), "precious");
 }
 
-TEST(Listener, OpensLoopbackWhereTcpIsAllowed) {
+TEST(Listener, OpensLoopback) {
   std::string error;
-  auto ipv4 = OpenListener("127.0.0.1:0", true, &error);
+  auto ipv4 = OpenListener("127.0.0.1:0", &error);
   ASSERT_TRUE(ipv4) << error;
   EXPECT_TRUE(Connection::ToPort(std::atoi(ipv4->name().c_str() + sizeof "127.0.0.1:" - 1)).connected());
   EXPECT_NE(Refused(ipv4->name()).find("Address already in use"), std::string::npos);
-  EXPECT_EQ(Refused("127.0.0.1:0", false), "TCP is for a trial root (--root) alone, because nobody can log in yet");
 }
 
 TEST(Listener, RefusesEveryOtherAddress) {
@@ -82,12 +81,13 @@ TEST(Listener, RefusesEveryOtherAddress) {
 
 TEST(Listener, AdoptsListeningSocketsUnderTheSameRules) {
   std::string error;
-  auto tcp = OpenListener("127.0.0.1:0", true, &error);
+  auto tcp = OpenListener("127.0.0.1:0", &error);
   ASSERT_TRUE(tcp) << error;
-  EXPECT_FALSE(AdoptListener(UniqueFd(dup(tcp->TakeSocket().get())), false, &error));
-  EXPECT_FALSE(AdoptListener(UniqueFd(socket(AF_UNIX, SOCK_STREAM, 0)), true, &error));
+  const UniqueFd socket_of_tcp = tcp->TakeSocket();
+  EXPECT_TRUE(AdoptListener(UniqueFd(dup(socket_of_tcp.get())), &error)) << error;
+  EXPECT_FALSE(AdoptListener(UniqueFd(socket(AF_UNIX, SOCK_STREAM, 0)), &error));
   EXPECT_EQ(error, "not a listening stream socket");
-  EXPECT_FALSE(AdoptListener(UniqueFd(open("/dev/null", O_RDONLY)), true, &error));
+  EXPECT_FALSE(AdoptListener(UniqueFd(open("/dev/null", O_RDONLY)), &error));
 }
 
 }  // namespace

@@ -18,14 +18,19 @@ TEST(Options, AreTheBoxItselfWithoutAny) {
   const auto options = std::get<Options>(Parse({}));
   EXPECT_EQ(options.root, "/");
   EXPECT_EQ(options.modules, "");
+  EXPECT_EQ(options.config, "");
+  EXPECT_FALSE(options.check);
   EXPECT_THAT(options.listen, IsEmpty());
 }
 
 TEST(Options, AreAllTaken) {
-  const auto options = std::get<Options>(Parse({"--root", "/srv/trial", "--modules=/m", "--listen", "unix:/a",
-                                                "--listen", "127.0.0.1:1", "--host-name", "nas"}));
+  const auto options =
+      std::get<Options>(Parse({"--root", "/srv/trial", "--modules=/m", "--listen", "unix:/a", "--listen", "127.0.0.1:1",
+                               "--host-name", "nas", "--config", "/c", "--check"}));
   EXPECT_EQ(options.root, "/srv/trial");
   EXPECT_EQ(options.modules, "/m");
+  EXPECT_EQ(options.config, "/c");
+  EXPECT_TRUE(options.check);
   EXPECT_THAT(options.listen, ElementsAre("unix:/a", "127.0.0.1:1"));
   EXPECT_THAT(options.host_names, ElementsAre("nas"));
 }
@@ -41,7 +46,8 @@ TEST(Options, HelpAndVersionEndWithSuccess) {
 
 TEST(Options, AMistakeEndsWithTwo) {
   testing::internal::CaptureStderr();
-  for (const char* word : {"--rot", "extra", "--root", "--listen"}) EXPECT_EQ(std::get<int>(Parse({word})), 2) << word;
+  for (const char* word : {"--rot", "extra", "--root", "--listen", "--config"})
+    EXPECT_EQ(std::get<int>(Parse({word})), 2) << word;
   EXPECT_THAT(testing::internal::GetCapturedStderr(), HasSubstr("--rot"));
 }
 

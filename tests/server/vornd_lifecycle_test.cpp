@@ -136,7 +136,7 @@ TEST(Vornd, SaysWhyItDoesNotStart) {
     const char* text;
     int status;
   } cases[] = {
-      {{"--listen", "0.0.0.0:80"}, "--listen 0.0.0.0:80: only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT", 1},
+      {{"--listen", "0.0.0.0:80"}, "--listen: \"0.0.0.0:80\": only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT", 1},
       {{"--listen", "unix:/nonexistent/s"}, "/nonexistent/s: No such file or directory", 1},
       {{"--modules", sandbox.File("empty")}, "there is no module to serve", 1},
       {{"--root", "/nonexistent"}, "--root: No such file or directory", 1},

@@ -3,6 +3,8 @@
 #include <openssl/evp.h>
 #include <openssl/sha.h>
 
+#include <utility>
+
 #include "answer.h"
 #include "header_value.h"
 #include "json_input.h"
@@ -44,14 +46,22 @@ std::string Digest(std::string_view text) {
 
 }  // namespace
 
-std::optional<std::string> MakeEntityTag(const Json::Value& parameters, std::string_view data) {
+std::optional<std::string> TaggedParameters(const Json::Value& parameters) {
+  std::optional<std::string> text(std::in_place);
+  if (!parameters.empty()) text = WriteJson(parameters);
+  if (text->size() > kMaxTaggedParameters) text.reset();
+  return text;
+}
+
+std::string EntityTagOf(std::string_view tagged_parameters, std::string_view data) {
   std::string tag = '"' + Digest(data);
-  if (!parameters.empty()) {
-    const std::string text = WriteJson(parameters);
-    if (text.size() > kMaxTaggedParameters) return std::nullopt;
-    tag += '.' + Base64(text);
-  }
+  if (!tagged_parameters.empty()) tag += '.' + Base64(tagged_parameters);
   return tag + '"';
+}
+
+std::optional<std::string> MakeEntityTag(const Json::Value& parameters, std::string_view data) {
+  const std::optional<std::string> tagged = TaggedParameters(parameters);
+  return tagged ? std::optional(EntityTagOf(*tagged, data)) : std::nullopt;
 }
 
 std::optional<Json::Value> ParametersOfTag(std::string_view tag) {

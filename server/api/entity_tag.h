@@ -17,6 +17,14 @@ namespace vorn::server {
 // The largest size, in bytes, of the JSON text of the parameters that a tag has.
 constexpr std::size_t kMaxTaggedParameters = 1024;
 
+// Returns the form of a call's parameters that a tag has: their JSON text, or an empty string if there are none;
+// std::nullopt if they are larger than kMaxTaggedParameters. Throws std::bad_alloc, as MakeEntityTag() does.
+std::optional<std::string> TaggedParameters(const Json::Value& parameters);
+
+// Returns the tag, with its quotation marks, of an answer with this data (JSON text) to a call with these tagged
+// parameters.
+std::string EntityTagOf(std::string_view tagged_parameters, std::string_view data);
+
 // Returns the tag, with its quotation marks, of an answer with this data (JSON text) to a call with these parameters;
 // std::nullopt if the parameters are larger than kMaxTaggedParameters. Throws std::bad_alloc.
 std::optional<std::string> MakeEntityTag(const Json::Value& parameters, std::string_view data);

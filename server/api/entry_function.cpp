@@ -12,12 +12,11 @@
 namespace vorn::server {
 namespace {
 
-Response AnswerWithTag(const Json::Value& parameters, const Outcome& outcome) {
-  const std::string data = WriteJson(outcome.data);
+// `parameters` are the tagged parameters of the call.
+Response AnswerWithTag(std::string_view parameters, const Outcome& outcome) {
+  const std::string data = WriteJson(outcome.data());
   Response response = SuccessWith(data, outcome.remarks);
-  if (std::optional<std::string> tag = MakeEntityTag(parameters, data)) {
-    response.headers.emplace_back("ETag", *std::move(tag));
-  }
+  response.headers.emplace_back("ETag", EntityTagOf(parameters, data));
   return response;
 }
 
@@ -36,16 +35,16 @@ class PresentData {
     const std::optional<Json::Value> parameters = ParametersOfTag(tag);
     if (!parameters || !HasSameSubject(*parameters)) return false;
     Read(*parameters);
-    return outcome_->code == 0 && MakeEntityTag(*parameters, WriteJson(outcome_->data)) == tag;
+    return outcome_->code() == 0 && MakeEntityTag(*parameters, WriteJson(outcome_->data())) == tag;
   }
 
   // The answer to a call whose condition does not hold. If the data cannot be read, it is the failure of the reading.
   Response Refuse() {
     if (!outcome_) Read(Subject());
-    if (outcome_->code != 0) return AnswerTo(*changing_.shown_by, *outcome_);
+    if (outcome_->code() != 0) return AnswerTo(*changing_.shown_by, *outcome_);
     Response response =
-        Failure(412, 412, "This was changed meanwhile. The details are what is there now.", outcome_->data);
-    const std::optional<std::string> tag = MakeEntityTag(read_with_, WriteJson(outcome_->data));
+        Failure(412, 412, "This was changed meanwhile. The details are what is there now.", outcome_->data());
+    const std::optional<std::string> tag = MakeEntityTag(read_with_, WriteJson(outcome_->data()));
     if (tag) response.headers.emplace_back("ETag", *tag);
     return response;
   }
@@ -94,34 +93,35 @@ std::vector<std::string> ReasonsOf(const Route& route, int code, const VORN::Cal
 Outcome RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
   const VORN::CallContext context(std::move(description));
   VORN::APIRequest request(std::move(parameters));
-  VORN::APIResponse response;
-  route.row.handler(&request, &response);
-  if (!response.answered()) throw std::runtime_error("the method ended without one");
-  if (response.error() == 0) return {0, response.data(), {{}, context.warnings()}};
-  return {
-      response.error(), response.data(), {ReasonsOf(route, response.error(), context, request), context.warnings()}};
+  auto response = std::make_unique<VORN::APIResponse>();
+  route.row.handler(&request, response.get());
+  if (!response->answered()) throw std::runtime_error("the method ended without one");
+  Remarks remarks{{}, context.warnings()};
+  if (const int code = response->error(); code != 0) remarks.reasons = ReasonsOf(route, code, context, request);
+  return {std::move(response), std::move(remarks)};
 }
 
 Response AnswerTo(const Route& route, const Outcome& outcome) {
-  if (outcome.code == 0) return Success(outcome.data, outcome.remarks);
-  const Descriptor::ErrorCode code = route.descriptor->Describe(outcome.code);
-  return Failure(code.status, outcome.code, code.text, outcome.data, outcome.remarks);
+  if (outcome.code() == 0) return Success(outcome.data(), outcome.remarks);
+  const Descriptor::ErrorCode code = route.descriptor->Describe(outcome.code());
+  return Failure(code.status, outcome.code(), code.text, outcome.data(), outcome.remarks);
 }
 
-Response RunAndAnswer(const Route& route, const Json::Value& parameters, VORN::CallDescription description) {
-  const Outcome outcome = RunEntryFunction(route, parameters, std::move(description));
-  const bool has_tag = route.method.reads_only && outcome.code == 0;
-  return has_tag ? AnswerWithTag(parameters, outcome) : AnswerTo(route, outcome);
+Response RunAndAnswer(const Route& route, Json::Value parameters, VORN::CallDescription description) {
+  std::optional<std::string> tagged;
+  if (route.method.reads_only) tagged = TaggedParameters(parameters);
+  const Outcome outcome = RunEntryFunction(route, std::move(parameters), std::move(description));
+  return tagged && outcome.code() == 0 ? AnswerWithTag(*tagged, outcome) : AnswerTo(route, outcome);
 }
 
-Response RunIfUnchanged(const Route& route, const Json::Value& parameters, VORN::CallDescription description,
+Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDescription description,
                         std::string_view if_match) {
   const VORN::CallLock lock;
   if (!lock.held()) return Busy("Another change takes long. Try again soon.");
   const IfMatch condition = ParseIfMatch(if_match);
   PresentData present(route, parameters, description);
   if (!condition.any && !IsUnchanged(condition, &present)) return present.Refuse();
-  return RunAndAnswer(route, parameters, std::move(description));
+  return RunAndAnswer(route, std::move(parameters), std::move(description));
 }
 
 }  // namespace vorn::server

@@ -4,6 +4,7 @@
 
 #include <json/value.h>
 
+#include <memory>
 #include <string>
 
 #include "answer.h"
@@ -14,8 +15,10 @@ namespace vorn::server {
 
 // The report of an entry function.
 struct Outcome {
-  int code = 0;      // the error code; 0 for success
-  Json::Value data;  // the result, or the details of the error
+  int code() const { return response->error(); }                // the error code; 0 for success
+  const Json::Value& data() const { return response->data(); }  // the result, or the details of the error
+
+  std::unique_ptr<const VORN::APIResponse> response;  // never null; owned, because a copy of its data may be large
   Remarks remarks;
 };
 
@@ -27,13 +30,13 @@ Outcome RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallD
 Response AnswerTo(const Route& route, const Outcome& outcome);
 
 // Like RunEntryFunction and AnswerTo. The answer of a successful reading method has an entity tag.
-Response RunAndAnswer(const Route& route, const Json::Value& parameters, VORN::CallDescription description);
+Response RunAndAnswer(const Route& route, Json::Value parameters, VORN::CallDescription description);
 
 // Runs a changing method only if `if_match`, the value of an If-Match header, names the present answer of the method
 // that shows what it changes (Route::shown_by, which must not be null). Otherwise the answer has status 412, and the
 // present data and its entity tag. Nothing can change between the comparison and the change, except by an editor,
 // whose change the platform detects and refuses to overwrite.
-Response RunIfUnchanged(const Route& route, const Json::Value& parameters, VORN::CallDescription description,
+Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDescription description,
                         std::string_view if_match);
 
 }  // namespace vorn::server

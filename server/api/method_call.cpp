@@ -118,15 +118,15 @@ void Call::Work() {
 Response Call::Execute() {
   std::variant<Json::Value, Response> parameters = body_->TakeParameters();
   if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
-  const Json::Value& object = std::get<Json::Value>(parameters);
+  Json::Value& object = std::get<Json::Value>(parameters);
   if (!MayNameShare(*caller_, route_, object)) return Refusal(403, "This token is not for this shared folder.");
   description_.uploads = body_->Uploads();
   if (!route_.method.reads_only) {
     audited_parameters_ = TextForAudit(route_, object);
   }
   if (route_.own) return route_.own(object, *caller_);
-  if (!if_match_) return RunAndAnswer(route_, object, description_);
-  return RunIfUnchanged(route_, object, description_, *if_match_);
+  if (!if_match_) return RunAndAnswer(route_, std::move(object), description_);
+  return RunIfUnchanged(route_, std::move(object), description_, *if_match_);
 }
 
 // A change must not be undone by a lack of memory for its record; the access log still has a line for it.

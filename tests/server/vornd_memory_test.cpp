@@ -187,6 +187,31 @@ std::string LargestJson() {
   return text + "]}";
 }
 
+// Returns the largest amount of memory that a process has had, in bytes (VmHWM, proc(5)).
+std::uint64_t LargestMemoryOf(pid_t pid) {
+  std::ifstream file("/proc/" + std::to_string(pid) + "/status");
+  for (std::string word; file >> word;) {
+    std::uint64_t kilobytes = 0;
+    if (word == "VmHWM:" && file >> kilobytes) return kilobytes * 1024;
+  }
+  return 0;
+}
+
+// A value of LargestJson() takes at least 160 bytes. The method has the parameters, a copy, and the copy that it
+// answers with; the server must add none.
+TEST(LargestCall, HasThreeCopiesOfItsParameters) {
+  constexpr std::uint64_t kCopy = std::uint64_t{160} * 99000;
+  const Sandbox sandbox;
+  const ServerProcess server(sandbox);
+  const std::uint64_t before = LargestMemoryOf(server.pid());
+  Connection client = server.Connect();
+  client.Send(Post("/api/Test.Echo/v1/get", LargestJson()));
+  EXPECT_EQ(client.Receive().status, 200);
+  const std::uint64_t taken = LargestMemoryOf(server.pid()) - before;
+  EXPECT_GT(taken, 2 * kCopy);
+  EXPECT_LT(taken, 4 * kCopy);
+}
+
 TEST(MemoryLimit, EndsCallsAndNotTheServer) {
   const Sandbox sandbox;
   ServerProcess server(sandbox);

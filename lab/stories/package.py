@@ -146,6 +146,28 @@ def test_a_purged_package_takes_what_it_wrote_and_nothing_else(box, client, sett
     assert box.threads() > 0
 
 
+def members(group):
+    return run("getent", "group", group).strip().split(":")[-1].split(",")
+
+
+def test_who_may_use_the_server_outlasts_an_upgrade_and_a_purge(box, settings):
+    """The groups stay with their members. The PAM file is a configuration file of the package."""
+    del box, settings
+    pam = pathlib.Path("/etc/pam.d/vornd")
+    run("usermod", "--append", "--groups", "vorn-admin", "alice")
+    with open(pam, "a", encoding="ascii") as file:
+        file.write("# of the site\n")
+    install(next_version())
+    assert "alice" in members("vorn-admin")
+    assert pam.read_text(encoding="ascii").endswith("# of the site\n")
+    purge()
+    assert not pam.exists()
+    assert "alice" in members("vorn-admin")
+    install(PACKAGE)
+    assert pam.exists() and members("vorn-readonly") == [""]
+    run("gpasswd", "--delete", "alice", "vorn-admin")
+
+
 def test_a_purge_keeps_an_administrators_lines_and_keytab(box, settings, realm):
     del box, settings, realm
     ours, keytab = pathlib.Path("/etc/nfs.conf.d/vorn.conf"), pathlib.Path("/etc/nfs/krb5.keytab")

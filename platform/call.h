@@ -9,6 +9,8 @@
 
 namespace VORN {
 
+class Draft;  // rehearsal.h
+
 // One call, as the server sees it.
 struct CallDescription {
   std::string caller;  // the authenticated account or token, for logs; empty when it is unknown
@@ -23,6 +25,10 @@ struct CallDescription {
   // Absolute paths, on this system, of the files that were uploaded with the call. KLIBCFileExist and
   // VORNNFSKeytabImport open these where they are; they look for every other path below the root.
   std::vector<std::string> uploads;
+
+  // The draft on which a rehearsed call works; null for a call that works on the box. It must outlive the call.
+  // Warnings of a rehearsal are collected as usual; remarks about what was done are not logged.
+  const Draft* draft = nullptr;
 };
 
 // The context of the calling thread, from construction to destruction. Contexts of one thread nest:

@@ -6,7 +6,16 @@
 namespace vorn {
 
 Box::Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine)
-    : root_(std::move(root)), store_(std::move(store)), choose_engine_(std::move(choose_engine)) {}
+    : Box(std::move(root), std::move(store), std::move(choose_engine), nullptr) {}
+
+Box::Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine, std::vector<RehearsedAction>* actions)
+    : root_(std::move(root)), store_(std::move(store)), choose_engine_(std::move(choose_engine)), actions_(actions) {}
+
+bool Box::Rehearse(RehearsedAction action) {
+  if (actions_ == nullptr) return false;
+  actions_->push_back(action);
+  return true;
+}
 
 Result<StoredFile> Box::Read(const std::string& path) {
   Result<StoredFile> file = store_->Read(path);
@@ -93,6 +102,11 @@ Status Box::Confirm(const std::string& path) {
 Status Box::SetMode(const std::string& path, unsigned mode) {
   const Status status = CheckMayWrite(path);
   return status.ok() ? store_->SetMode(path, mode) : status;
+}
+
+bool Box::Exists(const std::string& path) const {
+  const Result<Version> version = store_->VersionOf(path);
+  return version.ok() && version->exists;
 }
 
 Result<std::unique_ptr<HeldLock>> Box::Lock(const std::string& name, std::chrono::milliseconds limit) {

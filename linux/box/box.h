@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "engine.h"
+#include "rehearsed_action.h"
 #include "root.h"
 #include "store.h"
 
@@ -34,7 +35,18 @@ class Box {
 
   Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine);
 
+  // A draft of a box, for a rehearsal: its store is a DraftStore, and its engine one that records actions. `actions`
+  // receives what is not done; it must outlive the box.
+  Box(Root root, std::unique_ptr<Store> store, EngineChooser choose_engine, std::vector<RehearsedAction>* actions);
+
   const Root& root() const { return root_; }
+  const Store& store() const { return *store_; }
+
+  bool is_draft() const { return actions_ != nullptr; }
+
+  // In a draft: records the action and returns true; the caller must not take it. Otherwise returns false. Whatever
+  // changes something outside of the store asks this first.
+  bool Rehearse(RehearsedAction action);
 
   // The engine that the box's settings ask for. It lives as long as the box.
   Result<Engine*> engine() { return choose_engine_(*this); }
@@ -84,6 +96,9 @@ class Box {
   Status Confirm(const std::string& path);
   Status SetMode(const std::string& path, unsigned mode);
 
+  // Whether there is a file or folder at `path`.
+  bool Exists(const std::string& path) const;
+
   // Takes a lock of the box.
   Result<std::unique_ptr<HeldLock>> Lock(const std::string& name, std::chrono::milliseconds limit);
 
@@ -112,6 +127,7 @@ class Box {
   const Root root_;
   const std::unique_ptr<Store> store_;
   const EngineChooser choose_engine_;
+  std::vector<RehearsedAction>* const actions_;  // null: this is no draft
   std::mutex mutex_;
   std::map<Key, Cached> documents_;
   std::map<Key, Derived> derived_;

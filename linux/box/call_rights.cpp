@@ -21,6 +21,11 @@ Status CheckMayWrite(const std::string& what) {
                                     ", which may only read");
 }
 
+bool IsRehearsal() {
+  const VORN::CallContext* call = VORN::CallContext::Current();
+  return call != nullptr && call->description().draft != nullptr;
+}
+
 bool IsUpload(const std::string& path) {
   const VORN::CallContext* call = VORN::CallContext::Current();
   if (call == nullptr) return false;

@@ -17,6 +17,9 @@ bool MayWrite();
 // Fails with EROFS in a call that may not write; `what` is what it would have changed.
 Status CheckMayWrite(const std::string& what);
 
+// Whether the call is a rehearsal: what it reports as done is not done. False without a call context.
+bool IsRehearsal();
+
 // Whether `path` is a file of this system that was uploaded with the call. False without a call context.
 bool IsUpload(const std::string& path);
 

@@ -6,6 +6,8 @@
 
 namespace vorn {
 
+class Box;
+
 // Each operation returns when the service is in its new state, or has failed to reach it. IsEnabled may be
 // called at any time by any thread; the caller excludes two of the other operations at once.
 class Engine {
@@ -25,6 +27,10 @@ class Engine {
 
   // Applies what the name services say now of the hosts and netgroups in the export rules.
   virtual Status RefreshNames() = 0;
+
+  // Does in `draft`, a draft of the engine's box, what applying the export rules would do in the files of the box, and
+  // remarks what it would remark. Changes nothing else. `starts`: the service would start before.
+  virtual Status RehearseRules(Box& draft, bool starts) = 0;
 };
 
 }  // namespace vorn

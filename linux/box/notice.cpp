@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "call.h"
+#include "call_rights.h"
 
 namespace vorn {
 namespace {
@@ -18,8 +19,6 @@ std::string OnOneLine(std::string text) {
   }
   return text;
 }
-
-void Log(const std::string& sentence) { syslog(LOG_WARNING, "%s", OnOneLine(sentence).c_str()); }
 
 void Warn(const std::string& sentence) {
   if (VORN::CallContext* call = VORN::CallContext::Current()) call->AddWarning(OnOneLine(sentence));
@@ -39,13 +38,18 @@ bool IsNew(const std::string& location, const Version& version, const std::strin
 
 }  // namespace
 
+void LogDone(int priority, const std::string& sentence) {
+  if (!IsRehearsal()) syslog(priority, "%s", OnOneLine(sentence).c_str());
+}
+
 void Notice(const std::string& sentence) {
-  Log(sentence);
+  LogDone(LOG_WARNING, sentence);
   Warn(sentence);
 }
 
 void NoticeOnce(const std::string& location, const Version& version, const std::string& sentence) {
-  if (IsNew(location, version, sentence)) Log(sentence);
+  // A rehearsal must not make the sentence count as logged.
+  if (!IsRehearsal() && IsNew(location, version, sentence)) LogDone(LOG_WARNING, sentence);
   Warn(sentence);
 }
 

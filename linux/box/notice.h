@@ -8,7 +8,11 @@
 
 namespace vorn {
 
-// Logs the sentence as a warning, and adds it to the warnings of the current call (call.h), if there is one.
+// Logs the sentence with this priority (syslog(3)), unless the call is a rehearsal: then it would not be true.
+void LogDone(int priority, const std::string& sentence);
+
+// Logs the sentence as a warning, except in a rehearsal, and adds it to the warnings of the current call (call.h), if
+// there is one.
 void Notice(const std::string& sentence);
 
 // The same for a remark about the content of the file at `location`: it is logged once per version of the file, and

@@ -73,10 +73,9 @@ int ToLength(const Result<int>& length) { return length.ok() ? *length : ToResul
 
 std::string Text(const char* text) { return text == nullptr ? "" : text; }
 
-// An upload of the call is a file of this system; every other path is below the root.
-Result<std::string> LocateFile(const std::string& path) {
-  if (IsUpload(path)) return path;
-  return CurrentBox().root().Locate(path);
+// An upload of the call is a file of this system; every other path is one of the box.
+bool Exists(const std::string& path) {
+  return IsUpload(path) ? access(path.c_str(), F_OK) == 0 : CurrentBox().Exists(path);
 }
 
 }  // namespace
@@ -120,10 +119,7 @@ int KLIBCUnicodeUTF8StrUpper(const char* text, char* buffer, int size) {
   return vorn::ToLength(vorn::UpperCaseInto(text, buffer, size));
 }
 
-int KLIBCFileExist(const char* path) {
-  const vorn::Result<std::string> location = vorn::LocateFile(Text(path));
-  return location.ok() && access(location->c_str(), F_OK) == 0 ? 1 : 0;
-}
+int KLIBCFileExist(const char* path) { return vorn::Exists(Text(path)) ? 1 : 0; }
 
 int KLIBCExec(const char* program, const char* a1, const char* a2, const char* a3, const char* a4) {
   std::vector<std::string> arguments;

@@ -5,6 +5,8 @@
 #include <mutex>
 #include <string>
 
+#include "call.h"
+#include "draft.h"
 #include "engines.h"
 #include "file_store.h"
 #include "root.h"
@@ -26,6 +28,12 @@ Registry& Boxes() {
 }  // namespace
 
 Box& CurrentBox() {
+  const VORN::CallContext* call = VORN::CallContext::Current();
+  const VORN::Draft* draft = call == nullptr ? nullptr : call->description().draft;
+  return draft == nullptr ? RealBox() : draft->state().box;
+}
+
+Box& RealBox() {
   const Root root = Root::Current();
   Registry& registry = Boxes();
   const std::lock_guard lock(registry.mutex);

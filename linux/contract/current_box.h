@@ -6,9 +6,12 @@
 
 namespace vorn {
 
+// The box on which this thread works: the draft of its call context (call.h), else RealBox().
+Box& CurrentBox();
+
 // The box of this process's root directory (Root::Current). There is one object per root; it lives as long as the
 // process. May be called from any thread.
-Box& CurrentBox();
+Box& RealBox();
 
 }  // namespace vorn
 

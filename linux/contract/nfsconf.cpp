@@ -59,6 +59,12 @@ struct FreeRecord {
 };
 using IDMapRecord = std::unique_ptr<_tag_nfs_id_map_, FreeRecord>;
 
+// A rehearsal starts nothing, also no question to a name server.
+std::string DefaultDomain(const Box& box) {
+  HostDomain& domain = HostDomain::OfThisHost();
+  return box.is_draft() ? domain.Last() : domain.Get();
+}
+
 Result<IDMapRecord> GetIDMap(Box& box) {
   IDMapRecord record(new _tag_nfs_id_map_{});
   auto* state = new IDMapState(box);
@@ -66,7 +72,7 @@ Result<IDMapRecord> GetIDMap(Box& box) {
   if (!state->lock.status().ok()) return state->lock.status();
   const Result<std::shared_ptr<const IDMap>> map = ReadIDMap(box);
   if (!map.ok()) return map.status();
-  state->domain = (*map)->domain() ? *(*map)->domain() : HostDomain::OfThisHost().Get();
+  state->domain = (*map)->domain() ? *(*map)->domain() : DefaultDomain(box);
   record->domain = strdup(state->domain.c_str());
   record->table = KLIBCSzHashAlloc(0);
   if (record->domain == nullptr || record->table == nullptr) return Status::System(ENOMEM, kIDMapFile);
@@ -202,7 +208,7 @@ int VORNNFSUDPPrefSizeSet(int read_size, int write_size) {
   return ToResult(vorn::ApplyTransferSizes(CurrentBox(), read_size, write_size));
 }
 
-int VORNNFSUNIXPriEnableSet(int enable) { return ToResult(vorn::ApplyUnixPermissions(enable != 0)); }
+int VORNNFSUNIXPriEnableSet(int enable) { return ToResult(vorn::ApplyUnixPermissions(CurrentBox(), enable != 0)); }
 
 _tag_nfs_id_map_* VORNNFSIDMapGet() {
   vorn::Result<vorn::IDMapRecord> record = vorn::GetIDMap(CurrentBox());

@@ -74,6 +74,7 @@ Status UpdateFirewall(Box& box) {
   if (!ports.ok()) return ports.status();
   const std::string ruleset = Ruleset(*ports);
   if (Status status = Save(box, ruleset); !status.ok()) return status;
+  if (box.Rehearse(RehearsedAction::kFirewall)) return {};
   if (Status status = Load(ruleset); !status.ok()) return status;
   NoticeClosedPorts(*ports);
   return {};

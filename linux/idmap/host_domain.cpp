@@ -99,6 +99,11 @@ std::string HostDomain::Get() {
   return state_->domain;
 }
 
+std::string HostDomain::Last() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->domain;
+}
+
 HostDomain& HostDomain::OfThisHost() {
   // Never destroyed: the thread may run while the process exits.
   static auto* domain = new HostDomain(CanonicalNameInHostsFile(), ResolveCanonicalName, kRefreshAfter);

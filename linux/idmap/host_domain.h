@@ -24,6 +24,9 @@ class HostDomain {
   // runs at a time, and it ends with the answer. The thread may outlive this object.
   std::string Get();
 
+  // The last known domain. Starts nothing.
+  std::string Last() const;
+
   // The domain of this process's host. Its first name is the canonical one of /etc/hosts (hosts(5)).
   static HostDomain& OfThisHost();
 

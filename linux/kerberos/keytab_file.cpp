@@ -104,4 +104,16 @@ Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content) {
   return keys;
 }
 
+std::string PrintKeytab(std::string_view content) {
+  const Result<std::vector<KeytabKey>> keys = ReadKeytab(content);
+  if (!keys.ok()) return "(no keytab)\n";
+  std::string text;
+  for (const KeytabKey& key : *keys) {
+    const std::string version = std::to_string(key.version);
+    text += std::string(version.size() < 4 ? 4 - version.size() : 0, ' ') + version;
+    text += " " + key.principal + " (" + key.enc_type + ") \n";
+  }
+  return text;
+}
+
 }  // namespace vorn

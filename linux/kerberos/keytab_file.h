@@ -21,6 +21,10 @@ struct KeytabKey {
 // entry, and leaks memory over it; therefore the frame is validated first (keytab_frame.h).
 Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content);
 
+// Returns the lines that "klist -ke" prints of a keytab with this content below its heading: no keys. A content that is
+// no keytab gives a line that says so.
+std::string PrintKeytab(std::string_view content);
+
 }  // namespace vorn
 
 #endif  // VORN_LINUX_KERBEROS_KEYTAB_FILE_H

@@ -104,4 +104,11 @@ Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::
   return StoreExportHosts(box, *hosts);
 }
 
+Status RehearseExports(Box& draft) {
+  Lines lines;
+  const Result<Files> files = OpenWithoutLeftShares(draft, &lines);
+  if (files.ok()) NameFaults(*files);
+  return files.status();
+}
+
 }  // namespace vorn

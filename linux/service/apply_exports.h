@@ -29,6 +29,10 @@ struct ExportsEnvironment {
 // `resolved` are the keys of host names whose remembered addresses are new.
 Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::set<std::string>& resolved = {});
 
+// Does in a draft of the box what ApplyExports would do in the files of exports(5), and names faulty lines and left
+// shares. Neither the table nor a resolver is asked.
+Status RehearseExports(Box& draft);
+
 }  // namespace vorn
 
 #endif  // VORN_LINUX_SERVICE_APPLY_EXPORTS_H

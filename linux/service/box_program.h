@@ -12,7 +12,8 @@ namespace vorn {
 
 // Runs the program at the box's path `program` and waits for it, for a minute at most; its output goes to the
 // log. The configuration locks of the calling thread are released meanwhile. Fails with kProgramFailed unless the
-// exit status is 0, and with EROFS in a call that may not write.
+// exit status is 0, and with EROFS in a call that may not write. In a rehearsal nothing is run: "S83nfsd.sh
+// reloadidmap" is recorded, and every other program is refused with EROFS.
 Status RunBoxProgram(Box& box, const std::string& program, const std::vector<std::string>& arguments);
 
 }  // namespace vorn

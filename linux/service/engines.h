@@ -1,8 +1,9 @@
-// The engines of a Linux box: the kernel server under systemd, and the engine of a trial root.
+// The engines of a Linux box: the kernel server under systemd, the engine of a trial root, and the engine of a draft.
 #ifndef VORN_LINUX_SERVICE_ENGINES_H
 #define VORN_LINUX_SERVICE_ENGINES_H
 
 #include <chrono>
+#include <functional>
 #include <memory>
 #include <string>
 
@@ -27,7 +28,12 @@ std::unique_ptr<Engine> MakeSystemdEngine(Box& box, SystemdOptions options = {})
 // would have been done. `box` outlives the engine.
 std::unique_ptr<Engine> MakePaperEngine(Box& box);
 
-// Chooses between the two by the box's platform settings, each time it is called.
+// For a draft of a box (Box::is_draft), which outlives the engine: it records each operation and does none. `chosen` is
+// what chooses the engine of the box; the enabled state is that of the box until the draft is started or stopped.
+using ChosenEngine = std::function<Result<Engine*>()>;
+std::unique_ptr<Engine> MakeDraftEngine(Box& draft, ChosenEngine chosen);
+
+// Chooses between the first two by the box's platform settings, each time it is called.
 Box::EngineChooser MakeEngineChooser();
 
 }  // namespace vorn

@@ -1,6 +1,6 @@
 #include "left_shares.h"
 
-#include <syslog.h>
+#include <syslog.h>  // LOG_WARNING
 
 #include <set>
 #include <sstream>
@@ -10,6 +10,7 @@
 #include "box_paths.h"
 #include "exports_files.h"
 #include "exports_text.h"
+#include "notice.h"
 #include "path_resolver.h"
 #include "platform_settings.h"
 #include "share_rules.h"
@@ -43,14 +44,14 @@ Status Remember(Box& box, const Directories& directories) {
 Status Withdraw(Box& box, const std::string& directory) {
   Status status = WriteShareRules(box, directory, nullptr);
   if (status.ok()) {
-    syslog(LOG_WARNING, "%s is no share any more; its export rules were removed", directory.c_str());
+    LogDone(LOG_WARNING, directory + " is no share any more; its export rules were removed");
   }
   return status;
 }
 
 void NameLeft(const std::string& directory) {
-  syslog(LOG_WARNING, "%s is exported although it is no share any more; remove its line from %s, or set %s",
-         directory.c_str(), kExportsFile, "withdraw_left_shares = yes in /etc/vorn/platform.conf");
+  LogDone(LOG_WARNING, directory + " is exported although it is no share any more; remove its line from " +
+                           kExportsFile + ", or set withdraw_left_shares = yes in /etc/vorn/platform.conf");
 }
 
 }  // namespace

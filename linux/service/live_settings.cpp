@@ -1,12 +1,14 @@
 #include "live_settings.h"
 
-#include <syslog.h>
+#include <syslog.h>  // LOG_NOTICE
 
 #include <algorithm>
 #include <cerrno>
+#include <string>
 
 #include "call_rights.h"
 #include "configuration_lock.h"
+#include "notice.h"
 
 namespace vorn {
 namespace {
@@ -21,13 +23,12 @@ constexpr char kDropInText[] =
 
 void LogNextStart(int size) {
   if (size == 0) {
-    syslog(LOG_NOTICE, "the kernel chooses the size of NFS transfers again when the box has booted");
+    LogDone(LOG_NOTICE, "the kernel chooses the size of NFS transfers again when the box has booted");
     return;
   }
-  syslog(LOG_NOTICE,
-         "NFS takes transfers of at most %d bytes when it starts the next time; clients that are "
-         "mounted with more must mount again then",
-         size);
+  LogDone(LOG_NOTICE, "NFS takes transfers of at most " + std::to_string(size) +
+                          " bytes when it starts the next time; clients that are mounted with more must mount again "
+                          "then");
 }
 
 }  // namespace
@@ -44,13 +45,16 @@ Status PrepareTransferSizes(Box& box) {
 Status ApplyTransferSizes(Box& box, int read_size, int write_size) {
   if (std::min(read_size, write_size) < 0) return Status::Failure(EINVAL, "a transfer size is negative");
   if (Status status = PrepareTransferSizes(box); !status.ok()) return status;
+  box.Rehearse(RehearsedAction::kTransferSizes);
   LogNextStart(std::max(read_size, write_size));
   return {};
 }
 
-Status ApplyUnixPermissions(bool managed) {
+Status ApplyUnixPermissions(Box& box, bool managed) {
   if (Status status = CheckMayWrite("the UNIX-permission switch"); !status.ok()) return status;
-  syslog(LOG_NOTICE, "UNIX permissions %s when NFS starts the next time", managed ? "are managed" : "are left alone");
+  box.Rehearse(RehearsedAction::kUnixPermissions);
+  LogDone(LOG_NOTICE, std::string("UNIX permissions ") + (managed ? "are managed" : "are left alone") +
+                          " when NFS starts the next time");
   return {};
 }
 

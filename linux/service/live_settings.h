@@ -21,7 +21,7 @@ Status ApplyTransferSizes(Box& box, int read_size, int write_size);
 
 // Applies the switch for UNIX permissions. rpc.mountd(8) reads it when it starts, and its unit cannot be restarted
 // without the kernel's server, so it takes effect at the next start, and the log says so.
-Status ApplyUnixPermissions(bool managed);
+Status ApplyUnixPermissions(Box& box, bool managed);
 
 }  // namespace vorn
 

@@ -25,6 +25,7 @@ class PaperEngine : public Engine {
   Status Restart() override { return LogAction("restarted"); }
   Status Reload() override { return LogAction("reloaded"); }
   Status RefreshNames() override { return {}; }
+  Status RehearseRules(Box& /*draft*/, bool /*starts*/) override { return {}; }
 
  private:
   Status StoreState(const char* state, const char* action) {

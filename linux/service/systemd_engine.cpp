@@ -224,6 +224,10 @@ class SystemdEngine : public Engine {
     return HasThreads() ? ApplyNameChanges(box_, options_.exports, ReadNetgroup) : Status();
   }
 
+  Status RehearseRules(Box& draft, bool starts) override {
+    return starts || HasThreads() ? RehearseExports(draft) : Status();
+  }
+
  private:
   using Folders = std::vector<std::shared_ptr<const StoredFolder>>;
 

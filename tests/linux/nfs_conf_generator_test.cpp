@@ -11,6 +11,7 @@
 #include <optional>
 
 #include "captured_log.h"
+#include "foretold.h"
 #include "generated_case.h"
 #include "ini_judge.h"
 #include "nfsconf.h"
@@ -229,7 +230,7 @@ bool RunCase(unsigned number) {
   EXPECT_EQ(Text(record), Text(RecordByNfsconf(*before))) << "what is read";
   change.make(&record);
   TakeLog();
-  const bool done = VORNNFSConfSet(&record) >= 0;
+  const bool done = ExpectForetold(root, [&record] { return VORNNFSConfSet(&record); }) >= 0;
   const std::vector<LogLine> log = TakeLog();
   SCOPED_TRACE((done ? "done\n" : "refused: " + LastText(log) + "\n") + AllText(root, files));
   if (!done) {

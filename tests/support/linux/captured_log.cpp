@@ -25,9 +25,7 @@ std::vector<LogLine> TakeLog() {
   return std::exchange(lines, {});
 }
 
-std::string LastText(const std::vector<LogLine>& log) {
-  return log.empty() ? "(nothing was logged)" : log.back().text;
-}
+std::string LastText(const std::vector<LogLine>& log) { return log.empty() ? "(nothing was logged)" : log.back().text; }
 
 // These functions replace syslog(3) of the C library. A fortified build calls the second one.
 extern "C" {

@@ -1,0 +1,98 @@
+#include "rehearsal.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "action_effect.h"
+#include "box_paths.h"
+#include "current_box.h"
+#include "draft.h"
+#include "engines.h"
+#include "exports_files.h"
+#include "keytab.h"
+#include "keytab_file.h"
+#include "rule_changes.h"
+#include "unicode.h"
+#include "unified_diff.h"
+
+namespace vorn {
+namespace {
+
+using ChangedFile = DraftStore::ChangedFile;
+
+// A keytab is shown by what klist(1) prints of it, because its content is secret.
+std::optional<std::string> Shown(const std::string& path, const std::optional<std::string>& content) {
+  return path == kKeytabFile && content ? PrintKeytab(*content) : content;
+}
+
+VORN::Rehearsal::File Describe(const ChangedFile& file, int context) {
+  const std::optional<std::string> before = Shown(file.path, file.before);
+  const std::optional<std::string> after = Shown(file.path, file.after);
+  return {ToValidUtf8(file.path), ToValidUtf8(UnifiedDiff(file.path, before, after, context))};
+}
+
+const char* NameOf(RightChange::Access access) {
+  if (access == RightChange::Access::kLess) return "less";
+  return access == RightChange::Access::kMore ? "more" : "other";
+}
+
+VORN::Rehearsal::Rule Describe(const RuleChange& rule) {
+  VORN::Rehearsal::Rule described{ToValidUtf8(rule.directory), ToValidUtf8(rule.client), {}};
+  for (const RightChange& right : rule.rights) {
+    described.changes.push_back({right.change, NameOf(right.access), right.flavor, right.text});
+  }
+  return described;
+}
+
+// Files that cannot be read have no rules: the call has then failed for the same reason.
+std::vector<VORN::Rehearsal::Rule> CompareExports(Box& box, const ChangedFile& own) {
+  std::vector<VORN::Rehearsal::Rule> rules;
+  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
+  if (!files.ok()) return rules;
+  std::vector<const ExportsDocument*> others;
+  for (auto file = files->begin() + 1; file != files->end(); ++file) others.push_back(&(*file)->document);
+  const ExportsDocument before(own.before.value_or(""));
+  const ExportsDocument& after = files->front()->document;
+  for (const RuleChange& rule : CompareRules(before, after, others, BoxPaths(box.root()))) {
+    rules.push_back(Describe(rule));
+  }
+  return rules;
+}
+
+}  // namespace
+}  // namespace vorn
+
+VORN::Draft::State::State(vorn::Box& real)
+    : store(new vorn::DraftStore(real.store())),
+      box(
+          real.root(), std::unique_ptr<vorn::Store>(store),
+          [this, &real](vorn::Box& draft) -> vorn::Result<vorn::Engine*> {
+            const auto chosen = [&real] { return real.engine(); };
+            if (const vorn::Result<vorn::Engine*> of_box = chosen(); !of_box.ok()) return of_box.status();
+            if (this->engine == nullptr) this->engine = vorn::MakeDraftEngine(draft, chosen);
+            return this->engine.get();
+          },
+          &actions) {}
+
+namespace VORN {
+
+// The draft is one of the real box, also where a call context with another draft is current.
+Draft::Draft() : state_(std::make_unique<State>(vorn::RealBox())) {}
+Draft::~Draft() = default;
+
+Draft::State& Draft::state() const { return *state_; }
+
+Rehearsal Draft::Report(int context) const {
+  Rehearsal report;
+  for (const vorn::ChangedFile& file : state_->store->Changes()) {
+    report.files.push_back(vorn::Describe(file, context));
+    if (file.path == vorn::kExportsFile) report.rules = vorn::CompareExports(state_->box, file);
+  }
+  for (const vorn::RehearsedAction action : state_->actions) {
+    vorn::ActionEffect effect = vorn::EffectOf(action, state_->box);
+    report.actions.push_back({effect.action, effect.clients, effect.grace_seconds, std::move(effect.effect)});
+  }
+  return report;
+}
+
+}  // namespace VORN

@@ -24,11 +24,13 @@ def start(command, **options):
 def build(command, log, **options):
     """Runs a build step with its output in a log file. Raises LabError with the log's end."""
     with open(log, "w", encoding="utf-8") as output:
-        child = start(command, stdin=subprocess.DEVNULL, stdout=output, stderr=subprocess.STDOUT, **options)
+        # In a session of its own, so that the programs that it has started can be ended with it.
+        child = start(command, stdin=subprocess.DEVNULL, stdout=output, stderr=subprocess.STDOUT,
+                      start_new_session=True, **options)
         try:
             status = child.wait()
         except BaseException:
-            child.terminate()
+            os.killpg(child.pid, signal.SIGTERM)
             child.wait()
             raise
     if status != 0:

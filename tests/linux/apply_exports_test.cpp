@@ -66,6 +66,18 @@ TEST_F(ApplyExportsTest, WritesTheTable) {
   EXPECT_THAT(root_.Names("/var/lib/nfs"), ElementsAre(".etab.lock", "etab", "export-lock"));
 }
 
+TEST_F(ApplyExportsTest, WithdrawsTheRulesOfAFormerShareAtOnce) {
+  root_.Write("/etc/passwd", "root:x:0:0::/:/bin/sh\n");
+  root_.Write("/etc/vorn/platform.conf", "[platform]\nwithdraw_left_shares = yes\n");
+  root_.Write("/etc/vorn/shares.conf", "[shares]\ndata = /data\nleft = /left\n");
+  root_.Write("/etc/exports", "/data 10.0.0.1(rw)\n/left 10.0.0.1(rw)\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(Table(), HasSubstr("/left\t"));
+  root_.Write("/etc/vorn/shares.conf", "[shares]\ndata = /data\n");
+  EXPECT_TRUE(Apply().ok());
+  EXPECT_THAT(Table(), AllOf(HasSubstr("/data\t"), Not(HasSubstr("/left\t"))));
+}
+
 TEST_F(ApplyExportsTest, LeavesATableAloneThatIsAsItShouldBe) {
   root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
   root_.Write(kTable, "/a\t10.0.0.1(rw)\n");

@@ -156,6 +156,12 @@ struct Reloadable {
   OwnNames& names;
 };
 
+PasswordChecker::Limits PasswordLimits(const Settings& settings) {
+  PasswordChecker::Limits limits;
+  limits.deadline = settings.password_time.time;
+  return limits;
+}
+
 Sessions::Limits SessionLimits(const Settings& settings) {
   Sessions::Limits limits;
   limits.idle = settings.session_idle.time;
@@ -252,7 +258,7 @@ int Serve(const Options& options, const Settings& settings) {
 
   TokenStore tokens(folders->state + "/tokens.json");
   Sessions sessions(SessionLimits(settings));
-  PasswordChecker passwords(PasswordHelper(options, settings), PasswordChecker::Limits{});
+  PasswordChecker passwords(PasswordHelper(options, settings), PasswordLimits(settings));
   Authenticator authenticator(tokens, sessions, {});
   OwnNames names;
   const Reloadable reloadable{sessions, authenticator, passwords, names};

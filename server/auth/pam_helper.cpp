@@ -5,6 +5,7 @@
 // The accounts, groups and PAM services are those of the system, or for another ROOT than "/" those of the files
 // ROOT/etc/passwd, ROOT/etc/group and ROOT/etc/pam.d/vornd.
 #include <grp.h>
+#include <poll.h>
 #include <pwd.h>
 #include <security/pam_appl.h>
 #include <sys/prctl.h>
@@ -12,6 +13,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -196,6 +198,12 @@ PasswordVerdict Judge(char** arguments, PasswordRequest request) {
   return {Kind::kGranted, *role, account};
 }
 
+// Whether the server's end of the socket has been closed, also if there is still a request to read.
+bool ServerHasEnded() {
+  pollfd socket{STDIN_FILENO, 0, 0};
+  return poll(&socket, 1, 0) == 1 && (socket.revents & POLLHUP) != 0;
+}
+
 int Run(char** arguments) {
   std::string message(kMaxMessage, '\0');
   const ssize_t size = recv(STDIN_FILENO, message.data(), message.size(), 0);
@@ -218,6 +226,9 @@ int main(int argc, char** argv) {
     return 2;
   }
   prctl(PR_SET_DUMPABLE, 0, 0, 0, 0);
+  // The server's thread that starts helpers ends them before it ends itself. A killed server cannot do that.
+  prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);
+  if (vorn::server::ServerHasEnded()) return EXIT_FAILURE;
   alarm(vorn::server::kAlarmSeconds);
   return vorn::server::Run(argv);
 }

@@ -26,6 +26,7 @@ const std::vector<Setting>& SettingsTable() {
 
       Row<&S::administrators>("access", "administrators", kReloads),
       Row<&S::readers>("access", "readers", kReloads),
+      Row<&S::password_time>("access", "password-time", kNeedsRestart),
 
       Row<&S::session_idle>("sessions", "idle", kReloads),
       Row<&S::session_lifetime>("sessions", "lifetime", kReloads),
@@ -70,6 +71,7 @@ std::vector<Contradiction> FindContradictions(const Settings& settings) {
           "tcp-connections-per-address", "is larger than tcp-connections");
   require(settings.body_memory_per_address.bytes <= settings.body_memory.bytes, "limits", "body-memory-per-address",
           "is larger than body-memory");
+  require(settings.password_time.time <= std::chrono::minutes(1), "access", "password-time", "is longer than a minute");
   require(settings.administrators.name != settings.readers.name, "access", "readers",
           "is the administrators' group, too");
   return found;

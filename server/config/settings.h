@@ -26,6 +26,7 @@ struct Settings {
   // [access]
   GroupName administrators{"vorn-admin"};
   GroupName readers{"vorn-readonly"};
+  Duration password_time{std::chrono::seconds(10)};
 
   // [sessions]
   Duration session_idle{std::chrono::minutes(30)};

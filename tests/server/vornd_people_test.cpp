@@ -49,6 +49,16 @@ Reply Recorded(const std::string& path, const std::string& json, Reply reply) {
   return reply;
 }
 
+// Returns the number of a child process; an empty string if there is none.
+std::string ChildOf(pid_t pid) {
+  std::string child;
+  const std::filesystem::path tasks = "/proc/" + std::to_string(pid) + "/task";
+  for (const auto& task : std::filesystem::directory_iterator(tasks)) {
+    if (std::ifstream(task.path() / "children") >> child) break;
+  }
+  return child;
+}
+
 class People : public testing::Test {
  protected:
   enum class Way { kUnix, kTcp };
@@ -59,6 +69,8 @@ class People : public testing::Test {
     sandbox_.Write("etc/passwd",
                    "alice:x:1001:100::/:/bin/sh\nbob:x:1002:100::/:/bin/sh\ncarol:x:1003:100::/:/bin/sh\n"
                    "expired:x:1004:3001::/:/bin/sh\n");
+    std::filesystem::create_directories(sandbox_.File("etc/vorn"));
+    sandbox_.Write("etc/vorn/vornd.conf", "[access]\npassword-time = 1s\n");  // for the modules that hang
     sandbox_.Write("etc/group", "users:x:100:\nvorn-admin:x:3001:alice\nvorn-readonly:x:3002:bob\n");
     Start();
   }
@@ -297,21 +309,30 @@ TEST_F(People, OfNeitherGroupHaveNoSession) {
 
 // The module of the test notices an unknown account at once and a wrong password only after 0.3 s.
 TEST_F(People, CannotTellAnUnknownAccountFromAWrongPassword) {
-  const auto attempt = [this](const char* account) {
-    const auto begin = steady_clock::now();
-    const Reply reply = SignIn(account, std::string(kPasswordMark) + "nobody");
-    EXPECT_GE(steady_clock::now() - begin, milliseconds(1000)) << account;
-    return std::pair(reply.status, reply.body);
-  };
-  const auto wrong = attempt("alice");
-  EXPECT_EQ(wrong.first, 401);
-  EXPECT_EQ(attempt("ghost"), wrong);
-  const Reply expired = SignIn("expired", std::string(kPasswordMark) + "expired");
-  EXPECT_EQ(std::pair(expired.status, expired.body), wrong);
+  const auto begin = steady_clock::now();
+  std::vector<Connection> attempts;
+  for (const auto& [account, password] :
+       {std::pair("alice", "nobody"), std::pair("ghost", "nobody"), std::pair("expired", "expired")}) {
+    attempts.push_back(server_->ConnectTcp());
+    attempts.back().Send(
+        Post(std::string(kSession) + "sign_in", Credentials(account, std::string(kPasswordMark) + password)));
+  }
+  const Reply wrong = attempts[0].Receive();
+  EXPECT_EQ(wrong.status, 401);
+  for (const std::size_t other : {1, 2}) {
+    const Reply reply = attempts[other].Receive();
+    EXPECT_EQ(std::pair(reply.status, reply.body), std::pair(wrong.status, wrong.body)) << other;
+  }
+  EXPECT_GE(steady_clock::now() - begin, milliseconds(1000));
 }
 
 TEST_F(People, WaitLongerAfterEachWrongPasswordButGetIn) {
-  for (int i = 0; i < 3; ++i) EXPECT_EQ(SignIn("alice", "wrong").status, 401);
+  std::vector<Connection> wrong;
+  for (int i = 0; i < 3; ++i) {
+    wrong.push_back(server_->ConnectTcp());
+    wrong.back().Send(Post(std::string(kSession) + "sign_in", Credentials("alice", "wrong")));
+  }
+  for (Connection& client : wrong) EXPECT_EQ(client.Receive().status, 401);
   const auto begin = steady_clock::now();
   EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 200);
   EXPECT_GE(steady_clock::now() - begin, milliseconds(1000));
@@ -439,6 +460,22 @@ TEST_F(People, DoNotDelayTheEndOfTheServer) {
   Stop();
   EXPECT_EQ(server_->log().find("calls are still running"), std::string::npos);
   EXPECT_EQ(hanging.Receive().status, 503);
+}
+
+TEST_F(People, LeaveNoHelperBehindWhenTheServerIsKilled) {
+  sandbox_.Write("etc/vorn/vornd.conf", "[access]\npassword-time = 1min\n");
+  Start();
+  Connection hanging = server_->ConnectTcp();
+  hanging.Send(Post(std::string(kSession) + "sign_in", Credentials("hang", "x")));
+  std::string helper;
+  ASSERT_TRUE(Eventually([&] {
+    helper = ChildOf(server_->pid());
+    return !helper.empty();
+  }));
+  EXPECT_FALSE(ReadWholeFile("/proc/" + helper + "/cmdline").empty());
+  server_->Signal(SIGKILL);
+  server_->Wait();
+  EXPECT_TRUE(Eventually([&] { return ReadWholeFile("/proc/" + helper + "/cmdline").empty(); }));
 }
 
 // Vornd prints the link to its standard output, which is a file here.

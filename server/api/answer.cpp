@@ -28,6 +28,12 @@ std::string Member(std::string_view name, const std::vector<std::string>& senten
   return ",\"" + std::string(name) + "\":" + WriteJson(list);
 }
 
+// The members beside "success".
+std::string Besides(const Remarks& remarks) {
+  const std::string warnings = Member("warnings", remarks.warnings);
+  return remarks.rehearsal.empty() ? warnings : warnings + ",\"rehearsal\":" + remarks.rehearsal;
+}
+
 }  // namespace
 
 std::string WriteJson(const Json::Value& value) {
@@ -43,14 +49,14 @@ std::string WriteJson(const Json::Value& value) {
 Response Success(const Json::Value& data, const Remarks& remarks) { return SuccessWith(WriteJson(data), remarks); }
 
 Response SuccessWith(std::string_view data, const Remarks& remarks) {
-  return {200, R"({"success":true,"data":)" + std::string(data) + Member("warnings", remarks.warnings) + "}", {}};
+  return {200, R"({"success":true,"data":)" + std::string(data) + Besides(remarks) + "}", {}};
 }
 
 Response Failure(int status, int code, std::string_view text, const Json::Value& details, const Remarks& remarks) {
   std::string body = R"({"success":false,"error":{"code":)" + std::to_string(code) + R"(,"text":)" +
                      WriteJson(Json::Value(text.data(), text.data() + text.size()));
   if (!details.isNull()) body += R"(,"details":)" + WriteJson(details);
-  body += Member("reasons", remarks.reasons) + "}" + Member("warnings", remarks.warnings) + "}";
+  body += Member("reasons", remarks.reasons) + "}" + Besides(remarks) + "}";
   Response response{status, std::move(body), {}};
   response.error_code = code;
   return response;

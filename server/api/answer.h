@@ -1,7 +1,8 @@
 // The JSON envelope of every answer:
 //     {"success": true, "data": ...}
 //     {"success": false, "error": {"code": ..., "text": ..., "details": ..., "reasons": [...]}}
-// with "warnings": [...] beside "success". Details, reasons and warnings are left out if there are none.
+// with "warnings": [...] beside "success". Details, reasons and warnings are left out if there are none. The answer of
+// a rehearsal has "rehearsal": {...} besides (rehearsal_answer.h).
 #ifndef VORN_SERVER_ANSWER_H
 #define VORN_SERVER_ANSWER_H
 
@@ -23,6 +24,7 @@ constexpr int kInternalFailure = 2302;
 struct Remarks {
   std::vector<std::string> reasons;   // why operations of a failed call failed
   std::vector<std::string> warnings;  // what the caller should know besides the result
+  std::string rehearsal{};            // JSON text of what a rehearsed call would have done; empty for other calls
 };
 
 // Compact JSON text in ASCII.

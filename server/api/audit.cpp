@@ -31,9 +31,10 @@ std::string AuditedParameters(const Json::Value& parameters) {
   return text;
 }
 
-std::string FormatAudit(const AuditRecord& record) {
-  return "audit: " + (record.caller.empty() ? "-" : record.caller) + " " + record.origin + " " + record.method + " " +
-         record.parameters + " " + OutcomeOf(record) + ", " + std::to_string(record.duration.count()) + " us";
+std::string FormatAudit(const AuditRecord& record, const char* kind) {
+  return std::string(kind) + ": " + (record.caller.empty() ? "-" : record.caller) + " " + record.origin + " " +
+         record.method + " " + record.parameters + " " + OutcomeOf(record) + ", " +
+         std::to_string(record.duration.count()) + " us";
 }
 
 AuditSink JournalAudit() { return WriteToJournal; }

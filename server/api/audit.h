@@ -30,8 +30,8 @@ constexpr std::size_t kMostAuditedBytes = 16384;
 // The parameters as compact JSON in ASCII, on one line.
 std::string AuditedParameters(const Json::Value& parameters);
 
-// A record as one line.
-std::string FormatAudit(const AuditRecord& record);
+// A record as one line that begins with `kind`.
+std::string FormatAudit(const AuditRecord& record, const char* kind = "audit");
 
 // Writes to the systemd journal, in fields of their own (VORN_CALL, VORN_PARAMETERS, ...; systemd.journal-fields(7)).
 AuditSink JournalAudit();

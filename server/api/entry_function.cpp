@@ -8,6 +8,8 @@
 #include <vector>
 
 #include "entity_tag.h"
+#include "rehearsal.h"
+#include "rehearsal_answer.h"
 
 namespace vorn::server {
 namespace {
@@ -39,11 +41,13 @@ class PresentData {
   }
 
   // The answer to a call whose condition does not hold. If the data cannot be read, it is the failure of the reading.
-  Response Refuse() {
+  // `rehearsal` is that of Remarks.
+  Response Refuse(std::string rehearsal = "") {
     if (!outcome_) Read(Subject());
+    outcome_->remarks.rehearsal = std::move(rehearsal);
     if (outcome_->code() != 0) return AnswerTo(*changing_.shown_by, *outcome_);
-    Response response =
-        Failure(412, 412, "This was changed meanwhile. The details are what is there now.", outcome_->data());
+    Response response = Failure(412, 412, "This was changed meanwhile. The details are what is there now.",
+                                outcome_->data(), {{}, {}, outcome_->remarks.rehearsal});
     const std::optional<std::string> tag = MakeEntityTag(read_with_, WriteJson(outcome_->data()));
     if (tag) response.headers.emplace_back("ETag", *tag);
     return response;
@@ -75,9 +79,11 @@ class PresentData {
   Json::Value read_with_;           // its parameters
 };
 
-bool IsUnchanged(const IfMatch& condition, PresentData* present) {
-  return std::any_of(condition.tags.begin(), condition.tags.end(),
-                     [present](const std::string& tag) { return present->Matches(tag); });
+// Whether the data is what the value of an If-Match header names.
+bool IsUnchanged(std::string_view if_match, PresentData* present) {
+  const IfMatch condition = ParseIfMatch(if_match);
+  return condition.any || std::any_of(condition.tags.begin(), condition.tags.end(),
+                                      [present](const std::string& tag) { return present->Matches(tag); });
 }
 
 // Returns the reasons of a failed call: those of the platform. If it has none, and the code is about the parameters,
@@ -87,6 +93,8 @@ std::vector<std::string> ReasonsOf(const Route& route, int code, const VORN::Cal
   if (!context.reasons().empty() || !route.descriptor->Describe(code).about_parameters) return context.reasons();
   return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
 }
+
+std::string ReportOf(const VORN::Draft& draft, int context) { return WriteJson(RehearsalJson(draft.Report(context))); }
 
 }  // namespace
 
@@ -118,10 +126,22 @@ Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDe
                         std::string_view if_match) {
   const VORN::CallLock lock;
   if (!lock.held()) return Busy("Another change takes long. Try again soon.");
-  const IfMatch condition = ParseIfMatch(if_match);
   PresentData present(route, parameters, description);
-  if (!condition.any && !IsUnchanged(condition, &present)) return present.Refuse();
+  if (!IsUnchanged(if_match, &present)) return present.Refuse();
   return RunAndAnswer(route, std::move(parameters), std::move(description));
+}
+
+Response Rehearse(const Route& route, Json::Value parameters, VORN::CallDescription description,
+                  const std::optional<std::string>& if_match, int context) {
+  const VORN::Draft draft;
+  description.draft = &draft;
+  if (if_match) {
+    PresentData present(route, parameters, description);
+    if (!IsUnchanged(*if_match, &present)) return present.Refuse(ReportOf(draft, context));
+  }
+  Outcome outcome = RunEntryFunction(route, std::move(parameters), std::move(description));
+  outcome.remarks.rehearsal = ReportOf(draft, context);
+  return AnswerTo(route, outcome);
 }
 
 }  // namespace vorn::server

@@ -5,6 +5,7 @@
 #include <json/value.h>
 
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "answer.h"
@@ -38,6 +39,12 @@ Response RunAndAnswer(const Route& route, Json::Value parameters, VORN::CallDesc
 // whose change the platform detects and refuses to overwrite.
 Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDescription description,
                         std::string_view if_match);
+
+// Rehearses a changing method: answers what RunAndAnswer, or with a condition RunIfUnchanged, would answer, and what
+// the call would have changed. Nothing is changed, and no lock is taken: the reading method and the changing one work
+// on one draft. `context` is the number of unchanged lines that are shown around a change of a file.
+Response Rehearse(const Route& route, Json::Value parameters, VORN::CallDescription description,
+                  const std::optional<std::string>& if_match, int context);
 
 }  // namespace vorn::server
 

@@ -56,6 +56,9 @@ bool MayNameShare(const Caller& caller, const Route& route, const Json::Value& p
   return share.isString() && Permits(caller.shares, share.asString());
 }
 
+// The number of unchanged lines that a caller sees around the changes of a file. They may be about other shares.
+int ShownContext(const Caller& caller) { return caller.shares.empty() ? 3 : 0; }
+
 }  // namespace
 
 Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
@@ -65,12 +68,15 @@ Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
       if_match_(std::move(request.if_match)),
       turn_(std::move(request.turn)),
       recent_requests_(request.recent_requests),
+      rehearses_(request.rehearses),
       environment_(environment),
       answer_(caller_->name) {
   description_.caller = caller_->name;
   description_.origin = std::move(request.origin);
   description_.method = route_.Id();
-  description_.may_write = caller_->role == Role::kAdministrator && !route_.method.reads_only;
+  // A rehearsal writes to a draft, which a reader may do.
+  const bool may_change = caller_->role == Role::kAdministrator || rehearses_;
+  description_.may_write = may_change && !route_.method.reads_only;
 }
 
 std::optional<Response> Call::Receive(std::string_view piece) { return body_->Receive(piece); }
@@ -124,6 +130,7 @@ Response Call::Execute() {
   if (!route_.method.reads_only) {
     audited_parameters_ = TextForAudit(route_, object);
   }
+  if (rehearses_) return Rehearse(route_, std::move(object), description_, if_match_, ShownContext(*caller_));
   if (route_.own) return route_.own(object, *caller_);
   if (!if_match_) return RunAndAnswer(route_, std::move(object), description_);
   return RunIfUnchanged(route_, std::move(object), description_, *if_match_);
@@ -135,8 +142,15 @@ void Call::Record(const Response& response, std::chrono::nanoseconds duration) c
   environment_.metrics.AddDuration(route_, worked);
   if (route_.method.reads_only) return;
   try {
-    environment_.audit({description_.caller, description_.origin, description_.method, audited_parameters_,
-                        response.status, response.error_code, worked});
+    const AuditRecord record{description_.caller,
+                             description_.origin,
+                             description_.method,
+                             audited_parameters_,
+                             response.status,
+                             response.error_code,
+                             worked};
+    if (!rehearses_) return environment_.audit(record);
+    syslog(LOG_INFO, "%s", FormatAudit(record, "rehearsal").c_str());
   } catch (const std::exception&) {
     syslog(LOG_ERR, "A call has no audit record: no memory");
   }

@@ -31,7 +31,7 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
   // The objects that all calls share. They must outlive the calls.
   struct Environment {
     WorkerPool& pool;
-    const AuditSink& audit;  // receives each call of a method that may change something
+    const AuditSink& audit;  // receives each call that may change something; a rehearsal has a line in the log instead
     CallMetrics& metrics;
     std::chrono::milliseconds deadline;  // from the end of the body
   };
@@ -45,6 +45,7 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
     std::optional<std::string> if_match;  // the condition of a changing call, see RunIfUnchanged()
     std::string turn{};                   // Sender::peer of the call
     unsigned recent_requests = 0;         // Sender::recent_requests of the call
+    bool rehearses = false;               // whether the changing call is only rehearsed
   };
 
   Call(Request request, std::unique_ptr<Body> body, Environment environment);
@@ -69,6 +70,7 @@ class Call : public Exchange, public Job, public std::enable_shared_from_this<Ca
   const std::optional<std::string> if_match_;
   const std::string turn_;
   const unsigned recent_requests_;
+  const bool rehearses_;
   std::string audited_parameters_;  // of a call that may change something
   const Environment environment_;
   PendingAnswer answer_;

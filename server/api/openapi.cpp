@@ -30,8 +30,11 @@ Json::Value Reference(const std::string& name) {
   return reference;
 }
 
-// The schema of a whole answer. `member` is "data" or "error".
-Json::Value Envelope(bool success, const char* member, const Json::Value& schema) {
+// Whether a call of the method can be rehearsed.
+bool MayBeRehearsed(const Route& route) { return !route.method.reads_only && !route.own; }
+
+// The schema of a whole answer of the route. `member` is "data" or "error".
+Json::Value Envelope(const Route& route, bool success, const char* member, const Json::Value& schema) {
   Json::Value envelope;
   envelope["type"] = "object";
   envelope["required"].append("success");
@@ -40,17 +43,19 @@ Json::Value Envelope(bool success, const char* member, const Json::Value& schema
   envelope["properties"]["success"]["const"] = success;
   envelope["properties"][member] = schema;
   envelope["properties"]["warnings"] = Reference("schemas/Warnings");
+  if (MayBeRehearsed(route)) envelope["properties"]["rehearsal"] = Reference("schemas/Rehearsal");
   return envelope;
 }
 
 // Adds the envelope to the description of a method's result.
-void WrapResult(bool has_tag, Json::Value* operation) {
+void WrapResult(const Route& route, Json::Value* operation) {
+  const bool has_tag = route.method.reads_only && !route.own;
   Json::Value& response = (*operation)["responses"]["200"];
   if (!response.isMember("description")) response["description"] = "The method succeeded.";
   if (has_tag) response["headers"]["ETag"] = Reference("headers/ETag");
   Json::Value& content = response["content"][kJson];
   const Json::Value schema = content.get("schema", Json::objectValue);
-  content["schema"] = Envelope(true, "data", schema);
+  content["schema"] = Envelope(route, true, "data", schema);
   for (Json::Value& example : content["examples"]) {
     const Json::Value data = example["value"];
     example["value"] = Json::objectValue;
@@ -68,7 +73,7 @@ struct Code {
 };
 
 // A response with these codes.
-Json::Value FailureResponse(const std::vector<Code>& codes) {
+Json::Value FailureResponse(const Route& route, const std::vector<Code>& codes) {
   Json::Value error;
   error["type"] = "object";
   error["required"].append("code");
@@ -85,7 +90,7 @@ Json::Value FailureResponse(const std::vector<Code>& codes) {
   }
   Json::Value response;
   response["description"] = description;
-  response["content"][kJson]["schema"] = Envelope(false, "error", error);
+  response["content"][kJson]["schema"] = Envelope(route, false, "error", error);
   return response;
 }
 
@@ -131,7 +136,8 @@ class Document {
   Json::Value Operation(Json::Value operation, const Route& route) const {
     operation["operationId"] = route.Id();
     if (route.shown_by != nullptr) operation["parameters"].append(Reference("parameters/IfMatch"));
-    WrapResult(route.method.reads_only && !route.own, &operation);
+    if (MayBeRehearsed(route)) operation["parameters"].append(Reference("parameters/Rehearse"));
+    WrapResult(route, &operation);
     AddFailures(route, &operation);
     return operation;
   }
@@ -156,7 +162,7 @@ class Document {
         of_method->second.push_back({of_method->first, responses_[name]["description"].asString(), {}});
       }
     }
-    for (const auto& [status, each] : codes) responses[std::to_string(status)] = FailureResponse(each);
+    for (const auto& [status, each] : codes) responses[std::to_string(status)] = FailureResponse(route, each);
   }
 
   Json::Value document_;

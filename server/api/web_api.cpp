@@ -73,8 +73,8 @@ NewBody OpenBody(const Head& head, const Route& route, const WebApi::Parts& part
 
 // Refuses a call that the caller may not make, whatever its parameters are. The share that they name is compared when
 // they have been read.
-std::optional<Response> RefuseCaller(const Caller& caller, const Route& route) {
-  if (caller.role != Role::kAdministrator && !route.for_readers) {
+std::optional<Response> RefuseCaller(const Caller& caller, const Route& route, bool rehearses) {
+  if (caller.role != Role::kAdministrator && !route.for_readers && !rehearses) {
     return Refusal(403, "This caller may read only.");
   }
   if (!Permits(caller.apis, route.row.api)) return Refusal(403, "This token is not for this API.");
@@ -100,7 +100,7 @@ std::optional<std::string> IfMatchOf(const Head& head) {
   return value;
 }
 
-// Refuses a request with a query, and names its first parameter; no request accepts any.
+// Refuses a request with a query, and names its first parameter.
 std::optional<Response> RefuseQuery(std::string_view query) {
   const std::string_view name = query.substr(0, query.find_first_of("=&"));
   if (query.empty()) return std::nullopt;
@@ -115,11 +115,23 @@ Response Options(const std::string& allowed) {
   return response;
 }
 
-// Answers a request for a method that is not made with POST, or that has a query.
+// Answers a request for a method that is not made with POST.
 std::optional<Response> RefuseOtherThanPost(const Head& head) {
   if (head.method == "OPTIONS") return Options("POST");
   if (head.method != "POST") return MethodNotAllowed(head.target, "POST");
-  return RefuseQuery(head.query);
+  return std::nullopt;
+}
+
+constexpr std::string_view kRehearse = "rehearse=true";
+
+// Refuses a call with a query, except one that asks for the rehearsal of a module's changing method.
+std::optional<Response> RefuseQueryOfCall(std::string_view query, const Route& route) {
+  if (query.substr(0, query.find_first_of("=&")) != "rehearse") return RefuseQuery(query);
+  if (query != kRehearse)
+    return Refusal(400, "A rehearsal is asked for with the query rehearse=true, and no other one.");
+  if (route.own) return Refusal(400, "The methods of the server itself cannot be rehearsed.");
+  if (route.method.reads_only) return Refusal(400, "Only a method that changes something can be rehearsed.");
+  return std::nullopt;
 }
 
 // An answer that depends only on the program's version. Clients may cache it and revalidate it.
@@ -184,19 +196,27 @@ WebApi::Begun WebApi::BeginFor(const CallerPtr& caller, const Page* page, const 
   const Route* route = parts_.routes.Find(head.target, &unknown);
   if (route == nullptr) return Refusal(404, unknown);
   if (auto refusal = RefuseOtherThanPost(head)) return *std::move(refusal);
-  if (auto refusal = RefuseCaller(*caller, *route)) return *std::move(refusal);
+  if (auto refusal = RefuseQueryOfCall(head.query, *route)) return *std::move(refusal);
+  if (auto refusal = RefuseCaller(*caller, *route, !head.query.empty())) return *std::move(refusal);
   return BeginCall(*route, caller, head);
 }
 
 WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const {
   NewBody body = OpenBody(head, route, parts_);
   if (auto* refusal = std::get_if<Response>(&body)) return std::move(*refusal);
-  Call::Request request{
-      route, caller, head.peer.address, IfMatchOf(head), TurnOf(head.peer, caller->name), head.recent_requests};
+  Call::Request request{route,
+                        caller,
+                        head.peer.address,
+                        IfMatchOf(head),
+                        TurnOf(head.peer, caller->name),
+                        head.recent_requests,
+                        head.query == kRehearse};
   if (request.if_match && route.shown_by == nullptr) {
     return Refusal(400, "If-Match is for methods that change something which another method shows.");
   }
-  WorkerPool& pool = route.method.reads_only ? parts_.workers.reading : parts_.workers.changing;
+  // A rehearsal takes no lock, so it must not wait for changing calls that wait for one.
+  const bool only_reads = route.method.reads_only || request.rehearses;
+  WorkerPool& pool = only_reads ? parts_.workers.reading : parts_.workers.changing;
   std::get<std::unique_ptr<Body>>(body)->Announce(head.content_length);
   return std::make_shared<Call>(std::move(request), std::get<std::unique_ptr<Body>>(std::move(body)),
                                 Call::Environment{pool, parts_.audit, parts_.metrics, limits_.call});
@@ -204,6 +224,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, con
 
 WebApi::Begun WebApi::BeginSignIn(const Head& head) const {
   if (auto refusal = RefuseOtherThanPost(head)) return *std::move(refusal);
+  if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
   const std::optional<HeaderValue> type = ParseHeaderValue(head.content_type);
   if (!type || type->value != "application/json" || !IsUtf8(*type)) {
     return Refusal(415, "Signing in takes its parameters as application/json, in UTF-8.");

@@ -1,0 +1,16 @@
+// The JSON form of a rehearsal. "schemas/Rehearsal" of openapi.json describes it.
+#ifndef VORN_SERVER_REHEARSAL_ANSWER_H
+#define VORN_SERVER_REHEARSAL_ANSWER_H
+
+#include <json/value.h>
+
+#include "rehearsal.h"
+
+namespace vorn::server {
+
+// {"files": [...], "actions": [...], "rules": [...]}
+Json::Value RehearsalJson(const VORN::Rehearsal& rehearsal);
+
+}  // namespace vorn::server
+
+#endif  // VORN_SERVER_REHEARSAL_ANSWER_H

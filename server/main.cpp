@@ -274,7 +274,8 @@ int Serve(const Options& options, const Settings& settings) {
   const std::vector<MetricsSource> figures = {[&] {
                                                 return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
                                               },
-                                              ProcessMetrics, VORN::ReadMetrics};
+                                              [&] { return SessionMetrics(sessions); }, ProcessMetrics,
+                                              VORN::ReadMetrics};
   Workers workers;  // after everything that a running call uses: its destructor waits for them
   WebApi api({routes,
               folders->uploads,

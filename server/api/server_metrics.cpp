@@ -165,6 +165,14 @@ std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& 
   return metrics;
 }
 
+std::vector<VORN::Metric> SessionMetrics(Sessions& sessions) {
+  return {{"vorn_sessions",
+           "Sessions that have not ended",
+           Kind::kGauge,
+           {},
+           static_cast<double>(sessions.List(Sessions::Clock::now()).size())}};
+}
+
 std::vector<VORN::Metric> ProcessMetrics() {
   rusage used{};
   getrusage(RUSAGE_SELF, &used);

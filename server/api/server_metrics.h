@@ -20,6 +20,7 @@
 #include "budget.h"
 #include "metrics.h"
 #include "routes.h"
+#include "sessions.h"
 #include "worker_pool.h"
 
 namespace vorn::server {
@@ -64,6 +65,9 @@ std::string WriteMetrics(const CallMetrics& calls, const Workers& workers, const
 // The figures of the transport: answers by status, and the memory of these budgets.
 using NamedBudgets = std::vector<std::pair<std::string, const Budget&>>;
 std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& budgets);
+
+// The number of sessions that have not ended.
+std::vector<VORN::Metric> SessionMetrics(Sessions& sessions);
 
 // The CPU time, memory and descriptors of this process, under the names that all exporters use.
 std::vector<VORN::Metric> ProcessMetrics();

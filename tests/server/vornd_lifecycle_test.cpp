@@ -4,6 +4,7 @@
 
 #include <csignal>
 #include <filesystem>
+#include <vector>
 
 #include "server_process.h"
 
@@ -75,6 +76,34 @@ TEST(Vornd, FinishesARunningCallAndThenEnds) {
   EXPECT_EQ(reply.headers["Connection"], "close");
   EXPECT_EQ(server.Wait(), 0) << server.log();
   EXPECT_FALSE(std::filesystem::exists(server.socket()));
+}
+
+// Four calls of a method run at the same time.
+TEST(Vornd, RefusesTheCallsThatHaveNotBegunWhenItStops) {
+  const Sandbox sandbox;
+  ServerProcess server(sandbox);
+  std::vector<Connection> running;
+  for (int i = 0; i < 4; ++i) {
+    running.push_back(BeginCall(sandbox, server));
+    std::filesystem::remove(sandbox.File("begun"));
+  }
+  Connection queued = server.Connect();
+  queued.Send(
+      Post("/api/Test.Echo/v1/wait", R"({"begun": ")" + sandbox.File("late") + R"(", "release": "/dev/null"})"));
+  Connection other = server.Connect();
+  EXPECT_TRUE(Eventually([&] {
+    other.Send(Get("/metrics"));
+    return other.Receive().body.find("vorn_calls_waiting{kind=\"changing\"} 1\n") != std::string::npos;
+  }));
+  server.Signal(SIGTERM);
+  const Reply reply = queued.Receive();
+  EXPECT_EQ(reply.status, 503);
+  EXPECT_EQ(reply.headers.at("Retry-After"), "1");
+  EXPECT_THAT(reply.body, HasSubstr("The server is stopping."));
+  sandbox.Write("release", "");
+  for (Connection& client : running) EXPECT_EQ(client.Receive().Envelope()["data"], "released");
+  EXPECT_EQ(server.Wait(), 0) << server.log();
+  EXPECT_FALSE(std::filesystem::exists(sandbox.File("late"))) << "the call has not begun";
 }
 
 TEST(Vornd, EndsOnInterruptWithIdleClients) {

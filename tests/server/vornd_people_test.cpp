@@ -101,6 +101,12 @@ class People : public testing::Test {
     return Call(Way::kUnix, path, json);
   }
 
+  std::string MetricsPage() const {
+    Connection client = server_->Connect();
+    client.Send(Get("/metrics"));
+    return client.Receive().body;
+  }
+
   // Makes a token; `more` has further members of the parameters.
   std::string NewToken(const std::string& name, const std::string& role, const std::string& more = "") const {
     const Reply reply = Administer(std::string(kToken) + "create",
@@ -436,12 +442,14 @@ TEST_F(People, HaveSessionsThatAnAdministratorEnds) {
   const std::string header = SignedIn("bob");
   const Json::Value list = Administer(std::string(kSession) + "list").Envelope()["data"];
   ASSERT_EQ(list.size(), 1U);
+  EXPECT_THAT(MetricsPage(), HasSubstr("\nvorn_sessions 1\n"));
   EXPECT_EQ(list[0]["account"], "bob");
   EXPECT_EQ(list[0]["role"], "reader");
   const std::string id = R"({"id": ")" + list[0]["id"].asString() + "\"}";
   EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + "end", id, header).status, 403) << "bob is no administrator";
   EXPECT_EQ(Administer(std::string(kSession) + "end", id).status, 200);
   EXPECT_EQ(Administer(std::string(kSession) + "end", id).status, 404);
+  EXPECT_THAT(MetricsPage(), HasSubstr("\nvorn_sessions 0\n"));
   EXPECT_EQ(Call(Way::kTcp, kGet, "{}", header).status, 401);
 }
 

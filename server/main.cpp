@@ -6,12 +6,14 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <climits>
 #include <cstddef>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <string>
 #include <system_error>
@@ -38,6 +40,8 @@
 #include "server_metrics.h"
 #include "sessions.h"
 #include "termination.h"
+#include "tls.h"
+#include "tls_files.h"
 #include "token_store.h"
 #include "upload.h"
 #include "web_api.h"
@@ -108,10 +112,12 @@ void PrintSignInLink(const std::vector<Listener>& listeners, Sessions* sessions)
   const std::string code = sessions->NewCode(Sessions::Clock::now());
   for (const Listener& listener : listeners) {
     if (listener.family() == AF_UNIX) continue;
+    const std::string url =
+        listener.tls() ? "https://" + listener.name().substr(std::string("tls:").size()) : "http://" + listener.name();
     std::printf(
-        "Sign in once, within %lld minutes: http://%s/#code=%s\n",
+        "Sign in once, within %lld minutes: %s/#code=%s\n",
         static_cast<long long>(std::chrono::duration_cast<std::chrono::minutes>(sessions->limits().code).count()),
-        listener.name().c_str(), code.c_str());
+        url.c_str(), code.c_str());
   }
   std::fflush(stdout);
 }
@@ -148,12 +154,46 @@ std::optional<std::vector<Listener>> Listen(const Settings& settings, const Runt
   return listeners;
 }
 
+// The file of the self-signed certificate. The state folder may be missing.
+std::string SelfSignedPath(const Options& options) {
+  return (options.root == "/" ? "" : options.root) + "/var/lib/vorn/self-signed.pem";
+}
+
+// Makes new connections use the identity, and logs its fingerprint if it is another one than before.
+void Use(const TlsIdentityPtr& identity, TlsServer* tls) {
+  const TlsIdentityPtr before = tls->identity();
+  tls->Replace(identity);
+  if (before && before->fingerprint() == identity->fingerprint()) return;
+  syslog(LOG_NOTICE, "The TLS certificate has the SHA-256 fingerprint %s", identity->fingerprint().c_str());
+}
+
+// Returns the value of the header; empty if it is not to be sent.
+std::string StrictTransport(const Settings& settings) {
+  const auto seconds = settings.strict_transport.time.count();
+  return seconds == 0 ? "" : "max-age=" + std::to_string(seconds);
+}
+
+// Looks after the certificate, which expires while the server runs.
+void Maintain(const Options& options, const Settings& settings, TlsServer* tls) {
+  if (tls == nullptr) return;
+  const std::time_t now = std::time(nullptr);
+  if (settings.certificate.path.empty()) {
+    std::string error;
+    const TlsIdentityPtr identity = OpenTlsIdentity(settings, SelfSignedPath(options), now, &error);
+    if (!identity) return syslog(LOG_ERR, "%s", error.c_str());
+    Use(identity, tls);
+  }
+  const std::string warning = ExpiryWarning(*tls->identity(), now);
+  if (!warning.empty()) syslog(LOG_WARNING, "%s", warning.c_str());
+}
+
 // The objects that a reload changes.
 struct Reloadable {
   Sessions& sessions;
   Authenticator& authenticator;
   PasswordChecker& passwords;
   OwnNames& names;
+  TlsServer* tls;  // null: no listener has TLS
 };
 
 PasswordChecker::Limits PasswordLimits(const Settings& settings) {
@@ -178,18 +218,26 @@ void Apply(const Options& options, const Settings& settings, const Reloadable& p
   parts.authenticator.SetGroups(GroupsAtSocket(options, settings));
   parts.passwords.SetCommand(PasswordHelper(options, settings));
   parts.names.Set(settings.host_names.each);
+  if (parts.tls != nullptr) parts.tls->SetStrictTransport(StrictTransport(settings));
 }
 
 // Reads the configuration again. If it has a fault, nothing changes.
 void Reload(const Options& options, const Reloadable& parts, Settings* settings) {
   NotifyReloading();
   Configuration next = LoadConfiguration(options);
+  TlsIdentityPtr identity;
+  if (parts.tls != nullptr && next.faults.empty()) {
+    std::string error;
+    identity = OpenTlsIdentity(next.settings, SelfSignedPath(options), std::time(nullptr), &error);
+    if (!identity) next.faults.push_back(error);
+  }
   for (const std::string& fault : next.faults) syslog(LOG_ERR, "%s", fault.c_str());
   if (next.faults.empty()) {
     for (const std::string& key : NeedRestart(*settings, next.settings)) {
       syslog(LOG_WARNING, "%s has changed, which only a restart applies", key.c_str());
     }
     Apply(options, next.settings, parts);
+    if (identity) Use(identity, parts.tls);
     *settings = std::move(next.settings);
     syslog(LOG_NOTICE, "The configuration was read again");
   } else {
@@ -208,6 +256,7 @@ void Attend(const Options& options, const Reloadable& parts, Settings settings) 
         Reload(options, parts, &settings);
         break;
       case Awaited::kTime:
+        Maintain(options, settings, parts.tls);
         break;
     }
   }
@@ -245,6 +294,26 @@ std::vector<Module> LoadModulesOf(const Settings& settings) {
   return modules;
 }
 
+std::string MachineName() {
+  char name[HOST_NAME_MAX + 1] = "";
+  return gethostname(name, sizeof name - 1) == 0 ? name : "";
+}
+
+// Returns false, after logging the reason, if a listener needs TLS and it cannot be set up.
+bool OpenTls(const Options& options, const Settings& settings, std::unique_ptr<TlsServer>* tls) {
+  if (!WantsTls(settings)) return true;
+  std::string error;
+  const TlsIdentityPtr identity = OpenTlsIdentity(settings, SelfSignedPath(options), std::time(nullptr), &error);
+  if (!identity) {
+    syslog(LOG_ERR, "%s", error.c_str());
+    return false;
+  }
+  *tls = std::make_unique<TlsServer>(nullptr);
+  Use(identity, tls->get());
+  Maintain(options, settings, tls->get());
+  return true;
+}
+
 int Serve(const Options& options, const Settings& settings) {
   const std::optional<Folders> folders = OpenFolders(options);
   std::string error;
@@ -253,15 +322,17 @@ int Serve(const Options& options, const Settings& settings) {
   (void)VORN::RemoveLeftovers();  // a failure is logged, and is no reason not to serve
   const std::vector<Module> modules = LoadModulesOf(settings);
   if (modules.empty()) return EXIT_FAILURE;
-  std::optional<std::vector<Listener>> listeners = Listen(settings, folders->runtime);
+  std::unique_ptr<TlsServer> tls;
+  std::optional<std::vector<Listener>> listeners;
+  if (OpenTls(options, settings, &tls)) listeners = Listen(settings, folders->runtime);
   if (!listeners) return EXIT_FAILURE;
 
   TokenStore tokens(folders->state + "/tokens.json");
   Sessions sessions(SessionLimits(settings));
   PasswordChecker passwords(PasswordHelper(options, settings), PasswordLimits(settings));
   Authenticator authenticator(tokens, sessions, {});
-  OwnNames names;
-  const Reloadable reloadable{sessions, authenticator, passwords, names};
+  OwnNames names({}, MachineName());
+  const Reloadable reloadable{sessions, authenticator, passwords, names, tls.get()};
   Apply(options, settings, reloadable);
   if (options.sign_in_link) PrintSignInLink(*listeners, &sessions);
   Routes routes(modules);
@@ -288,7 +359,7 @@ int Serve(const Options& options, const Settings& settings) {
               authenticator,
               {sessions, passwords}});
   const HttpLimits limits = FitToDescriptors(HttpLimitsOf(settings), *listeners, DescriptorLimit());
-  HttpServer server(api, std::move(*listeners), limits, {&bodies, &log});
+  HttpServer server(api, std::move(*listeners), limits, {&bodies, &log, tls.get()});
   Notify("READY=1");
   Attend(options, reloadable, settings);
   Notify("STOPPING=1");
@@ -312,11 +383,26 @@ bool SettleRoot(Options* options) {
   return false;
 }
 
+// Loads the certificate that the settings name, or the self-signed one if there is one. Returns nullptr, with the
+// reason in `error`, if it cannot be used.
+TlsIdentityPtr CheckTls(const Options& options, const Settings& settings, std::string* error) {
+  if (!settings.certificate.path.empty()) return ReadTlsFiles(settings, error);
+  return WantsTls(settings) ? ReadSelfSigned(SelfSignedPath(options), error) : nullptr;
+}
+
 // Prints what is wrong with the configuration.
-int Check(const Options& options, const Configuration& configuration) {
+int Check(const Options& options, Configuration configuration) {
+  std::string error;
+  TlsIdentityPtr identity;
+  if (configuration.faults.empty()) identity = CheckTls(options, configuration.settings, &error);
+  if (!error.empty()) configuration.faults.push_back(error);
   for (const std::string& fault : configuration.faults) std::fprintf(stderr, "%s\n", fault.c_str());
   if (!configuration.faults.empty()) return EXIT_FAILURE;
   std::printf("%s: no fault\n", ConfigurationPath(options).c_str());
+  if (!identity) return EXIT_SUCCESS;
+  std::printf("The TLS certificate has the SHA-256 fingerprint %s\n", identity->fingerprint().c_str());
+  const std::string warning = ExpiryWarning(*identity, std::time(nullptr));
+  if (!warning.empty()) std::printf("%s\n", warning.c_str());
   return EXIT_SUCCESS;
 }
 

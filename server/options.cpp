@@ -6,7 +6,7 @@ namespace vorn::server {
 namespace {
 
 constexpr const char* kFooter =
-    "\nADDRESS is unix:/PATH, 127.0.0.1:PORT or [::1]:PORT.\n"
+    "\nADDRESS is unix:/PATH, 127.0.0.1:PORT, [::1]:PORT or, with TLS, tls:ADDRESS:PORT.\n"
     "Without any, and without sockets from systemd, it is unix:ROOT/run/vorn/vornd.sock.\n"
     "The configuration file, which the options override, is described in vornd.conf(5).";
 
@@ -29,9 +29,8 @@ std::variant<Options, int> ParseOptions(int argc, const char* const* argv) {
   app.add_option("--listen", options.listen, "Listen at ADDRESS; may be given several times")
       ->type_name("ADDRESS")
       ->allow_extra_args(false);
-  app.add_option(
-         "--host-name", options.host_names,
-         "Accept requests and pages of https://NAME, which a proxy with TLS forwards; may be given several times")
+  app.add_option("--host-name", options.host_names,
+                 "Accept requests and pages of https://NAME; may be given several times")
       ->type_name("NAME")
       ->allow_extra_args(false);
   app.add_option("--administrators", options.administrators, "Members of GROUP may do everything")

@@ -1,6 +1,10 @@
 #include "browser_guard.h"
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+
 #include <algorithm>
+#include <cstddef>
 #include <string>
 #include <utility>
 
@@ -27,6 +31,18 @@ bool IsLoopback(std::string_view host) {
   return HasName(host, "localhost") || HasName(host, "127.0.0.1") || HasName(host, "[::1]");
 }
 
+// Returns whether the Host header is an IP address, with any port or none.
+bool IsAddress(const std::string& host) {
+  in6_addr address{};
+  if (host.empty() || host.front() != '[') {
+    const std::string name = host.substr(0, host.find(':'));
+    return inet_pton(AF_INET, name.c_str(), &address) == 1 && HasName(host, name);
+  }
+  const std::size_t end = host.find(']');
+  return end != std::string::npos && inet_pton(AF_INET6, host.substr(1, end - 1).c_str(), &address) == 1 &&
+         HasName(host, host.substr(0, end + 1));
+}
+
 bool HasPrefix(std::string_view text, std::string_view prefix) { return text.substr(0, prefix.size()) == prefix; }
 
 // A URL may contain the default port of its scheme or omit it.
@@ -37,7 +53,9 @@ std::string_view WithoutPort(std::string_view host, std::string_view port) {
 
 }  // namespace
 
-OwnNames::OwnNames(std::vector<std::string> names) { Set(std::move(names)); }
+OwnNames::OwnNames(std::vector<std::string> names, std::string machine) : machine_(LowerAscii(machine)) {
+  Set(std::move(names));
+}
 
 void OwnNames::Set(std::vector<std::string> names) {
   for (std::string& name : names) name = LowerAscii(name);
@@ -50,17 +68,19 @@ bool OwnNames::HasGivenName(std::string_view host) const {
   return std::any_of(names_.begin(), names_.end(), [host](const std::string& name) { return HasName(host, name); });
 }
 
-bool OwnNames::Include(std::string_view host) const {
+bool OwnNames::Include(std::string_view host, bool tls) const {
   const std::string lower = LowerAscii(host);
-  return IsLoopback(lower) || HasGivenName(lower);
+  if (IsLoopback(lower) || HasGivenName(lower)) return true;
+  return tls && (IsAddress(lower) || (!machine_.empty() && HasName(lower, machine_)));
 }
 
-bool OwnNames::AreOrigin(std::string_view origin, std::string_view host) const {
+bool OwnNames::AreOrigin(std::string_view origin, std::string_view host, bool tls) const {
   const std::string own = LowerAscii(host);
   const std::string lower = LowerAscii(origin);
   const std::string_view sender = lower;
-  if (HasGivenName(own) && HasPrefix(sender, kHttps)) {
-    return WithoutPort(sender.substr(kHttps.size()), ":443") == WithoutPort(own, ":443");
+  if (tls || (HasGivenName(own) && HasPrefix(sender, kHttps))) {
+    return HasPrefix(sender, kHttps) && !own.empty() &&
+           WithoutPort(sender.substr(kHttps.size()), ":443") == WithoutPort(own, ":443");
   }
   return IsLoopback(own) && HasPrefix(sender, kHttp) &&
          WithoutPort(sender.substr(kHttp.size()), ":80") == WithoutPort(own, ":80");

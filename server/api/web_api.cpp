@@ -23,11 +23,11 @@ using NewBody = std::variant<std::unique_ptr<Body>, Response>;
 
 std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& names) {
   const std::string_view host = head.host.value_or("");
-  if (!head.peer.credentials && !names.Include(host)) {
+  if (!head.peer.credentials && !names.Include(host, head.secure)) {
     return Refusal(421, "The Host header names another server. Names of this one can be set with --host-name.");
   }
   const std::optional<std::string_view> origin = head.Header("Origin");
-  const bool own_origin = !origin || names.AreOrigin(*origin, host);
+  const bool own_origin = !origin || names.AreOrigin(*origin, host, head.secure);
   if (own_origin && IsOwnFetch(head.Header("Sec-Fetch-Site").value_or("none"))) return std::nullopt;
   return Refusal(403, "Web pages of other sites, and of other ports, may not use this server.");
 }
@@ -183,7 +183,8 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
       std::find_if(kPages.begin(), kPages.end(), [&head](const Page& each) { return each.path == head.target; });
   if (page == kPages.end()) page = nullptr;
   if (page != nullptr && page->is_public) return BeginPage(*page, head);
-  const CallerPtr caller = parts_.authenticator.Identify(head, parts_.names.AreSecure(head.host.value_or("")));
+  const CallerPtr caller =
+      parts_.authenticator.Identify(head, parts_.names.AreSecure(head.host.value_or(""), head.secure));
   if (!caller) return Unauthenticated("Sign in first, or send a valid token.");
   Begun begun = BeginFor(caller, page, head);
   if (auto* answer = std::get_if<Response>(&begun)) answer->caller = caller->name;
@@ -230,7 +231,8 @@ WebApi::Begun WebApi::BeginSignIn(const Head& head) const {
     return Refusal(415, "Signing in takes its parameters as application/json, in UTF-8.");
   }
   if (head.content_length > SignInCall::kMaxBytes) return SignInCall::TooLarge();
-  return std::make_shared<SignInCall>(parts_.sign_in, head.peer, parts_.names.AreSecure(head.host.value_or("")));
+  return std::make_shared<SignInCall>(parts_.sign_in, head.peer,
+                                      parts_.names.AreSecure(head.host.value_or(""), head.secure));
 }
 
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }

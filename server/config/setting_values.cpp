@@ -170,6 +170,8 @@ std::optional<ValueFault> ParseValue(std::string_view text, ByteCount* value) {
 }
 
 std::optional<ValueFault> ParseValue(std::string_view text, Duration* value) {
+  const bool may_be_none = value->time.count() == 0;
+  if (may_be_none && text == "none") return std::nullopt;
   std::uint64_t seconds = 0;
   if (auto fault = ParseAmount(text, kTimes, "time, a number with s, min, h or d", &seconds)) return fault;
   if (seconds == 0 || seconds > kLongestDuration) return ValueFault{0, Quoted(text) + " is not from 1s to 366d"};
@@ -199,6 +201,7 @@ std::string FormatValue(const Count& value) { return std::to_string(value.number
 std::string FormatValue(const ByteCount& value) { return FormatAmount(value.bytes, kSizes); }
 
 std::string FormatValue(const Duration& value) {
+  if (value.time.count() == 0) return "none";
   return FormatAmount(static_cast<std::uint64_t>(value.time.count()), kTimes);
 }
 

@@ -36,13 +36,14 @@ struct ByteCount {
   std::size_t bytes = 0;  // from 64 KiB to 1 GiB; written with a unit: "12MiB"
 };
 struct Duration {
-  std::chrono::seconds time{0};  // from 1 s to 366 days; written with a unit: "30min"
+  std::chrono::seconds time{0};  // from 1 s to 366 days, written with a unit: "30min"; 0: "none"
 };
 struct LogLevel {
   int priority = 0;  // as of syslog(3)
 };
 
-// Each function parses `text`, which has no blanks around it, into `value`. On failure the value is not changed.
+// Each function parses `text`, which has no blanks around it, into `value`, which has its default. On failure the value
+// is not changed. A time may be "none" if that is its default.
 std::optional<ValueFault> ParseValue(std::string_view text, ListenAddresses* value);
 std::optional<ValueFault> ParseValue(std::string_view text, HostNames* value);
 std::optional<ValueFault> ParseValue(std::string_view text, FilePath* value);

@@ -28,6 +28,10 @@ const std::vector<Setting>& SettingsTable() {
       Row<&S::readers>("access", "readers", kReloads),
       Row<&S::password_time>("access", "password-time", kNeedsRestart),
 
+      Row<&S::certificate>("tls", "certificate", kReloads),
+      Row<&S::key>("tls", "key", kReloads),
+      Row<&S::strict_transport>("tls", "strict-transport", kReloads),
+
       Row<&S::session_idle>("sessions", "idle", kReloads),
       Row<&S::session_lifetime>("sessions", "lifetime", kReloads),
       Row<&S::sessions_per_account>("sessions", "per-account", kReloads),
@@ -63,6 +67,11 @@ std::vector<Contradiction> FindContradictions(const Settings& settings) {
   const auto require = [&found](bool sound, std::string_view section, std::string_view key, std::string text) {
     if (!sound) found.push_back({FindSetting(section, key), std::move(text)});
   };
+  require(settings.certificate.path.empty() || !settings.key.path.empty(), "tls", "certificate", "needs a key");
+  require(settings.key.path.empty() || !settings.certificate.path.empty(), "tls", "key", "needs a certificate");
+  // With this header browsers let nobody accept a certificate that they do not trust.
+  require(settings.strict_transport.time.count() == 0 || !settings.certificate.path.empty(), "tls", "strict-transport",
+          "needs a certificate of an authority");
   require(settings.session_idle.time <= settings.session_lifetime.time, "sessions", "idle",
           "is longer than the lifetime of a session");
   require(settings.sessions_per_account.number <= settings.sessions.number, "sessions", "per-account",

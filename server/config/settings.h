@@ -28,6 +28,11 @@ struct Settings {
   GroupName readers{"vorn-readonly"};
   Duration password_time{std::chrono::seconds(10)};
 
+  // [tls]
+  FilePath certificate{};  // empty: a self-signed certificate is made
+  FilePath key{};
+  Duration strict_transport{};  // 0: Strict-Transport-Security is not sent
+
   // [sessions]
   Duration session_idle{std::chrono::minutes(30)};
   Duration session_lifetime{std::chrono::hours(12)};

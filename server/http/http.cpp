@@ -22,6 +22,7 @@
 #include <utility>
 
 #include "session.h"
+#include "tls_stream.h"
 
 namespace vorn::server {
 namespace {
@@ -87,6 +88,7 @@ class HttpServer::Engine : public SessionHost {
   const std::shared_ptr<Mailbox>& mailbox() override { return mailbox_; }
   bool stopping() const override { return stopping_; }
   const std::string& date() override;
+  std::string strict_transport() const override { return parts_.tls == nullptr ? "" : parts_.tls->strict_transport(); }
   void DispatchLater() override;
   void Forget(const std::shared_ptr<Session>& session) override;
 
@@ -104,6 +106,7 @@ class HttpServer::Engine : public SessionHost {
   void Accept(std::size_t listener);
   void Admit(std::size_t listener, UniqueFd connection);
   std::shared_ptr<Session> NewSession(std::size_t listener, UniqueFd connection);
+  std::unique_ptr<Stream> NewStream(std::size_t listener, Socket socket) const;
   void KeepToShare(const std::shared_ptr<Session>& newest);
   bool MakeRoom(int error);
   template <typename Step>
@@ -237,10 +240,15 @@ std::shared_ptr<Session> HttpServer::Engine::NewSession(std::size_t listener, Un
   Socket socket(io_.get_executor());
   socket.assign(Protocol(listeners_[listener].family(), 0), connection.get());
   (void)connection.release();
-  auto stream = std::make_unique<SocketStream>(std::move(socket));
-  auto session = std::make_shared<Session>(*this, std::move(stream), std::move(peer), listener);
+  auto session = std::make_shared<Session>(*this, NewStream(listener, std::move(socket)), std::move(peer), listener);
   sessions_.insert(session);
   return session;
+}
+
+// A handshake may be as long as the headers of a request.
+std::unique_ptr<Stream> HttpServer::Engine::NewStream(std::size_t listener, Socket socket) const {
+  if (!listeners_[listener].tls()) return std::make_unique<SocketStream>(std::move(socket));
+  return std::make_unique<TlsStream>(std::move(socket), parts_.tls->identity()->NewConnection(), limits_.head_bytes);
 }
 
 void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {

@@ -15,6 +15,7 @@
 #include "listener.h"
 #include "service.h"
 #include "shares.h"
+#include "tls.h"
 
 namespace vorn::server {
 
@@ -54,6 +55,7 @@ rlim_t DescriptorLimit();
 struct HttpParts {
   Budget* bodies = nullptr;  // null: bodies are not charged
   AccessLog* log = nullptr;  // null: no access log
+  TlsServer* tls = nullptr;  // needed if a listener has TLS
 };
 
 // Serves from construction until Stop() and Join(). The service must outlive it. All functions are thread-safe.

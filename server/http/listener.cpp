@@ -21,7 +21,9 @@ namespace vorn::server {
 namespace {
 
 constexpr std::string_view kUnixScheme = "unix:";
-constexpr std::string_view kRule = "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at";
+constexpr std::string_view kTlsScheme = "tls:";
+constexpr std::string_view kRule =
+    "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at without TLS, and tls:ADDRESS:PORT with TLS";
 
 // Any socket address, with its size in bytes.
 struct SocketAddress {
@@ -56,27 +58,41 @@ std::optional<std::uint16_t> ParsePort(std::string_view text) {
   return port;
 }
 
-std::optional<SocketAddress> ParseTcp(std::string_view address) {
-  const std::size_t colon = address.rfind(':');
-  if (colon == std::string_view::npos) return std::nullopt;
-  const std::string_view host = address.substr(0, colon);
-  const auto port = ParsePort(address.substr(colon + 1));
-  if (!port) return std::nullopt;
-  if (host == "127.0.0.1") {
-    sockaddr_in ipv4{};
-    ipv4.sin_family = AF_INET;
-    ipv4.sin_port = htons(*port);
-    ipv4.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    return SocketAddress::Of(ipv4);
-  }
-  if (host == "[::1]") {
-    sockaddr_in6 ipv6{};
-    ipv6.sin6_family = AF_INET6;
-    ipv6.sin6_port = htons(*port);
-    ipv6.sin6_addr = in6addr_loopback;
-    return SocketAddress::Of(ipv6);
-  }
+// An address of TCP, and whether its connections have TLS.
+struct Endpoint {
+  SocketAddress address;
+  bool tls = false;
+};
+
+std::optional<SocketAddress> ParseHost(std::string_view host, std::uint16_t port) {
+  sockaddr_in ipv4{};
+  ipv4.sin_family = AF_INET;
+  ipv4.sin_port = htons(port);
+  if (inet_pton(AF_INET, std::string(host).c_str(), &ipv4.sin_addr) == 1) return SocketAddress::Of(ipv4);
+  if (host.size() < 2 || host.front() != '[' || host.back() != ']') return std::nullopt;
+  sockaddr_in6 ipv6{};
+  ipv6.sin6_family = AF_INET6;
+  ipv6.sin6_port = htons(port);
+  const std::string inner(host.substr(1, host.size() - 2));
+  if (inet_pton(AF_INET6, inner.c_str(), &ipv6.sin6_addr) == 1) return SocketAddress::Of(ipv6);
   return std::nullopt;
+}
+
+bool IsLoopback(const SocketAddress& address) {
+  if (address.family() == AF_INET) return address.As<sockaddr_in>().sin_addr.s_addr == htonl(INADDR_LOOPBACK);
+  const auto ipv6 = address.As<sockaddr_in6>();
+  return address.family() == AF_INET6 && IN6_IS_ADDR_LOOPBACK(&ipv6.sin6_addr);
+}
+
+std::optional<Endpoint> ParseTcp(std::string_view text) {
+  const bool tls = HasTls(text);
+  if (tls) text.remove_prefix(kTlsScheme.size());
+  const std::size_t colon = text.rfind(':');
+  if (colon == std::string_view::npos) return std::nullopt;
+  const auto port = ParsePort(text.substr(colon + 1));
+  const auto address = port ? ParseHost(text.substr(0, colon), *port) : std::nullopt;
+  if (!address || (!tls && !IsLoopback(*address))) return std::nullopt;
+  return Endpoint{*address, tls};
 }
 
 bool IsUnix(std::string_view address) { return address.substr(0, kUnixScheme.size()) == kUnixScheme; }
@@ -100,6 +116,8 @@ UniqueFd BindAndListen(const SocketAddress& address) {
     // Connections inherit both.
     setsockopt(socket.get(), IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
     setsockopt(socket.get(), SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
+    // Otherwise [::] would take the IPv4 addresses, too, and 0.0.0.0 could not be listened at beside it.
+    if (address.family() == AF_INET6) setsockopt(socket.get(), IPPROTO_IPV6, IPV6_V6ONLY, &on, sizeof on);
   }
   if (!socket || bind(socket.get(), address.get(), address.size) != 0 || listen(socket.get(), SOMAXCONN) != 0)
     return {};
@@ -130,7 +148,7 @@ std::optional<Listener> OpenUnix(const std::string& path, std::string* error) {
   const mode_t before = umask(0111);
   UniqueFd socket = BindAndListen(*address);
   umask(before);
-  if (socket) return Listener(std::move(socket), AF_UNIX, std::string(kUnixScheme) + path, path);
+  if (socket) return Listener(std::move(socket), AF_UNIX, false, std::string(kUnixScheme) + path, path);
   *error = SystemError(path);
   return std::nullopt;
 }
@@ -145,25 +163,27 @@ SocketAddress LocalAddress(int socket) {
 // Returns the address in the syntax of --listen; empty for a socket of another address family.
 std::string NameOf(const SocketAddress& address) {
   if (address.family() == AF_UNIX) return std::string(kUnixScheme) + address.As<sockaddr_un>().sun_path;
+  char text[INET6_ADDRSTRLEN] = "";
   if (address.family() == AF_INET) {
     const auto ipv4 = address.As<sockaddr_in>();
-    if (ipv4.sin_addr.s_addr == htonl(INADDR_LOOPBACK)) return "127.0.0.1:" + std::to_string(ntohs(ipv4.sin_port));
+    inet_ntop(AF_INET, &ipv4.sin_addr, text, sizeof text);
+    return std::string(text) + ":" + std::to_string(ntohs(ipv4.sin_port));
   }
-  if (address.family() == AF_INET6) {
-    const auto ipv6 = address.As<sockaddr_in6>();
-    if (IN6_IS_ADDR_LOOPBACK(&ipv6.sin6_addr)) return "[::1]:" + std::to_string(ntohs(ipv6.sin6_port));
-  }
-  return "";
+  if (address.family() != AF_INET6) return "";
+  const auto ipv6 = address.As<sockaddr_in6>();
+  inet_ntop(AF_INET6, &ipv6.sin6_addr, text, sizeof text);
+  return "[" + std::string(text) + "]:" + std::to_string(ntohs(ipv6.sin6_port));
 }
 
 }  // namespace
 
-Listener::Listener(UniqueFd socket, int family, std::string name, std::string path)
-    : socket_(std::move(socket)), family_(family), name_(std::move(name)), path_(std::move(path)) {}
+Listener::Listener(UniqueFd socket, int family, bool tls, std::string name, std::string path)
+    : socket_(std::move(socket)), family_(family), tls_(tls), name_(std::move(name)), path_(std::move(path)) {}
 
 Listener::Listener(Listener&& other) noexcept
     : socket_(std::move(other.socket_)),
       family_(other.family_),
+      tls_(other.tls_),
       name_(std::move(other.name_)),
       path_(std::exchange(other.path_, {})) {}
 
@@ -181,26 +201,31 @@ std::string FindAddressFault(std::string_view address) {
   return error;
 }
 
+bool HasTls(std::string_view address) { return address.substr(0, kTlsScheme.size()) == kTlsScheme; }
+
 std::optional<Listener> OpenListener(std::string_view address, std::string* error) {
   *error = FindAddressFault(address);
   if (!error->empty()) return std::nullopt;
   if (IsUnix(address)) return OpenUnix(std::string(address.substr(kUnixScheme.size())), error);
-  UniqueFd socket = BindAndListen(*ParseTcp(address));
-  if (socket) return AdoptListener(std::move(socket), error);
-  *error = SystemError(std::string(address));
-  return std::nullopt;
+  const Endpoint endpoint = *ParseTcp(address);
+  UniqueFd socket = BindAndListen(endpoint.address);
+  if (!socket) {
+    *error = SystemError(std::string(address));
+    return std::nullopt;
+  }
+  std::string name = (endpoint.tls ? std::string(kTlsScheme) : "") + NameOf(LocalAddress(socket.get()));
+  return Listener(std::move(socket), endpoint.address.family(), endpoint.tls, std::move(name), "");
 }
 
 std::optional<Listener> AdoptListener(UniqueFd socket, std::string* error) {
   const SocketAddress address = LocalAddress(socket.get());
-  std::string name = NameOf(address);
   if (sd_is_socket(socket.get(), AF_UNSPEC, SOCK_STREAM, 1) <= 0) {
     *error = "not a listening stream socket";
-  } else if (name.empty()) {
+  } else if (address.family() != AF_UNIX && !IsLoopback(address)) {
     *error = kRule;
   } else {
     fcntl(socket.get(), F_SETFL, fcntl(socket.get(), F_GETFL) | O_NONBLOCK);
-    return Listener(std::move(socket), address.family(), std::move(name), "");
+    return Listener(std::move(socket), address.family(), false, NameOf(address), "");
   }
   return std::nullopt;
 }

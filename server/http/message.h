@@ -30,6 +30,7 @@ struct Head {
   std::vector<std::pair<std::string_view, std::string_view>> headers;  // all, in the order sent
   Peer peer;
   unsigned recent_requests = 0;  // that were sent on this connection before, where each second halves their number
+  bool secure = false;           // the connection has TLS
 
   // Returns the value of the first header with this name; names are compared case-insensitively.
   std::optional<std::string_view> Header(std::string_view name) const;

@@ -71,7 +71,10 @@ void Session::Start() {
   Guard([this] { stream_->Begin(Then(&Session::OnBegun)); });
 }
 
-void Session::OnBegun(const Error& error, std::size_t /*bytes*/) { error ? Close() : Read(); }
+void Session::OnBegun(const Error& error, std::size_t /*bytes*/) {
+  begun_ = !error;
+  error ? Close() : Read();
+}
 
 std::chrono::seconds Session::LimitOf(Phase phase) const {
   const HttpLimits& limits = host_.limits();
@@ -100,6 +103,7 @@ void Session::Enter(Phase phase) {
 }
 
 void Session::TurnAway() {
+  if (!begun_) return Close();  // an answer would need the handshake
   Guard([this] { RefuseForNow("Too many connections wait for an answer. Try again soon."); });
 }
 
@@ -189,6 +193,7 @@ void Session::BeginExchange() {
   Head head = reader_.MakeHead();
   head.peer = peer_;
   head.recent_requests = requests_.Add(since_);
+  head.secure = stream_->IsSecure();
   form_ = FormOf(head, reader_.is_old());
   record_.method = head.method;
   record_.target = head.target;
@@ -276,6 +281,7 @@ void Session::Send(Response response) {
   reader_.Attach(nullptr);
   charge_.reset();
   response_ = std::move(response);
+  if (stream_->IsSecure()) AddStrictTransport();
   const Framing framing = FramingOf(form_, response_);
   // A client that sends more than can be served must not take the next place in a queue before those who wait.
   const bool overloads = response_.status == 503;
@@ -288,6 +294,11 @@ void Session::Send(Response response) {
   record_.status = response_.status;
   record_.bytes = body.size();
   stream_->Write({boost::asio::buffer(std::as_const(text_)), body}, Then(&Session::OnSent));
+}
+
+void Session::AddStrictTransport() {
+  std::string value = host_.strict_transport();
+  if (!value.empty()) response_.headers.emplace_back("Strict-Transport-Security", std::move(value));
 }
 
 void Session::OnSent(const Error& error, std::size_t /*bytes*/) {

@@ -33,8 +33,9 @@ class SessionHost {
   virtual AccessLog* log() = 0;
   virtual const std::shared_ptr<Mailbox>& mailbox() = 0;
   virtual bool stopping() const = 0;
-  virtual const std::string& date() = 0;  // for the Date header
-  virtual void DispatchLater() = 0;       // calls Service::Dispatch() after the events that are pending
+  virtual const std::string& date() = 0;             // for the Date header
+  virtual std::string strict_transport() const = 0;  // for Strict-Transport-Security; may be empty
+  virtual void DispatchLater() = 0;                  // calls Service::Dispatch() after the events that are pending
   virtual void Forget(const std::shared_ptr<Session>& session) = 0;
 };
 
@@ -48,7 +49,7 @@ class Session : public std::enable_shared_from_this<Session> {
 
   void Start();
 
-  // Answers 503 and closes the connection, which was accepted beyond the limit.
+  // Answers 503 and closes the connection, which was accepted beyond the limit. One without a handshake is closed.
   void TurnAway();
 
   // Called when the server stops: closes the connection now, or after the answer to the running request.
@@ -90,6 +91,7 @@ class Session : public std::enable_shared_from_this<Session> {
   void Refuse(int status, std::string_view text);
   void RefuseForNow(std::string_view text);
   void Reply(Response response);
+  void AddStrictTransport();
   void Send(Response response);
   void OnSent(const Error& error, std::size_t bytes);
   void SendMore();
@@ -107,6 +109,7 @@ class Session : public std::enable_shared_from_this<Session> {
   Clock::time_point since_;     // of the phase
   Clock::time_point deadline_;  // of the phase
   bool closed_ = false;
+  bool begun_ = false;       // the handshake of the stream is complete
   bool reading_ = false;     // a read is under way
   bool continuing_ = false;  // "100 Continue" is being written
 

@@ -1,4 +1,4 @@
-// The byte stream of one connection. Another kind of connection, such as TLS, is another implementation of Stream.
+// The byte stream of one connection. tls_stream.h has the implementation for connections with TLS.
 #ifndef VORN_SERVER_STREAM_H
 #define VORN_SERVER_STREAM_H
 
@@ -26,6 +26,9 @@ class Stream {
   // The handshake before the first byte of HTTP; a plain stream has none. `done` may be called immediately.
   // NOLINTNEXTLINE(performance-unnecessary-value-param): a handshake keeps `done`.
   virtual void Begin(Done done) { done({}, 0); }
+
+  // Whether the connection has TLS.
+  virtual bool IsSecure() const { return false; }
 
   virtual void ReadSome(boost::asio::mutable_buffer buffer, Done done) = 0;
   virtual void Write(Buffers buffers, Done done) = 0;  // all of them

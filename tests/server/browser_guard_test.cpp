@@ -9,22 +9,22 @@ TEST(OwnNames, AreLoopbackNamesWithAnyPort) {
   const OwnNames names;
   for (const char* host :
        {"localhost", "LOCALHOST", "localhost:8080", "127.0.0.1", "127.0.0.1:1", "[::1]", "[::1]:65535", "localhost:"}) {
-    EXPECT_TRUE(names.Include(host)) << host;
+    EXPECT_TRUE(names.Include(host, false)) << host;
   }
   for (const char* host :
        {"", "nas.example", "localhost.evil.example", "127.0.0.1.evil.example", "127.0.0.10", "127.1", "::1", "[::1",
         "localhost:80x", "localhost:808080", "evil.example:localhost", " localhost"}) {
-    EXPECT_FALSE(names.Include(host)) << host;
+    EXPECT_FALSE(names.Include(host, false)) << host;
   }
 }
 
 TEST(OwnNames, IncludeThoseThatAreGiven) {
   const OwnNames names({"NAS.example", "[2001:db8::1]"});
   for (const char* host : {"nas.example", "Nas.Example:8443", "[2001:db8::1]:443", "localhost"}) {
-    EXPECT_TRUE(names.Include(host)) << host;
+    EXPECT_TRUE(names.Include(host, false)) << host;
   }
   for (const char* host : {"nas.example.evil.example", "xnas.example", "example", "[2001:db8::12]"}) {
-    EXPECT_FALSE(names.Include(host)) << host;
+    EXPECT_FALSE(names.Include(host, false)) << host;
   }
 }
 
@@ -61,7 +61,37 @@ TEST(OwnNames, AreAnOriginIfSchemeHostAndPortAreTheSame) {
       {"http://localhost:8080", "", false},
       {"http://", "", false},
   };
-  for (const auto& c : cases) EXPECT_EQ(names.AreOrigin(c.origin, c.host), c.own) << c.origin << " at " << c.host;
+  for (const auto& c : cases)
+    EXPECT_EQ(names.AreOrigin(c.origin, c.host, false), c.own) << c.origin << " at " << c.host;
+}
+
+TEST(OwnNames, WithTlsIncludeTheMachineAndEveryAddress) {
+  const OwnNames names({"nas.example"}, "Box");
+  for (const char* host : {"box", "BOX:8443", "192.0.2.7", "192.0.2.7:8443", "[2001:db8::1]", "[2001:db8::1]:443",
+                           "localhost", "nas.example:443"}) {
+    EXPECT_TRUE(names.Include(host, true)) << host;
+    EXPECT_TRUE(names.AreSecure(host, true)) << host;
+  }
+  for (const char* host : {"", "boxes", "box.evil.example", "192.0.2.7.evil.example", "192.0.2.7:x", "[2001:db8::1",
+                           "[2001:db8::1]x", "[box]", "2001:db8::1", ":443"}) {
+    EXPECT_FALSE(names.Include(host, true)) << host;
+  }
+  for (const char* host : {"box", "192.0.2.7"}) {
+    EXPECT_FALSE(names.Include(host, false)) << host;
+    EXPECT_FALSE(names.AreSecure(host, false)) << host;
+  }
+  EXPECT_FALSE(OwnNames().Include("", true));
+}
+
+TEST(OwnNames, WithTlsAreAnOriginOfHttpsOnly) {
+  const OwnNames names;
+  EXPECT_TRUE(names.AreOrigin("https://localhost:8443", "localhost:8443", true));
+  EXPECT_TRUE(names.AreOrigin("https://192.0.2.7", "192.0.2.7:443", true));
+  for (const char* origin :
+       {"http://localhost:8443", "https://localhost:8444", "https://evil.example", "null", "https://"}) {
+    EXPECT_FALSE(names.AreOrigin(origin, "localhost:8443", true)) << origin;
+  }
+  EXPECT_FALSE(names.AreOrigin("https://", "", true));
 }
 
 TEST(FetchMetadata, TellsWhoseRequestItIs) {

@@ -69,14 +69,48 @@ TEST(Listener, OpensLoopback) {
 }
 
 TEST(Listener, RefusesEveryOtherAddress) {
-  for (const char* address :
-       {"", "0.0.0.0:80", "[::]:80", "::1:80", "127.0.0.1", "127.0.0.1:", "127.0.0.1:65536", "127.0.0.1:-1",
-        "127.0.0.1:x", "127.0.0.2:80", "localhost:80", "192.0.2.1:80", ":80", "80", "/run/s", "tcp:127.0.0.1:80"}) {
-    EXPECT_EQ(Refused(address), "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at") << address;
+  for (const char* address : {"",
+                              "0.0.0.0:80",
+                              "[::]:80",
+                              "::1:80",
+                              "127.0.0.1",
+                              "127.0.0.1:",
+                              "127.0.0.1:65536",
+                              "127.0.0.1:-1",
+                              "127.0.0.1:x",
+                              "127.0.0.2:80",
+                              "localhost:80",
+                              "192.0.2.1:80",
+                              ":80",
+                              "80",
+                              "/run/s",
+                              "tcp:127.0.0.1:80",
+                              "tls:nas:443",
+                              "tls:443",
+                              "tls:::1:443",
+                              "tls:[::1]",
+                              "tls:0.0.0.0:"}) {
+    EXPECT_EQ(
+        Refused(address),
+        "only unix:/PATH, 127.0.0.1:PORT and [::1]:PORT can be listened at without TLS, and tls:ADDRESS:PORT with "
+        "TLS")
+        << address;
   }
   for (const std::string& address : {std::string("unix:"), std::string("unix:s"), "unix:/" + std::string(107, 'x')}) {
     EXPECT_EQ(Refused(address), "the path of a socket is absolute and at most 107 bytes") << address;
   }
+}
+
+TEST(Listener, OpensAnyAddressWithTls) {
+  std::string error;
+  for (const char* address : {"tls:0.0.0.0:0", "tls:[::]:0", "tls:127.0.0.2:0"}) {
+    const auto listener = OpenListener(address, &error);
+    ASSERT_TRUE(listener) << error;
+    EXPECT_TRUE(listener->tls());
+    EXPECT_EQ(listener->name().rfind(std::string(address).substr(0, std::string(address).size() - 1), 0), 0U)
+        << address;
+  }
+  EXPECT_FALSE(OpenListener("127.0.0.1:0", &error)->tls());
 }
 
 TEST(Listener, AdoptsListeningSocketsUnderTheSameRules) {

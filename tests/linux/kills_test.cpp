@@ -192,7 +192,7 @@ using Kills = Writes;
 
 TEST_F(Kills, LoseNoAcknowledgedChangeUnderLoad) {
   const TemporaryRoot root;
-  FurnishFiles(root);
+  WriteAllFiles(root);
   Writers writers(root);
   std::mt19937 chance(kSeed);
   std::uniform_int_distribution<int> any_writer(0, Writers::kCount - 1);

@@ -45,7 +45,7 @@ const Fault kFaults[] = {
 };
 
 // Makes the change under the fault in a child process. Returns whether it failed and logged a reason.
-int MakeUnder(const Fault& fault, const Change& change) {
+int MakeWithFault(const Fault& fault, const Change& change) {
   constexpr int kFailedWithReason = 1;
   ChildProcess process([&] {
     TakeLog();
@@ -64,10 +64,10 @@ TEST_F(SystemFaults, FailTheChangeAndLeaveTheFilesUnchanged) {
   for (const Fault& fault : kFaults) {
     for (size_t index = 0; index < kinds; ++index, ++cases) {
       const TemporaryRoot root;
-      FurnishFiles(root);
+      WriteAllFiles(root);
       const Change change = AllChanges(root)[index];
       const Contents before = ContentsOf(root, change);
-      EXPECT_TRUE(MakeUnder(fault, change)) << fault.name << ": " << change.name;
+      EXPECT_TRUE(MakeWithFault(fault, change)) << fault.name << ": " << change.name;
       EXPECT_EQ(ContentsOf(root, change), before) << fault.name << ": " << change.name;
       EXPECT_THAT(Leftovers(root, change), IsEmpty()) << fault.name << ": " << change.name;
       EXPECT_GE(change.make(), 0) << fault.name << ": " << change.name << ": after the fault";
@@ -94,7 +94,7 @@ TEST_F(SystemFaults, IncludeAPathThatIsNoRegularFile) {
   for (const Obstacle& obstacle : kObstacles) {
     for (size_t index = 0; index < kinds; ++index) {
       const TemporaryRoot root;
-      FurnishFiles(root);
+      WriteAllFiles(root);
       const Change change = AllChanges(root)[index];
       const std::string path = root.At(change.files.front());
       std::filesystem::remove_all(path);
@@ -112,7 +112,7 @@ TEST_F(SystemFaults, DoNotIncludeMissingFolders) {
   int made = 0;
   for (size_t index = 0; index < AllChanges(TemporaryRoot()).size(); ++index) {
     const TemporaryRoot root;
-    LeaveFilesToBeMade(root);
+    WriteForeignFiles(root);
     const Change change = AllChanges(root)[index];
     EXPECT_GE(change.make(), 0) << change.name;
     for (const auto& [path, text] : ContentsOf(root, change)) made += text ? 1 : 0;

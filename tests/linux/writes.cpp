@@ -63,6 +63,7 @@ int ChangeDomain() {
 }
 
 int SaveSettings() {
+  const VornConf configuration;
   NFSConfRecord record{};
   if (VORNNFSConfGet(&record) < 0) return -1;
   record.read_size = 65536;
@@ -102,17 +103,17 @@ std::vector<Change> AllChanges(const TemporaryRoot& root) {
           {"a start of the service", StartService, {kState, kDropIn}}};
 }
 
-void FurnishFiles(const TemporaryRoot& root) {
+void WriteAllFiles(const TemporaryRoot& root) {
   root.Write(kExports, "# ours\n/volume1/media *(ro)\n/volume1/data 10.9.9.9(rw)\n");
   root.Write(kIDMap, "# ours\n[General]\nDomain = lab.test\n[Static]\nalice@LAB.TEST = alice\n");
   root.Write(kSettings, "# ours\n[nfsd]\nvers4 = y\n");
   root.Write(kKeytab, EncodeFile({EncodeEntry("old", "LAB.TEST", 17)}));
   root.Write(kDropIn, "# of an older version\n");
   root.Write(kState, "disabled\n");
-  LeaveFilesToBeMade(root);
+  WriteForeignFiles(root);
 }
 
-void LeaveFilesToBeMade(const TemporaryRoot& root) {
+void WriteForeignFiles(const TemporaryRoot& root) {
   root.Write("/etc/passwd", "root:x:0:0::/:/bin/sh\nadmin:x:1024:100::/:/bin/sh\nnobody:x:65534:65534::/:/bin/sh\n");
   root.Write("/upload", EncodeFile({EncodeEntry("new", "LAB.TEST", 17)}));
 }

@@ -25,14 +25,14 @@ struct Change {
   std::vector<const char*> files;  // the files that it writes, below the root
 };
 
-// Returns all kinds of change. After FurnishFiles() each of them alters each of its files.
+// Returns all kinds of change. After WriteAllFiles() each of them alters each of its files.
 std::vector<Change> AllChanges(const TemporaryRoot& root);
 
 // Creates all files, with lines of an administrator in them.
-void FurnishFiles(const TemporaryRoot& root);
+void WriteAllFiles(const TemporaryRoot& root);
 
 // Creates only the files that are not written by the platform. The changes that remove something have no effect then.
-void LeaveFilesToBeMade(const TemporaryRoot& root);
+void WriteForeignFiles(const TemporaryRoot& root);
 
 using Contents = std::map<std::string, std::optional<std::string>>;  // by path; nullopt for a missing file
 

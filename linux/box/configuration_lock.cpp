@@ -1,7 +1,6 @@
 #include "configuration_lock.h"
 
 #include <algorithm>
-#include <chrono>
 #include <map>
 #include <memory>
 #include <vector>
@@ -11,8 +10,6 @@
 
 namespace vorn {
 namespace {
-
-constexpr std::chrono::seconds kLockLimit{20};
 
 // The configuration context of one box.
 struct Context {
@@ -32,23 +29,23 @@ Context* Find(const Box& box) {
   return found == layer.end() ? nullptr : &*found;
 }
 
-Status TakeLock(Context* context) {
-  Result<std::unique_ptr<HeldLock>> lock = context->box->Lock(kConfigurationLockFile, kLockLimit);
+Status TakeLock(Context* context, std::chrono::milliseconds limit) {
+  Result<std::unique_ptr<HeldLock>> lock = context->box->Lock(kConfigurationLockFile, limit);
   if (!lock.ok()) return lock.status();
   context->lock = std::move(*lock);
   return {};
 }
 
-Status Enter(Box& box) {
+Status Enter(Box& box, std::chrono::milliseconds limit) {
   Context* context = Find(box);
   if (context == nullptr) {
     Context fresh{&box, nullptr, 1, {}};
-    if (Status status = TakeLock(&fresh); !status.ok()) return status;
+    if (Status status = TakeLock(&fresh, limit); !status.ok()) return status;
     layers.back().push_back(std::move(fresh));
     return {};
   }
   if (context->lock == nullptr) {
-    if (Status status = TakeLock(context); !status.ok()) return status;
+    if (Status status = TakeLock(context, limit); !status.ok()) return status;
   }
   ++context->depth;
   return {};
@@ -63,9 +60,9 @@ void Leave(const Box& box) {
 
 }  // namespace
 
-ConfigurationLock::ConfigurationLock(Box& box) : box_(box) {
+ConfigurationLock::ConfigurationLock(Box& box, std::chrono::milliseconds limit) : box_(box) {
   if (!MayWrite()) return;
-  status_ = Enter(box_);
+  status_ = Enter(box_, limit);
   entered_ = status_.ok();
 }
 
@@ -80,7 +77,7 @@ LockPause::LockPause() {
 
 LockPause::~LockPause() {
   layers.pop_back();
-  for (Context& context : layers.back()) static_cast<void>(TakeLock(&context));
+  for (Context& context : layers.back()) static_cast<void>(TakeLock(&context, kConfigurationLockLimit));
 }
 
 void FirstReads::Note(Box& box, const std::string& path, const Version& version) {

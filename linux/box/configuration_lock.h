@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_BOX_CONFIGURATION_LOCK_H
 #define VORN_LINUX_BOX_CONFIGURATION_LOCK_H
 
+#include <chrono>
 #include <string>
 
 #include "box.h"
@@ -10,16 +11,17 @@
 namespace vorn {
 
 constexpr char kConfigurationLockFile[] = "/run/vorn/config.lock";
+constexpr std::chrono::seconds kConfigurationLockLimit{20};
 
 // The thread that constructs an object owns the box's configuration lock until it destroys it. Objects of
 // one thread nest; the outermost one is the configuration context, which also remembers the first version
 // read of each file (see FirstReads). In a call that may not write an object takes no lock and succeeds.
 //
 // The lock is a file lock on /run/vorn/config.lock: the kernel releases it when the process dies, and a child
-// of fork(2) shares it until it runs a program. Waiting for it fails with kLockTimeout after kLockLimit.
+// of fork(2) shares it until it runs a program. Waiting for it fails with kLockTimeout after `limit`.
 class ConfigurationLock {
  public:
-  explicit ConfigurationLock(Box& box);
+  explicit ConfigurationLock(Box& box, std::chrono::milliseconds limit = kConfigurationLockLimit);
   ~ConfigurationLock();
   ConfigurationLock(const ConfigurationLock&) = delete;
   ConfigurationLock& operator=(const ConfigurationLock&) = delete;

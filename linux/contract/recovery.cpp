@@ -19,13 +19,11 @@ namespace {
 // Every file that the platform replaces.
 constexpr const char* kFiles[] = {kExportsFile, kIDMapFile, kNFSRecordFile, kKeytabFile, kDropInFile, kFirewallFile};
 
-// Fails if the configuration lock is not free. A start must not wait for another program, and the next change of a file
-// removes its leftovers as well.
-Status CheckFree(Box& box) { return box.Lock(kConfigurationLockFile, std::chrono::milliseconds(100)).status(); }
+// A start must not wait for another program; the next change of a file removes its leftovers as well.
+constexpr std::chrono::milliseconds kLockLimit{100};
 
 Status ConfirmFiles(Box& box) {
-  if (Status status = CheckFree(box); !status.ok()) return status;
-  const ConfigurationLock lock(box);
+  const ConfigurationLock lock(box, kLockLimit);
   Status first = lock.status();
   if (!first.ok()) return first;
   for (const char* file : kFiles) {

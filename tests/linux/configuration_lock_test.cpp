@@ -3,7 +3,6 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/file.h>
-#include <sys/stat.h>
 
 #include <cerrno>
 #include <fstream>
@@ -13,6 +12,7 @@
 
 #include "current_box.h"
 #include "file_descriptor.h"
+#include "file_lock_waiters.h"
 #include "processes.h"
 #include "temporary_root.h"
 
@@ -25,18 +25,6 @@ constexpr char kLockFile[] = "/run/vorn/config.lock";
 bool IsHeld(const TemporaryRoot& root) {
   const FileDescriptor file(open(root.At(kLockFile).c_str(), O_RDWR | O_CLOEXEC));
   return file && flock(file.get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
-}
-
-// Returns whether a process is blocked until the root's lock is free: proc(5), /proc/locks.
-bool SomebodyWaits(const TemporaryRoot& root) {
-  struct stat file {};
-  if (stat(root.At(kLockFile).c_str(), &file) != 0) return false;
-  std::ifstream locks("/proc/locks");
-  for (std::string line; std::getline(locks, line);) {
-    const bool waits = line.find("-> FLOCK") != std::string::npos;
-    if (waits && line.find(":" + std::to_string(file.st_ino) + " ") != std::string::npos) return true;
-  }
-  return false;
 }
 
 // Increments the number in a file by an unprotected read and write.
@@ -123,10 +111,27 @@ TEST(ConfigurationLock, MovesToANewFileWhenItsOwnWasRemoved) {
   });
   {
     const ConfigurationLock lock(CurrentBox());
-    ASSERT_TRUE(Eventually([&] { return SomebodyWaits(root); }));
+    ASSERT_TRUE(Eventually([&] { return HasLockWaiter(root.At(kLockFile)); }));
     unlink(root.At(kLockFile).c_str());
   }
   EXPECT_EQ(waiter.Wait(), 0);
+}
+
+TEST(ConfigurationLock, WaitsNoLongerThanItsLimit) {
+  EXPECT_LT(kConfigurationLockLimit, std::chrono::seconds(60)) << "vornd answers after 60 s without the reason";
+  const TemporaryRoot root;
+  ChildProcess holder([&]() -> int {
+    const ConfigurationLock lock(CurrentBox());
+    root.Write("/held", "");
+    for (;;) pause();
+  });
+  ASSERT_TRUE(Eventually([&] { return root.Read("/held").has_value(); }));
+  {
+    const ConfigurationLock lock(CurrentBox(), std::chrono::milliseconds(50));
+    EXPECT_EQ(lock.status().code(), kLockTimeout);
+  }
+  holder.Kill();
+  holder.Wait();
 }
 
 TEST(ConfigurationLock, SaysWhyItIsNotHeld) {
@@ -194,7 +199,7 @@ TEST(LockPause, EndsInTheOrderTakenSoThatNestedRootsNeverWaitForEachOther) {
     const FileDescriptor file(open(first.At(kLockFile).c_str(), O_RDWR | O_CLOEXEC));
     if (flock(file.get(), LOCK_EX) != 0) return 2;
     first.Write("/held", "");
-    if (!Eventually([&] { return SomebodyWaits(first); })) return 3;
+    if (!Eventually([&] { return HasLockWaiter(first.At(kLockFile)); })) return 3;
     return IsHeld(second) ? 4 : 0;
   });
   setenv("VORN_ROOT", first.directory().c_str(), 1);

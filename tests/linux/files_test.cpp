@@ -13,6 +13,7 @@
 #include <fstream>
 
 #include "file_descriptor.h"
+#include "file_lock_waiters.h"
 #include "injected_failures.h"
 #include "processes.h"
 #include "temporary_root.h"
@@ -37,7 +38,7 @@ mode_t ModeOf(const std::string& path) {
 }
 
 // File times have a coarse resolution: two edits within one tick get the same time.
-bool ClockOfInodesPasses(const TemporaryRoot& root, std::int64_t time) {
+bool HasInodeClockPassed(const TemporaryRoot& root, std::int64_t time) {
   return Eventually([&] { return root.Write("/tick", ""), ReadFile(root.At("/tick"))->stamp.changed > time; });
 }
 
@@ -135,18 +136,6 @@ TEST(ReplaceFile, KeepsExtendedAttributesAndTheAccessControlList) {
   for (const auto& [name, value] : attributes) EXPECT_EQ(AttributeOf(root.At(kFile), name), value) << name;
 }
 
-// Returns whether a process is blocked until the lock of this file is free: proc(5), /proc/locks.
-bool SomebodyWaitsFor(const std::string& path) {
-  struct stat file {};
-  if (stat(path.c_str(), &file) != 0) return false;
-  std::ifstream locks("/proc/locks");
-  for (std::string line; std::getline(locks, line);) {
-    const bool waits = line.find("-> FLOCK") != std::string::npos;
-    if (waits && line.find(":" + std::to_string(file.st_ino) + " ") != std::string::npos) return true;
-  }
-  return false;
-}
-
 TEST(ReplaceFile, WaitsForAProgramThatHasLockedTheFile) {
   const TemporaryRoot root;
   root.Write(kFile, "old");
@@ -155,7 +144,7 @@ TEST(ReplaceFile, WaitsForAProgramThatHasLockedTheFile) {
     const FileDescriptor file(open(root.At(kFile).c_str(), O_RDWR | O_CLOEXEC));
     if (!file || flock(file.get(), LOCK_EX) != 0) return 1;
     root.Write("/locked", "");
-    if (!Eventually([&] { return SomebodyWaitsFor(root.At(kFile)); })) return 2;
+    if (!Eventually([&] { return HasLockWaiter(root.At(kFile)); })) return 2;
     return write(file.get(), "edited", 6) == 6 ? 0 : 3;
   });
   ASSERT_TRUE(Eventually([&] { return root.Read("/locked").has_value(); }));
@@ -189,7 +178,7 @@ TEST(ReplaceFile, NoticesAnEditBetweenReadAndWrite) {
     chmod(path.c_str(), 0644);
     const Result<FileText> file = ReadFile(path);
     ASSERT_TRUE(file.ok());
-    ASSERT_TRUE(ClockOfInodesPasses(root, file->stamp.changed));
+    ASSERT_TRUE(HasInodeClockPassed(root, file->stamp.changed));
     c.edit();
     const std::optional<std::string> edited = root.Read(kFile);
     EXPECT_EQ(ReplaceFile(path, "new", file->stamp).code(), kChangedBehind) << c.name;

@@ -85,8 +85,6 @@ BREAKS = [
           select="without_the_former_keys"),
     Break("firewall-not-with-nfs", "the firewall follows the ports", "ports",
           f"sed -i 's/^\\tload_firewall$/\\texit 0/' {_SCRIPT}", select="start_of_nfs"),
-    Break("no-squash-accounts", "the package creates the squash accounts", "package",
-          _package("sed -i 's/^  make_account .*/  :/' postinst"), select="accounts"),
     Break("id-map-not-reloaded", "a changed mapping is in force immediately", "kerberos",
           f"sed -i 's/^\\treload_idmap$/\\texit 0/' {_SCRIPT}", select="id_map"),
     Break("mappings-not-followed", "a mapping is in force with the answer", "identities",

@@ -7,7 +7,9 @@
 #include <unordered_map>
 #include <utility>
 
+#include "export_table.h"
 #include "exports_client.h"
+#include "exports_text.h"
 #include "path_resolver.h"
 
 namespace vorn {
@@ -110,13 +112,6 @@ Grant MakeGrant(std::string client, int options) {
   return grant;
 }
 
-// The path of a line of the table. Unusual bytes of it are escaped.
-std::string ReadTablePath(std::string_view text) {
-  if (text.find_first_of("\\\"") == std::string_view::npos) return std::string(text);
-  const auto lines = ExportsDocument(std::string(text) + " *(ro)\n").Lines();
-  return lines->size() == 1 ? lines->front().path : std::string(text);
-}
-
 using Grants = std::vector<Grant>;
 using Table = std::unordered_map<std::string, Grants>;
 
@@ -127,26 +122,18 @@ struct TableText {
 };
 
 Result<TableText> ReadTable(std::string_view text, OptionLists* options) {
+  Result<std::vector<ExportTableLine>> lines = ReadExportTable(text);
+  if (!lines.ok()) return lines.status();
   TableText table;
-  for (std::size_t begin = 0; begin < text.size();) {
-    const std::size_t end = std::min(text.find('\n', begin), text.size() - 1) + 1;
-    const std::string_view line = text.substr(begin, end - begin);
-    begin = end;
-    const std::size_t tab = line.find('\t');
-    const std::size_t open = line.find('(', tab == std::string_view::npos ? line.size() : tab);
-    const std::size_t close = line.rfind(')');
-    const bool is_whole = open != std::string_view::npos && close != std::string_view::npos && close > open;
-    const std::optional<int> number =
-        is_whole ? options->NumberOf(line.substr(open + 1, close - open - 1)) : std::nullopt;
+  for (ExportTableLine& line : *lines) {
+    const std::optional<int> number = options->NumberOf(line.options);
     if (!number) {
-      return Status::Failure(kSyntax, std::string(kExportTable) + ": unexpected line: " + std::string(line));
+      return Status::Failure(kSyntax, std::string(kExportTable) + ": unexpected line: " + std::string(line.text));
     }
-    std::string path = ReadTablePath(line.substr(0, tab));
-    const std::string client(line.substr(tab + 1, open - tab - 1));
-    Grant grant = MakeGrant(client.empty() ? "*" : client, *number);
-    grant.line = line;
-    Grants& grants = table.grants[path];
-    if (grants.empty()) table.paths.push_back(std::move(path));
+    Grant grant = MakeGrant(std::string(line.client), *number);
+    grant.line = line.text;
+    Grants& grants = table.grants[line.path];
+    if (grants.empty()) table.paths.push_back(std::move(line.path));
     grants.push_back(std::move(grant));
   }
   return table;

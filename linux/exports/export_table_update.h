@@ -13,9 +13,6 @@
 
 namespace vorn {
 
-// The table that exportfs(8) writes and rpc.mountd(8) reads ("etab").
-constexpr char kExportTable[] = "/var/lib/nfs/etab";
-
 // The addresses of host names as they were last resolved, by the key of the name (ExportClientKey).
 using HostAddresses = std::map<std::string, std::vector<std::string>>;
 

@@ -1,6 +1,5 @@
 #include "apply_exports.h"
 
-#include <fstream>
 #include <iterator>
 #include <memory>
 #include <set>
@@ -19,11 +18,6 @@ namespace {
 
 using Files = std::vector<SharedExportsFile>;
 using Lines = std::vector<std::shared_ptr<const std::vector<ExportLine>>>;
-
-std::string ReadCache(const std::string& path) {
-  std::ifstream content(path);
-  return {std::istreambuf_iterator<char>(content), std::istreambuf_iterator<char>()};
-}
 
 // Brings the table up to the state of the files. Returns the difference.
 Result<ExportTableUpdate> UpdateTable(Box& box, const ExportsEnvironment& environment, const Files& files,
@@ -90,7 +84,8 @@ Status ApplyExports(Box& box, const ExportsEnvironment& environment, const std::
   NameFaults(*files);
   Result<HostAddresses> hosts = ReadExportHosts(box);
   if (!hosts.ok()) return hosts.status();
-  AddServedHosts(ReadCache(environment.kernel_caches + "/auth.unix.ip/content"), &*hosts);
+  // Read again after the table was replaced (ForgetExports), because the kernel may learn an address until then.
+  AddServedHosts(KernelCache(environment.kernel_caches, kAddressesCache), &*hosts);
   // Rules whose addresses are known are applied before the resolver is asked for others, which may take long.
   Result<ExportTableUpdate> update = UpdateTable(box, environment, *files, *hosts, resolved);
   if (!update.ok()) return update.status();

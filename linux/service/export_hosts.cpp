@@ -64,19 +64,14 @@ Status StoreExportHosts(Box& box, const HostAddresses& hosts) {
   return StoreState(box, kHostsFile, text);
 }
 
-void AddServedHosts(const std::string& cache_content, HostAddresses* hosts) {
+void AddServedHosts(const KernelCache& addresses, HostAddresses* hosts) {
   HostAddresses served;
-  std::istringstream lines(cache_content);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line);
-    std::string kind;
-    std::string address;
-    std::string clients;
-    words >> kind >> address >> clients;
-    if (kind != "nfsd") continue;  // a comment, or an address without any right
-    std::istringstream names(clients);
+  const auto entries = addresses.Entries();
+  for (const KernelCache::Entry& entry : entries ? *entries : std::vector<KernelCache::Entry>()) {
+    if (entry.is_negative || entry.words.size() < 3 || entry.words[0] != "nfsd") continue;
+    std::istringstream names(entry.words[2]);
     for (std::string name; std::getline(names, name, ',');) {
-      if (IsExportHostName(name)) served[ExportClientKey(name)].push_back(address);
+      if (IsExportHostName(name)) served[ExportClientKey(name)].push_back(entry.words[1]);
     }
   }
   hosts->merge(served);

@@ -10,6 +10,7 @@
 
 #include "box.h"
 #include "export_table_update.h"
+#include "kernel_cache.h"
 #include "status.h"
 
 namespace vorn {
@@ -24,9 +25,9 @@ std::optional<std::vector<std::string>> ResolveHost(const std::string& name);
 Result<HostAddresses> ReadExportHosts(Box& box);
 Status StoreExportHosts(Box& box, const HostAddresses& hosts);
 
-// Adds the hosts whose name the kernel's server knows by an address ("nfsd 10.0.0.1 host.example" in the content of
-// its cache auth.unix.ip) to those of which nothing is remembered.
-void AddServedHosts(const std::string& cache_content, HostAddresses* hosts);
+// Adds the hosts whose name the kernel's server knows by an address ("nfsd 10.0.0.1 host.example" in the cache
+// kAddressesCache) to those of which nothing is remembered.
+void AddServedHosts(const KernelCache& addresses, HostAddresses* hosts);
 
 // Resolves `names` and updates `hosts`. Stops at the first name for which the resolver does not answer, so that a name
 // server that is away is awaited once. Returns the names that have an address.

@@ -8,7 +8,7 @@
 #include <utility>
 
 #include "deadline_timer.h"
-#include "export_table_update.h"
+#include "export_table.h"
 #include "files.h"
 
 namespace vorn {

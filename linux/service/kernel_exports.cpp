@@ -1,79 +1,41 @@
 #include "kernel_exports.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdint>
 #include <cstring>
 #include <ctime>
-#include <fstream>
 #include <functional>
 #include <optional>
-#include <sstream>
 #include <utility>
 #include <vector>
 
+#include "export_table.h"
 #include "exports_client.h"
-#include "exports_text.h"
-#include "file_descriptor.h"
-#include "files.h"
+#include "kernel_cache.h"
 
 namespace vorn {
 namespace {
 
-constexpr char kRights[] = "nfsd.export";      // what a client may do in a directory
-constexpr char kHandles[] = "nfsd.fh";         // the directory that a file handle of a client means
-constexpr char kAddresses[] = "auth.unix.ip";  // the clients of the table that an address belongs to
-
-using Words = std::vector<std::string>;
-
 // Returns the line to write to the channel in order to expire the entry; nullopt for an entry that stays.
-using Expire = std::function<std::optional<std::string>(const Words& entry, bool is_negative)>;
+using Expire = std::function<std::optional<std::string>(const KernelCache::Entry& entry)>;
 
-// One of the caches. Its `content` has one entry per line; "# " precedes an entry without a right.
-class Cache {
- public:
-  Cache(const std::string& folder, const char* name) : folder_(folder + "/" + name) {}
-
-  Status Flush() const { return WriteLine("flush", std::to_string(std::time(nullptr))); }
-
-  // Returns the lines that expire entries; nullopt if the entries cannot be read.
-  std::optional<std::vector<std::string>> Expired(const Expire& expire) const {
-    std::ifstream content(folder_ + "/content");
-    if (!content) return std::nullopt;
-    std::vector<std::string> lines;
-    for (std::string line; std::getline(content, line);) {
-      const bool is_negative = line.substr(0, 2) == "# ";
-      std::istringstream text(is_negative ? line.substr(2) : line);
-      Words words;
-      for (std::string word; text >> word;) words.push_back(word);
-      if (words.empty() || words[0][0] == '#') continue;  // the header
-      if (const auto entry = expire(words, is_negative)) lines.push_back(*entry);
-    }
-    return lines;
+// Returns the lines that expire entries of the cache; nullopt if the entries cannot be read.
+std::optional<std::vector<std::string>> LinesToExpire(const KernelCache& cache, const Expire& expire) {
+  const auto entries = cache.Entries();
+  if (!entries) return std::nullopt;
+  std::vector<std::string> lines;
+  for (const KernelCache::Entry& entry : *entries) {
+    if (auto line = expire(entry)) lines.push_back(std::move(*line));
   }
+  return lines;
+}
 
-  Status ExpireEntries(const Expire& expire) const {
-    const auto lines = Expired(expire);
-    if (!lines) return Flush();
-    for (const std::string& line : *lines) {
-      // The entry may have gone meanwhile.
-      if (const Status status = WriteLine("channel", line); !status.ok() && status.code() != ENOENT) return Flush();
-    }
-    return {};
-  }
-
- private:
-  Status WriteLine(const char* file, const std::string& line) const {
-    const std::string path = folder_ + "/" + file;
-    const FileDescriptor channel(open(path.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC));
-    return channel ? WriteAll(channel.get(), line + "\n", path) : Status::System(errno, path);
-  }
-
-  const std::string folder_;
-};
+Status ExpireEntries(const KernelCache& cache, const Expire& expire) {
+  const auto lines = LinesToExpire(cache, expire);
+  return lines ? cache.Write(*lines) : cache.Flush();
+}
 
 // In seconds since the epoch.
 std::string Past() { return std::to_string(std::time(nullptr) - 1); }
@@ -96,25 +58,12 @@ bool IsConcerned(const std::string& path, const std::set<std::string>& changed) 
   return changed.count("/") != 0;
 }
 
-// Undoes the escapes of a path in a cache's content, "\040".
-std::string Unescape(const std::string& word) {
-  std::string text;
-  for (std::size_t i = 0; i < word.size(); ++i) {
-    if (word[i] == '\\' && i + 3 < word.size()) {
-      text.push_back(static_cast<char>(std::stoi(word.substr(i + 1, 3), nullptr, 8)));
-      i += 3;
-    } else {
-      text.push_back(word[i]);
-    }
-  }
-  return text;
-}
-
 // "/srv/data client(rw,...)"
-Status ForgetRights(const Cache& cache, const std::set<std::string>& changed, const RightsWriter& write) {
-  const auto lines = cache.Expired([&changed](const Words& entry, bool) -> std::optional<std::string> {
-    if (entry.size() < 2 || !IsConcerned(Unescape(entry[0]), changed)) return std::nullopt;
-    return entry[1].substr(0, entry[1].rfind('(')) + " " + entry[0] + " " + Past();
+Status ForgetRights(const KernelCache& cache, const std::set<std::string>& changed, const RightsWriter& write) {
+  const auto lines = LinesToExpire(cache, [&changed](const KernelCache::Entry& entry) -> std::optional<std::string> {
+    const auto& words = entry.words;
+    if (words.size() < 2 || !IsConcerned(UnescapeWord(words[0]), changed)) return std::nullopt;
+    return words[1].substr(0, words[1].rfind('(')) + " " + words[0] + " " + Past();
   });
   if (!lines) return cache.Flush();
   std::string text;
@@ -140,12 +89,13 @@ std::string HandleBytes(const std::string& shown) {
 }
 
 // "client 6 0x01020304... /srv/data". A handle that had no directory may have one now.
-Status ForgetHandles(const Cache& cache, const ExportTableUpdate& update) {
-  return cache.ExpireEntries([&update](const Words& entry, bool is_negative) -> std::optional<std::string> {
-    if (entry.size() < 3 || entry[2].substr(0, 2) != "0x") return std::nullopt;
-    const bool concerned = is_negative || entry.size() < 4 || IsConcerned(Unescape(entry[3]), update.left);
-    if (!concerned) return std::nullopt;
-    return entry[0] + " " + entry[1] + " " + HandleBytes(entry[2]) + " " + Past();
+Status ForgetHandles(const KernelCache& cache, const ExportTableUpdate& update) {
+  return ExpireEntries(cache, [&update](const KernelCache::Entry& entry) -> std::optional<std::string> {
+    const auto& words = entry.words;
+    if (words.size() < 3 || words[2].substr(0, 2) != "0x") return std::nullopt;
+    const bool has_directory = !entry.is_negative && words.size() > 3;
+    if (has_directory && !IsConcerned(UnescapeWord(words[3]), update.left)) return std::nullopt;
+    return words[0] + " " + words[1] + " " + HandleBytes(words[2]) + " " + Past();
   });
 }
 
@@ -155,15 +105,16 @@ bool IsOneAddress(const std::string& client) {
 }
 
 // "nfsd 10.0.0.1 client,client"
-Status ForgetAddresses(const Cache& cache, const std::set<std::string>& clients) {
+Status ForgetAddresses(const KernelCache& cache, const std::set<std::string>& clients) {
   if (clients.empty()) return {};
   std::set<std::string> addresses;
   for (const std::string& client : clients) addresses.insert(ExportClientKey(client));
   const bool all = !std::all_of(clients.begin(), clients.end(), IsOneAddress);
-  return cache.ExpireEntries([&](const Words& entry, bool /*is_negative*/) -> std::optional<std::string> {
-    if (entry.size() < 2 || entry[0] != "nfsd") return std::nullopt;
-    if (!all && addresses.count(ExportClientKey(entry[1])) == 0) return std::nullopt;
-    return entry[0] + " " + entry[1] + " " + Past();
+  return ExpireEntries(cache, [&](const KernelCache::Entry& entry) -> std::optional<std::string> {
+    const auto& words = entry.words;
+    if (words.size() < 2 || words[0] != "nfsd") return std::nullopt;
+    if (!all && addresses.count(ExportClientKey(words[1])) == 0) return std::nullopt;
+    return words[0] + " " + words[1] + " " + Past();
   });
 }
 
@@ -181,11 +132,11 @@ bool HasLeftVolume(const ExportTableUpdate& update) {
     if (!device) return true;
     left.insert(*device);
   }
-  for (std::size_t begin = 0; begin < update.text.size() && !left.empty();) {
-    const std::size_t end = std::min(update.text.find('\n', begin), update.text.size());
-    const auto device = DeviceOf(Unescape(update.text.substr(begin, update.text.find('\t', begin) - begin)));
-    if (device) left.erase(*device);
-    begin = end + 1;
+  if (left.empty()) return false;
+  const Result<std::vector<ExportTableLine>> table = ReadExportTable(update.text);
+  if (!table.ok()) return true;
+  for (auto line = table->begin(); line != table->end() && !left.empty(); ++line) {
+    if (const auto device = DeviceOf(line->path)) left.erase(*device);
   }
   return !left.empty();
 }
@@ -194,13 +145,13 @@ bool HasLeftVolume(const ExportTableUpdate& update) {
 
 Status ForgetExports(const std::string& folder, const ExportTableUpdate& update, const RightsWriter& write_rights) {
   if (update.changed.empty()) return {};
-  const Cache rights(folder, kRights);
-  const Status addresses = ForgetAddresses(Cache(folder, kAddresses), update.clients);
-  const Status handles = ForgetHandles(Cache(folder, kHandles), update);
+  const KernelCache rights(folder, kRightsCache);
+  const Status addresses = ForgetAddresses(KernelCache(folder, kAddressesCache), update.clients);
+  const Status handles = ForgetHandles(KernelCache(folder, kHandlesCache), update);
   const Status forgotten = HasLeftVolume(update) ? rights.Flush() : ForgetRights(rights, update.changed, write_rights);
   return !addresses.ok() ? addresses : !handles.ok() ? handles : forgotten;
 }
 
-Status ForgetClients(const std::string& folder) { return Cache(folder, kAddresses).Flush(); }
+Status ForgetClients(const std::string& folder) { return KernelCache(folder, kAddressesCache).Flush(); }
 
 }  // namespace vorn

@@ -1,4 +1,4 @@
-// The parts of the export table that the kernel's server remembers: the caches of sunrpc, in files below /proc/net/rpc.
+// The parts of the export table that the kernel's server remembers in its caches.
 #ifndef VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 #define VORN_LINUX_SERVICE_KERNEL_EXPORTS_H
 
@@ -6,11 +6,10 @@
 #include <string>
 
 #include "export_table_update.h"
+#include "kernel_cache.h"
 #include "status.h"
 
 namespace vorn {
-
-constexpr char kKernelCaches[] = "/proc/net/rpc";
 
 // Writes lines to the channel of the rights (nfsd.export), one at a time.
 using RightsWriter = std::function<Status(const std::string& lines)>;
@@ -20,9 +19,9 @@ using RightsWriter = std::function<Status(const std::string& lines)>;
 // has left it, to which clients an address belongs. All other entries stay, so other requests are served without
 // rpc.mountd, which reads the whole table again first.
 //
-// An entry expires when it is written to the cache's `channel` with a time that has passed. All of a cache is flushed
-// if that fails. The cache of rights is also flushed if a file system has lost its last export: an expired entry keeps
-// a reference to its directory, and the file system could not be unmounted.
+// All of a cache is flushed if its entries cannot be expired one by one. The cache of rights is also flushed if a file
+// system has lost its last export: an expired entry keeps a reference to its directory, and the file system could not
+// be unmounted.
 //
 // `folder` is that of the caches (kKernelCaches). An entry of the rights refers to a directory in the mount namespace
 // of rpc.mountd, and only a process in that namespace can expire it: `write_rights` must write from there.

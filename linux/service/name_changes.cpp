@@ -4,10 +4,9 @@
 #include <syslog.h>
 
 #include <set>
-#include <sstream>
 #include <utility>
 
-#include "export_table_update.h"
+#include "export_table.h"
 #include "state_file.h"
 
 namespace vorn {
@@ -16,14 +15,13 @@ namespace {
 // Below /run: after a boot the kernel remembers nothing.
 constexpr char kNetgroups[] = "/run/vorn/export-netgroups";
 
-// The netgroups among the clients of the table: "/srv/data\t@group(rw,...)".
-std::set<std::string> NetgroupsIn(const std::string& table) {
+// The netgroups among the clients of the table.
+Result<std::set<std::string>> NetgroupsIn(const std::string& table) {
+  const Result<std::vector<ExportTableLine>> lines = ReadExportTable(table);
+  if (!lines.ok()) return lines.status();
   std::set<std::string> netgroups;
-  std::istringstream lines(table);
-  for (std::string line; std::getline(lines, line);) {
-    const std::size_t client = line.find("\t@");
-    if (client == std::string::npos) continue;
-    netgroups.insert(line.substr(client + 2, line.find('(', client) - client - 2));
+  for (const ExportTableLine& line : *lines) {
+    if (line.client.front() == '@') netgroups.emplace(line.client.substr(1));
   }
   return netgroups;
 }
@@ -31,9 +29,10 @@ std::set<std::string> NetgroupsIn(const std::string& table) {
 Status ApplyNetgroups(Box& box, const ExportsEnvironment& environment, const NetgroupReader& read_netgroup) {
   const Result<StoredFile> table = box.Read(kExportTable);
   if (!table.ok()) return table.status();
+  const Result<std::set<std::string>> netgroups = NetgroupsIn(table->text);
+  if (!netgroups.ok()) return netgroups.status();
   std::string members;
-  for (const std::string& netgroup : NetgroupsIn(table->text))
-    members += netgroup + " " + read_netgroup(netgroup) + "\n";
+  for (const std::string& netgroup : *netgroups) members += netgroup + " " + read_netgroup(netgroup) + "\n";
   const Result<StoredFile> before = box.Read(kNetgroups);
   if (!before.ok()) return before.status();
   if (before->text == members) return {};

@@ -30,6 +30,14 @@ Status Operate(Box& box, const std::string& service, const std::function<Status(
   return turn.ok() ? operation(**engine) : turn.status();
 }
 
+// Starts or restarts the service with the transfer sizes that are configured now.
+Status BringUp(Box& box, const std::string& service, Status (Engine::*operation)()) {
+  return Operate(box, service, [&](Engine& engine) {
+    const Status prepared = PrepareTransferSizes(box);
+    return prepared.ok() ? (engine.*operation)() : prepared;
+  });
+}
+
 }  // namespace
 
 Result<bool> IsServiceEnabled(Box& box, const std::string& service) {
@@ -37,23 +45,13 @@ Result<bool> IsServiceEnabled(Box& box, const std::string& service) {
   return engine.ok() ? (*engine)->IsEnabled() : engine.status();
 }
 
-Status StartService(Box& box, const std::string& service) {
-  return Operate(box, service, [&box](Engine& engine) {
-    const Status prepared = PrepareTransferSizes(box);
-    return prepared.ok() ? engine.Start() : prepared;
-  });
-}
+Status StartService(Box& box, const std::string& service) { return BringUp(box, service, &Engine::Start); }
 
 Status StopService(Box& box, const std::string& service) {
   return Operate(box, service, [](Engine& engine) { return engine.Stop(); });
 }
 
-Status RestartService(Box& box, const std::string& service) {
-  return Operate(box, service, [&box](Engine& engine) {
-    const Status prepared = PrepareTransferSizes(box);
-    return prepared.ok() ? engine.Restart() : prepared;
-  });
-}
+Status RestartService(Box& box, const std::string& service) { return BringUp(box, service, &Engine::Restart); }
 
 Status ReloadService(Box& box, const std::string& service) {
   return Operate(box, service, [](Engine& engine) { return engine.Reload(); });

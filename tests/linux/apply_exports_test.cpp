@@ -10,6 +10,7 @@
 
 #include "call.h"
 #include "current_box.h"
+#include "kernel_caches.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -23,18 +24,9 @@ using testing::IsEmpty;
 using testing::Not;
 
 constexpr char kTable[] = "/var/lib/nfs/etab";
-constexpr char kCaches[] = "/proc/net/rpc";
 
 class ApplyExportsTest : public testing::Test {
  protected:
-  ApplyExportsTest() {
-    for (const char* cache : {"auth.unix.ip", "nfsd.export", "nfsd.fh"}) {
-      for (const char* file : {"content", "channel", "flush"}) {
-        root_.Write(std::string(kCaches) + "/" + cache + "/" + file, "");
-      }
-    }
-  }
-
   Status Apply() {
     return ApplyWith([this](const std::string& name) {
       asked_.push_back(name);
@@ -44,15 +36,16 @@ class ApplyExportsTest : public testing::Test {
 
   Status ApplyWith(HostResolver resolve) {
     const auto write_rights = [this](const std::string& lines) {
-      root_.Write("/proc/net/rpc/nfsd.export/channel", lines);
+      caches_.Write("nfsd.export", "channel", lines);
       return Status();
     };
-    return ApplyExports(CurrentBox(), {root_.At(kCaches), std::move(resolve), write_rights});
+    return ApplyExports(CurrentBox(), {caches_.folder(), std::move(resolve), write_rights});
   }
 
   std::string Table() const { return root_.Read(kTable).value_or(""); }
 
   TemporaryRoot root_;
+  const KernelCaches caches_{root_};
   VORN::CallContext call_{{}};
   std::optional<std::vector<std::string>> addresses_ = std::vector<std::string>{"10.0.0.7"};
   std::vector<std::string> asked_;
@@ -81,18 +74,18 @@ TEST_F(ApplyExportsTest, WithdrawsTheRulesOfAFormerShareAtOnce) {
 TEST_F(ApplyExportsTest, LeavesATableAloneThatIsAsItShouldBe) {
   root_.Write("/etc/exports", "/a 10.0.0.1(rw)\n");
   root_.Write(kTable, "/a\t10.0.0.1(rw)\n");
-  root_.Write("/proc/net/rpc/nfsd.export/content", "/a\t10.0.0.1(rw)\n");
+  caches_.Fill("nfsd.export", "/a\t10.0.0.1(rw)\n");
   EXPECT_TRUE(Apply().ok());
   EXPECT_EQ(Table(), "/a\t10.0.0.1(rw)\n");
-  EXPECT_EQ(root_.Read("/proc/net/rpc/nfsd.export/channel"), "");
+  EXPECT_EQ(caches_.Channel("nfsd.export"), "");
 }
 
 TEST_F(ApplyExportsTest, HasTheKernelForgetWhatChanged) {
   root_.Write("/etc/exports", "/a 10.0.0.1(ro)\n");
   root_.Write(kTable, "/a\t10.0.0.1(rw)\n");
-  root_.Write("/proc/net/rpc/nfsd.export/content", "/a\t10.0.0.1(rw)\n");
+  caches_.Fill("nfsd.export", "/a\t10.0.0.1(rw)\n");
   EXPECT_TRUE(Apply().ok());
-  EXPECT_THAT(*root_.Read("/proc/net/rpc/nfsd.export/channel"), HasSubstr("10.0.0.1 /a "));
+  EXPECT_THAT(caches_.Channel("nfsd.export"), HasSubstr("10.0.0.1 /a "));
 }
 
 TEST_F(ApplyExportsTest, WarnsOfEachFaultyLine) {
@@ -138,7 +131,7 @@ TEST_F(ApplyExportsTest, AsksAResolverThatDoesNotAnswerOnce) {
 TEST_F(ApplyExportsTest, KnowsAHostThatTheKernelServesByItsName) {
   root_.Write("/etc/exports", "/a host.example(rw)\n/b 10.0.0.1(rw)\n");
   root_.Write(kTable, "/a\thost.example(rw)\n");
-  root_.Write("/proc/net/rpc/auth.unix.ip/content", "#class IP domain\nnfsd 10.0.0.9 *,host.example\n");
+  caches_.Fill("auth.unix.ip", "#class IP domain\nnfsd 10.0.0.9 *,host.example\n");
   addresses_ = std::nullopt;
   EXPECT_TRUE(Apply().ok());
   EXPECT_THAT(Table(), AllOf(HasSubstr("/a\t10.0.0.9(rw,"), Not(HasSubstr("host.example"))));

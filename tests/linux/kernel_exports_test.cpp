@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include "exports_text.h"
+#include "kernel_caches.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -16,41 +18,35 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-// A stand-in for /proc/net/rpc, with what the kernel of Debian 12 shows.
+// The caches have entries as the kernel of Debian 12 shows them.
 class KernelExports : public testing::Test {
  protected:
   KernelExports() {
-    Fill("auth.unix.ip",
-         "#class IP domain\n"
-         "nfsd 10.0.0.1 10.0.0.1,10.0.0.0/24\n"
-         "nfsd 10.0.0.2 10.0.0.0/24\n"
-         "nfsd 2001:db8:0000:0000:0000:0000:0000:0001 2001:db8::1\n"
-         "# nfsd 10.9.0.9 -no-domain-\n");
-    Fill("nfsd.export",
-         "#path domain(flags)\n"
-         "/\t10.0.0.1(ro,v4root,fsid=0,sec=390003:1)\n"
-         "/srv\t10.0.0.1(ro,v4root)\n"
-         "/srv/data\t10.0.0.1(rw,sec=1)\n"
-         "# /srv/data\t10.0.0.2()\n"
-         "/srv/data/inner\\040volume\t10.0.0.1(rw,sec=1)\n"
-         "/srv/database\t10.0.0.1(rw,sec=1)\n");
-    Fill("nfsd.fh",
-         "#domain fsidtype fsid [path]\n"
-         "10.0.0.1 7 0x0102030405060708090a0b0c0d0e0f1011121314 /srv/data\n"
-         "10.0.0.1 1 0x00000000 /\n"
-         "# 10.0.0.2 6 0x01020304\n");
-  }
-
-  void Fill(const std::string& cache, const std::string& content) {
-    folder_.Write("/" + cache + "/content", content);
-    folder_.Write("/" + cache + "/channel", "");
-    folder_.Write("/" + cache + "/flush", "");
+    caches_.Fill("auth.unix.ip",
+                 "#class IP domain\n"
+                 "nfsd 10.0.0.1 10.0.0.1,10.0.0.0/24\n"
+                 "nfsd 10.0.0.2 10.0.0.0/24\n"
+                 "nfsd 2001:db8:0000:0000:0000:0000:0000:0001 2001:db8::1\n"
+                 "# nfsd 10.9.0.9 -no-domain-\n");
+    caches_.Fill("nfsd.export",
+                 "#path domain(flags)\n"
+                 "/\t10.0.0.1(ro,v4root,fsid=0,sec=390003:1)\n"
+                 "/srv\t10.0.0.1(ro,v4root)\n"
+                 "/srv/data\t10.0.0.1(rw,sec=1)\n"
+                 "# /srv/data\t10.0.0.2()\n"
+                 "/srv/data/inner\\040volume\t10.0.0.1(rw,sec=1)\n"
+                 "/srv/database\t10.0.0.1(rw,sec=1)\n");
+    caches_.Fill("nfsd.fh",
+                 "#domain fsidtype fsid [path]\n"
+                 "10.0.0.1 7 0x0102030405060708090a0b0c0d0e0f1011121314 /srv/data\n"
+                 "10.0.0.1 1 0x00000000 /\n"
+                 "# 10.0.0.2 6 0x01020304\n");
   }
 
   // The lines that were written to the channel, with "PAST" for a time that has passed.
   std::vector<std::string> Expired(const std::string& cache) const {
     std::vector<std::string> lines;
-    std::istringstream text(folder_.Read("/" + cache + "/channel").value_or(""));
+    std::istringstream text(caches_.Channel(cache));
     for (std::string line; std::getline(text, line);) {
       const std::size_t blank = line.rfind(' ');
       EXPECT_LT(std::stoll(line.substr(blank)), std::time(nullptr)) << line;
@@ -59,17 +55,16 @@ class KernelExports : public testing::Test {
     return lines;
   }
 
-  bool IsFlushed(const std::string& cache) const { return !folder_.Read("/" + cache + "/flush").value_or("").empty(); }
-
   Status Forget(const ExportTableUpdate& update) {
-    return ForgetExports(folder_.directory(), update, [this](const std::string& lines) {
+    return ForgetExports(caches_.folder(), update, [this](const std::string& lines) {
       if (!can_write_) return Status::Failure(kServiceFailed, "no unit");
-      folder_.Write("/nfsd.export/channel", lines);
+      caches_.Write("nfsd.export", "channel", lines);
       return Status();
     });
   }
 
   TemporaryRoot folder_;
+  const KernelCaches caches_{folder_};
   bool can_write_ = true;
 };
 
@@ -84,7 +79,7 @@ TEST_F(KernelExports, ForgetsTheRightsInAChangedDirectoryAndAboveAndBelowIt) {
   EXPECT_THAT(Expired("nfsd.export"),
               ElementsAre("10.0.0.1 / PAST", "10.0.0.1 /srv PAST", "10.0.0.1 /srv/data PAST", "10.0.0.2 /srv/data PAST",
                           "10.0.0.1 /srv/data/inner\\040volume PAST"));
-  EXPECT_FALSE(IsFlushed("nfsd.export"));
+  EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(KernelExports, AsksAgainForHandlesWithoutADirectory) {
@@ -107,7 +102,7 @@ TEST_F(KernelExports, ForgetsTheAddressOfANewClient) {
 
 TEST_F(KernelExports, ForgetsEveryAddressForAClientThatMayHaveAny) {
   for (const char* client : {"10.0.0.0/8", "*", "*.example", "@group", "host.example"}) {
-    folder_.Write("/auth.unix.ip/channel", "");
+    caches_.Write("auth.unix.ip", "channel", "");
     ExportTableUpdate update = Changed("/srv/data");
     update.clients = {client};
     EXPECT_TRUE(Forget(update).ok());
@@ -119,7 +114,7 @@ TEST_F(KernelExports, FlushesTheRightsWhereAVolumeHasNoExportAnyMore) {
   ExportTableUpdate update = Changed("/no/such/folder");
   update.left = {"/no/such/folder"};
   EXPECT_TRUE(Forget(update).ok());
-  EXPECT_TRUE(IsFlushed("nfsd.export"));
+  EXPECT_TRUE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(KernelExports, DoesNotFlushWhereTheVolumeHasOtherExports) {
@@ -129,7 +124,7 @@ TEST_F(KernelExports, DoesNotFlushWhereTheVolumeHasOtherExports) {
   update.left = update.changed;
   update.text = folder_.At("/b") + "\t*(ro)\n";
   EXPECT_TRUE(Forget(update).ok());
-  EXPECT_FALSE(IsFlushed("nfsd.export"));
+  EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(KernelExports, ForgetsTheHandlesOfADirectoryThatHasLeft) {
@@ -140,13 +135,37 @@ TEST_F(KernelExports, ForgetsTheHandlesOfADirectoryThatHasLeft) {
                                                     "0c0b0a09100f0e0d14131211 PAST"));
 }
 
+// The table's path reads as "/a\\040": the backslash is an escape, and the digits after it are not part of one.
+TEST_F(KernelExports, FindsADirectoryWithABackslashInTheTable) {
+  folder_.Write("/left/file", "");
+  folder_.Write("/a\\040/file", "");
+  ExportTableUpdate update = Changed(folder_.At("/left"));
+  update.left = update.changed;
+  update.text = EncodeExportsWord(folder_.At("/a\\040")) + "\t*(ro)\n";
+  EXPECT_TRUE(Forget(update).ok());
+  EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
+}
+
+TEST_F(KernelExports, FlushesTheRightsIfTheTableCannotBeRead) {
+  ExportTableUpdate update = Changed(folder_.directory());
+  update.left = update.changed;
+  update.text = "nonsense\n";
+  EXPECT_TRUE(Forget(update).ok());
+  EXPECT_TRUE(caches_.IsFlushed("nfsd.export"));
+}
+
+TEST_F(KernelExports, UnderstandsWordsThatOnlyLookLikeEscapes) {
+  for (const char* word : {"\\", "\\04", "\\09x", "\\x41", "a\\"}) EXPECT_EQ(UnescapeWord(word), word);
+  EXPECT_EQ(UnescapeWord("a\\040b\\134\\011"), "a b\\\t");
+}
+
 TEST_F(KernelExports, FlushesACacheWhoseChannelCannotBeWritten) {
-  ASSERT_EQ(std::remove(folder_.At("/nfsd.fh/channel").c_str()), 0);
-  folder_.Write("/nfsd.fh/channel/file", "");
+  ASSERT_EQ(std::remove((caches_.folder() + "/nfsd.fh/channel").c_str()), 0);
+  caches_.Write("nfsd.fh", "channel/file", "");
   can_write_ = false;
   EXPECT_TRUE(Forget(Changed("/srv/data")).ok());
-  EXPECT_TRUE(IsFlushed("nfsd.fh"));
-  EXPECT_TRUE(IsFlushed("nfsd.export"));
+  EXPECT_TRUE(caches_.IsFlushed("nfsd.fh"));
+  EXPECT_TRUE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(KernelExports, FailsWithoutTheKernelsCaches) {

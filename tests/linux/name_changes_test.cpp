@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "current_box.h"
+#include "kernel_caches.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -19,24 +20,18 @@ using testing::HasSubstr;
 using testing::Not;
 
 constexpr char kTable[] = "/var/lib/nfs/etab";
-constexpr char kCaches[] = "/proc/net/rpc";
 
 class NameChanges : public testing::Test {
  protected:
   NameChanges() {
-    for (const char* cache : {"auth.unix.ip", "nfsd.export", "nfsd.fh"}) {
-      for (const char* file : {"content", "channel", "flush"}) {
-        root_.Write(std::string(kCaches) + "/" + cache + "/" + file, "");
-      }
-    }
     root_.Write("/etc/exports", "/a host(rw)\n/b @group(rw)\n");
     EXPECT_TRUE(ApplyExports(CurrentBox(), Environment()).ok());
     Apply();
-    root_.Write("/proc/net/rpc/auth.unix.ip/flush", "");
+    caches_.Write("auth.unix.ip", "flush", "");
   }
 
   ExportsEnvironment Environment() {
-    return {root_.At(kCaches), [this](const std::string&) { return addresses_; },
+    return {caches_.folder(), [this](const std::string&) { return addresses_; },
             [](const std::string&) { return Status(); }};
   }
 
@@ -47,9 +42,10 @@ class NameChanges : public testing::Test {
   }
 
   std::string Table() const { return root_.Read(kTable).value_or(""); }
-  bool IsFlushed() const { return !root_.Read("/proc/net/rpc/auth.unix.ip/flush")->empty(); }
+  bool IsFlushed() const { return caches_.IsFlushed("auth.unix.ip"); }
 
   TemporaryRoot root_;
+  const KernelCaches caches_{root_};
   std::optional<std::vector<std::string>> addresses_ = std::vector<std::string>{"10.0.0.7"};
   std::string members_ = "(client,)";
 };
@@ -79,6 +75,13 @@ TEST_F(NameChanges, HaveTheKernelAskAgainWhoIsInANetgroup) {
   members_ = "(other,)";
   Apply();
   EXPECT_TRUE(IsFlushed());
+}
+
+TEST_F(NameChanges, FailWithATableThatIsNotUnderstood) {
+  root_.Write(kTable, "nonsense\n");
+  const Status status = ApplyNameChanges(CurrentBox(), Environment(), [](const std::string&) { return ""; });
+  EXPECT_EQ(status.code(), kSyntax);
+  EXPECT_EQ(Table(), "nonsense\n");
 }
 
 }  // namespace

@@ -2,6 +2,7 @@
 
 #include "current_box.h"
 #include "engines.h"
+#include "kernel_caches.h"
 #include "stand_in_manager.h"
 
 namespace {
@@ -13,14 +14,7 @@ using vorn::Status;
 
 class SystemdEngine : public testing::Test {
  protected:
-  SystemdEngine() {
-    SetThreads("8\n");
-    for (const char* cache : {"auth.unix.ip", "nfsd.export", "nfsd.fh"}) {
-      for (const char* file : {"content", "channel", "flush"}) {
-        folder_.Write(std::string("/caches/") + cache + "/" + file, "");
-      }
-    }
-  }
+  SystemdEngine() { SetThreads("8\n"); }
 
   void SetThreads(const char* text) { folder_.Write("/threads", text); }
 
@@ -29,12 +23,13 @@ class SystemdEngine : public testing::Test {
     options.bus_address = manager_.address();
     options.threads_file = folder_.At("/threads");
     options.job_limit = std::chrono::seconds(limit_);
-    options.exports.kernel_caches = folder_.At("/caches");
+    options.exports.kernel_caches = caches_.folder();
     return vorn::MakeSystemdEngine(vorn::CurrentBox(), options);
   }
 
   StandInManager manager_;
   TemporaryRoot folder_;
+  const KernelCaches caches_{folder_};
   int limit_ = 60;
 };
 
@@ -130,21 +125,21 @@ TEST_F(SystemdEngine, AppliesTheRulesWithoutTheUnit) {
 }
 
 TEST_F(SystemdEngine, HasAUnitOutsideOfItsNamespaceExpireTheRights) {
-  folder_.Write("/caches/nfsd.export/content", "/volume1/data\t10.0.0.1(ro)\n");
+  caches_.Fill("nfsd.export", "/volume1/data\t10.0.0.1(ro)\n");
   folder_.Write("/var/lib/nfs/etab", "/volume1/data\t10.0.0.1(ro)\n");
   folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw)\n");
   EXPECT_TRUE(Engine()->Reload().ok());
   EXPECT_THAT(manager_.TakeCalls(), ElementsAre("Subscribe", "StartUnit vorn-nfs-forget.service replace"));
   EXPECT_THAT(*folder_.Read("/run/vorn/expired-rights"), HasSubstr("10.0.0.1 /volume1/data "));
-  EXPECT_EQ(folder_.Read("/caches/nfsd.export/flush"), "");
+  EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(SystemdEngine, FlushesAllRightsWhereThatUnitFails) {
   manager_.End("StartUnit vorn-nfs-forget.service", "failed");
-  folder_.Write("/caches/nfsd.export/content", "/volume1/data\t10.0.0.1(ro)\n");
+  caches_.Fill("nfsd.export", "/volume1/data\t10.0.0.1(ro)\n");
   folder_.Write("/etc/exports", "/volume1/data 10.0.0.1(rw)\n");
   EXPECT_TRUE(Engine()->Reload().ok());
-  EXPECT_NE(folder_.Read("/caches/nfsd.export/flush"), "");
+  EXPECT_TRUE(caches_.IsFlushed("nfsd.export"));
 }
 
 TEST_F(SystemdEngine, AppliesWhatExportfsIgnoredAfterAStart) {

@@ -1,4 +1,5 @@
-// A file descriptor with an owner.
+// A file descriptor with an owner. The platform library has a class of its own (linux/system/file_descriptor.h): the
+// server and the platform share nothing but platform/, which is C and contains no helpers.
 #ifndef VORN_SERVER_UNIQUE_FD_H
 #define VORN_SERVER_UNIQUE_FD_H
 
@@ -13,8 +14,9 @@ class UniqueFd {
   UniqueFd() = default;
   explicit UniqueFd(int fd) : fd_(fd) {}
   UniqueFd(UniqueFd&& other) noexcept : fd_(other.release()) {}
+  // Closes the descriptor that this object owned.
   UniqueFd& operator=(UniqueFd&& other) noexcept {
-    std::swap(fd_, other.fd_);
+    const UniqueFd former(std::exchange(fd_, other.release()));
     return *this;
   }
   ~UniqueFd() {

@@ -39,7 +39,7 @@ std::string Load(Box& box) {
 }
 
 // Waits until the file is old enough for its document to be cached.
-void Settle(Box& box) {
+void WaitUntilCacheable(Box& box) {
   ASSERT_TRUE(Eventually([&] { return box.Read(kFile)->is_settled; }));
 }
 
@@ -47,7 +47,7 @@ TEST(Box, ParsesAnUnchangedFileOnce) {
   const TemporaryRoot root;
   root.Write(kFile, "text");
   Box& box = CurrentBox();
-  Settle(box);
+  WaitUntilCacheable(box);
   parses = 0;
   const auto first = box.Load<std::string>(kFile, Parse);
   const auto second = box.Load<std::string>(kFile, Parse);
@@ -59,7 +59,7 @@ TEST(Box, ParsesAChangedFileAgain) {
   const TemporaryRoot root;
   root.Write(kFile, "one");
   Box& box = CurrentBox();
-  Settle(box);
+  WaitUntilCacheable(box);
   EXPECT_EQ(Load(box), "one");
   root.Write(kFile, "three");
   EXPECT_EQ(Load(box), "three");

@@ -175,7 +175,7 @@ class FileMaker {
 
  private:
   int Up(int most) { return std::uniform_int_distribution<int>(0, most)(random_); }
-  bool Seldom() { return Up(60) == 0; }
+  bool IsRare() { return Up(60) == 0; }
 
   std::string Line() {
     static constexpr const char* kPlain[] = {"\n", "# comment\n", "  # c \\\n", "\t\n", "\\\n"};
@@ -192,7 +192,7 @@ class FileMaker {
 
   std::string Word() {
     static constexpr const char* kFaults[] = {"alpha(rw", "\"", "gamma(foo)", "alpha(rw)x", "-bar", "\\"};
-    if (Seldom()) return Any(kFaults);
+    if (IsRare()) return Any(kFaults);
     static constexpr const char* kClients[] = {"alpha",  "beta.example", "*",  "10.0.0.0/8",
                                                "@group", "*.ex[a-m]ple", "::1"};
     if (Up(6) == 0) return "-" + Options();

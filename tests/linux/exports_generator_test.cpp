@@ -366,9 +366,24 @@ class FileMaker {
         "insecure",     "secure",   "sec=krb5",      "sec=sys",   "sec=krb5i:krb5", "sec=krb5p",    "crossmnt",
         "no_wdelay",    "nohide",   "no_all_squash", "anonuid=7", "anongid=8",      "anonuid=1024", "anongid=100",
         "sec=none:sys", kNewOption, "subtree_check", "fsid=5"};
+    if (random_->OneIn(4)) return FlavorOptions(separator);
     std::string options = random_->Any(kOptions);
     for (int more = random_->Up(6); more > 0; --more) options += separator + random_->Any(kOptions);
     return options;
+  }
+
+  // Access options after each of several flavours.
+  std::string FlavorOptions(const std::string& separator) {
+    static const std::vector<std::string> kFlavors = {"sec=krb5", "sec=sys", "sec=krb5i:krb5p"};
+    static const std::vector<std::string> kAccess = {
+        "rw", "ro", "no_root_squash", "root_squash", "all_squash", "no_all_squash", "insecure", "secure"};
+    std::string options;
+    for (const std::string& flavor : kFlavors) {
+      if (random_->OneIn(3)) continue;
+      options += (options.empty() ? "" : separator) + flavor;
+      for (int more = random_->Up(3); more > 0; --more) options += separator + random_->Any(kAccess);
+    }
+    return options.empty() ? "rw" : options;
   }
 
   std::string Fault() {
@@ -597,15 +612,21 @@ class GeneratedBox {
   static void CheckFiles(const Outcome& outcome, const ExportsSet& before, const ExportsSet& after) {
     EXPECT_EQ(before.foreign, after.foreign) << outcome.name;
     EXPECT_TRUE(outcome.saved || before.file == after.file) << outcome.name;
+    const bool fits = outcome.path.size() < sizeof ExportRuleList::path;
+    const bool can_be_removed = outcome.removed_all && fits && before.foreign.empty();
+    EXPECT_TRUE(outcome.saved || !can_be_removed) << outcome.name << "\n" << before.file << "\nshare: " << outcome.path;
     for (const GeneratedLine& line : outcome.lines) {
       // A backslash may have another meaning than its author intended.
-      const bool is_other = line.path != outcome.path && line.text.find('\\') == std::string::npos;
+      const bool is_plain = line.text.find('\\') == std::string::npos;
+      const bool is_other = line.path != outcome.path && is_plain;
       const bool must_stay = is_other || (line.has_fault && !outcome.removed_all);
       const bool stays = after.file.find(line.text) != std::string::npos;
       EXPECT_TRUE(stays || !must_stay) << outcome.name << "\n"
                                        << before.file << "\nlost: " << line.text << "\nshare: " << outcome.path
                                        << "\nafter:\n"
                                        << after.file;
+      const bool must_go = outcome.saved && outcome.removed_all && is_plain && line.path == outcome.path;
+      EXPECT_FALSE(stays && must_go) << outcome.name << "\n" << before.file << "\nleft: " << line.text;
     }
   }
 

@@ -46,6 +46,9 @@ void RunCases(unsigned number_of_cases, const RunCase& run_case) {
   }
 }
 
+// The text after the last complete line, which the readers of INI files ignore.
+inline std::string Tail(const std::string& text) { return text.substr(text.rfind('\n') + 1); }
+
 // Files by path below the root.
 using GeneratedFiles = std::vector<std::pair<std::string, std::string>>;
 

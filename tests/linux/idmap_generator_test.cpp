@@ -192,9 +192,6 @@ std::string AllText(const TemporaryRoot& root, const GeneratedFiles& files) {
   return text;
 }
 
-// The text after the last complete line.
-std::string Tail(const std::string& text) { return text.substr(text.rfind('\n') + 1); }
-
 bool IsNamed(const std::vector<LogLine>& log, const std::string& principal) {
   return std::any_of(log.begin(), log.end(),
                      [&](const LogLine& line) { return line.text.find(" " + principal + " = ") != std::string::npos; });

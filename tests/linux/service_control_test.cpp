@@ -110,10 +110,10 @@ class WaitingOperation : public testing::Test {
     });
   }
   ~WaitingOperation() override {
-    if (thread_.joinable()) LetItDoSo();
+    if (thread_.joinable()) Release();
   }
 
-  void LetItDoSo() {
+  void Release() {
     root_.Write("/go", "");
     thread_.join();
   }
@@ -137,7 +137,7 @@ TEST_F(WaitingOperation, LetsOthersHaveTheConfigurationAndIsDoneInItsTurn) {
     EXPECT_EQ(KLIBServiceIsEnabled("nfsd"), 0);
     EXPECT_FALSE(root_.Read("/started").has_value());
   }
-  LetItDoSo();
+  Release();
   EXPECT_EQ(result_, 0);
   EXPECT_EQ(KLIBServiceIsEnabled("nfsd"), 1);
   EXPECT_EQ(other_.Wait(), 0);

@@ -43,18 +43,18 @@ const sd_bus_vtable kMethods[] = {
     SD_BUS_VTABLE_END,
 };
 
-void Must(int result, const char* what) {
+void ThrowIfFailed(int result, const char* what) {
   if (result < 0) throw std::runtime_error(what);
 }
 
 // Formats a call for the tests: the method and its string arguments.
 std::string Describe(sd_bus_message* message, const std::string& types) {
   std::string call = sd_bus_message_get_member(message);
-  if (types == "as") Must(sd_bus_message_enter_container(message, 'a', "s"), "array");
+  if (types == "as") ThrowIfFailed(sd_bus_message_enter_container(message, 'a', "s"), "array");
   const std::size_t count = types == "as" ? 1 : types.size();
   for (std::size_t i = 0; i < count; ++i) {
     const char* text = nullptr;
-    Must(sd_bus_message_read(message, "s", &text), "text");
+    ThrowIfFailed(sd_bus_message_read(message, "s", &text), "text");
     call += std::string(" ") + text;
   }
   return call;
@@ -75,16 +75,16 @@ StandInManager::StandInManager() {
     return 127;
   });
   if (!Eventually([this] { return Connect(); })) throw std::runtime_error("no dbus-daemon");
-  Must(sd_bus_add_object_vtable(bus_, nullptr, kPath, kInterface, kMethods, this), "object");
-  Must(sd_bus_request_name(bus_, kName, 0), "name");
+  ThrowIfFailed(sd_bus_add_object_vtable(bus_, nullptr, kPath, kInterface, kMethods, this), "object");
+  ThrowIfFailed(sd_bus_request_name(bus_, kName, 0), "name");
   thread_ = std::thread([this] { Serve(); });
 }
 
 bool StandInManager::Connect() {
   bus_ = sd_bus_flush_close_unref(bus_);
-  Must(sd_bus_new(&bus_), "bus");
-  Must(sd_bus_set_address(bus_, address_.c_str()), "address");
-  Must(sd_bus_set_bus_client(bus_, 1), "client");
+  ThrowIfFailed(sd_bus_new(&bus_), "bus");
+  ThrowIfFailed(sd_bus_set_address(bus_, address_.c_str()), "address");
+  ThrowIfFailed(sd_bus_set_bus_client(bus_, 1), "client");
   return sd_bus_start(bus_) >= 0;
 }
 

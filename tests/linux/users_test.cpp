@@ -79,6 +79,15 @@ TEST(Users, AreFoundByAPartOfTheirName) {
   EXPECT_THAT(With("bash", 1), IsEmpty());
 }
 
+TEST(Users, AreFoundBehindALineOfAnyLength) {
+  const TemporaryRoot root;
+  for (const std::size_t length : {1'000U, 5'000U, 100'000U}) {
+    root.Write("/etc/passwd",
+               "long:x:1000:100:" + std::string(length, 'x') + ":/:/bin/sh\nlast:x:1001:100::/:/bin/sh\n");
+    EXPECT_THAT(All(), ElementsAre("long", "last")) << length;
+  }
+}
+
 TEST(Users, OfARootWithoutAPasswordFileAreNone) {
   const TemporaryRoot root;
   EXPECT_THAT(All(), IsEmpty());

@@ -61,7 +61,7 @@ constexpr long kChangingCalls[] = {
 class Rehearsals : public Writes {
  protected:
   Rehearsals() {
-    FurnishFiles(root_);
+    WriteAllFiles(root_);
     root_.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\nfirewall = no\n");
     root_.Write(kScript, "#!/bin/sh\n");
     std::filesystem::permissions(root_.At(kScript), std::filesystem::perms::owner_all);

@@ -87,6 +87,17 @@ TEST(OpenApi, DescribesRevisionsWhereTheyArePossible) {
   EXPECT_EQ(set["parameters"][0]["$ref"], "#/components/parameters/IfMatch");
 }
 
+TEST(OpenApi, DescribesRehearsalsOfChangingMethods) {
+  const Json::Value document = DocumentOf({Describe("A", kDescriptor)});
+  const Json::Value& get = document["paths"]["/api/A/v1/get"]["post"];
+  const Json::Value& set = document["paths"]["/api/A/v1/set"]["post"];
+  EXPECT_EQ(set["parameters"][1]["$ref"], "#/components/parameters/Rehearse");
+  EXPECT_EQ(SchemaOf(set, "200")["properties"]["rehearsal"]["$ref"], "#/components/schemas/Rehearsal");
+  EXPECT_EQ(SchemaOf(set, "500")["properties"]["rehearsal"]["$ref"], "#/components/schemas/Rehearsal");
+  EXPECT_FALSE(SchemaOf(get, "200")["properties"].isMember("rehearsal"));
+  EXPECT_TRUE(document["components"]["schemas"]["Rehearsal"].isObject());
+}
+
 TEST(OpenApi, HasOnlyMethodsThatCanBeCalled) {
   const Json::Value document = DocumentOf({Describe("A", kDescriptor)});
   EXPECT_FALSE(document["paths"].isMember("/api/A/v1/absent"));

@@ -202,6 +202,26 @@ TEST_F(People, TokensOfReadersCallOnlyMethodsThatRead) {
   }
 }
 
+TEST_F(People, ReadersMayRehearse) {
+  const std::string header = BearerHeader(NewToken("monitor", "reader"));
+  const Reply reply = Call(Way::kTcp, kContext + "?rehearse=true", "{}", header);
+  EXPECT_EQ(reply.status, 200) << reply.body;
+  EXPECT_EQ(reply.Envelope()["data"]["may_write"], true) << "to a draft";
+  EXPECT_TRUE(reply.Envelope()["rehearsal"]["files"].isArray()) << reply.body;
+  EXPECT_EQ(Call(Way::kTcp, kGet + "?rehearse=true", "{}", header).status, 400);
+  EXPECT_EQ(Call(Way::kTcp, kContext + "?rehearse=yes", "{}", header).status, 400);
+  EXPECT_EQ(Call(Way::kTcp, std::string(kToken) + "create?rehearse=true", "{}", header).status, 400);
+  EXPECT_THAT(server_->log(),
+              testing::ContainsRegex("rehearsal: .*monitor 127.0.0.1 Test.Echo/v1/context .* succeeded"));
+  EXPECT_THAT(server_->log(), testing::Not(testing::ContainsRegex("audit: token monitor")));
+  EXPECT_FALSE(Administer(kContext).Envelope().isMember("rehearsal"));
+}
+
+TEST_F(People, LimitsOfATokenHoldForRehearsals) {
+  const std::string header = BearerHeader(NewToken("music", "administrator", R"(, "shares": ["music"])"));
+  EXPECT_EQ(Call(Way::kTcp, kContext + "?rehearse=true", "{}", header).status, 403);
+}
+
 TEST_F(People, ChangingCallsOfReadersDoNotBegin) {
   const std::string header = BearerHeader(NewToken("monitor", "reader"));
   const std::string begun = sandbox_.File("begun");

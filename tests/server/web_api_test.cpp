@@ -4,11 +4,13 @@
 
 #include <algorithm>
 #include <future>
+#include <memory>
 
 #include "body.h"
 #include "call.h"
 #include "form_body.h"
 #include "sandbox.h"
+#include "server_methods.h"
 
 namespace vorn::server {
 namespace {
@@ -62,14 +64,18 @@ class WebApiTest : public testing::Test {
   static Descriptor ParseDescriptor() {
     std::string error;
     return *Descriptor::Parse(
-        R"({"paths": {"/api/Nfs/v1/put": {"post": {"requestBody": {"content": {"multipart/form-data": {}}}}}}})",
+        R"({"paths": {"/api/Nfs/v1/read": {"post": {"x-read-only": true}},
+                      "/api/Nfs/v1/put": {"post": {"requestBody": {"content": {"multipart/form-data": {}}}}}}})",
         &error);
   }
 
-  std::vector<Module> modules_{
-      {"a.so",
-       {{"Nfs", 1, "get", Nothing}, {"Nfs", 1, "put", Nothing}, {"Nfs", 1, "who", Who}, {"Nfs", 1, "hold", Hold}},
-       ParseDescriptor()}};
+  std::vector<Module> modules_{{"a.so",
+                                {{"Nfs", 1, "get", Nothing},
+                                 {"Nfs", 1, "read", Nothing},
+                                 {"Nfs", 1, "put", Nothing},
+                                 {"Nfs", 1, "who", Who},
+                                 {"Nfs", 1, "hold", Hold}},
+                                ParseDescriptor()}};
   Routes routes_{modules_};
   Workers workers_{FewOfALane()};
   Budget memory_{std::size_t{1} << 30, std::size_t{1} << 30};
@@ -161,6 +167,35 @@ TEST_F(WebApiTest, OptionsNamesTheAllowedMethods) {
     EXPECT_EQ(std::get<Response>(begun).status, 204) << c.target;
     ASSERT_EQ(std::get<Response>(begun).headers.size(), 1U);
     EXPECT_EQ(std::get<Response>(begun).headers[0], (std::pair<std::string, std::string>("Allow", c.allowed)));
+  }
+}
+
+TEST_F(WebApiTest, RehearsesOnlyMethodsThatChangeSomething) {
+  const struct {
+    const char* target;
+    const char* query;
+    int status;
+  } cases[] = {{"/api/Nfs/v1/put", "rehearse=true", 0},
+               {"/api/Nfs/v1/put", "rehearse=false", 400},
+               {"/api/Nfs/v1/put", "rehearse", 400},
+               {"/api/Nfs/v1/put", "rehearse=", 400},
+               {"/api/Nfs/v1/put", "rehearse=TRUE", 400},
+               {"/api/Nfs/v1/put", "rehearse=true&rehearse=true", 400},
+               {"/api/Nfs/v1/put", "rehearse=true&x=1", 400},
+               {"/api/Nfs/v1/put", "Rehearse=true", 400},
+               {"/api/Nfs/v1/put", "rehearse=%74rue", 400},
+               {"/api/Nfs/v1/read", "rehearse=true", 400},
+               {"/api", "rehearse=true", 405}};
+  for (const auto& c : cases) {
+    Head head = Post(c.target);
+    head.query = c.query;
+    EXPECT_EQ(Begin(head), c.status) << c.target << "?" << c.query;
+  }
+  AddServerMethods(tokens_, sessions_, &routes_);
+  for (const char* target : {"/api/VORN.Server.Token/v1/create", "/api/VORN.Server.Session/v1/sign_in"}) {
+    Head head = PostBody(target, "application/json");
+    head.query = "rehearse=true";
+    EXPECT_EQ(Begin(head), 400) << target;
   }
 }
 
@@ -314,10 +349,12 @@ TEST_F(WebApiTest, CallsOfAFewProcessesLeaveRoomToOthers) {
 TEST_F(WebApiTest, TellsTheCallWhoHasSentIt) {
   const Head head = Post("/api/Nfs/v1/who");
   auto begun = api_.Begin(head);
-  std::promise<std::string> answer;
-  std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& response) { answer.set_value(response.body); });
+  // Shared, because the worker may still be in set_value() when the future is ready.
+  const auto answer = std::make_shared<std::promise<std::string>>();
+  std::get<std::shared_ptr<Exchange>>(begun)->Run(
+      [answer](const Response& response) { answer->set_value(response.body); });
   api_.Dispatch();
-  EXPECT_EQ(answer.get_future().get(), R"({"success":true,"data":"uid 0 at unix"})");
+  EXPECT_EQ(answer->get_future().get(), R"({"success":true,"data":"uid 0 at unix"})");
 }
 
 }  // namespace

@@ -3,11 +3,13 @@
 #include <cerrno>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "core.h"
 #include "current_box.h"
 #include "error.h"
 #include "nfsconf.h"
+#include "shared_folders.h"
 #include "shares.h"
 
 struct VORNSHARE {
@@ -23,7 +25,42 @@ vorn::Status CheckLength(const std::string& path) {
   return vorn::Status::System(ENAMETOOLONG, "shared folder " + path);
 }
 
+vorn::Status AddShare(const char* name, const char* path) {
+  if (name == nullptr || path == nullptr) return vorn::Status::Failure(EINVAL, "no name, or no path");
+  if (const vorn::Status status = CheckLength(path); !status.ok()) return status;
+  return vorn::AddShare(vorn::CurrentBox(), name, path);
+}
+
+vorn::Status EnumerateShares(KLIBSZHASH** hash) {
+  if (hash == nullptr || *hash == nullptr) return vorn::Status::Failure(EINVAL, "no hash");
+  const vorn::Result<std::vector<vorn::SharedFolder>> shares = vorn::ListShares(vorn::CurrentBox());
+  if (!shares.ok()) return shares.status();
+  for (const vorn::SharedFolder& share : *shares) {
+    if (KLIBCSzHashGetValue(*hash, share.name.c_str()) != nullptr) continue;  // the first entry counts
+    if (KLIBCSzHashSetValue(hash, share.name.c_str(), share.path.c_str()) < 0) {
+      return vorn::Status::System(ENOMEM, "shared folders");
+    }
+  }
+  return {};
+}
+
 }  // namespace
+
+int VORNShareEnum(KLIBSZHASH** hash) { return vorn::ToResult(EnumerateShares(hash)); }
+
+int VORNShareCreate(const char* name, const char* path) {
+  const vorn::Status status = AddShare(name, path);
+  if (vorn::ToResult(status) == 0) return 0;
+  if (status.code() == EEXIST) return VORNSHARE_EXISTS;
+  return status.code() == ENOENT || status.code() == ENOTDIR ? VORNSHARE_NO_FOLDER : VORNSHARE_FAILED;
+}
+
+int VORNShareDelete(const char* name) {
+  const vorn::Status status =
+      name == nullptr ? vorn::Status::Failure(EINVAL, "no name") : vorn::RemoveShare(vorn::CurrentBox(), name);
+  if (vorn::ToResult(status) == 0) return 0;
+  return status.code() == ENOENT ? VORNSHARE_NO_SHARE : VORNSHARE_FAILED;
+}
 
 int VORNShareGet(const char* name, VORNSHARE** share) {
   if (name == nullptr || share == nullptr) return vorn::ToResult(vorn::Status::Failure(EINVAL, "no name, or no share"));

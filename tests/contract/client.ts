@@ -152,6 +152,19 @@ async function sharePrivilege() {
   assert.deepEqual(refused.error?.error.reasons, ['"share_name" is missing.']);
 }
 
+async function shares() {
+  const photos = { name: 'photos', path: '/volume1/photos' };
+  expectDone(await client.POST('/api/VORN.Core.Share/v1/create', { body: photos }));
+  const again = await client.POST('/api/VORN.Core.Share/v1/create', { body: photos });
+  assert.equal(again.error?.error.code, 2372);
+  const list = dataOf(await client.POST('/api/VORN.Core.Share/v1/list', { body: { filter: 'photos' } }));
+  assert.deepEqual(list, { shares: [{ ...photos, rules: 0 }], total: 1 });
+  const get = dataOf(await client.POST('/api/VORN.Core.Share/v1/get', { body: { name: 'photos' } }));
+  const rules: number = get.rules;
+  assert.equal(rules, 0);
+  expectDone(await client.POST('/api/VORN.Core.Share/v1/delete', { body: { name: 'photos' } }));
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -227,6 +240,7 @@ await advancedSettings();
 await kerberos();
 await idMap();
 await sharePrivilege();
+await shares();
 await revisions();
 await sessions();
 await tokens();

@@ -16,7 +16,9 @@ PROJECT = pathlib.Path(__file__).resolve().parents[2]
 
 # Each folder, and the folders whose headers it may include besides its own.
 ALLOWED = {
-    "src": {"include", "platform"},
+    "src": {"src/frame", "include", "platform"},
+    "src/frame": {"include", "platform"},
+    "share": {"src/frame", "include", "platform"},
     "linux/system": {"linux/status"},
     "linux/text": {"linux/status"},
     "linux/box": {"linux/status", "linux/system", "linux/text", "platform"},

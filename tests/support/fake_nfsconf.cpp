@@ -7,6 +7,7 @@
 #include "filesystem.h"
 #include "firewall.h"
 #include "share.h"
+#include "shared_folders.h"
 #include "user.h"
 
 struct VORNSHARE {
@@ -177,6 +178,28 @@ void VORNShareFree(VORNSHARE* share) {
   if (share == nullptr) return;
   delete share;
   FakePlatform::Current().Died("VORNSHARE");
+}
+
+int VORNShareEnum(KLIBSZHASH** hash) {
+  FakePlatform& platform = FakePlatform::Current();
+  if (platform.Fails("VORNShareEnum")) return -1;
+  for (const auto& [name, path] : platform.shares) KLIBCSzHashSetValue(hash, name.c_str(), path.c_str());
+  return platform.done;
+}
+
+int VORNShareCreate(const char* name, const char* path) {
+  FakePlatform& platform = FakePlatform::Current();
+  if (platform.Fails("VORNShareCreate", std::string(name) + " " + path))
+    return platform.FailureResult("VORNShareCreate");
+  platform.shares[name] = path;
+  return platform.done;
+}
+
+int VORNShareDelete(const char* name) {
+  FakePlatform& platform = FakePlatform::Current();
+  if (platform.Fails("VORNShareDelete", name)) return platform.FailureResult("VORNShareDelete");
+  platform.shares.erase(name);
+  return platform.done;
 }
 
 const char* KLIBSharePathGet(const VORNSHARE* share) {

@@ -1,0 +1,1 @@
+"""The command line of the box: every command is a call of its web API."""

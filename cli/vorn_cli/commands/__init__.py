@@ -1,0 +1,17 @@
+"""All commands, in the order of the help."""
+
+from . import access, calls, exports, idmap, keytab, service, shares, state
+
+GROUPS = {
+    "nfs": "the NFS service",
+    "advanced": "transfer sizes, UNIX permissions and fixed ports",
+    "exports": "the export rules of shared folders",
+    "idmap": "the mappings of Kerberos principals to local users",
+    "keytab": "the Kerberos keys of the box",
+    "share": "shared folders",
+    "token": "tokens for programs",
+    "session": "sessions of people",
+}
+
+COMMANDS = (service.COMMANDS + exports.COMMANDS + idmap.COMMANDS + keytab.COMMANDS + shares.COMMANDS + state.COMMANDS +
+            access.COMMANDS + calls.COMMANDS)

@@ -1,0 +1,70 @@
+"""The parser of the command line, made from the commands."""
+
+import argparse
+
+from .commands import COMMANDS, GROUPS
+from .connection import DEFAULT_SOCKET
+from .failure import Exit
+
+GLOBAL_OPTIONS = (
+    (("--url",), {"metavar": "URL", "help": "a box on the network, with the token that \"vorn login\" keeps for it, or that "
+                                          "the variable VORN_TOKEN has; default: the variable VORN_URL"}),
+    (("--socket",), {"metavar": "PATH", "help": "the Unix socket of vornd; default: the variable VORN_SOCKET, or "
+                                              + DEFAULT_SOCKET}),
+    (("--json",), {"action": "store_true", "help": "print JSON, for programs"}),
+)
+_REHEARSE = (("--rehearse",), {"action": "store_true", "help": "change nothing; show what the command would do"})
+
+
+class Parser(argparse.ArgumentParser):
+    """Ends with the exit status for usage errors, and names the help."""
+
+    def error(self, message):
+        self.exit(Exit.USAGE, f"vorn: {message}\n  \"{self.prog} --help\" has the usage.\n")
+
+
+def build():
+    """The parser of all commands."""
+    parser = Parser(prog="vorn", description="Administers the NFS service of a storage box.",
+                    epilog="\"vorn COMMAND --help\" describes a command and has examples.",
+                    formatter_class=argparse.RawDescriptionHelpFormatter)
+    for names, settings in GLOBAL_OPTIONS:
+        parser.add_argument(*names, **settings)
+    subparsers = parser.add_subparsers(metavar="COMMAND", required=True)
+    groups = {}
+    for command in COMMANDS:
+        *group, name = command.words.split()
+        if group and group[0] not in groups:
+            groups[group[0]] = _add_group(subparsers, group[0])
+        _add_command(groups[group[0]] if group else subparsers, name, command)
+    return parser
+
+
+def _add_group(subparsers, name):
+    group = subparsers.add_parser(name, help=GROUPS[name], description=f"Commands about {GROUPS[name]}.")
+    return group.add_subparsers(metavar="COMMAND", required=True)
+
+
+def _add_command(subparsers, name, command):
+    parser = subparsers.add_parser(name, help=command.help, description=describe(command), epilog=_examples(command),
+                                   formatter_class=argparse.RawDescriptionHelpFormatter)
+    for one in command.arguments + rehearse_option(command):
+        parser.add_argument(*one.names, **one.settings)
+    parser.set_defaults(command=command)
+
+
+def rehearse_option(command):
+    """The option of the commands that change something."""
+    from .command import Argument  # pylint: disable=import-outside-toplevel
+    return (Argument(*_REHEARSE),) if command.changes else ()
+
+
+def describe(command):
+    """The sentences at the top of the help."""
+    first = command.help[0].upper() + command.help[1:] + "."
+    return f"{first} {command.description}".rstrip()
+
+
+def _examples(command):
+    lines = [f"  {line}\n      {text}" for text, line in command.examples]
+    return "examples:\n" + "\n".join(lines) if lines else ""

@@ -1,0 +1,431 @@
+#!/usr/bin/env python3
+"""cli_test: the command line against a vornd on a trial root, and what is made from the commands."""
+
+import contextlib
+import csv
+import io
+import json
+import os
+import pathlib
+import pty
+import shlex
+import stat
+import subprocess
+import sys
+import tempfile
+import threading
+import unittest
+
+import yaml
+
+PROJECT = pathlib.Path(__file__).resolve().parents[2]
+sys.path[:0] = [str(PROJECT / "scripts"), str(PROJECT / "cli")]
+from trial_server import TrialServer  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli import parser  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli.command import Command  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli.commands import COMMANDS, state  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli.failure import Exit  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli.manual import page  # noqa: E402 pylint: disable=wrong-import-position
+from vorn_cli.output import Output  # noqa: E402 pylint: disable=wrong-import-position
+
+VORN = PROJECT / "cli/vorn"
+NFS = "VORN.Core.FileServ.NFS"
+
+
+class BoxTest(unittest.TestCase):
+    """A fresh trial root for each test."""
+
+    def setUp(self):
+        self.server = TrialServer()
+        self.server.__enter__()
+        self.addCleanup(self.server.__exit__)
+        home = tempfile.TemporaryDirectory()
+        self.addCleanup(home.cleanup)
+        self.environment = {**os.environ, "VORN_SOCKET": str(self.server.socket), "XDG_CONFIG_HOME": home.name}
+
+    def run_vorn(self, line, stdin="", **environment):
+        """Runs a command line, given as a shell would get it."""
+        return subprocess.run([VORN, *shlex.split(line)], input=stdin, capture_output=True, text=True, timeout=300,
+                              env={**self.environment, **environment}, check=False)
+
+    def vorn(self, line, stdin="", **environment):
+        """Runs a command that succeeds, and returns what it prints."""
+        done = self.run_vorn(line, stdin, **environment)
+        self.assertEqual((done.returncode, done.stderr), (0, ""), line)
+        return done.stdout
+
+    def refuses(self, line, status, *texts, stdin="", **environment):
+        """Runs a command that ends with this status and prints these texts to standard error."""
+        done = self.run_vorn(line, stdin, **environment)
+        self.assertEqual(done.returncode, status, f"{line}: {done.stderr}")
+        for text in texts:
+            self.assertIn(text, done.stderr)
+        return done
+
+    def json(self, line):
+        """What a command prints for programs."""
+        return json.loads(self.vorn(f"--json {line}"))
+
+
+class ServiceTest(BoxTest):
+    """vorn nfs, vorn advanced."""
+
+    def test_changes_only_what_is_given(self):
+        before = self.json("nfs show")
+        self.vorn("nfs set --service on --domain new.example")
+        self.assertEqual(self.json("nfs show"), {**before, "enable_nfs": True, "nfs_v4_domain": "new.example"})
+        self.vorn("advanced set --fixed-ports on --statd-port 4050 --lockd-port 4051")
+        self.assertEqual(self.json("nfs show")["enable_nfs"], True)
+        self.vorn("advanced set --lockd-port 4052")
+        advanced = self.json("advanced show")
+        self.assertEqual((advanced["custom_port_enable"], advanced["statd_port"], advanced["nlm_port"]), (1, 4050, 4052))
+
+    def test_refuses_nothing_and_nonsense(self):
+        self.refuses("nfs set", Exit.USAGE, "give at least one option")
+        self.refuses("nfs set --nfs4 maybe", Exit.USAGE, "maybe", "vorn nfs set --help")
+        self.refuses("nfs set --read-size many", Exit.USAGE, "many")
+        self.refuses("nfs frobnicate", Exit.USAGE, "frobnicate")
+
+    def test_shows_the_reasons_of_the_box(self):
+        self.refuses("advanced set --fixed-ports on --statd-port 4050 --lockd-port 4050", Exit.FAILED, "(code 2302,",
+                  "statd_port and nlm_port are both 4050")
+
+    def test_prints_words_for_people(self):
+        shown = self.vorn("nfs show")
+        self.assertRegex(shown, r"(?m)^NFS service: +disabled$")
+        self.assertRegex(shown, r"(?m)^Read size: +chosen by the system$")
+
+
+class ExportsTest(BoxTest):
+    """vorn exports, vorn share."""
+
+    def rules(self, share):
+        return self.json(f"exports show {share}")
+
+    def test_adds_replaces_and_removes_rules(self):
+        self.vorn("exports add data 10.0.0.0/24 --access rw --squash admin --security sys,krb5p --crossmnt")
+        self.vorn("exports add data @staff")
+        self.assertEqual([rule["client"] for rule in self.rules("data")], ["10.0.0.0/24", "@staff"])
+        first = self.rules("data")[0]
+        self.assertEqual((first["privilege"], first["root_squash"], first["crossmnt"], first["async"]),
+                         ("rw", "admin", True, False))
+        self.assertEqual([name for name, on in first["security_flavor"].items() if on], ["kerberos_privacy", "sys"])
+        self.vorn("exports add data 10.0.0.0/24")
+        self.assertEqual([(rule["client"], rule["privilege"]) for rule in self.rules("data")],
+                         [("10.0.0.0/24", "ro"), ("@staff", "ro")])
+        self.vorn("exports remove data @staff")
+        self.vorn("exports remove data --all")
+        self.assertEqual(self.rules("data"), [])
+
+    def test_copies_rules_from_one_folder_to_another(self):
+        rules = self.vorn("--json exports show media")
+        self.vorn("exports set data --file -", stdin=rules)
+        self.assertEqual(self.rules("data"), json.loads(rules))
+        self.vorn("exports set data --file -", stdin="- client: 10.0.0.1\n")
+        self.assertEqual(self.rules("data")[0]["privilege"], "ro")
+
+    def test_refuses_what_is_no_list_of_rules(self):
+        for text in ("", "a: b", "- 1", "- {privilege: rw}", "["):
+            self.refuses("exports set data --file -", Exit.USAGE, stdin=text)
+        self.refuses("exports set data --file /none", Exit.USAGE, "/none")
+        self.refuses("exports add data 10.0.0.1 --security none", Exit.USAGE, "\"none\" is no security flavour")
+        self.refuses("exports add data 10.0.0.256", Exit.FAILED, "not a whole address")
+        self.refuses("exports remove data", Exit.USAGE, "--all")
+        self.refuses("exports remove data nobody", Exit.FAILED, "no rule for nobody")
+        self.refuses("exports show none", Exit.FAILED, "(code 2370,")
+        self.assertEqual(self.rules("data"), [])
+
+    def test_makes_a_folder_a_shared_folder_and_back(self):
+        self.vorn("share add photos /volume1/photos")
+        self.assertIn({"name": "photos", "path": "/volume1/photos", "rules": 0}, self.json("share list --filter PHOTO"))
+        self.vorn("exports add photos 10.0.0.1")
+        self.assertRegex(self.vorn("exports list"), r"(?m)^photos +1 +10\.0\.0\.1$")
+        self.refuses("share remove photos", Exit.FAILED, "(code 2373,")
+        self.vorn("exports remove photos --all")
+        self.vorn("share remove photos")
+        self.refuses("share remove photos", Exit.FAILED, "(code 2370,")
+        self.refuses("share add media2 /volume1/media", Exit.FAILED, "(code 2372,")
+        self.refuses("share add new /none", Exit.FAILED, "(code 2374,")
+        self.assertTrue((self.server.root / "volume1/photos").is_dir())
+
+    def test_never_saves_a_rule_that_it_does_not_wholly_know(self):
+        with open(self.server.root / "etc/exports", "a", encoding="ascii") as file:
+            file.write("/volume1/data 10.0.0.9(rw,anonuid=4711,anongid=4711)\n")
+        rule = self.rules("data")[0]
+        if "root_squash" not in rule:
+            self.refuses("exports add data 10.0.0.1", Exit.FAILED, "10.0.0.9", "root_squash")
+        self.assertIn("anonuid=4711", (self.server.root / "etc/exports").read_text("ascii"))
+
+
+class IDMapTest(BoxTest):
+    """vorn idmap."""
+
+    def test_adds_changes_and_removes_mappings(self):
+        self.vorn("idmap add alice@EXAMPLE alice")
+        self.vorn("idmap add root@EXAMPLE root")
+        self.vorn("idmap change alice@EXAMPLE --user root")
+        self.vorn("idmap change alice@EXAMPLE --new-principal a@EXAMPLE")
+        self.assertEqual({row["id"]: row["local_name"] for row in self.json("idmap list")},
+                         {"a@EXAMPLE": "root", "root@EXAMPLE": "root"})
+        self.vorn("idmap remove a@EXAMPLE root@EXAMPLE")
+        self.assertEqual(self.json("idmap list"), [])
+
+    def test_says_what_is_wrong(self):
+        self.refuses("idmap add alice@EXAMPLE nobody-at-all", Exit.FAILED, "(code 2352,")
+        self.refuses("idmap change a@E --user root", Exit.FAILED, "no mapping of a@E")
+        self.refuses("idmap remove a@E", Exit.FAILED, "no mapping of a@E")
+        self.vorn("idmap add alice@EXAMPLE alice")
+        self.refuses("idmap change alice@EXAMPLE", Exit.USAGE, "--user")
+        self.refuses("idmap add alice@EXAMPLE alice", Exit.FAILED, "(code 2351,", "alice@EXAMPLE")
+
+    def test_exports_what_it_imports(self):
+        text = "kerberos_principal,local_name\r\n\"a,b@EXAMPLE\",alice\r\nroot@EXAMPLE,root\r\n"
+        self.vorn("idmap import -", stdin=text)
+        self.assertEqual(list(csv.reader(io.StringIO(self.vorn("idmap export")))), list(csv.reader(io.StringIO(text))))
+        self.refuses("idmap import -", Exit.USAGE, "mapping 2", "3 columns", stdin="a@E,alice\nb@E,alice,x\n")
+
+    def test_pages_and_suggests(self):
+        self.assertIn("root@", self.vorn("idmap suggest"))
+        self.assertIn("1 of", self.vorn("idmap suggest --limit 1"))
+
+
+class StateTest(BoxTest):
+    """vorn dump, vorn apply."""
+
+    def test_applying_a_dump_changes_nothing(self):
+        dump = self.vorn("dump")
+        self.assertEqual(self.vorn("apply - --check", stdin=dump), "The box is in the wanted state.\n")
+        self.assertEqual(self.vorn("apply - --yes", stdin=dump), "The box is in the wanted state.\n")
+
+    def test_makes_the_box_what_the_file_says(self):
+        self.vorn("idmap add old@EXAMPLE alice")
+        self.vorn("idmap add moved@EXAMPLE alice")
+        wanted = yaml.safe_load(self.vorn("dump"))
+        wanted["nfs"].update(enable_nfs=True, nfs_v4_domain="new.example")
+        wanted["ports"] = {"custom_port_enable": True, "statd_port": 4050, "nlm_port": 4051}
+        del wanted["shares"]["media"]
+        wanted["shares"]["data"]["rules"] = [{"client": "10.0.0.1"}]
+        wanted["shares"]["photos"] = {"path": "/volume1/photos", "rules": [{"client": "*", "privilege": "rw"}]}
+        wanted["idmap"] = {"moved@EXAMPLE": "root", "new@EXAMPLE": "alice"}
+        text = yaml.safe_dump(wanted)
+        self.refuses("apply - --check", Exit.DIFFERS, "differs", stdin=text)
+        self.assertNotIn("photos", self.vorn("share list"))
+        self.vorn("apply - --yes", stdin=text)
+        self.assertEqual(self.vorn("apply - --check", stdin=text), "The box is in the wanted state.\n")
+        self.assertEqual({share["name"]: share["rules"] for share in self.json("share list")},
+                         {"backup": 1, "data": 1, "photos": 1})
+        self.assertEqual(self.json("nfs show")["nfs_v4_domain"], "new.example")
+
+    def test_leaves_sections_alone_that_the_file_does_not_have(self):
+        before = self.vorn("dump")
+        self.vorn("apply - --yes", stdin="nfs: {enable_nfs: true}\n")
+        after = yaml.safe_load(self.vorn("dump"))
+        self.assertEqual(after, {**yaml.safe_load(before), "nfs": {**yaml.safe_load(before)["nfs"], "enable_nfs": True}})
+
+    def test_refuses_files_that_it_does_not_understand(self):
+        for text in ("", "[]", "nix: 1", "nfs: [1]", "shares: {a: 1}", "shares: {a: {path: /a, rules: 1}}",
+                     "shares: {a: {path: /a, rules: [1]}}", "shares: {a: {path: /a, x: 1}}", "a: [", "\x01"):
+            self.refuses("apply - --yes", Exit.USAGE, stdin=text)
+        self.refuses("apply /none --yes", Exit.USAGE, "/none")
+
+    def test_asks_only_people(self):
+        self.refuses("apply -", Exit.USAGE, "--yes", stdin="nfs: {enable_nfs: true}\n")
+        self.assertFalse(self.json("nfs show")["enable_nfs"])
+
+    def test_names_the_step_that_failed(self):
+        wanted = "idmap: {a@EXAMPLE: nobody-at-all}\nnfs: {enable_nfs: true}\n"
+        self.refuses("apply - --yes", Exit.FAILED, "(code 2352,", "step 1 of 2", stdin=wanted)
+
+    def test_changes_only_what_it_has_read(self):
+        present = state.State(nfs={"enable_nfs": False}, ports={}, shares={"a": {"path": "/a", "rules": []}}, idmap={})
+        wanted = state.State(nfs={"enable_nfs": True}, shares={"a": {"path": "/a", "rules": [{"client": "*"}]}})
+        revisions = state.Revisions(nfs="\"1\"", rules={"a": "\"2\""})
+        self.assertEqual([step.revision for step in state.plan(present, wanted, revisions)], ["\"2\"", "\"1\""])
+        self.refuses(f"call {NFS} set '{{\"enable_nfs\": true}}' --revision '\"stale\"'", Exit.CHANGED_MEANWHILE,
+                  "(code 412,")
+        self.assertFalse(self.json("nfs show")["enable_nfs"])
+
+
+class KeytabTest(BoxTest):
+    """vorn keytab."""
+
+    def test_refuses_what_is_no_keytab(self):
+        self.refuses("keytab import /none", Exit.USAGE, "/none")
+        self.refuses(f"keytab import {__file__}", Exit.FAILED, "(code 2331,")
+
+    def test_imports_a_keytab(self):
+        self.server.keytab()
+        path = self.server.folder / "nfs.keytab"
+        self.vorn(f"keytab import {path}")
+        self.assertRegex(self.vorn("keytab show"), r"(?m)^1 +nfs/box\.example@STORAGE\.EXAMPLE +aes256-cts-hmac-sha1-96$")
+
+
+class AccessTest(BoxTest):
+    """vorn token, session, login, whoami."""
+
+    def url(self):
+        return f"http://{self.server.address()}"
+
+    def test_makes_lists_and_revokes_tokens(self):
+        token = self.vorn("token create backup --role administrator --share data --days 3").strip()
+        self.assertRegex(token, "^vorn_")
+        self.assertRegex(self.vorn("token list"), r"backup +administrator +all +data")
+        self.assertNotIn(token, self.vorn("--json token list"))
+        self.vorn("token revoke backup")
+        self.refuses("token revoke backup", Exit.FAILED, "no token backup")
+
+    def test_uses_the_token_that_login_keeps(self):
+        token = self.vorn("token create admin --role administrator")
+        url = self.url()
+        self.refuses(f"--url {url} nfs show", Exit.NOT_PERMITTED, "(code 401,")
+        self.assertIn("administrator", self.vorn(f"login {url}", stdin=token))
+        kept = pathlib.Path(self.environment["XDG_CONFIG_HOME"]) / "vorn/credentials.json"
+        self.assertEqual(stat.S_IMODE(kept.stat().st_mode), 0o600)
+        self.assertIn("token admin", self.vorn(f"--url {url} whoami"))
+        self.assertIn("token admin", self.vorn("whoami", VORN_URL=url))
+        kept.chmod(0o644)
+        self.refuses(f"--url {url} whoami", Exit.NOT_PERMITTED, "can be read by others")
+        kept.chmod(0o600)
+        self.vorn(f"logout {url}")
+        self.refuses(f"logout {url}", Exit.FAILED, "No token is kept")
+        self.refuses(f"--url {url} nfs show", Exit.NOT_PERMITTED)
+
+    def test_keeps_no_token_that_the_box_refuses(self):
+        self.refuses(f"login {self.url()}", Exit.NOT_PERMITTED, stdin="vorn_wrong\n")
+        self.refuses(f"logout {self.url()}", Exit.FAILED)
+
+    def test_a_reader_may_not_change(self):
+        token = self.vorn("token create reader --role reader").strip()
+        self.vorn(f"--url {self.url()} nfs show", VORN_TOKEN=token)
+        self.refuses(f"--url {self.url()} nfs set --service on", Exit.NOT_PERMITTED, "(code 403,", VORN_TOKEN=token)
+
+    def test_lists_sessions(self):
+        self.assertEqual(self.json("session list"), [])
+        self.refuses("session end none", Exit.FAILED, "(code 404,")
+
+    def test_says_why_a_box_is_not_reached(self):
+        self.refuses("--socket /none nfs show", Exit.NO_CONNECTION, "/none cannot be reached", "Is vornd running?")
+        self.refuses("--url http://127.0.0.1:1 nfs show", Exit.NO_CONNECTION, "refused")
+        for url in ("box.example", "ftp://box", "http://", "http://a/b", "http://u:p@a", "http://a:0", "http://a:x"):
+            self.refuses(f"--url {url} nfs show", Exit.USAGE, "is no URL of a box")
+        self.refuses("--url http://a --socket /b nfs show", Exit.USAGE, "two boxes")
+
+
+class CallTest(BoxTest):
+    """vorn call, vorn methods."""
+
+    def test_calls_any_method(self):
+        self.assertEqual(json.loads(self.vorn(f"call {NFS} get")), self.json("nfs show"))
+        self.assertEqual(json.loads(self.vorn(f"call {NFS} v2/get")), self.json("nfs show"))
+        self.assertEqual(json.loads(self.vorn(f"call {NFS}.SharePrivilege load -", stdin="{\"share_name\": \"data\"}")),
+                         {"rule": []})
+
+    def test_refuses_parameters_that_are_no_object(self):
+        self.refuses(f"call {NFS} get '['", Exit.USAGE, "no JSON")
+        self.refuses(f"call {NFS} get 1", Exit.USAGE, "one JSON object")
+        self.refuses(f"call {NFS} none", Exit.FAILED, "(code 404,")
+
+    def test_lists_the_methods(self):
+        listed = {row["method"]: row["reads"] for row in self.json("methods")}
+        self.assertEqual(listed[f"{NFS}/v1/get"], True)
+        self.assertEqual(listed[f"{NFS}/v1/set"], False)
+
+
+class TerminalTest(BoxTest):
+    """What differs on a terminal."""
+
+    def on_terminal(self, line, answer="", **environment):
+        """What a command prints to a terminal, on which a person types `answer`."""
+        pid, terminal = pty.fork()
+        if pid == 0:
+            os.execve(VORN, [str(VORN), *shlex.split(line)], {**self.environment, "TERM": "xterm", **environment})
+        if answer:
+            os.write(terminal, answer.encode())
+        printed = b""
+        with contextlib.suppress(OSError):  # EIO: the end of a terminal
+            while data := os.read(terminal, 65536):
+                printed += data
+        return printed.decode(), os.waitstatus_to_exitcode(os.waitpid(pid, 0)[1])
+
+    def test_colours_are_for_terminals(self):
+        self.assertIn("\x1b[1m", self.on_terminal("share list")[0])
+        self.assertNotIn("\x1b", self.on_terminal("share list", NO_COLOR="1")[0])
+        self.assertNotIn("\x1b", self.on_terminal("share list", TERM="dumb")[0])
+        self.assertNotIn("\x1b", self.vorn("share list"))
+
+    def test_apply_asks(self):
+        path = self.server.folder / "wanted.yaml"
+        path.write_text("nfs: {enable_nfs: true}\n", "ascii")
+        self.assertEqual(self.on_terminal(f"apply {path}", "n\n")[1], Exit.FAILED)
+        self.assertFalse(self.json("nfs show")["enable_nfs"])
+        self.assertEqual(self.on_terminal(f"apply {path}", "y\n")[1], Exit.SUCCESS)
+        self.assertTrue(self.json("nfs show")["enable_nfs"])
+
+    def test_a_reader_that_leaves_is_no_error(self):
+        done = subprocess.run(f"{shlex.quote(str(VORN))} methods | true", shell=True, env=self.environment,
+                              capture_output=True, text=True, check=False)
+        self.assertEqual(done.stderr, "")
+
+
+class OutputTest(unittest.TestCase):
+    """Tables and texts without a box."""
+
+    def test_texts_cannot_control_the_terminal(self):
+        stdout = io.StringIO()
+        Output(stdout=stdout).table([{"a": "x\x1b[2Jy"}], {"A": lambda row: row["a"]})
+        self.assertNotIn("\x1b", stdout.getvalue())
+
+    def test_columns_have_the_width_that_a_terminal_shows(self):
+        stdout = io.StringIO()
+        Output(stdout=stdout).table([{"a": "\u65e5\u672c", "b": 1}, {"a": "e\u0301", "b": 2}, {"a": "long", "b": 3}],
+                                    {"A": lambda row: row["a"], "B": lambda row: row["b"]})
+        self.assertEqual(stdout.getvalue(), "A     B\n\u65e5\u672c  1\ne\u0301     2\nlong  3\n")
+
+    def test_progress_is_shown_after_a_second_only(self):
+        class Terminal(io.StringIO):  # pylint: disable=missing-class-docstring
+            def isatty(self):
+                return True
+        stderr = Terminal()
+        with Output(stderr=stderr).progress("waiting"):
+            pass
+        self.assertEqual(stderr.getvalue(), "")
+        shown = threading.Event()
+        stderr.flush = shown.set
+        with Output(stderr=stderr).progress("waiting"):
+            self.assertTrue(shown.wait(60))
+        self.assertIn("waiting ... 1 s", stderr.getvalue())
+
+
+class DocumentsTest(unittest.TestCase):
+    """What is made from the commands."""
+
+    def test_each_command_has_an_example_that_the_parser_accepts(self):
+        for command in COMMANDS:
+            self.assertIsInstance(command, Command)
+            self.assertTrue(command.examples, command.words)
+            for _, line in command.examples:
+                words = [shlex.split(part) for part in line.split(" | ")]
+                for one in words:
+                    one = one[:one.index(">")] if ">" in one else one
+                    self.assertEqual(one[0], "vorn")
+                    parser.build().parse_args(one[1:])
+
+    def test_the_manual_page_is_well_formed(self):
+        with tempfile.NamedTemporaryFile("w", suffix=".1") as file:
+            file.write(page())
+            file.flush()
+            done = subprocess.run(["groff", "-man", "-ww", "-z", file.name], capture_output=True, text=True, check=False)
+        self.assertEqual(done.stderr, "")
+        for command in COMMANDS:
+            self.assertIn(f"\\fBvorn {command.words}\\fR", page())
+
+    def test_each_shell_accepts_its_completions(self):
+        for shell, check in (("bash", ["bash", "-n"]), ("zsh", ["zsh", "-n"]), ("fish", ["fish", "--no-execute"])):
+            script = subprocess.run([VORN, "completion", shell], capture_output=True, text=True, check=True).stdout
+            self.assertIn("exports", script)
+            with contextlib.suppress(FileNotFoundError):  # a shell that is not installed
+                subprocess.run(check, input=script, text=True, check=True)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -4,8 +4,10 @@
 
 #include <atomic>
 #include <chrono>
+#include <deque>
 #include <future>
 #include <memory>
+#include <mutex>
 #include <new>
 #include <stdexcept>
 #include <thread>
@@ -32,12 +34,12 @@ void AnswerThenThrow(VORN::APIRequest* /*request*/, VORN::APIResponse* response)
 // A body that reports its destruction.
 class TracedBody : public Body {
  public:
-  explicit TracedBody(bool* gone) : Body(1, JsonBody::TooLarge), gone_(gone) {}
+  explicit TracedBody(std::atomic<bool>* gone) : Body(1, JsonBody::TooLarge), gone_(gone) {}
   ~TracedBody() override { *gone_ = true; }
   std::variant<Json::Value, Response> TakeParameters() override { return Json::Value(Json::objectValue); }
 
  private:
-  bool* gone_;
+  std::atomic<bool>* gone_;
 };
 
 // A body with these parameters.
@@ -94,18 +96,23 @@ class CallTest : public testing::Test {
   const Descriptor descriptor_;
   const Route echo_{{"Api", 1, "echo", Echo}, &descriptor_, {}};
   const Route hold_{{"Api", 1, "hold", Hold}, &descriptor_, {}};
-  bool gone_ = false;
+  std::deque<Route> routes_;  // a worker uses its route until it has counted the answer
+  std::atomic<bool> gone_ = false;
   CallMetrics metrics_;
+  std::mutex mutex_;
   std::vector<AuditRecord> audited_;
-  const AuditSink audit_ = [this](const AuditRecord& record) { audited_.push_back(record); };
+  const AuditSink audit_ = [this](const AuditRecord& record) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    audited_.push_back(record);
+  };
   WorkerPool pool_{OneOfALane()};
 };
 
 TEST_F(CallTest, ReleasesItsBodyBeforeItAnswers) {
-  std::promise<bool> gone_at_answer;
-  NewCall(echo_)->Run([&](const Response& /*response*/) { gone_at_answer.set_value(gone_); });
+  const auto gone_at_answer = std::make_shared<std::promise<bool>>();
+  NewCall(echo_)->Run([this, gone_at_answer](const Response& /*response*/) { gone_at_answer->set_value(gone_); });
   pool_.Wake();
-  EXPECT_TRUE(gone_at_answer.get_future().get());
+  EXPECT_TRUE(gone_at_answer->get_future().get());
 }
 
 TEST_F(CallTest, IsRefusedWhenTooManyWait) {
@@ -154,15 +161,15 @@ TEST_F(CallTest, IsAnsweredWhenThereIsNoMemoryForItsParameters) {
 }
 
 TEST_F(CallTest, ThatMayChangeSomethingIsRecordedBeforeItsAnswer) {
-  std::promise<std::size_t> records_at_answer;
+  const auto records_at_answer = std::make_shared<std::promise<std::size_t>>();
   Caller caller;
   caller.name = "alice";
   Call::Request request{echo_, std::make_shared<Caller>(caller), "unix", {}};
   std::make_shared<Call>(std::move(request), std::make_unique<TracedBody>(&gone_),
                          Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)})
-      ->Run([&](const Response& /*response*/) { records_at_answer.set_value(audited_.size()); });
+      ->Run([this, records_at_answer](const Response& /*response*/) { records_at_answer->set_value(audited_.size()); });
   pool_.Wake();
-  ASSERT_EQ(records_at_answer.get_future().get(), 1U);
+  ASSERT_EQ(records_at_answer->get_future().get(), 1U);
   EXPECT_EQ(audited_[0].caller, "alice");
   EXPECT_EQ(audited_[0].origin, "unix");
   EXPECT_EQ(audited_[0].method, "Api/v1/echo");
@@ -172,17 +179,17 @@ TEST_F(CallTest, ThatMayChangeSomethingIsRecordedBeforeItsAnswer) {
 }
 
 TEST_F(CallTest, ThatFailsIsRecordedWithItsCode) {
-  const Route route{{"Api", 1, "method", Throw}, &descriptor_, {}};
-  Run(NewCall(route)).get();
+  routes_.push_back({{"Api", 1, "method", Throw}, &descriptor_, {}});
+  Run(NewCall(routes_.back())).get();
   ASSERT_EQ(audited_.size(), 1U);
   EXPECT_EQ(audited_[0].status, 500);
   EXPECT_EQ(audited_[0].code, 2302);
 }
 
 TEST_F(CallTest, ThatOnlyReadsIsNotRecorded) {
-  Route route = echo_;
-  route.method.reads_only = true;
-  Run(NewCall(route)).get();
+  routes_.push_back(echo_);
+  routes_.back().method.reads_only = true;
+  Run(NewCall(routes_.back())).get();
   EXPECT_TRUE(audited_.empty());
 }
 
@@ -192,7 +199,7 @@ TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
       "application/json": {"schema": {"properties": {"password": {"writeOnly": true}}}}}}}}}})",
                                             &error);
   ASSERT_TRUE(descriptor) << error;
-  const Route route{{"Api", 1, "echo", Echo}, &*descriptor, {}};
+  const Route& route = routes_.emplace_back(Route{{"Api", 1, "echo", Echo}, &*descriptor, {}});
   auto body = std::make_unique<FixedBody>();
   body->parameters["password"] = "secret";
   body->parameters["name"] = "alice";
@@ -206,8 +213,8 @@ TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
 
 TEST_F(CallTest, IsAnsweredWhenItsMethodDoesNotAnswer) {
   for (const auto handler : {Silent, Throw, ThrowNumber, AnswerThenThrow}) {
-    const Route route{{"Api", 1, "method", handler}, &descriptor_, {}};
-    const Response response = Run(NewCall(route)).get();
+    routes_.push_back({{"Api", 1, "method", handler}, &descriptor_, {}});
+    const Response response = Run(NewCall(routes_.back())).get();
     EXPECT_EQ(response.status, 500);
     EXPECT_NE(response.body.find("\"code\":2302"), std::string::npos) << response.body;
   }

@@ -77,7 +77,6 @@ class WebApiTest : public testing::Test {
                                  {"Nfs", 1, "hold", Hold}},
                                 ParseDescriptor()}};
   Routes routes_{modules_};
-  Workers workers_{FewOfALane()};
   Budget memory_{std::size_t{1} << 30, std::size_t{1} << 30};
   Sandbox sandbox_;
   std::string error_;
@@ -90,6 +89,7 @@ class WebApiTest : public testing::Test {
   Sessions sessions_{Sessions::Limits{}};
   PasswordChecker passwords_{{"/bin/false"}, PasswordChecker::Limits{}};
   const Authenticator authenticator_{tokens_, sessions_, {}};
+  Workers workers_{FewOfALane()};  // end before what their calls use
   WebApi api_{{routes_,
                *uploads_,
                workers_,
@@ -143,9 +143,10 @@ TEST_F(WebApiTest, IsReadyWhenAWorkerIsFree) {
   head.method = "GET";
   const auto ask = [&] {
     auto begun = api_.Begin(head);
-    std::promise<int> status;
-    std::get<std::shared_ptr<Exchange>>(begun)->Run([&](const Response& answer) { status.set_value(answer.status); });
-    return status.get_future().get();
+    const auto status = std::make_shared<std::promise<int>>();  // set_value() may return after the waiter has gone on
+    std::get<std::shared_ptr<Exchange>>(begun)->Run(
+        [status](const Response& answer) { status->set_value(answer.status); });
+    return status->get_future().get();
   };
   EXPECT_EQ(ask(), 200);
   workers_.changing.Close();

@@ -25,9 +25,11 @@ class Blocker : public Job {
 };
 
 int StatusOf(WorkerPool& pool, std::chrono::milliseconds time, const std::function<Response()>& make = MakePage) {
-  std::promise<int> status;
-  std::make_shared<WorkerPage>(pool, time, make)->Run([&](const Response& answer) { status.set_value(answer.status); });
-  return status.get_future().get();
+  const auto status = std::make_shared<std::promise<int>>();  // set_value() may return after the waiter has gone on
+  std::make_shared<WorkerPage>(pool, time, make)->Run([status](const Response& answer) {
+    status->set_value(answer.status);
+  });
+  return status->get_future().get();
 }
 
 TEST(WorkerPage, IsMadeIfAWorkerIsFreeInTime) {

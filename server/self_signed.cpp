@@ -110,7 +110,7 @@ std::string TextOf(const sockaddr* address) {
 }  // namespace
 
 std::optional<std::string> MakeSelfSigned(const std::vector<std::string>& names, std::string* error) {
-  const Key key(EVP_EC_gen("P-256"));
+  const Key key(EVP_PKEY_Q_keygen(nullptr, nullptr, "EC", "P-256"));
   const Certificate certificate(X509_new());
   const Bio text(BIO_new(BIO_s_mem()));
   if (key && certificate && text && Fill(certificate.get(), key.get(), names) &&

@@ -27,7 +27,8 @@ vorn::Status CheckLength(const std::string& path) {
 
 vorn::Status AddShare(const char* name, const char* path) {
   if (name == nullptr || path == nullptr) return vorn::Status::Failure(EINVAL, "no name, or no path");
-  if (const vorn::Status status = CheckLength(path); !status.ok()) return status;
+  vorn::Status status = CheckLength(path);
+  if (!status.ok()) return status;
   return vorn::AddShare(vorn::CurrentBox(), name, path);
 }
 

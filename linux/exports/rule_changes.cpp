@@ -140,7 +140,8 @@ void CompareDirectory(const std::string& directory, const Rules& before, const R
 }
 
 std::string_view TextOf(const ExportsDocument& document, const ExportLine& line) {
-  return std::string_view(document.text()).substr(line.span.begin, line.span.end - line.span.begin);
+  const std::string_view text = document.text();
+  return text.substr(line.span.begin, line.span.end - line.span.begin);
 }
 
 // The directories of the lines that only one of the versions has.

@@ -82,9 +82,9 @@ Result<std::vector<SharedFolder>> ListShares(Box& box) {
   const Result<SharedIniFile> file = IniFile::Open(box, kFile);
   if (!file.ok()) return file.status();
   std::vector<SharedFolder> shares;
-  for (IniEntry& share : (*file)->document().Entries(kSection)) {
+  for (const IniEntry& share : (*file)->document().Entries(kSection)) {
     const Result<std::string> path = CanonicalPath(box.root(), **file, share);
-    shares.push_back({std::move(share.key), path.ok() ? *path : std::move(share.value)});
+    shares.push_back({share.key, path.ok() ? *path : share.value});
   }
   return shares;
 }

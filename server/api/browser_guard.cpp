@@ -53,7 +53,7 @@ std::string_view WithoutPort(std::string_view host, std::string_view port) {
 
 }  // namespace
 
-OwnNames::OwnNames(std::vector<std::string> names, std::string machine) : machine_(LowerAscii(machine)) {
+OwnNames::OwnNames(std::vector<std::string> names, const std::string& machine) : machine_(LowerAscii(machine)) {
   Set(std::move(names));
 }
 

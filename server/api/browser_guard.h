@@ -17,7 +17,7 @@ class OwnNames {
  public:
   // Names have no port; an IPv6 address is in brackets. Upper and lower case are the same. `machine` is the name of
   // this machine; empty if it is not known.
-  explicit OwnNames(std::vector<std::string> names = {}, std::string machine = {});
+  explicit OwnNames(std::vector<std::string> names = {}, const std::string& machine = {});
 
   // Replaces the given names.
   void Set(std::vector<std::string> names);

@@ -85,8 +85,9 @@ def show_rehearsal(out, answer):
         out.difference(file["difference"])
     for action in rehearsal.get("actions", []):
         out.text(f"- {action['action']}: {action['effect']}")
-    for line in rehearsal.get("clients", []):
-        out.text(f"- {line if isinstance(line, str) else line.get('effect', line)}")
+    for rule in rehearsal.get("rules", []):
+        effects = ", ".join(change["text"] for change in rule["changes"])
+        out.text(f"- {rule['client']} at {rule['directory']}: {effects}")
 
 
 def switch(text):

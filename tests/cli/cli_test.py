@@ -124,6 +124,16 @@ class ExportsTest(BoxTest):
         self.vorn("exports set data --file -", stdin="- client: 10.0.0.1\n")
         self.assertEqual(self.rules("data")[0]["privilege"], "ro")
 
+    def test_rehearses_a_change(self):
+        before = (self.server.root / "etc/exports").read_bytes()
+        rehearsed = self.vorn("exports remove media 10.20.0.0/16 --rehearse")
+        self.assertIn("--- /etc/exports\n", rehearsed)
+        self.assertIn("- reload: ", rehearsed)
+        self.assertIn("- 10.20.0.0/16 at /volume1/media: loses its rule\n", rehearsed)
+        self.assertEqual((self.server.root / "etc/exports").read_bytes(), before)
+        self.assertEqual(len(self.rules("media")), 2)
+        self.refuses("exports add data 10.0.0.256 --rehearse", Exit.FAILED, "not a whole address")
+
     def test_refuses_what_is_no_list_of_rules(self):
         for text in ("", "a: b", "- 1", "- {privilege: rw}", "["):
             self.refuses("exports set data --file -", Exit.USAGE, stdin=text)

@@ -39,6 +39,7 @@
 #include "server_methods.h"
 #include "server_metrics.h"
 #include "sessions.h"
+#include "sha256.h"
 #include "termination.h"
 #include "tls.h"
 #include "tls_files.h"
@@ -327,6 +328,7 @@ int Serve(const Options& options, const Settings& settings) {
   if (OpenTls(options, settings, &tls)) listeners = Listen(settings, folders->runtime);
   if (!listeners) return EXIT_FAILURE;
 
+  Sha256("");  // loads the algorithm
   TokenStore tokens(folders->state + "/tokens.json");
   Sessions sessions(SessionLimits(settings));
   PasswordChecker passwords(PasswordHelper(options, settings), PasswordLimits(settings));

@@ -1,7 +1,6 @@
 #include "entity_tag.h"
 
 #include <openssl/evp.h>
-#include <openssl/sha.h>
 
 #include <utility>
 
@@ -9,6 +8,7 @@
 #include "header_value.h"
 #include "json_input.h"
 #include "response_writer.h"
+#include "sha256.h"
 
 namespace vorn::server {
 namespace {
@@ -38,10 +38,8 @@ std::optional<std::string> FromBase64(std::string_view text) {
 }
 
 std::string Digest(std::string_view text) {
-  std::string digest(SHA256_DIGEST_LENGTH, '\0');
-  SHA256(reinterpret_cast<const unsigned char*>(text.data()), text.size(),
-         reinterpret_cast<unsigned char*>(digest.data()));
-  return Base64(digest);
+  const Sha256Digest digest = Sha256(text);
+  return Base64({reinterpret_cast<const char*>(digest.data()), digest.size()});
 }
 
 }  // namespace

@@ -1,7 +1,6 @@
 #include "secret.h"
 
 #include <openssl/crypto.h>
-#include <openssl/sha.h>
 #include <sys/random.h>
 #include <zlib.h>
 
@@ -11,6 +10,8 @@
 #include <cstddef>
 #include <cstdio>
 #include <system_error>
+
+#include "sha256.h"
 
 namespace vorn::server {
 namespace {
@@ -66,11 +67,7 @@ bool IsSecret(std::string_view text, std::string_view prefix) {
   return text.substr(secret.size()) == ChecksumOf(secret);
 }
 
-std::string DigestOf(std::string_view secret) {
-  std::array<unsigned char, SHA256_DIGEST_LENGTH> digest{};
-  SHA256(reinterpret_cast<const unsigned char*>(secret.data()), secret.size(), digest.data());
-  return Hexadecimal(digest);
-}
+std::string DigestOf(std::string_view secret) { return Hexadecimal(Sha256(secret)); }
 
 std::string NewId() { return Hexadecimal(RandomBytes<kIdBytes>()); }
 

@@ -65,8 +65,9 @@ bool SetRules(SSL_CTX* context) {
   SSL_CTX_set_mode(context,
                    SSL_MODE_ENABLE_PARTIAL_WRITE | SSL_MODE_ACCEPT_MOVING_WRITE_BUFFER | SSL_MODE_RELEASE_BUFFERS);
   SSL_CTX_set_alpn_select_cb(context, SelectProtocol, nullptr);
+  std::string groups = kGroups;  // the macro casts the pointer to one to char, and the list is only read
   return SSL_CTX_set_min_proto_version(context, TLS1_2_VERSION) == 1 && SSL_CTX_set_num_tickets(context, 0) == 1 &&
-         SSL_CTX_set_cipher_list(context, kCiphers) == 1 && SSL_CTX_set1_groups_list(context, kGroups) == 1;
+         SSL_CTX_set_cipher_list(context, kCiphers) == 1 && SSL_CTX_set1_groups_list(context, groups.data()) == 1;
 }
 
 std::string FingerprintOf(X509* certificate) {

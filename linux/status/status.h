@@ -22,6 +22,8 @@ enum ErrorCode : int {
   kUnsupported = 0x1008,     // this box cannot do it
   kLockTimeout = 0x1009,     // another process kept a lock for too long
   kOverridden = 0x100a,      // another file decides over the value
+  kNoSuchUser = 0x100b,      // the box has no such user
+  kNoSuchGroup = 0x100c,     // the box has no such group
 };
 
 // The outcome of an operation: success, or a failure with an ErrorCode or an errno(3) value.

@@ -165,6 +165,16 @@ async function shares() {
   expectDone(await client.POST('/api/VORN.Core.Share/v1/delete', { body: { name: 'photos' } }));
 }
 
+async function access() {
+  const question = { share: 'data', client: '192.0.2.1' };
+  const answer = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.Access/v1/explain', { body: question }));
+  const mountable: boolean = answer.mountable;
+  assert.equal(mountable, false);
+  assert.deepEqual(answer.addresses, ['192.0.2.1']);
+  const unknown = await client.POST('/api/VORN.Core.FileServ.NFS.Access/v1/explain', { body: { ...question, share: 'x' } });
+  assert.equal(unknown.error?.error.code, 2370);
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -241,6 +251,7 @@ await kerberos();
 await idMap();
 await sharePrivilege();
 await shares();
+await access();
 await revisions();
 await sessions();
 await tokens();

@@ -19,6 +19,7 @@ ALLOWED = {
     "src": {"src/frame", "include", "platform"},
     "src/frame": {"include", "platform"},
     "share": {"src/frame", "include", "platform"},
+    "insight": {"src/frame", "include", "platform"},
     "linux/system": {"linux/status"},
     "linux/text": {"linux/status"},
     "linux/box": {"linux/status", "linux/system", "linux/text", "platform"},
@@ -29,8 +30,10 @@ ALLOWED = {
     "linux/kerberos": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "platform"},
     "linux/service": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/settings", "platform"},
+    "linux/access": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
+        "linux/idmap", "linux/settings", "linux/service", "platform"},
     "linux/contract": {
-        "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
+        "linux/access", "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
         "linux/idmap", "linux/kerberos", "linux/service", "platform"},
 }
 HEADERS = sorted(set(ALLOWED) | {"include", "platform", "linux/status", "server", "tests/support"})

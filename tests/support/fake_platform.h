@@ -12,6 +12,7 @@
 #include <utility>
 #include <vector>
 
+#include "access.h"
 #include "core.h"
 #include "nfsconf.h"
 #include "recorded_answers.h"
@@ -59,6 +60,7 @@ class FakePlatform {
   int keytab_import_result = 0;
   std::vector<std::string> files;           // that KLIBCFileExist finds, besides those of the system
   std::vector<std::string> port_conflicts;  // "nfs_statd 4000"
+  VORN::AccessAnswer access;                // what every access is explained with
   int done = 3;  // what an operation answers on success where every non-negative number says so
 
   // ---- Recorded events.

@@ -1,0 +1,114 @@
+#include "client_host.h"
+
+#include <fnmatch.h>
+
+#include <algorithm>
+#include <optional>
+#include <utility>
+
+#include "exports_client.h"
+
+namespace vorn {
+namespace {
+
+bool Contains(const std::vector<std::string>& list, const std::string& text) {
+  return std::find(list.begin(), list.end(), text) != list.end();
+}
+
+// Asks for the client's names and keeps them if the canonical one leads back to the address.
+void FindNames(const NameService& service, ClientHost* client) {
+  const std::string& address = client->addresses.front();
+  const std::optional<std::vector<std::string>> names = service.names_of(address);
+  client->is_away = !names.has_value();
+  if (!names || names->empty()) return;
+  std::optional<std::vector<std::string>> addresses = service.resolve(names->front());
+  client->is_away = !addresses.has_value();
+  if (!addresses || !Contains(*addresses, address)) return;
+  client->names = *names;
+  client->compared = std::move(*addresses);
+}
+
+bool IsHost(ClientHost* client, const std::string& host, const NameService& service, HostAddresses* hosts) {
+  const std::string key = ExportClientKey(host);
+  if (!IsExportHostName(key)) return Contains(client->compared, key);
+  auto known = hosts->find(key);
+  if (known == hosts->end()) {
+    if (client->is_away) return false;
+    std::optional<std::vector<std::string>> addresses = service.resolve(key);
+    client->is_away = !addresses.has_value();
+    if (!addresses) return false;
+    known = hosts->emplace(key, std::move(*addresses)).first;
+  }
+  return std::any_of(client->compared.begin(), client->compared.end(),
+                     [&](const std::string& address) { return Contains(known->second, address); });
+}
+
+bool IsInNetwork(const ClientHost& client, const std::string& network) {
+  const std::string key = ExportNetworkKey(network);
+  const std::size_t slash = key.find('/');
+  if (slash == std::string::npos) return false;
+  return std::any_of(client.compared.begin(), client.compared.end(),
+                     [&](const std::string& address) { return ExportNetworkKey(address + key.substr(slash)) == key; });
+}
+
+// Without a name, mountd compares the address itself with a pattern.
+std::vector<std::string> ComparedNames(const ClientHost& client) {
+  return client.names.empty() ? std::vector<std::string>{client.addresses.front()} : client.names;
+}
+
+bool IsInPattern(const ClientHost& client, const std::string& pattern) {
+  const std::vector<std::string> names = ComparedNames(client);
+  return std::any_of(names.begin(), names.end(), [&](const std::string& name) {
+    return fnmatch(pattern.c_str(), name.c_str(), FNM_CASEFOLD) == 0;
+  });
+}
+
+bool IsInNetgroup(const ClientHost& client, const std::string& netgroup, const NameService& service) {
+  std::vector<std::string> hosts = ComparedNames(client);
+  const std::string& name = hosts.front();
+  const bool has_domain = !client.names.empty() && name.find('.') != std::string::npos;
+  const std::string short_name = has_domain ? name.substr(0, name.find('.')) : name;
+  hosts.push_back(client.addresses.front());
+  hosts.push_back(short_name);
+  return std::any_of(hosts.begin(), hosts.end(),
+                     [&](const std::string& host) { return service.is_member(netgroup, host); });
+}
+
+}  // namespace
+
+ClientHost FindClientHost(const std::string& client, const NameService& service, bool needs_names) {
+  ClientHost host;
+  if (const std::optional<std::string> address = HostAddress(client)) {
+    host.addresses = {*address};
+  } else {
+    std::optional<std::vector<std::string>> addresses = service.resolve(client);
+    host.is_away = !addresses.has_value();
+    if (addresses) host.addresses = std::move(*addresses);
+    // IPv4 first: most clients of a box with both families mount over it.
+    std::stable_partition(host.addresses.begin(), host.addresses.end(),
+                          [](const std::string& text) { return text.find(':') == std::string::npos; });
+  }
+  if (host.addresses.empty()) return host;
+  host.compared = {host.addresses.front()};
+  if (needs_names) FindNames(service, &host);
+  return host;
+}
+
+bool MatchesExport(ClientHost* client, const TableExport& one, const NameService& service, HostAddresses* hosts) {
+  if (client->addresses.empty()) return false;
+  switch (one.kind) {
+    case ExportKind::kHost:
+      return IsHost(client, one.client, service, hosts);
+    case ExportKind::kNetwork:
+      return IsInNetwork(*client, one.client);
+    case ExportKind::kPattern:
+      return IsInPattern(*client, one.client);
+    case ExportKind::kNetgroup:
+      return IsInNetgroup(*client, one.client.substr(1), service);
+    case ExportKind::kEverybody:
+      return true;
+  }
+  return false;
+}
+
+}  // namespace vorn

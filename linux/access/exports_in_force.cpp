@@ -1,0 +1,122 @@
+#include "exports_in_force.h"
+
+#include <map>
+#include <utility>
+#include <vector>
+
+#include "box_paths.h"
+#include "export_table.h"
+#include "exports_client.h"
+#include "exports_files.h"
+#include "path_resolver.h"
+
+namespace vorn {
+namespace {
+
+struct Place {
+  std::string file;
+  int line = 0;
+  std::string written;
+};
+
+// Where the clients of directories are written, by directory and key of the client (ExportClientKey).
+using Places = std::map<std::pair<std::string, std::string>, Place>;
+
+void AddPlaces(const ExportsFile& file, const HostAddresses& hosts, PathResolver* resolver, Places* places) {
+  const auto lines = file.document.Lines();
+  for (const ExportLine& line : *lines) {
+    const std::string directory = resolver->Resolve(line.path);
+    const int number = std::stoi(file.document.Place(line.span.path));
+    for (const ExportEntry& entry : line.entries) {
+      const Place place{file.path, number, entry.client};
+      const std::string key = ExportClientKey(entry.client);
+      places->try_emplace({directory, key}, place);
+      const auto host = hosts.find(key);
+      if (host == hosts.end()) continue;
+      for (const std::string& address : host->second) places->try_emplace({directory, address}, place);
+    }
+  }
+}
+
+Places FindPlaces(const std::vector<SharedExportsFile>& files, const HostAddresses& hosts, const ExportPaths& paths) {
+  PathResolver resolver(paths);
+  Places places;
+  for (const SharedExportsFile& file : files) AddPlaces(*file, hosts, &resolver, &places);
+  return places;
+}
+
+Result<ExportList> ReadExports(std::string_view text, const Places& places) {
+  const Result<std::vector<ExportTableLine>> lines = ReadExportTable(text);
+  if (!lines.ok()) return lines.status();
+  ExportList exports;
+  for (const ExportTableLine& line : *lines) {
+    ExportOptionReader options;
+    if (Status status = options.Apply(line.options); !status.ok()) return status;
+    TableExport one;
+    one.directory = line.path;
+    one.client = line.client;
+    one.kind = ExportKindOf(one.client);
+    one.options = options.Options();
+    one.written = one.client;
+    const auto place = places.find({one.directory, ExportClientKey(one.client)});
+    if (place != places.end()) {
+      one.file = place->second.file;
+      one.line = place->second.line;
+      one.written = place->second.written;
+    }
+    exports.push_back(std::move(one));
+  }
+  return exports;
+}
+
+std::set<std::string> HostNames(const std::vector<SharedExportsFile>& files) {
+  std::set<std::string> names;
+  for (const SharedExportsFile& file : files) {
+    const auto lines = file->document.Lines();
+    for (const ExportLine& line : *lines) {
+      for (const ExportEntry& entry : line.entries) {
+        if (IsExportHostName(entry.client)) names.insert(ExportClientKey(entry.client));
+      }
+    }
+  }
+  return names;
+}
+
+// Adds the addresses of the names that `hosts` does not have. Returns the names that have addresses now.
+std::set<std::string> AddHosts(const std::set<std::string>& names, const NameService& service, ExportsInForce* result) {
+  std::set<std::string> known;
+  for (const std::string& name : names) {
+    if (result->hosts.count(name) == 0 && !result->is_name_service_away) {
+      std::optional<std::vector<std::string>> addresses = service.resolve(name);
+      result->is_name_service_away = !addresses.has_value();
+      if (addresses && !addresses->empty()) result->hosts[name] = std::move(*addresses);
+    }
+    if (result->hosts.count(name) != 0) known.insert(name);
+  }
+  return known;
+}
+
+}  // namespace
+
+Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bool is_serving) {
+  const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
+  if (!files.ok()) return files.status();
+  const Result<StoredFile> table = box.Read(kExportTable);
+  if (!table.ok()) return table.status();
+  Result<HostAddresses> hosts = ReadExportHosts(box);
+  if (!hosts.ok()) return hosts.status();
+  ExportsInForce result;
+  result.hosts = std::move(*hosts);
+  const std::set<std::string> known = AddHosts(HostNames(*files), names, &result);
+  const BoxPaths paths(box.root());
+  const Result<ExportTableUpdate> update = PlanExportTable(*files, table->text, paths, result.hosts, known);
+  if (!update.ok()) return update.status();
+  if (is_serving) result.pending = update->changed;
+  const Places places = FindPlaces(*files, result.hosts, paths);
+  Result<ExportList> exports = ReadExports(is_serving ? table->text : update->text, places);
+  if (!exports.ok()) return exports.status();
+  result.exports = std::move(*exports);
+  return result;
+}
+
+}  // namespace vorn

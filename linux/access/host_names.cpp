@@ -1,0 +1,76 @@
+#include "host_names.h"
+
+#include <arpa/inet.h>
+#include <netdb.h>
+#include <netinet/in.h>
+
+#include <array>
+#include <cerrno>
+#include <cstring>
+
+namespace vorn {
+namespace {
+
+struct Address {
+  int family = AF_UNSPEC;
+  socklen_t size = 0;
+  std::array<unsigned char, sizeof(in6_addr)> bytes{};
+};
+
+constexpr std::array<unsigned char, 12> kMappedPrefix = {0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0xff, 0xff};
+
+std::optional<Address> ReadAddress(const std::string& text) {
+  Address address;
+  if (inet_pton(AF_INET, text.c_str(), address.bytes.data()) == 1) {
+    address.family = AF_INET;
+    address.size = sizeof(in_addr);
+    return address;
+  }
+  if (inet_pton(AF_INET6, text.c_str(), address.bytes.data()) != 1) return std::nullopt;
+  address.family = AF_INET6;
+  address.size = sizeof(in6_addr);
+  if (std::memcmp(address.bytes.data(), kMappedPrefix.data(), kMappedPrefix.size()) == 0) {
+    std::memmove(address.bytes.data(), address.bytes.data() + kMappedPrefix.size(), sizeof(in_addr));
+    address.family = AF_INET;
+    address.size = sizeof(in_addr);
+  }
+  return address;
+}
+
+std::optional<std::vector<std::string>> NamesOf(const std::string& text) {
+  const std::optional<Address> address = ReadAddress(text);
+  if (!address) return std::vector<std::string>();
+  std::vector<char> buffer(1024);
+  hostent entry{};
+  hostent* found = nullptr;
+  int error = 0;
+  while (gethostbyaddr_r(address->bytes.data(), address->size, address->family, &entry, buffer.data(), buffer.size(),
+                         &found, &error) == ERANGE) {
+    buffer.resize(buffer.size() * 2);
+  }
+  std::vector<std::string> names;
+  if (found == nullptr) {
+    if (error == TRY_AGAIN || error == NO_RECOVERY) return std::nullopt;
+    return names;
+  }
+  names.emplace_back(found->h_name);
+  for (char** alias = found->h_aliases; *alias != nullptr; ++alias) names.emplace_back(*alias);
+  return names;
+}
+
+bool IsMember(const std::string& netgroup, const std::string& host) {
+  return innetgr(netgroup.c_str(), host.c_str(), nullptr, nullptr) != 0;
+}
+
+}  // namespace
+
+NameService NameService::OfSystem() { return {ResolveHost, NamesOf, IsMember}; }
+
+std::optional<std::string> HostAddress(const std::string& text) {
+  const std::optional<Address> address = ReadAddress(text);
+  if (!address) return std::nullopt;
+  std::array<char, INET6_ADDRSTRLEN> usual{};
+  return std::string(inet_ntop(address->family, address->bytes.data(), usual.data(), usual.size()));
+}
+
+}  // namespace vorn

@@ -1,0 +1,33 @@
+// The names and addresses of hosts, as rpc.mountd(8) asks for them.
+#ifndef VORN_LINUX_ACCESS_HOST_NAMES_H
+#define VORN_LINUX_ACCESS_HOST_NAMES_H
+
+#include <functional>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "export_hosts.h"
+
+namespace vorn {
+
+// The name service. Each function may wait for a name server.
+struct NameService {
+  HostResolver resolve = ResolveHost;
+
+  // Returns the names of an address, the canonical one first; none if it has no name. nullopt: no answer.
+  std::function<std::optional<std::vector<std::string>>(const std::string& address)> names_of;
+
+  // Whether a host, by name or address, belongs to a netgroup (innetgr(3)).
+  std::function<bool(const std::string& netgroup, const std::string& host)> is_member;
+
+  // The name service of this system.
+  static NameService OfSystem();
+};
+
+// Returns the usual text of an address, "10.0.0.1" also for "::ffff:10.0.0.1"; nullopt for every other text.
+std::optional<std::string> HostAddress(const std::string& text);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_ACCESS_HOST_NAMES_H

@@ -9,9 +9,6 @@
 namespace vorn::server {
 namespace {
 
-// A method that asks for all parameters in one object has a second copy of them in memory.
-constexpr std::size_t kCopies = 2;
-
 // A request with at least this charge, for example a tree of 20,000 values, returns its memory to the system
 // immediately.
 constexpr std::size_t kMuchMemory = std::size_t{8} * 1024 * 1024;
@@ -59,7 +56,11 @@ std::variant<Json::Value, Response> JsonBody::Parse() {
   JsonFault fault;
   const std::optional<JsonText> checked = JsonText::Check(text(), &fault);
   if (!checked) return NotJson(fault.too_large ? 413 : 400, fault.text);
-  charge_ = budget_.Take("", checked->cost() * kCopies);
+  const std::size_t cost = checked->cost() * kCopies;
+  charge_ = budget_.Take("", cost);
+  if (!charge_ && !budget_.HasRoomFor("", cost)) {
+    return Refusal(413, "The settings of this server leave no memory for parameters of this size.");
+  }
   if (!charge_) return Busy("The server has no memory left for parameters of this size. Try again soon.");
   std::string error;
   std::optional<Json::Value> parameters = checked->ParseObject(&error);

@@ -14,6 +14,7 @@
 
 #include "budget.h"
 #include "http.h"
+#include "json_input.h"
 
 namespace vorn::server {
 
@@ -67,7 +68,13 @@ class JsonBody : public Body {
   static constexpr std::size_t kMaxBytes = std::size_t{1024} * 1024;
   static Response TooLarge();
 
-  // Charges the memory of the parsed parameters to `budget`, which must outlive this.
+  // A method that asks for all parameters in one object has a second copy of them in memory.
+  static constexpr std::size_t kCopies = 2;
+  // The largest charge of one body.
+  static constexpr std::size_t kMaxCharge = LargestJsonCost(kMaxBytes) * kCopies;
+
+  // Charges the memory of the parsed parameters to `budget`, which must outlive this. Parameters for which it has no
+  // memory at the moment are refused with 503, those for which it never has with 413.
   explicit JsonBody(Budget& budget) : Body(kMaxBytes, TooLarge), budget_(budget) {}
   ~JsonBody() override;
 

@@ -26,12 +26,6 @@ std::size_t Utf8End(std::string_view text) {
   return fault == nullptr ? text.size() : static_cast<std::size_t>(fault - Bytes(text));
 }
 
-// The memory that JsonCpp allocates for a value: the Json::Value itself, the node of the map that holds it, and for an
-// array or an object the map.
-constexpr std::size_t kValueCost = 192;
-// A key, and a string, are copied into an allocation of their own.
-constexpr std::size_t kTextCost = 32;
-
 // Finds characters, numbers and strings that RFC 8259 does not allow and JsonCpp accepts even in its strict mode,
 // and limits the memory and depth that JsonCpp would need. JsonCpp checks the order of the tokens.
 class LexicalCheck {
@@ -48,7 +42,9 @@ class LexicalCheck {
   }
   std::size_t position() const { return at_; }
   bool too_large() const { return values_ > kMaxJsonValues; }
-  std::size_t cost() const { return values_ * kValueCost + texts_ * kTextCost + text_.size(); }
+  std::size_t cost() const {
+    return values_ * kJsonValueCost + containers_ * kJsonContainerCost + texts_ * kJsonTextCost + text_.size();
+  }
 
  private:
   const char* Fault(std::size_t at, const char* what) {
@@ -93,6 +89,7 @@ class LexicalCheck {
   const char* Opening(char c) {
     if (c != '{' && c != '[') return "unexpected character";
     if (++depth_ > kMaxJsonDepth) return "nested too deep";
+    ++containers_;
     ++at_;
     return nullptr;
   }
@@ -185,8 +182,9 @@ class LexicalCheck {
   std::size_t at_ = 0;
   int depth_ = 0;
   std::size_t values_ = 0;
-  std::size_t texts_ = 0;      // keys and strings
-  bool after_string_ = false;  // the last token was a string
+  std::size_t containers_ = 0;  // arrays and objects
+  std::size_t texts_ = 0;       // keys and strings
+  bool after_string_ = false;   // the last token was a string
 };
 
 std::string Located(std::string_view text, std::size_t position, const char* what) {

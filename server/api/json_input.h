@@ -14,6 +14,17 @@ namespace vorn::server {
 constexpr int kMaxJsonDepth = 64;
 constexpr std::size_t kMaxJsonValues = 100000;  // every object, array, string, number and literal counts
 
+// Upper bounds of the memory, in bytes, that JsonCpp allocates: for a value (the node of the map that holds it, with
+// the Json::Value), in addition for an array or object (its map), and for a key or string (its copy, beside the bytes).
+constexpr std::size_t kJsonValueCost = 128;
+constexpr std::size_t kJsonContainerCost = 64;
+constexpr std::size_t kJsonTextCost = 32;
+
+// The largest JsonText::cost() of a text of `bytes` bytes: all values are arrays or objects that have a key.
+constexpr std::size_t LargestJsonCost(std::size_t bytes) {
+  return kMaxJsonValues * (kJsonValueCost + kJsonContainerCost + kJsonTextCost) + bytes;
+}
+
 // The reason why a text was refused: "Line 1, Column 7: ..." (columns are bytes, and both count from 1).
 struct JsonFault {
   std::string text;

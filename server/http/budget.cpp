@@ -37,6 +37,10 @@ std::optional<Charge> Budget::Take(std::string_view peer, std::size_t amount) {
   return Charge(*this, std::move(key), amount);
 }
 
+bool Budget::HasRoomFor(std::string_view peer, std::size_t amount) const {
+  return amount <= total_ && (peer.empty() || amount <= per_peer_);
+}
+
 std::size_t Budget::used() const {
   const std::lock_guard<std::mutex> lock(mutex_);
   return used_;

@@ -44,6 +44,9 @@ class Budget {
   // the total alone.
   std::optional<Charge> Take(std::string_view peer, std::size_t amount);
 
+  // Whether Take() returns a charge when nothing else is taken. If it does not, waiting is useless.
+  bool HasRoomFor(std::string_view peer, std::size_t amount) const;
+
   std::size_t used() const;
   std::size_t total() const { return total_; }
 

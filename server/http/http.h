@@ -27,7 +27,7 @@ struct HttpLimits {
   ConnectionShare unix_connections{320, 320};
 
   // Bodies are charged to a budget before they are read, by the length that is declared for them. A body
-  // that does not fit is refused with 503 and Retry-After.
+  // that does not fit is refused with 503 and Retry-After, one that could never fit with 413.
   std::size_t uncharged_body = std::size_t{8} * 1024;     // bodies of up to this size are not charged
   std::size_t largest_charge = std::size_t{1088} * 1024;  // for larger bodies and those of unknown length
 

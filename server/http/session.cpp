@@ -217,9 +217,7 @@ void Session::Authorize() {
 void Session::OnAuthorized(std::optional<Response> refusal) {
   if (phase_ != Phase::kAuthorize) return;
   if (refusal) return Reply(*std::move(refusal));
-  if (reader_.state() == RequestReader::State::kBody && !ChargeBody()) {
-    return RefuseForNow("Too much is being sent to this server. Try again soon.");
-  }
+  if (reader_.state() == RequestReader::State::kBody && !ChargeBody()) return RefuseBody();
   reader_.Attach(exchange_);
   Enter(Phase::kBody);
   body_bytes_ = buffer_.size();
@@ -230,12 +228,21 @@ void Session::OnAuthorized(std::optional<Response> refusal) {
   stream_->Write({boost::asio::buffer(kContinue), {}}, Then(&Session::OnContinueSent));
 }
 
+std::size_t Session::BodyCharge() const {
+  return static_cast<std::size_t>(std::min<std::uint64_t>(body_charge_, host_.limits().largest_charge));
+}
+
 bool Session::ChargeBody() {
-  const HttpLimits& limits = host_.limits();
-  if (host_.bodies() == nullptr || body_charge_ <= limits.uncharged_body) return true;
-  const auto amount = static_cast<std::size_t>(std::min<std::uint64_t>(body_charge_, limits.largest_charge));
-  charge_ = host_.bodies()->Take(share_key_, amount);
+  if (host_.bodies() == nullptr || body_charge_ <= host_.limits().uncharged_body) return true;
+  charge_ = host_.bodies()->Take(share_key_, BodyCharge());
   return charge_.has_value();
+}
+
+void Session::RefuseBody() {
+  if (host_.bodies()->HasRoomFor(share_key_, BodyCharge())) {
+    return RefuseForNow("Too much is being sent to this server. Try again soon.");
+  }
+  Refuse(413, "The settings of this server leave no memory for a body of this size, or of unknown length.");
 }
 
 void Session::OnContinueSent(const Error& error, std::size_t /*bytes*/) {

@@ -83,7 +83,9 @@ class Session : public std::enable_shared_from_this<Session> {
   void BeginExchange();
   void Authorize();
   void OnAuthorized(std::optional<Response> refusal);
+  std::size_t BodyCharge() const;
   bool ChargeBody();
+  void RefuseBody();
   void OnContinueSent(const Error& error, std::size_t bytes);
   void Run();
   void OnAnswer(std::optional<Response> response);

@@ -4,6 +4,8 @@
 
 #include <memory>
 
+#include "settings.h"
+
 namespace vorn::server {
 namespace {
 
@@ -67,7 +69,7 @@ TEST(JsonBody, DoesNotTrustTheDeclaredLength) {
 }
 
 TEST(JsonBody, ChargesItsMemoryUntilItIsDestroyed) {
-  Budget memory(10000, 10000);
+  Budget memory(8000, 8000);
   auto first = std::make_unique<JsonBody>(memory);
   EXPECT_FALSE(first->Receive(R"({"a": [1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14]})"));
   EXPECT_TRUE(std::holds_alternative<Json::Value>(first->TakeParameters()));
@@ -80,6 +82,38 @@ TEST(JsonBody, ChargesItsMemoryUntilItIsDestroyed) {
   first.reset();
   EXPECT_EQ(memory.used(), 0U);
   EXPECT_TRUE(std::holds_alternative<Json::Value>(second.TakeParameters()));
+}
+
+TEST(JsonBody, ThatNeverFitsIntoTheBudgetIsTooLarge) {
+  Budget memory(1000, 1000);
+  JsonBody body(memory);
+  EXPECT_FALSE(body.Receive(R"({"a": [1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14]})"));
+  const auto refused = body.TakeParameters();
+  ASSERT_TRUE(std::holds_alternative<Response>(refused));
+  EXPECT_EQ(std::get<Response>(refused).status, 413);
+}
+
+// The n-th of 185,193 short keys.
+std::string Key(int n) {
+  std::string key;
+  for (int i = 0; i < 3; ++i, n /= 57) key += static_cast<char>('#' + n % 57);
+  return key;
+}
+
+// The bodies that cost most: all values are arrays with a key, or strings with a key.
+TEST(JsonBody, OfEveryKindFitsIntoTheDefaultBudget) {
+  EXPECT_LE(JsonBody::kMaxCharge, Settings().parameter_memory.bytes);
+  for (const char* value : {"[]", "\"\""}) {
+    std::string text = "{";
+    for (int i = 1; i < 100000; ++i) text += "\"" + Key(i) + "\":" + value + ",";
+    text.back() = '}';
+    Budget memory(JsonBody::kMaxCharge, JsonBody::kMaxCharge);
+    JsonBody body(memory);
+    text.resize(JsonBody::kMaxBytes, ' ');
+    EXPECT_FALSE(body.Receive(text));
+    EXPECT_TRUE(std::holds_alternative<Json::Value>(body.TakeParameters())) << value;
+    EXPECT_GT(memory.used(), JsonBody::kMaxCharge * 4 / 5) << "the bound is not much larger than what can be charged";
+  }
 }
 
 }  // namespace

@@ -32,6 +32,15 @@ TEST(Budget, OnePeerHasAShare) {
   EXPECT_FALSE(budget.Take("c", 31)) << "more than a share, although nothing is used";
 }
 
+TEST(Budget, SaysWhetherAnAmountCouldEverBeTaken) {
+  Budget budget(100, 30);
+  const auto held = budget.Take("", 100);
+  EXPECT_TRUE(budget.HasRoomFor("", 100));
+  EXPECT_FALSE(budget.HasRoomFor("", 101));
+  EXPECT_TRUE(budget.HasRoomFor("a", 30));
+  EXPECT_FALSE(budget.HasRoomFor("a", 31));
+}
+
 TEST(Budget, AChargeIsReturnedOnceAfterItWasMoved) {
   Budget budget(100, 100);
   auto first = budget.Take("a", 40);

@@ -2,6 +2,11 @@
 #include <gmock/gmock.h>
 #include <sys/resource.h>
 
+#include <atomic>
+#include <filesystem>
+#include <future>
+#include <iterator>
+
 #include "echo_service.h"
 
 namespace vorn::server {
@@ -10,6 +15,56 @@ namespace {
 using testing::HasSubstr;
 
 constexpr std::chrono::seconds kShort{1};
+
+std::ptrdiff_t CountDescriptors() {
+  const std::filesystem::directory_iterator descriptors("/proc/self/fd");
+  return std::distance(begin(descriptors), end(descriptors));
+}
+
+// Refuses every request. "/gate" holds the network thread until the gate opens.
+class GatedService : public Service {
+ public:
+  std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override {
+    if (head.target == "/gate") {
+      reached.set_value();
+      gate.get_future().wait();
+    }
+    descriptors = CountDescriptors();
+    return Response{404, "refused"};
+  }
+  Response Refuse(int status, std::string_view text) const override { return {status, std::string(text)}; }
+
+  std::promise<void> reached;
+  std::promise<void> gate;
+  std::atomic<std::ptrdiff_t> descriptors{0};  // of this process, when the last request was begun
+};
+
+// Clients and server are in one process, so the number of its descriptors shows how many connections are accepted.
+TEST(Accepting, TakesTurnsWithTheRequestsOfOtherConnections) {
+  const Sandbox sandbox;
+  const std::string path = sandbox.File("socket");
+  std::string error;
+  std::vector<Listener> listeners;
+  listeners.push_back(*OpenListener("unix:" + path, &error));
+  GatedService service;
+  HttpServer server(service, std::move(listeners));
+  Connection other = Connection::ToUnix(path);
+  other.Send(Get("/"));
+  EXPECT_EQ(other.Receive().status, 404);
+  Connection gate = Connection::ToUnix(path);
+  gate.Send(Get("/gate"));
+  service.reached.get_future().wait();
+  std::vector<Connection> many;
+  for (int i = 0; i < 200; ++i) many.push_back(Connection::ToUnix(path));
+  const std::ptrdiff_t before = CountDescriptors();
+  other.Send(Get("/"));
+  service.gate.set_value();
+  EXPECT_EQ(other.Receive().status, 404);
+  EXPECT_GT(service.descriptors, before) << "connections are accepted before the request, which arrived later";
+  EXPECT_LE(service.descriptors, before + 32);
+  many.back().Send(Get("/"));
+  EXPECT_EQ(many.back().Receive().status, 404);
+}
 
 TEST_F(HttpTest, SlowSendersAreAnsweredAndDroppedAndDelayNoOtherClient) {
   HttpLimits limits;
@@ -221,7 +276,7 @@ TEST(FitToDescriptors, LeavesTheServersOwnFilesTheirReserve) {
 }
 
 TEST_F(HttpTest, ABodyBeyondTheBudgetIsRefusedBeforeItIsRead) {
-  Budget memory(1000000, 1000000);
+  Budget memory(1150000, 1150000);
   Start({}, {&memory, nullptr});
   Connection first = Connect();
   first.Send("POST /echo HTTP/1.1\r\nHost: x\r\nContent-Length: 600000\r\n\r\n");
@@ -240,6 +295,19 @@ TEST_F(HttpTest, ABodyBeyondTheBudgetIsRefusedBeforeItIsRead) {
   first.Send(std::string(600000, 'x'));
   EXPECT_EQ(first.Receive().body.size(), 600000U);
   EXPECT_EQ(memory.used(), 0U);
+}
+
+TEST_F(HttpTest, ABodyThatNeverFitsIntoTheBudgetIsTooLarge) {
+  Budget memory(100000, 100000);
+  Start({}, {&memory, nullptr});
+  for (const char* length : {"Content-Length: 100001", "Transfer-Encoding: chunked"}) {
+    Connection client = Connect();
+    client.Send(std::string("POST /echo HTTP/1.1\r\nHost: x\r\n") + length + "\r\n\r\n");
+    EXPECT_EQ(client.Receive().status, 413) << length;
+  }
+  Connection client = Connect();
+  client.Send(Post("/echo", std::string(100000, 'x')));
+  EXPECT_EQ(client.Receive().status, 200);
 }
 
 TEST_F(HttpTest, TheBudgetGetsBackWhatAVanishedClientHeld) {

@@ -120,6 +120,7 @@ TEST(JsonInput, BoundsTheMemoryOfTheValue) {
                                ArrayOf(33000, R"({"k":1})"),
                                ArrayOf(33000, R"({"a longer key":"a longer string"})"),
                                ArrayOf(50000, "\"a string of some 40 characters, I believe\""),
+                               ArrayOf(33000, R"({"k":[]})"),
                                R"({"a":1})"};
   for (const std::string& text : texts) {
     JsonFault fault;
@@ -131,7 +132,7 @@ TEST(JsonInput, BoundsTheMemoryOfTheValue) {
     const auto after = mallinfo2();
     ASSERT_TRUE(value) << error;
     const std::size_t taken = after.uordblks + after.hblkhd - before.uordblks - before.hblkhd;
-    if (taken == 0) GTEST_SKIP() << "the sanitizers' allocator keeps no statistics";
+    if (taken == 0 && text.size() > 1000) GTEST_SKIP() << "the sanitizers' allocator keeps no statistics";
     EXPECT_LE(taken, checked->cost()) << text.substr(0, 60);
     EXPECT_LE(checked->cost(), 3 * taken + 4096) << text.substr(0, 60);
   }

@@ -1,6 +1,7 @@
 #include "method_call.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
+#include <syslog.h>
 
 #include <atomic>
 #include <chrono>
@@ -19,6 +20,8 @@ namespace vorn::server {
 namespace {
 
 using std::chrono::milliseconds;
+using testing::HasSubstr;
+using testing::Not;
 
 void Echo(VORN::APIRequest* request, VORN::APIResponse* response) {
   response->SetSuccess(request->GetParam("", Json::Value()));
@@ -139,6 +142,28 @@ TEST_F(CallTest, IsAnsweredAtItsDeadline) {
   held = false;
   EXPECT_EQ(Run(NewCall(echo_)).get().status, 200);
   EXPECT_EQ(held_calls, 1);
+}
+
+TEST_F(CallTest, ThatEndsAfterItsDeadlineIsLoggedAndRecordedWhenItEnds) {
+  testing::internal::CaptureStderr();
+  openlog("test", LOG_PERROR, LOG_USER);
+  held = true;
+  EXPECT_EQ(Run(NewCall(hold_, std::chrono::seconds(2))).get().status, 504);
+  const std::string before = testing::internal::GetCapturedStderr();
+  testing::internal::CaptureStderr();
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    EXPECT_TRUE(audited_.empty());
+  }
+  held = false;
+  EXPECT_TRUE(Eventually([this] { return pool_.load().running == 0; }));
+  closelog();
+  const std::string after = testing::internal::GetCapturedStderr();
+  EXPECT_THAT(before, HasSubstr("Api v1 hold: not done at its deadline"));
+  EXPECT_THAT(before, Not(HasSubstr("ended")));
+  EXPECT_THAT(after, HasSubstr("Api v1 hold: ended with status 200 after its deadline"));
+  ASSERT_EQ(audited_.size(), 1U);
+  EXPECT_EQ(audited_[0].status, 200) << "the outcome, not the answer that the client has seen";
 }
 
 TEST_F(CallTest, OfAClientThatHasLeftIsNotRun) {

@@ -1,9 +1,13 @@
 // Files sent to the real vornd.
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 
 #include <csignal>
 #include <filesystem>
+#include <functional>
+#include <iterator>
+#include <vector>
 
 #include "server_process.h"
 
@@ -109,6 +113,36 @@ TEST_F(Uploads, OfAKilledServerAreRemovedByTheNext) {
   const ServerProcess next(sandbox);
   EXPECT_TRUE(next.ready());
   EXPECT_TRUE(std::filesystem::is_empty(folder));
+}
+
+// Returns the status of a request after `count` connections that remain idle.
+int StatusBehindIdleConnections(const std::function<Connection()>& connect, int count, std::vector<Connection>* idle) {
+  for (int i = 0; i < count; ++i) idle->push_back(connect());
+  idle->push_back(connect());
+  idle->back().Send(Get("/healthz"));
+  return idle->back().Receive().status;
+}
+
+TEST(Descriptors, AreReservedForTheFilesOfCalls) {
+  const Sandbox sandbox;
+  rlimit before{};
+  ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &before), 0);
+  const rlimit few{320, before.rlim_max};
+  setrlimit(RLIMIT_NOFILE, &few);
+  ServerProcess server(sandbox);
+  setrlimit(RLIMIT_NOFILE, &before);
+  std::vector<Connection> idle;
+  EXPECT_EQ(StatusBehindIdleConnections([&] { return server.ConnectTcp(); }, 250, &idle), 200);
+  EXPECT_EQ(StatusBehindIdleConnections([&] { return server.Connect(); }, 150, &idle), 200);
+  const std::filesystem::directory_iterator descriptors("/proc/" + std::to_string(server.pid()) + "/fd");
+  EXPECT_LT(std::distance(begin(descriptors), end(descriptors)), 160);
+  Connection client = server.Connect();
+  const std::string form = Part("name=keytab_file; filename=k", "keytab") + "--b--\r\n";
+  client.Send(FormHead(form.size()) + form);
+  EXPECT_EQ(client.Receive().Envelope()["data"]["size"], 6);
+  EXPECT_EQ(server.log().find("No connection accepted"), std::string::npos);
+  server.Signal(SIGTERM);
+  EXPECT_EQ(server.Wait(), 0) << server.log();
 }
 
 }  // namespace

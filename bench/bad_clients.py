@@ -130,6 +130,16 @@ class HungMethod(BadClient):
         return post(len(self.body), "/api/Test.Echo/v1/wait") + self.body
 
 
+class TwoHungMethods(HungMethod):
+    """Half of the clients call another method that never ends: together they wait for more than one queue."""
+    calls = 0
+
+    def first(self):
+        TwoHungMethods.calls += 1
+        version = TwoHungMethods.calls % 2 + 1
+        return post(len(self.body), f"/api/Test.Echo/v{version}/wait") + self.body
+
+
 SCENARIOS = {name: kind for name, kind in sorted(globals().items())
              if isinstance(kind, type) and issubclass(kind, BadClient) and kind is not BadClient}
 

@@ -241,28 +241,37 @@ WebApi::Begun WebApi::BeginPage(const Page& page, const Head& head) const {
   if (head.method == "OPTIONS") return Options("GET, HEAD");
   if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
   if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
-  return (this->*page.begin)();
+  return (this->*page.begin)(head);
 }
 
-WebApi::Begun WebApi::List() const { return list_; }
-WebApi::Begun WebApi::OpenApi() const { return open_api_; }
-WebApi::Begun WebApi::Docs() const { return docs_; }
-WebApi::Begun WebApi::DocsStyle() const { return docs_style_; }
+WebApi::Begun WebApi::List(const Head& /*head*/) const { return list_; }
+WebApi::Begun WebApi::OpenApi(const Head& /*head*/) const { return open_api_; }
+WebApi::Begun WebApi::Docs(const Head& /*head*/) const { return docs_; }
+WebApi::Begun WebApi::DocsStyle(const Head& /*head*/) const { return docs_style_; }
 
-WebApi::Begun WebApi::Alive() const { return Success(Json::Value()); }
+WebApi::Begun WebApi::Alive(const Head& /*head*/) const { return Success(Json::Value()); }
 
-WebApi::Begun WebApi::Ready() const {
-  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.ready, [] { return Success(Json::Value()); });
+WebApi::Begun WebApi::Ready(const Head& head) const {
+  static const char page = 0;
+  return MakeOnWorker(&page, head, limits_.ready, [] { return Success(Json::Value()); });
 }
 
-WebApi::Begun WebApi::Metrics() const {
+WebApi::Begun WebApi::Metrics(const Head& head) const {
+  static const char page = 0;
   // The page may be made when this object is gone; the parts live longer than the workers.
-  const auto make = [&calls = parts_.metrics, &workers = parts_.workers, &figures = parts_.figures] {
-    Response response{200, WriteMetrics(calls, workers, figures)};
-    response.content_type = "text/plain; version=0.0.4; charset=utf-8";
-    return response;
-  };
-  return std::make_shared<WorkerPage>(parts_.workers.reading, limits_.call, make);
+  return MakeOnWorker(&page, head, limits_.call,
+                      [&calls = parts_.metrics, &workers = parts_.workers, &figures = parts_.figures] {
+                        Response response{200, WriteMetrics(calls, workers, figures)};
+                        response.content_type = "text/plain; version=0.0.4; charset=utf-8";
+                        return response;
+                      });
+}
+
+// The page is identified by the address.
+WebApi::Begun WebApi::MakeOnWorker(const void* page, const Head& head, std::chrono::milliseconds time,
+                                   std::function<Response()> make) const {
+  WorkerPage::Request request{page, TurnOf(head.peer, ""), head.recent_requests};
+  return std::make_shared<WorkerPage>(parts_.workers.reading, std::move(request), time, std::move(make));
 }
 
 }  // namespace vorn::server

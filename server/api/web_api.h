@@ -4,6 +4,7 @@
 
 #include <array>
 #include <chrono>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string_view>
@@ -49,6 +50,7 @@ class WebApi : public Service {
 
   std::variant<std::shared_ptr<Exchange>, Response> Begin(const Head& head) override;
   void Dispatch() override { parts_.workers.Wake(); }
+  bool EndWaitingCall() override { return parts_.workers.Displace(); }
   Response Refuse(int status, std::string_view text) const override;
 
  private:
@@ -58,20 +60,22 @@ class WebApi : public Service {
   struct Page {
     std::string_view path;
     bool is_public;
-    Begun (WebApi::*begin)() const;
+    Begun (WebApi::*begin)(const Head& head) const;
   };
   static const std::array<Page, 8> kPages;
 
   Begun BeginFor(const CallerPtr& caller, const Page* page, const Head& head) const;
   Begun BeginSignIn(const Head& head) const;
   Begun BeginPage(const Page& page, const Head& head) const;
-  Begun List() const;
-  Begun OpenApi() const;
-  Begun Docs() const;
-  Begun DocsStyle() const;
-  Begun Alive() const;
-  Begun Ready() const;
-  Begun Metrics() const;
+  Begun List(const Head& head) const;
+  Begun OpenApi(const Head& head) const;
+  Begun Docs(const Head& head) const;
+  Begun DocsStyle(const Head& head) const;
+  Begun Alive(const Head& head) const;
+  Begun Ready(const Head& head) const;
+  Begun Metrics(const Head& head) const;
+  Begun MakeOnWorker(const void* page, const Head& head, std::chrono::milliseconds time,
+                     std::function<Response()> make) const;
   Begun BeginCall(const Route& route, const CallerPtr& caller, const Head& head) const;
 
   const Parts parts_;

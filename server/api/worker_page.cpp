@@ -7,8 +7,6 @@
 namespace vorn::server {
 namespace {
 
-const char kLane = 0;
-
 // A server without memory is not ready either.
 Response Unready(const char* text) noexcept {
   try {
@@ -25,7 +23,8 @@ Response Unready(const char* text) noexcept {
 void WorkerPage::Run(Answer answer) {
   answer_.Await(std::move(answer));
   try {
-    if (pool_.Submit({&kLane, JobSize::kSmall}, shared_from_this(), time_)) return;
+    const LaneId lane{request_.page, JobSize::kSmall};
+    if (pool_.Submit(lane, shared_from_this(), time_, {request_.turn, request_.recent_requests})) return;
   } catch (const std::bad_alloc&) {
   }
   Refuse(Refused::kClosed);
@@ -41,6 +40,6 @@ void WorkerPage::Work() {
 
 void WorkerPage::Expire(bool /*running*/) { answer_.Give(Unready("No worker was free in time.")); }
 
-void WorkerPage::Refuse(Refused /*why*/) { answer_.Give(Unready("The server takes no calls.")); }
+void WorkerPage::Refuse(Refused /*why*/) { answer_.Give(Unready("The server takes no more requests at the moment.")); }
 
 }  // namespace vorn::server

@@ -6,6 +6,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <string>
 #include <string_view>
 #include <utility>
 
@@ -15,12 +16,20 @@
 
 namespace vorn::server {
 
-// Answers with what `make` returns if a worker has done it in time, else with 503.
+// Answers with what `make` returns if a worker has done it in time, else with 503. The requests for one page are a lane
+// of the pool, in which the peers have turns.
 class WorkerPage : public Exchange, public Job, public std::enable_shared_from_this<WorkerPage> {
  public:
+  // The part of a request that its turn depends on.
+  struct Request {
+    const void* page;              // identifies the page
+    std::string turn{};            // Sender::peer
+    unsigned recent_requests = 0;  // Sender::recent_requests
+  };
+
   // The pool must outlive this. `make` may throw std::bad_alloc.
-  WorkerPage(WorkerPool& pool, std::chrono::milliseconds time, std::function<Response()> make)
-      : pool_(pool), time_(time), make_(std::move(make)) {}
+  WorkerPage(WorkerPool& pool, Request request, std::chrono::milliseconds time, std::function<Response()> make)
+      : pool_(pool), request_(std::move(request)), time_(time), make_(std::move(make)) {}
 
   std::optional<Response> Receive(std::string_view /*piece*/) override { return std::nullopt; }
   void Run(Answer answer) override;
@@ -31,6 +40,7 @@ class WorkerPage : public Exchange, public Job, public std::enable_shared_from_t
 
  private:
   WorkerPool& pool_;
+  const Request request_;
   const std::chrono::milliseconds time_;
   const std::function<Response()> make_;
   PendingAnswer answer_;

@@ -73,6 +73,21 @@ bool WorkerPool::Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::mil
   return true;
 }
 
+bool WorkerPool::Displace() {
+  Entries displaced;
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto fullest = std::max_element(lanes_.begin(), lanes_.end(), [](const auto& left, const auto& right) {
+      return left.second.waiting < right.second.waiting;
+    });
+    if (fullest == lanes_.end() || fullest->second.waiting == 0) return false;
+    displaced = TakeSurplus(&fullest->second);
+    --queued_;
+  }
+  displaced.front().job->Refuse(Refused::kDisplaced);
+  return true;
+}
+
 // Moves the only job of `job` to the end of the peer's queue.
 void WorkerPool::Append(Lane* lane, std::string_view peer, Entries* job) {
   auto queue =

@@ -21,7 +21,7 @@ namespace vorn::server {
 // Why a job is not run.
 enum class Refused {
   kClosed,     // the pool was closed before the job began
-  kDisplaced,  // the queue is full, and the job's sender has a larger part of it than others
+  kDisplaced,  // the queue, or the server, is full, and the job's sender has a larger part of it than others
 };
 
 // A unit of work. Exactly one of Work() and Refuse() is called, or Expire(false). None of them may throw.
@@ -91,6 +91,10 @@ class WorkerPool {
   // job. For a caller that has several jobs to submit.
   bool Enqueue(LaneId lane, std::shared_ptr<Job> job, std::chrono::milliseconds time, const Sender& sender = {});
   void Wake();
+
+  // Displaces a job of the lane in which most jobs wait, as a further job in its full queue would. Returns false if no
+  // job waits.
+  bool Displace();
 
   struct Load {
     std::size_t waiting = 0;
@@ -171,6 +175,11 @@ struct Workers {
   void Wake() {
     reading.Wake();
     changing.Wake();
+  }
+
+  // Displaces a job of the pool in which more jobs wait. Returns false if no job waits.
+  bool Displace() {
+    return reading.load().waiting > changing.load().waiting ? reading.Displace() : changing.Displace();
   }
 
   void Close() {

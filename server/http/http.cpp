@@ -269,6 +269,8 @@ void HttpServer::Engine::KeepToShare(const std::shared_ptr<Session>& newest) {
   add(newest);
   const std::size_t surplus = SurplusOf(uses, share);
   if (surplus == kNoConnection) return;
+  const bool is_needed = uses[surplus].activity == Activity::kWaiting;
+  if (is_needed && CallsCrowdOut(uses, share) && service_.EndWaitingCall()) return;
   sessions[surplus] == newest ? newest->TurnAway() : sessions[surplus]->Close();
 }
 

@@ -53,6 +53,11 @@ class Service {
   // been passed on: a service that wakes its threads here wakes them once for all of them. Must not throw.
   virtual void Dispatch() {}
 
+  // Ends one call that waits for a thread: it is answered with 503, and its connection closed. Called on the network
+  // thread when calls occupy most connections of a listener and another one has arrived. Returns false if no call
+  // waits. Must not throw.
+  virtual bool EndWaitingCall() { return false; }
+
   // The answer to a request that the transport itself refuses, in the service's own format. `text` is a sentence
   // for the client. Called on the network thread.
   virtual Response Refuse(int status, std::string_view text) const = 0;

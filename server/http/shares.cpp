@@ -15,6 +15,14 @@ std::size_t Choose(const std::vector<ConnectionUse>& uses, const std::string_vie
   return chosen;
 }
 
+// Whether the address of the newest connection has more than its share.
+bool AddressExceedsShare(const std::vector<ConnectionUse>& uses, const ConnectionShare& share) {
+  const std::string_view address = uses.back().share_key;
+  const auto same = std::count_if(uses.begin(), uses.end(),
+                                  [&address](const ConnectionUse& use) { return use.share_key == address; });
+  return !address.empty() && static_cast<std::size_t>(same) > share.per_address;
+}
+
 }  // namespace
 
 bool GoesFirst(const ConnectionUse& left, const ConnectionUse& right) {
@@ -26,11 +34,15 @@ std::size_t MostExpendable(const std::vector<ConnectionUse>& uses) { return Choo
 
 std::size_t SurplusOf(const std::vector<ConnectionUse>& uses, const ConnectionShare& share) {
   if (uses.empty()) return kNoConnection;
-  const std::string_view address = uses.back().share_key;
-  const auto same = std::count_if(uses.begin(), uses.end(),
-                                  [&address](const ConnectionUse& use) { return use.share_key == address; });
-  if (!address.empty() && static_cast<std::size_t>(same) > share.per_address) return Choose(uses, &address);
+  if (AddressExceedsShare(uses, share)) return Choose(uses, &uses.back().share_key);
   return uses.size() > share.total ? Choose(uses, nullptr) : kNoConnection;
+}
+
+bool CallsCrowdOut(const std::vector<ConnectionUse>& uses, const ConnectionShare& share) {
+  if (uses.size() <= share.total || AddressExceedsShare(uses, share)) return false;
+  const auto working = std::count_if(uses.begin(), uses.end(),
+                                     [](const ConnectionUse& use) { return use.activity == Activity::kWorking; });
+  return static_cast<std::size_t>(working) > share.total / 2;
 }
 
 }  // namespace vorn::server

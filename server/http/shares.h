@@ -40,6 +40,11 @@ constexpr std::size_t kNoConnection = static_cast<std::size_t>(-1);
 // there is room, or if the surplus consists of connections that are working.
 std::size_t SurplusOf(const std::vector<ConnectionUse>& uses, const ConnectionShare& share);
 
+// Whether more connections than the listener may have are there because most of its share waits for the server, and
+// not because one address has more than its own share. Then a call should end, rather than the connection of a client
+// that is about to send a request.
+bool CallsCrowdOut(const std::vector<ConnectionUse>& uses, const ConnectionShare& share);
+
 // Returns the index of the most expendable connection, or kNoConnection.
 std::size_t MostExpendable(const std::vector<ConnectionUse>& uses);
 

@@ -17,7 +17,7 @@ void Copy(const std::string& from, const std::string& to) { std::filesystem::cop
 TEST(Modules, AreLoadedWithTheirRowsAndDescriptors) {
   const std::vector<Module> modules = LoadModules(TEST_MODULES);
   ASSERT_THAT(modules, SizeIs(1));
-  EXPECT_THAT(modules[0].rows, SizeIs(13));
+  EXPECT_THAT(modules[0].rows, SizeIs(14));
   EXPECT_STREQ(modules[0].rows[0].api, "Test.Echo");
   EXPECT_STREQ(modules[0].rows[9].method, "get");
   EXPECT_EQ(modules[0].rows[9].version, 2);

@@ -36,6 +36,23 @@ TEST(Shares, AnAddressBeyondItsShareLosesItsOwnConnections) {
   EXPECT_EQ(SurplusOf(uses, {3, 3}), 0U);
 }
 
+TEST(Shares, CallsCrowdOutIfMostOfTheListenersShareIsWorking) {
+  std::vector<ConnectionUse> uses = {Use("", Activity::kWorking, 1), Use("", Activity::kWorking, 2),
+                                     Use("", Activity::kWorking, 3), Use("", Activity::kWaiting, 4),
+                                     Use("", Activity::kWaiting, 5)};
+  EXPECT_TRUE(CallsCrowdOut(uses, {4, 4}));
+  EXPECT_FALSE(CallsCrowdOut(uses, {5, 5})) << "there is room";
+  uses[0].activity = Activity::kWaiting;
+  EXPECT_FALSE(CallsCrowdOut(uses, {4, 4})) << "half of the share is not most of it";
+}
+
+TEST(Shares, CallsOfAnAddressBeyondItsShareCrowdOutNobody) {
+  const std::vector<ConnectionUse> uses = {Use("a", Activity::kWorking, 1), Use("a", Activity::kWorking, 2),
+                                           Use("a", Activity::kWaiting, 3)};
+  EXPECT_TRUE(CallsCrowdOut(uses, {2, 3}));
+  EXPECT_FALSE(CallsCrowdOut(uses, {2, 2}));
+}
+
 TEST(Peer, AddressesAreCountedTogetherByNetwork) {
   const auto key = [](const char* address, bool loopback = false) {
     Peer peer;

@@ -4,6 +4,7 @@
 
 #include <atomic>
 #include <csignal>
+#include <filesystem>
 #include <thread>
 #include <vector>
 
@@ -112,11 +113,11 @@ TEST_F(Calls, AreListed) {
   Connection client = server_.ConnectTcp();
   client.Send(Get("/api", ServerProcess::TokenHeader()));
   const Json::Value data = client.Receive().Envelope()["data"];
-  ASSERT_EQ(data.size(), 21U);
+  ASSERT_EQ(data.size(), 22U);
   EXPECT_EQ(data[12]["api"], "Test.Echo");
   EXPECT_EQ(data[12]["version"], 2);
-  EXPECT_EQ(data[13]["api"], "VORN.Server.Session");
-  EXPECT_EQ(data[20]["method"], "revoke");
+  EXPECT_EQ(data[14]["api"], "VORN.Server.Session");
+  EXPECT_EQ(data[21]["method"], "revoke");
   client.Send(Get("/healthz"));
   EXPECT_EQ(client.Receive().status, 200);
 }
@@ -172,6 +173,30 @@ TEST_F(Calls, BeyondTheQueueOfTheirMethodAreRefused) {
   sandbox_.Write("release", "");
   EXPECT_EQ(slow[0].Receive().status, 200);
   EXPECT_TRUE(Eventually([&] { return Call("v1/wait", Wait("0")).status == 200; }));
+}
+
+// Calls of two methods that hang are more than a listener may have connections.
+TEST_F(Calls, ThatHangLeaveConnectionsToOthers) {
+  const auto connect = [this](bool local) { return local ? server_.Connect() : server_.ConnectTcp(); };
+  for (const bool local : {false, true}) {
+    std::vector<Connection> hung;
+    for (int i = 0; i < 700; ++i) {
+      const std::string method = i % 2 == 0 ? "v1/wait" : "v2/wait";
+      hung.push_back(connect(local));
+      hung.back().Send(Post("/api/Test.Echo/" + method, Wait(std::to_string(i % 2)), ServerProcess::TokenHeader()));
+    }
+    EXPECT_TRUE(Eventually([&] { return HasBegun("0") && HasBegun("1"); }));
+    for (int i = 0; i < 20; ++i) {
+      Connection client = connect(local);
+      client.Send(Post("/api/Test.Echo/v1/get", "", ServerProcess::TokenHeader()));
+      EXPECT_EQ(client.Receive().status, 200) << i;
+    }
+    sandbox_.Write("release", "");
+    int released = 0;
+    for (Connection& client : hung) released += client.Receive().status == 200;
+    EXPECT_GT(released, 200) << "most of the calls that wait are not given up";
+    std::filesystem::remove(sandbox_.File("release"));
+  }
 }
 
 TEST_F(Calls, WithMoreValuesThanAllowedAreRefused) {

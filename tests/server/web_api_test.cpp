@@ -83,7 +83,11 @@ class WebApiTest : public testing::Test {
   std::optional<UploadFolder> uploads_ = UploadFolder::Open(sandbox_.File("uploads"), &error_);
   const OwnNames names_{{"nas.example"}};
   CallMetrics metrics_;
-  const std::vector<MetricsSource> figures_;
+  std::promise<void> release_metrics_;
+  const std::vector<MetricsSource> figures_{[released = release_metrics_.get_future().share()] {
+    released.wait();
+    return std::vector<VORN::Metric>();
+  }};
   const AuditSink audit_ = [](const AuditRecord& /*record*/) {};
   TokenStore tokens_{sandbox_.File("tokens.json")};
   Sessions sessions_{Sessions::Limits{}};
@@ -153,6 +157,27 @@ TEST_F(WebApiTest, IsReadyWhenAWorkerIsFree) {
   EXPECT_EQ(ask(), 200) << "changing methods have other threads";
   workers_.reading.Close();
   EXPECT_EQ(ask(), 503);
+}
+
+TEST_F(WebApiTest, IsReadyWhileMetricsHang) {
+  const std::string secret =
+      sessions_.Begin("alice", Role::kAdministrator, "", Sessions::Carrier::kBearer, Sessions::Clock::now());
+  const auto ask = [&](const char* target) {
+    Head head = Post(target);
+    head.method = "GET";
+    const std::string credentials = "Bearer " + secret;
+    head.headers.emplace_back("authorization", credentials);
+    auto begun = api_.Begin(head);
+    const auto status = std::make_shared<std::promise<int>>();
+    std::get<std::shared_ptr<Exchange>>(begun)->Run(
+        [status](const Response& answer) { status->set_value(answer.status); });
+    return status->get_future();
+  };
+  std::vector<std::future<int>> hanging;
+  for (int i = 0; i < 2; ++i) hanging.push_back(ask("/metrics"));  // one page runs at a time
+  EXPECT_EQ(ask("/healthz/ready").get(), 200);
+  release_metrics_.set_value();
+  for (std::future<int>& each : hanging) EXPECT_EQ(each.get(), 200);
 }
 
 TEST_F(WebApiTest, OptionsNamesTheAllowedMethods) {

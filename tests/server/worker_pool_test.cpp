@@ -213,6 +213,23 @@ TEST_F(WorkerPoolTest, RefusesMoreThanALanesShareOfTheQueue) {
   EXPECT_TRUE(Eventually([&] { return Submit(pool, 0); }));
 }
 
+TEST_F(WorkerPoolTest, DisplacesAJobOfTheFullestLane) {
+  WorkerPool pool(Limits(1, 1, 10));
+  EXPECT_FALSE(pool.Displace()) << "no job";
+  for (int lane = 0; lane < 2; ++lane) SubmitHanging(pool, lane);
+  EXPECT_TRUE(Eventually([&] { return hanging_ == 2; }));
+  EXPECT_FALSE(pool.Displace()) << "running jobs stay";
+  bool ran = false;
+  Submit(pool, 0, [&ran] { ran = true; });
+  for (int i = 0; i < 3; ++i) Submit(pool, 1);
+  for (int i = 0; i < 2; ++i) EXPECT_TRUE(pool.Displace());
+  EXPECT_EQ(counts_.displaced, 2);
+  EXPECT_EQ(pool.load().waiting, 2U);
+  Release();
+  EXPECT_TRUE(Eventually([&] { return counts_.done == 4; }));
+  EXPECT_TRUE(ran) << "the only job that waits in its lane";
+}
+
 TEST_F(WorkerPoolTest, TellsAJobThatItsDeadlineHasPassed) {
   WorkerPool pool(Limits(1, 1, 10));
   SubmitHanging(pool, 0, std::chrono::seconds(2));  // long enough for a worker to begin

@@ -96,7 +96,8 @@ const APIRow table[] = {{"Test.Echo", 1, "get", Echo},        {"Test.Echo", 1, "
                         {"Test.Echo", 1, "root", Root},       {"Test.Echo", 1, "binary", Binary},
                         {"Test.Echo", 1, "upload", Upload},   {"Test.Echo", 2, "get", EchoV2},
                         {"Test.Echo", 1, "remark", Remark},   {"Test.Echo", 1, "context", Context},
-                        {"Test.Echo", 2, "context", Context}, {nullptr, 0, nullptr, nullptr}};
+                        {"Test.Echo", 2, "context", Context}, {"Test.Echo", 2, "wait", Wait},
+                        {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace
 

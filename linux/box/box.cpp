@@ -80,8 +80,7 @@ void Box::KeepDerived(const Key& key, Derived derived) {
 Status Box::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
   if (Status status = CheckMayWrite(path); !status.ok()) return status;
   if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;
-  if (Status status = store_->Replace(path, text, expected, mode); !status.ok()) return status;
-  const Result<Version> written = store_->VersionOf(path);
+  const Result<Version> written = store_->Replace(path, text, expected, mode);
   if (written.ok()) FirstReads::Renew(*this, path, *written);
   return written.status();
 }

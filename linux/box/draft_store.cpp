@@ -87,7 +87,7 @@ Result<StoredFolder> DraftStore::List(const std::string& folder) const {
 }
 
 // Without a text the file is removed.
-Status DraftStore::Write(const std::string& path, std::optional<std::string> text, const Version& expected) {
+Result<Version> DraftStore::Write(const std::string& path, std::optional<std::string> text, const Version& expected) {
   const std::lock_guard lock(mutex_);
   const Result<File*> found = Find(path);
   if (!found.ok()) return found.status();
@@ -98,15 +98,16 @@ Status DraftStore::Write(const std::string& path, std::optional<std::string> tex
   if (file.now.version.exists != exists) changed_folders_[FolderOf(file.written_as)] = NextVersion();
   file.now.version = exists ? NextVersion() : Version{};
   file.now.text = std::move(text).value_or("");
-  return {};
+  return file.now.version;
 }
 
-Status DraftStore::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned /*mode*/) {
+Result<Version> DraftStore::Replace(const std::string& path, std::string_view text, const Version& expected,
+                                    unsigned /*mode*/) {
   return Write(path, std::string(text), expected);
 }
 
 Status DraftStore::Remove(const std::string& path, const Version& expected) {
-  return Write(path, std::nullopt, expected);
+  return Write(path, std::nullopt, expected).status();
 }
 
 Status DraftStore::Confirm(const std::string& /*path*/) { return {}; }

@@ -40,7 +40,8 @@ class DraftStore : public Store {
   Result<StoredFile> Read(const std::string& path) const override;
   Result<Version> VersionOf(const std::string& path) const override;
   Result<StoredFolder> List(const std::string& folder) const override;
-  Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) override;
+  Result<Version> Replace(const std::string& path, std::string_view text, const Version& expected,
+                          unsigned mode) override;
   Status Remove(const std::string& path, const Version& expected) override;
   Status Confirm(const std::string& path) override;
   Status SetMode(const std::string& path, unsigned mode) override;
@@ -55,7 +56,7 @@ class DraftStore : public Store {
   };
 
   Result<File*> Find(const std::string& path) const;
-  Status Write(const std::string& path, std::optional<std::string> text, const Version& expected);
+  Result<Version> Write(const std::string& path, std::optional<std::string> text, const Version& expected);
   Version NextVersion();
 
   const Store& stored_;

@@ -100,9 +100,13 @@ Result<StoredFolder> FileStore::List(const std::string& folder) const {
   return StoredFolder{std::move(*names), VersionFrom(*stamp), IsSettled(*stamp, now)};
 }
 
-Status FileStore::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
+Result<Version> FileStore::Replace(const std::string& path, std::string_view text, const Version& expected,
+                                   unsigned mode) {
   const Result<std::string> location = Locate(path);
-  return location.ok() ? ReplaceFile(*location, text, StampFrom(expected), mode) : location.status();
+  if (!location.ok()) return location.status();
+  const Result<FileStamp> written = ReplaceFile(*location, text, StampFrom(expected), mode);
+  if (!written.ok()) return written.status();
+  return VersionFrom(*written);
 }
 
 Status FileStore::Remove(const std::string& path, const Version& expected) {

@@ -26,7 +26,8 @@ class FileStore : public Store {
   Result<StoredFile> Read(const std::string& path) const override;
   Result<Version> VersionOf(const std::string& path) const override;
   Result<StoredFolder> List(const std::string& folder) const override;
-  Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) override;
+  Result<Version> Replace(const std::string& path, std::string_view text, const Version& expected,
+                          unsigned mode) override;
   Status Remove(const std::string& path, const Version& expected) override;
   Status Confirm(const std::string& path) override;
   Status SetMode(const std::string& path, unsigned mode) override;

@@ -66,8 +66,10 @@ class Store {
 
   // Makes the file contain `text`, atomically and durably, if it is in the state `expected`; else fails
   // with kChangedBehind and changes nothing. An existing file keeps owner and mode, a new one gets
-  // `mode` (the bits of chmod(2)). Missing folders are created.
-  virtual Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) = 0;
+  // `mode` (the bits of chmod(2)). Missing folders are created. Returns the version that was written: any other
+  // version of the file is a later change of somebody else.
+  virtual Result<Version> Replace(const std::string& path, std::string_view text, const Version& expected,
+                                  unsigned mode) = 0;
 
   // Removes the file if it is in the state `expected`; else fails with kChangedBehind.
   virtual Status Remove(const std::string& path, const Version& expected) = 0;

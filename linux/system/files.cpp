@@ -78,6 +78,9 @@ class TemporaryFile {
 
   const Status& status() const { return status_; }
 
+  // After Replace(): the stamp that the target has unless somebody else has changed it since.
+  const FileStamp& stamp() const { return stamp_; }
+
   Status Write(std::string_view text) { return WriteAll(file_.get(), text, path_); }
 
   Status Sync() {
@@ -105,6 +108,9 @@ class TemporaryFile {
 
   // Atomic. Fails with kChangedBehind if the target is not in the expected state.
   Status Replace(const fs::path& target, const FileStamp& expected) {
+    struct stat filled {};
+    if (fstat(file_.get(), &filled) != 0) return Status::System(errno, path_);
+    stamp_ = StampOf(filled);
     if (renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, target.c_str(),
                   expected.exists ? RENAME_EXCHANGE : RENAME_NOREPLACE) == 0) {
       return expected.exists ? VerifyAndUnlink(target, expected) : Done();
@@ -122,7 +128,10 @@ class TemporaryFile {
   }
 
  private:
+  // Everything but the ctime was read before the file was visible: it cannot be that of an edit.
   Status Done() {
+    struct stat visible {};
+    if (fstat(file_.get(), &visible) == 0) stamp_.changed = StampOf(visible).changed;
     file_.Close();
     return {};
   }
@@ -143,6 +152,7 @@ class TemporaryFile {
 
   std::string path_;
   FileDescriptor file_;
+  FileStamp stamp_{};
   Status status_;
 };
 
@@ -260,7 +270,7 @@ Status MakeFolders(const std::string& path) {
   return SyncFolder(folder.parent_path());
 }
 
-Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode) {
+Result<FileStamp> ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode) {
   const fs::path folder = fs::path(path).parent_path();
   if (Status status = MakeFolders(folder); !status.ok()) return status;
   const Result<FileDescriptor> original = OpenOriginal(path);
@@ -271,7 +281,8 @@ Status ReplaceFile(const std::string& path, std::string_view text, const FileSta
   if (Status status = Fill(&temporary, *original, path, text, mode); !status.ok()) return status;
   if (Status status = CheckUnchanged(path, expected); !status.ok()) return status;
   if (Status status = temporary.Replace(path, expected); !status.ok()) return status;
-  return SyncFolder(folder);
+  if (Status status = SyncFolder(folder); !status.ok()) return status;
+  return temporary.stamp();
 }
 
 Status RemoveFile(const std::string& path, const FileStamp& expected) {

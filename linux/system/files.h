@@ -70,8 +70,10 @@ Status MakeFolders(const std::string& path);
 // A file that is a mount point cannot be replaced and fails with EBUSY. Fails with kChangedBehind, and leaves the file
 // alone, if it is no longer in the state `expected`. The two files are exchanged (renameat2(2)), so that even an edit
 // during the call is noticed; a file system without RENAME_EXCHANGE misses an edit of the last moment.
+// Returns the stamp of the new file: a later edit has another one, also an edit that follows immediately.
 // The caller holds the configuration lock: two calls for one file would disturb each other.
-Status ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected, mode_t mode = 0644);
+Result<FileStamp> ReplaceFile(const std::string& path, std::string_view text, const FileStamp& expected,
+                              mode_t mode = 0644);
 
 // Removes the file at `path` durably. Fails with kChangedBehind if it is not in the state `expected`. The
 // caller holds the configuration lock.

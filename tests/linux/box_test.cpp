@@ -5,6 +5,7 @@
 
 #include <cerrno>
 #include <memory>
+#include <optional>
 
 #include "call.h"
 #include "captured_log.h"
@@ -12,6 +13,7 @@
 #include "core.h"
 #include "current_box.h"
 #include "firewall.h"
+#include "injected_failures.h"
 #include "nfsconf.h"
 #include "processes.h"
 #include "temporary_root.h"
@@ -111,6 +113,35 @@ TEST(Box, AcceptsSeveralWritesOfOneContext) {
     EXPECT_TRUE(box.Replace(kFile, text, file->version).ok());
   }
   EXPECT_EQ(root.Read(kFile), "three");
+}
+
+// Writes twice in one context. Returns 1 if a write notices that somebody else has changed the file.
+int WriteTwice(Box& box, const Version& expected) {
+  const ConfigurationLock lock(box);
+  if (box.Replace(kFile, "one", expected).code() == kChangedBehind) return 1;
+  const Result<StoredFile> file = box.Read(kFile);
+  return box.Replace(kFile, "other", file->version).code() == kChangedBehind ? 1 : 0;
+}
+
+TEST(Box, TakesNoEditForAWriteOfItsContext) {
+  int call = 0;
+  for (;; ++call) {
+    const TemporaryRoot root;
+    root.Write(kFile, "old");
+    Box& box = CurrentBox();
+    const Version old = box.Read(kFile)->version;
+    bool is_over = false;
+    const std::optional<int> noticed = InterruptAtSystemCall(
+        call, [&] { return WriteTwice(box, old); },
+        [&] {
+          is_over = root.Read(kFile) == "other";
+          root.Write(kFile, "by hand");
+        });
+    if (!noticed) break;
+    ASSERT_EQ(root.Read(kFile), "by hand") << call;
+    ASSERT_EQ(*noticed == 0, is_over) << call;
+  }
+  EXPECT_GT(call, 20);
 }
 
 TEST(Box, ForgetsWhatAContextReadWhenItEnds) {

@@ -39,7 +39,7 @@ class Draft : public testing::Test {
   }
 
   void Write(const std::string& text, const std::string& path = kFile) {
-    const Status status = draft_.Replace(path, text, draft_.Read(path)->version, 0644);
+    const Status status = draft_.Replace(path, text, draft_.Read(path)->version, 0644).status();
     EXPECT_TRUE(status.ok()) << status.reason();
   }
 
@@ -61,7 +61,7 @@ TEST_F(Draft, ReadsThroughToTheStore) {
 TEST_F(Draft, FailsWhereTheStoreCannotRead) {
   std::filesystem::create_directories(root_.At(kFile));
   EXPECT_EQ(draft_.Read(kFile).status().code(), store_.Read(kFile).status().code());
-  EXPECT_EQ(draft_.Replace(kFile, "text", Version{}, 0644).code(), store_.Read(kFile).status().code());
+  EXPECT_EQ(draft_.Replace(kFile, "text", Version{}, 0644).status().code(), store_.Read(kFile).status().code());
 }
 
 TEST_F(Draft, KeepsWhatItReadFirst) {
@@ -122,9 +122,9 @@ TEST_F(Draft, RefusesAWriteOverAnotherVersion) {
   root_.Write(kFile, "text");
   const Version first = draft_.Read(kFile)->version;
   Write("changed");
-  EXPECT_EQ(draft_.Replace(kFile, "other", first, 0644).code(), kChangedBehind);
+  EXPECT_EQ(draft_.Replace(kFile, "other", first, 0644).status().code(), kChangedBehind);
   EXPECT_EQ(draft_.Remove(kFile, first).code(), kChangedBehind);
-  EXPECT_EQ(draft_.Replace(kFile, "other", Version{}, 0644).code(), kChangedBehind);
+  EXPECT_EQ(draft_.Replace(kFile, "other", Version{}, 0644).status().code(), kChangedBehind);
   EXPECT_EQ(Read(), "changed");
 }
 

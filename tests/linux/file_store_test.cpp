@@ -90,7 +90,7 @@ TEST(FileStore, ReplacesAndRemovesOnlyTheExpectedVersion) {
   FileStore store(Root::Current());
   EXPECT_TRUE(store.Replace(kFile, "one", Version{}, 0644).ok());
   const Version one = VersionOf(store);
-  EXPECT_EQ(store.Replace(kFile, "two", Version{}, 0644).code(), kChangedBehind);
+  EXPECT_EQ(store.Replace(kFile, "two", Version{}, 0644).status().code(), kChangedBehind);
   EXPECT_TRUE(store.Replace(kFile, "two", one, 0644).ok());
   EXPECT_EQ(store.Remove(kFile, one).code(), kChangedBehind);
   EXPECT_EQ(root.Read(kFile), "two");

@@ -29,7 +29,7 @@ constexpr char kFile[] = "/etc/file";
 Status Replace(const TemporaryRoot& root, std::string_view text, mode_t mode = 0644) {
   const Result<FileText> file = ReadFileOrNothing(root.At(kFile));
   if (!file.ok()) return file.status();
-  return ReplaceFile(root.At(kFile), text, file->stamp, mode);
+  return ReplaceFile(root.At(kFile), text, file->stamp, mode).status();
 }
 
 mode_t ModeOf(const std::string& path) {
@@ -84,7 +84,7 @@ TEST(ReadFile, RefusesAFileOfMoreThan64MiB) {
 TEST(ReplaceFile, MakesTheFileAndTheFoldersAboveItWhateverTheUmaskSays) {
   const TemporaryRoot root;
   const mode_t before = umask(077);
-  const Status status = ReplaceFile(root.At("/etc/nfs.conf.d/new.conf"), "text\n", FileStamp{}, 0640);
+  const Status status = ReplaceFile(root.At("/etc/nfs.conf.d/new.conf"), "text\n", FileStamp{}, 0640).status();
   umask(before);
   ASSERT_TRUE(status.ok()) << status.reason();
   EXPECT_EQ(root.Read("/etc/nfs.conf.d/new.conf"), "text\n");
@@ -148,7 +148,7 @@ TEST(ReplaceFile, WaitsForAProgramThatHasLockedTheFile) {
     return write(file.get(), "edited", 6) == 6 ? 0 : 3;
   });
   ASSERT_TRUE(Eventually([&] { return root.Read("/locked").has_value(); }));
-  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", expected).code(), kChangedBehind);
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", expected).status().code(), kChangedBehind);
   EXPECT_EQ(program.Wait(), 0);
   EXPECT_EQ(root.Read(kFile), "edited");
 }
@@ -181,7 +181,7 @@ TEST(ReplaceFile, NoticesAnEditBetweenReadAndWrite) {
     ASSERT_TRUE(HasInodeClockPassed(root, file->stamp.changed));
     c.edit();
     const std::optional<std::string> edited = root.Read(kFile);
-    EXPECT_EQ(ReplaceFile(path, "new", file->stamp).code(), kChangedBehind) << c.name;
+    EXPECT_EQ(ReplaceFile(path, "new", file->stamp).status().code(), kChangedBehind) << c.name;
     EXPECT_EQ(root.Read(kFile), edited) << c.name;
   }
 }
@@ -189,7 +189,7 @@ TEST(ReplaceFile, NoticesAnEditBetweenReadAndWrite) {
 TEST(ReplaceFile, NoticesAFileThatAppeared) {
   const TemporaryRoot root;
   root.Write(kFile, "somebody's");
-  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).code(), kChangedBehind);
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).status().code(), kChangedBehind);
   EXPECT_EQ(root.Read(kFile), "somebody's");
   EXPECT_EQ(root.Names("/etc"), Names{"file"});
 }
@@ -197,9 +197,9 @@ TEST(ReplaceFile, NoticesAFileThatAppeared) {
 TEST(ReplaceFile, RefusesATargetThatIsNoRegularFile) {
   const TemporaryRoot root;
   fs::create_directories(root.At("/etc/file"));
-  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).code(), EINVAL);
+  EXPECT_EQ(ReplaceFile(root.At(kFile), "new", FileStamp{}).status().code(), EINVAL);
   fs::create_symlink("file", root.At("/etc/link"));
-  EXPECT_EQ(ReplaceFile(root.At("/etc/link"), "new", FileStamp{}).code(), EINVAL);
+  EXPECT_EQ(ReplaceFile(root.At("/etc/link"), "new", FileStamp{}).status().code(), EINVAL);
   EXPECT_EQ(root.Names("/etc"), (Names{"file", "link"}));
 }
 
@@ -232,7 +232,7 @@ TEST(ReplaceFile, LeavesAWholeFileAndNothingElseWhicheverSystemCallFails) {
     ChildProcess writer([&] {
       const Result<FileText> file = ReadFile(root.At(kFile));
       if (!FailSystemCall(c.number, EIO)) return 99;
-      return ReplaceFile(root.At(kFile), "new", file->stamp).code();
+      return ReplaceFile(root.At(kFile), "new", file->stamp).status().code();
     });
     EXPECT_EQ(writer.Wait(), EIO) << c.name;
     EXPECT_EQ(root.Read(kFile), c.left) << c.name;
@@ -266,7 +266,14 @@ void EditByReplacing(const TemporaryRoot& root) {
 
 using Edit = void (*)(const TemporaryRoot& root);
 
-// Makes an edit at system call number `call` of a write. Returns whether the write made that many calls.
+// Returns 1 if one of two writes, one after the other, notices that somebody else has changed the file.
+int WriteTwice(const TemporaryRoot& root, const FileStamp& read) {
+  const Result<FileStamp> written = ReplaceFile(root.At(kFile), "new", read);
+  if (!written.ok()) return written.status().code() == kChangedBehind ? 1 : 0;
+  return ReplaceFile(root.At(kFile), "newer", *written).status().code() == kChangedBehind ? 1 : 0;
+}
+
+// Makes an edit at system call number `call` of two writes. Returns whether the writes made that many calls.
 bool KeepsTheEditAt(int call, const char* before, Edit edit) {
   const TemporaryRoot root;
   fs::create_directory(root.At("/etc"));
@@ -274,9 +281,9 @@ bool KeepsTheEditAt(int call, const char* before, Edit edit) {
   const FileStamp read = ReadFileOrNothing(root.At(kFile))->stamp;
   bool edit_is_later = false;
   const std::optional<int> noticed = InterruptAtSystemCall(
-      call, [&] { return ReplaceFile(root.At(kFile), "new", read).code() == kChangedBehind ? 1 : 0; },
+      call, [&] { return WriteTwice(root, read); },
       [&] {
-        edit_is_later = root.Read(kFile) == "new";
+        edit_is_later = root.Read(kFile) == "newer";
         edit(root);
       });
   if (!noticed) return false;

@@ -57,8 +57,7 @@ struct AccessCheck {
     kFailed,
     kUnknown  // the box cannot tell; the sentence says why
   };
-  std::string
-      check;  // "service", "version", "name", "rule", "flavor", "port", "identity", "permissions", "firewall", ...
+  std::string check;  // "service", "version", "firewall", "name", "rule", "flavor", "port", "way", "read", "write", ...
   Result result = Result::kPassed;
   std::string text;    // a sentence
   std::string remedy;  // what would have to change; empty unless the condition failed

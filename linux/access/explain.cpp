@@ -1,26 +1,34 @@
 #include "explain.h"
 
 #include <algorithm>
-#include <cerrno>
+#include <optional>
+#include <set>
 #include <string>
 #include <utility>
+#include <vector>
 
+#include "access_checks.h"
 #include "client_host.h"
+#include "client_identity.h"
 #include "export_decision.h"
 #include "exports_in_force.h"
-#include "kernel_statistics.h"
+#include "folder_permissions.h"
+#include "keytab.h"
 #include "mounts.h"
+#include "service_checks.h"
 #include "shares.h"
 #include "unicode.h"
 
 namespace vorn {
 namespace {
 
-using Check = VORN::AccessCheck;
-using CheckResult = VORN::AccessCheck::Result;
 using Outcome = ExportDecision::Outcome;
 
 constexpr int kFirstUnreservedPort = 1024;
+constexpr std::uint32_t kNobody = 65534;
+constexpr unsigned kList = 4;  // the permission bits of a folder
+constexpr unsigned kChange = 2;
+constexpr unsigned kEnter = 1;
 
 struct KindText {
   const char* name;
@@ -83,142 +91,210 @@ VORN::AccessRule OtherRule(const TableExport& one, const TableExport* decider, E
 // Answers one question.
 class Explanation {
  public:
-  Explanation(const VORN::AccessQuestion& question, std::string path, const ExportsInForce& in_force, ClientHost client)
-      : question_(question), path_(std::move(path)), in_force_(in_force), client_(std::move(client)) {}
+  Explanation(Box& box, const VORN::AccessQuestion& question, std::string path, const ExportsInForce& in_force)
+      : box_(box), question_(question), path_(std::move(path)), in_force_(in_force) {}
 
-  VORN::AccessAnswer Answer(const NameService& names, std::set<std::string> mount_points) {
-    answer_.path = ToValidUtf8(path_);
+  Result<VORN::AccessAnswer> Answer(const NameService& names, ClientHost client, std::set<std::string> mount_points) {
     HostAddresses hosts = in_force_.hosts;
-    const auto matches = [&](const TableExport& one) { return MatchesExport(&client_, one, names, &hosts); };
+    const auto matches = [&](const TableExport& one) { return MatchesExport(&client, one, names, &hosts); };
     decision_ = DecideExport(in_force_.exports, {path_, question_.version != "3", std::move(mount_points), matches});
-    answer_.addresses = client_.addresses;
-    answer_.names = client_.names;
+    if (decision_.decider) decider_ = &in_force_.exports[*decision_.decider];
     AddRules();
-    CheckName();
+    if (Status status = CheckService(box_, question_.version, &checks_); !status.ok()) return status;
+    CheckName(client);
+    if (decider_ != nullptr) CheckMount();
+    if (question_.version != "3" && decision_.outcome != Outcome::kNone) CheckWay();
+    // NFSv4 lets a client mount a folder that is only the way to exports inside it, and shows nothing else there.
+    const bool is_open = decision_.outcome == Outcome::kRule || decision_.outcome == Outcome::kPassage;
+    answer_.mountable = is_open && !checks_.HasFailed();
     CheckRule();
-    if (decider() != nullptr) {
-      CheckFlavor();
-      CheckPort();
-    }
-    Conclude();
+    if (Status status = CheckFolder(); !status.ok()) return status;
+    answer_.path = ToValidUtf8(path_);
+    answer_.addresses = std::move(client.addresses);
+    for (const std::string& name : client.names) answer_.names.push_back(ToValidUtf8(name));
+    CheckReload();  // not a condition: the table in force decides
+    answer_.checks = checks_.list();
     return std::move(answer_);
   }
 
  private:
-  const TableExport* decider() const { return decision_.decider ? &in_force_.exports[*decision_.decider] : nullptr; }
-
-  void Add(const char* check, CheckResult result, const std::string& text, const std::string& remedy = "") {
-    answer_.checks.push_back({check, result, ToValidUtf8(text), ToValidUtf8(remedy)});
-  }
-
   void AddRules() {
-    if (decider() != nullptr) {
-      answer_.rule = RuleOf(*decider(), "decides", Described(*decider()) + " decides.");
-    }
+    if (decider_ != nullptr) answer_.rule = RuleOf(*decider_, "decides", Described(*decider_) + " decides.");
     for (const ExportDecision::Other& other : decision_.others) {
-      answer_.others.push_back(OtherRule(in_force_.exports[other.index], decider(), other.reason));
+      answer_.others.push_back(OtherRule(in_force_.exports[other.index], decider_, other.reason));
     }
   }
 
-  void CheckName() {
-    if (client_.is_away || in_force_.is_name_service_away) {
-      return Add(
-          "name", CheckResult::kUnknown,
-          "The name service did not answer, so that rules for host names, patterns and netgroups may be missing.");
+  void CheckName(const ClientHost& client) {
+    if (client.is_away || in_force_.is_name_service_away) {
+      checks_.Doubt("name",
+                    "The name service did not answer. Rules for host names, patterns and netgroups may be missing.");
+    } else if (client.addresses.empty()) {
+      checks_.Fail("name", "The name service has no address for " + Quoted(question_.client) + ".",
+                   "Enter the host in the name service, or in /etc/hosts of the box.");
+    } else {
+      checks_.Pass("name", "The client has the address " + client.addresses.front() + ".");
     }
-    if (!client_.addresses.empty()) {
-      return Add("name", CheckResult::kPassed, "The client has the address " + client_.addresses.front() + ".");
-    }
-    Add("name", CheckResult::kFailed, "The name service has no address for " + Quoted(question_.client) + ".",
-        "Enter the host in the name service or in /etc/hosts of the box.");
+  }
+
+  void CheckReload() {
+    if (in_force_.pending.count(path_) == 0) return;
+    checks_.Fail("reload", "The exports files have other rules for " + path_ + " than those in force.",
+                 "Reload the NFS service.");
   }
 
   void CheckRule() {
-    if (in_force_.pending.count(path_) != 0) {
-      Add("reload", CheckResult::kFailed, "The exports files have other rules for " + path_ + " than those in force.",
-          "Reload the NFS service.");
-    }
     switch (decision_.outcome) {
       case Outcome::kRule:
-        return Add("rule", CheckResult::kPassed, answer_.rule->text);
+        return checks_.Pass("rule", answer_.rule->text);
       case Outcome::kNone:
-        return Add("rule", CheckResult::kFailed,
-                   "No export rule of " + path_ +
-                       " or of a folder around it is for this "
-                       "client.",
-                   "Add a rule for the client.");
+        return checks_.Fail("rule", "No export rule of " + path_ + " or of a folder around it is for this client.",
+                            "Add a rule for the client.");
       case Outcome::kPassage:
-        return Add("rule", CheckResult::kFailed,
-                   "Only folders inside of " + path_ +
-                       " are exported to this client. "
-                       "NFSv4 shows it as the way to them.",
-                   "Add a rule for the client.");
+        return checks_.Fail("rule",
+                            "Only folders inside of " + path_ + " are exported to this client; NFSv4 shows " + path_ +
+                                " as the way to them.",
+                            "Add a rule for the client.");
       case Outcome::kHidden:
-        return Add("rule", CheckResult::kFailed,
-                   "Another file system is mounted on the way to " + path_ + ", and no rule opens it to this client.",
-                   "Add a rule for the client to this share.");
+        return checks_.Fail(
+            "rule", "Another file system is mounted on the way to " + path_ + ", and no rule opens it to this client.",
+            "Add a rule for the client to this share.");
       case Outcome::kFolder:
-        return Add("rule", CheckResult::kFailed,
-                   Described(*decider()) +
-                       " is for another file system and has no "
-                       "\"crossmnt\".",
-                   "Add a rule for the client to this share.");
+        return checks_.Fail("rule", Described(*decider_) + " is for another file system and has no \"crossmnt\".",
+                            "Add a rule for the client to this share.");
     }
   }
 
-  const ExportFlavor* Flavor() const {
-    const std::vector<ExportFlavor>& flavors = decider()->options.flavors;
+  // The conditions of a mount besides the rule itself.
+  void CheckMount() {
+    const std::vector<ExportFlavor>& flavors = decider_->options.flavors;
     const auto found = std::find_if(flavors.begin(), flavors.end(),
                                     [&](const ExportFlavor& flavor) { return flavor.name == question_.flavor; });
-    return found == flavors.end() ? nullptr : &*found;
+    if (found != flavors.end()) access_ = found->access;
+    CheckFlavor();
+    CheckPort();
+    CheckKeytab();
   }
 
   void CheckFlavor() {
-    if (Flavor() != nullptr) {
-      return Add("flavor", CheckResult::kPassed, "The rule accepts the security flavour " + question_.flavor + ".");
+    if (access_) {
+      return checks_.Pass("flavor", "The rule accepts the security flavour " + question_.flavor + ".");
     }
     std::string accepted;
-    for (const ExportFlavor& flavor : decider()->options.flavors)
+    for (const ExportFlavor& flavor : decider_->options.flavors) {
       accepted += (accepted.empty() ? "" : ", ") + flavor.name;
-    Add("flavor", CheckResult::kFailed,
-        "The rule does not accept the security flavour " + question_.flavor + ", but " + accepted + ".",
-        "Mount with another flavour, or add " + question_.flavor + " to the rule.");
+    }
+    checks_.Fail("flavor", "The rule accepts " + accepted + " and not the security flavour " + question_.flavor + ".",
+                 "Mount with another flavour, or add " + question_.flavor + " to the rule.");
   }
 
   // rpc.mountd(8) looks at the port of every version 3 client, nfsd at that of those without Kerberos. mountd takes the
   // option that stands last in the table.
   bool NeedsReservedPort() const {
-    if (question_.version == "3" && !decider()->options.flavors.back().access.insecure) return true;
-    return question_.flavor == "sys" && Flavor() != nullptr && !Flavor()->access.insecure;
+    if (question_.version == "3" && !decider_->options.flavors.back().access.insecure) return true;
+    return question_.flavor == "sys" && access_ && !access_->insecure;
   }
 
   void CheckPort() {
-    if (question_.port < kFirstUnreservedPort) {
-      return Add("port", CheckResult::kPassed, "The client uses a reserved port.");
-    }
+    if (question_.port < kFirstUnreservedPort) return checks_.Pass("port", "The client uses a reserved port.");
     const std::string port = std::to_string(question_.port);
-    if (!NeedsReservedPort()) {
-      return Add("port", CheckResult::kPassed, "The rule accepts the port " + port + ".");
+    if (!NeedsReservedPort()) return checks_.Pass("port", "The rule accepts the port " + port + ".");
+    checks_.Fail("port", "The rule accepts ports below 1024 only (\"secure\"); the client uses " + port + ".",
+                 "Mount from a reserved port, or accept other ports (\"insecure\").");
+  }
+
+  void CheckKeytab() {
+    if (question_.flavor == "sys" || box_.Exists(kKeytabFile)) return;
+    checks_.Fail("keytab", "The box has no keytab, so no client can use Kerberos.", "Upload a keytab.");
+  }
+
+  // Over version 4 the root user of the client walks to the folder. The folders above the rule's one are shown with
+  // root squashed to nobody, those below it under the options of the rule.
+  void CheckWay() {
+    VORN::AccessIdentity root;
+    root.user_id = root.group_id = kNobody;
+    for (const std::string& folder : FoldersAbove(path_)) {
+      const bool is_in_rule = decider_ != nullptr && folder.size() >= decider_->directory.size();
+      if (is_in_rule && access_) root = Squash({}, *access_, *decider_);
+      const Result<FolderPermissions> permissions = ReadFolderPermissions(box_, folder);
+      if (!permissions.ok() || permissions->Of(root, kEnter) == kEnter) continue;
+      return checks_.Fail("way",
+                          "The folder " + folder + " may not be entered by the user " + std::to_string(root.user_id) +
+                              ", as whom the client's root user walks to the share.",
+                          "Let others enter " + folder + ", or mount with version 3.");
     }
-    Add("port", CheckResult::kFailed,
-        "The rule accepts ports below 1024 only (\"secure\"); the client uses " + port + ".",
-        "Mount from a reserved port, or accept other ports (\"insecure\").");
   }
 
-  void Conclude() {
-    const bool is_open = std::none_of(answer_.checks.begin(), answer_.checks.end(), [](const Check& check) {
-      return check.result == CheckResult::kFailed && check.check != "reload";
-    });
-    answer_.mountable = is_open && decision_.outcome == Outcome::kRule;
-    answer_.read = answer_.mountable;
-    answer_.write = answer_.mountable && !Flavor()->access.read_only;
+  static std::vector<std::string> FoldersAbove(const std::string& path) {
+    std::vector<std::string> folders = {"/"};
+    for (std::size_t end = path.find('/', 1); end != std::string::npos; end = path.find('/', end + 1)) {
+      folders.push_back(path.substr(0, end));
+    }
+    return folders;
   }
 
+  // Checks the rights of the user in the folder itself.
+  Status CheckFolder() {
+    std::optional<ClientIDs> ids;
+    if (!question_.user.empty()) {
+      Result<ClientIDs> found = FindClientIDs(box_, question_);
+      if (!found.ok()) return found.status();
+      ids = std::move(*found);
+    }
+    if (decision_.outcome != Outcome::kRule || !access_) return {};
+    const Result<FolderPermissions> folder = ReadFolderPermissions(box_, path_);
+    if (!folder.ok()) {
+      checks_.Fail("folder", folder.status().reason(), "Create the folder, or mount its file system.");
+      answer_.mountable = false;
+      return {};
+    }
+    if (ids && ids->is_refused) {
+      for (const char* check : {"read", "write"}) checks_.Fail(check, ids->identity.text, "Correct the mapping.");
+      return {};
+    }
+    if (ids) SetIdentity(Squash(*ids, *access_, *decider_));
+    CheckPermission("read", kList | kEnter, "list", *folder);
+    CheckWrite(*folder);
+    answer_.read = answer_.mountable && !checks_.HasFailed("read");
+    answer_.write = answer_.mountable && !checks_.HasFailed("write");
+    return {};
+  }
+
+  void SetIdentity(VORN::AccessIdentity identity) {
+    identity.text = ToValidUtf8(identity.text);
+    identity.file = ToValidUtf8(identity.file);
+    answer_.identity = std::move(identity);
+  }
+
+  void CheckWrite(const FolderPermissions& folder) {
+    if (access_->read_only) {
+      checks_.Fail("write", "The rule is read-only.", "Give the rule the privilege to write.");
+    } else if (folder.is_read_only) {
+      checks_.Fail("write", "The file system of " + path_ + " is mounted read-only.", "Mount it for writing.");
+    } else {
+      CheckPermission("write", kChange | kEnter, "change", folder);
+    }
+  }
+
+  void CheckPermission(const char* check, unsigned wanted, const char* what, const FolderPermissions& folder) {
+    if (!answer_.identity) return;
+    const std::string user = "The user " + std::to_string(answer_.identity->user_id);
+    const std::string permission = std::string(" may ") + what + " the folder " + path_ + ".";
+    if (folder.Of(*answer_.identity, wanted) == wanted) return checks_.Pass(check, user + permission);
+    checks_.Fail(check,
+                 "By its UNIX permissions, the user " + std::to_string(answer_.identity->user_id) + " may not " + what +
+                     " the folder " + path_ + ".",
+                 "Change the owner or the permissions of the folder, or the user as whom the server acts.");
+  }
+
+  Box& box_;
   const VORN::AccessQuestion& question_;
   const std::string path_;
   const ExportsInForce& in_force_;
-  ClientHost client_;
   ExportDecision decision_;
+  const TableExport* decider_ = nullptr;
+  std::optional<ExportAccess> access_;  // of the flavour of the question
+  AccessChecks checks_;
   VORN::AccessAnswer answer_;
 };
 
@@ -226,11 +302,6 @@ bool NeedsNames(const ExportList& exports) {
   return std::any_of(exports.begin(), exports.end(), [](const TableExport& one) {
     return one.kind == ExportKind::kPattern || one.kind == ExportKind::kNetgroup;
   });
-}
-
-bool IsServing(Box& box) {
-  const Result<StoredFile> file = box.Read(kKernelStatistics);
-  return file.ok() && file->version.exists && ParseKernelStatistics(file->text).threads > 0;
 }
 
 }  // namespace
@@ -243,8 +314,8 @@ Result<VORN::AccessAnswer> ExplainAccess(Box& box, const NameService& names, con
   const Result<std::vector<std::string>> mounts = MountsBelow(box, "/");
   if (!mounts.ok()) return mounts.status();
   ClientHost client = FindClientHost(question.client, names, NeedsNames(in_force->exports));
-  Explanation explanation(question, std::move(*path), *in_force, std::move(client));
-  return explanation.Answer(names, {mounts->begin(), mounts->end()});
+  Explanation explanation(box, question, std::move(*path), *in_force);
+  return explanation.Answer(names, std::move(client), {mounts->begin(), mounts->end()});
 }
 
 }  // namespace vorn

@@ -45,16 +45,22 @@ Status Load(const std::string& ruleset) {
   return Status::Failure(kServiceFailed, std::string("nftables: ") + nft_ctx_get_error_buffer(context.get()));
 }
 
-// Logs once what keeps the ports closed. Only a remark: other programs decide over their own tables.
-void NoticeClosedPorts(const std::vector<ConfiguredPort>& ports) {
+std::optional<std::vector<std::string>> FindClosedPorts(const std::vector<ConfiguredPort>& ports) {
   const std::unique_ptr<nft_ctx, FreeContext> context(nft_ctx_new(NFT_CTX_DEFAULT));
-  if (!context) return;
+  if (!context) return std::nullopt;
   nft_ctx_buffer_error(context.get());
   nft_ctx_buffer_output(context.get());
   nft_ctx_output_set_flags(context.get(), NFT_CTX_OUTPUT_STATELESS);
-  if (nft_run_cmd_from_buffer(context.get(), "list ruleset") != 0) return;
-  const char* ruleset = nft_ctx_get_output_buffer(context.get());
-  for (const std::string& sentence : FindClosedFirewalls(ruleset, ports)) NoticeOnce("nftables", Version(), sentence);
+  if (nft_run_cmd_from_buffer(context.get(), "list ruleset") != 0) return std::nullopt;
+  return FindClosedFirewalls(nft_ctx_get_output_buffer(context.get()), ports);
+}
+
+// Logs once what keeps the ports closed. Only a remark: other programs decide over their own tables.
+void NoticeClosedPorts(const std::vector<ConfiguredPort>& ports) {
+  const std::optional<std::vector<std::string>> closed = FindClosedPorts(ports);
+  for (const std::string& sentence : closed ? *closed : std::vector<std::string>()) {
+    NoticeOnce("nftables", Version(), sentence);
+  }
 }
 
 Status Save(Box& box, const std::string& ruleset) {
@@ -78,6 +84,10 @@ Status UpdateFirewall(Box& box) {
   if (Status status = Load(ruleset); !status.ok()) return status;
   NoticeClosedPorts(*ports);
   return {};
+}
+
+std::optional<std::vector<std::string>> DescribeClosedPorts(Box& box, const std::vector<ConfiguredPort>& ports) {
+  return box.root().is_box() ? FindClosedPorts(ports) : std::nullopt;
 }
 
 }  // namespace vorn

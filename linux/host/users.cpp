@@ -1,5 +1,6 @@
 #include "users.h"
 
+#include <grp.h>
 #include <pwd.h>
 
 #include <algorithm>
@@ -7,6 +8,7 @@
 #include <cstdio>
 #include <iterator>
 #include <sstream>
+#include <utility>
 
 namespace vorn {
 namespace {
@@ -27,6 +29,23 @@ Result<Accounts> ParseAccounts(StoredFile file) {
     accounts.push_back({account.pw_name, account.pw_uid, account.pw_gid});
   }
   return accounts;
+}
+
+Result<Groups> ParseGroups(StoredFile file) {
+  Groups groups;
+  if (file.text.empty()) return groups;
+  const std::unique_ptr<std::FILE, CloseFile> stream(fmemopen(file.text.data(), file.text.size(), "r"));
+  if (stream == nullptr) return Status::System(errno, file.location);
+  // fgetgrent_r also puts the list of members there, a pointer for at most each second byte of the line.
+  std::vector<char> line((file.text.size() + 2) * sizeof(char*));
+  group entry{};
+  group* found = nullptr;
+  while (fgetgrent_r(stream.get(), &entry, line.data(), line.size(), &found) == 0) {
+    Group one{entry.gr_name, entry.gr_gid, {}};
+    for (char** member = entry.gr_mem; *member != nullptr; ++member) one.members.emplace_back(*member);
+    groups.push_back(std::move(one));
+  }
+  return groups;
 }
 
 // The user ids of people: login.defs(5).
@@ -54,6 +73,8 @@ Result<UserIds> ParseUserIds(const StoredFile& file) {
 Result<std::shared_ptr<const Accounts>> ReadAccounts(Box& box) {
   return box.Load<Accounts>("/etc/passwd", ParseAccounts);
 }
+
+Result<std::shared_ptr<const Groups>> ReadGroups(Box& box) { return box.Load<Groups>("/etc/group", ParseGroups); }
 
 Result<Accounts> ReadLocalUsers(Box& box) {
   const auto accounts = ReadAccounts(box);

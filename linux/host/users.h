@@ -27,6 +27,18 @@ Result<std::shared_ptr<const Accounts>> ReadAccounts(Box& box);
 // The accounts of people: their user ids are from UID_MIN to UID_MAX of login.defs(5).
 Result<Accounts> ReadLocalUsers(Box& box);
 
+struct Group {
+  std::string name;
+  unsigned group_id = 0;
+  std::vector<std::string> members;  // names of accounts; those whose own group it is are mostly not among them
+};
+
+// Every group of group(5), in the order of the file.
+using Groups = std::vector<Group>;
+
+// The groups of the box, shared by all who read the same version of the file.
+Result<std::shared_ptr<const Groups>> ReadGroups(Box& box);
+
 // The account of this name; nullopt if there is none.
 std::optional<Account> FindAccount(const Accounts& accounts, const std::string& name);
 

@@ -31,7 +31,7 @@ ALLOWED = {
     "linux/service": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/settings", "platform"},
     "linux/access": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
-        "linux/idmap", "linux/settings", "linux/service", "platform"},
+        "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "platform"},
     "linux/contract": {
         "linux/access", "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
         "linux/idmap", "linux/kerberos", "linux/service", "platform"},

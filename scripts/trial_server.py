@@ -1,5 +1,6 @@
 """A vornd of the release build that serves a fresh trial root in a temporary folder, called over its Unix socket."""
 
+import base64
 import http.client
 import json
 import os
@@ -15,6 +16,21 @@ PROJECT = pathlib.Path(__file__).resolve().parent.parent
 VORND = os.environ.get("VORND", PROJECT / "build/release/bin/vornd")
 PATIENCE = 60  # seconds until vornd serves, and until it has ended
 BOUNDARY = "trial-server-boundary"
+
+# Tokens, sessions and codes, and the passwords of the tests.
+SECRET = re.compile(r"vorn[sc]?_[0-9a-f]{16}|Passphrase-of-|PRIVATE KEY")
+PRINTED_LINK = re.compile(r"^Sign in once, within .*$", re.MULTILINE)
+
+
+def expect_no_secret(log, secrets=()):
+    """Fails if a log has a secret. `secrets` are further ones: bytes, which may be quoted in hexadecimal or base64."""
+    text = PRINTED_LINK.sub("", log)  # printed to the standard output, which the tests keep in the same file
+    spellings = [spelling for secret in secrets
+                 for spelling in (secret.decode("latin-1"), secret.hex(), secret.hex().upper(),
+                                  base64.b64encode(secret).decode().rstrip("="))]
+    found = [line for line in text.splitlines() if SECRET.search(line) or any(word in line for word in spellings)]
+    if found:
+        raise AssertionError(f"a secret is logged: {found[:3]}")
 
 
 class UnixConnection(http.client.HTTPConnection):
@@ -34,6 +50,7 @@ class TrialServer:
     """Serves until the end of the "with" statement."""
 
     def __enter__(self):
+        self._keys = []
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))  # a short path: a socket has 107 bytes at most
         self.root = self.folder / "root"
         shutil.copytree(PROJECT / "scripts/trial", self.root)
@@ -56,7 +73,9 @@ class TrialServer:
     def __exit__(self, *_):
         self._process.terminate()
         self._process.wait(PATIENCE)
+        log = self.log()
         shutil.rmtree(self.folder)
+        expect_no_secret(log, self._keys)
 
     def _await(self):
         limit = time.monotonic() + PATIENCE
@@ -105,7 +124,9 @@ class TrialServer:
         file = self.folder / "nfs.keytab"
         commands = ["addent -password -p nfs/box.example@STORAGE.EXAMPLE -k 1 -e aes256-cts", "secret", f"wkt {file}"]
         subprocess.run(["ktutil"], input="\n".join(commands) + "\n", text=True, check=True, capture_output=True)
-        return file.read_bytes()
+        content = file.read_bytes()
+        self._keys.append(content[-36:-4])  # a key of 256 bits, before the 32-bit key version
+        return content
 
 
 def try_example(server, path, operation, name):

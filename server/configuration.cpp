@@ -1,10 +1,12 @@
 #include "configuration.h"
 
+#include <cerrno>
 #include <optional>
 #include <string_view>
 #include <utility>
 
 #include "settings_file.h"
+#include "small_file.h"
 
 namespace vorn::server {
 namespace {
@@ -50,9 +52,10 @@ std::string ConfigurationPath(const Options& options) {
 Configuration LoadConfiguration(const Options& options) {
   const std::string path = ConfigurationPath(options);
   std::string error;
-  const std::optional<std::string> text = ReadSettingsText(path, !options.config.empty(), &error);
-  if (!text) return {{}, {error}};
-  SettingsFile file = ParseSettings(*text);
+  const std::optional<SmallFile> content = ReadSmallFile(path, &error);
+  const bool may_be_missing = options.config.empty() && errno == ENOENT;
+  if (!content && !may_be_missing) return {{}, {error}};
+  SettingsFile file = ParseSettings(content ? content->text : "");
   Configuration loaded{std::move(file.settings)};
   for (const FileFault& fault : file.faults) loaded.faults.push_back(At(path, fault.place) + fault.text);
   for (const Override& each : OverridesOf(options)) {

@@ -1,14 +1,11 @@
 // vornd: constructs the parts in the order of their dependencies, and runs the server.
-#include <grp.h>
 #include <sys/socket.h>
 #include <syslog.h>
-#include <systemd/sd-daemon.h>
 #include <unistd.h>
 
 #include <chrono>
 #include <climits>
 #include <cstddef>
-#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
@@ -33,16 +30,20 @@
 #include "module.h"
 #include "options.h"
 #include "password_checker.h"
+#include "program_folders.h"
 #include "recovery.h"
+#include "reload.h"
 #include "routes.h"
 #include "runtime_folder.h"
 #include "server_methods.h"
 #include "server_metrics.h"
 #include "sessions.h"
 #include "sha256.h"
+#include "systemd.h"
 #include "termination.h"
 #include "tls.h"
 #include "tls_files.h"
+#include "tls_upkeep.h"
 #include "token_store.h"
 #include "upload.h"
 #include "web_api.h"
@@ -51,62 +52,8 @@
 namespace vorn::server {
 namespace {
 
-constexpr const char* kHelperName = "vorn-pam-helper";
 constexpr std::chrono::seconds kStopLimit{10};  // for running calls, after SIGTERM
 constexpr std::chrono::hours kLookAfter{12};    // between two looks after what changes with time
-
-// systemd copies standard error into the journal, which also receives syslog(3): each line would be logged twice.
-bool StartedBySystemd() {
-  const char* pid = std::getenv("SYSTEMD_EXEC_PID");
-  return pid != nullptr && pid == std::to_string(getpid());
-}
-
-// Notifies systemd if it started this process with Type=notify (sd_notify(3)); otherwise does nothing.
-void Notify(const char* state) { sd_notify(0, state); }
-
-void NotifyReloading() {
-  timespec now{};
-  clock_gettime(CLOCK_MONOTONIC, &now);
-  const auto microseconds = std::int64_t{now.tv_sec} * 1000000 + now.tv_nsec / 1000;
-  Notify(("RELOADING=1\nMONOTONIC_USEC=" + std::to_string(microseconds)).c_str());
-}
-
-// The folder of this program.
-std::filesystem::path ProgramFolder() {
-  std::error_code failure;
-  return std::filesystem::read_symlink("/proc/self/exe", failure).parent_path();
-}
-
-// Returns the module folder of the build tree if there is one, otherwise that of the installation.
-std::string DefaultModuleFolder() {
-  std::error_code failure;
-  const auto prefix = ProgramFolder().parent_path();
-  const auto installed = prefix / VORN_MODULE_FOLDER;
-  const auto built = prefix / "modules";
-  return std::filesystem::is_directory(built, failure) ? built.string() : installed.string();
-}
-
-// The command of the program that checks passwords. In the build tree it is beside this program.
-std::vector<std::string> PasswordHelper(const Options& options, const Settings& settings) {
-  std::error_code failure;
-  const auto built = ProgramFolder() / kHelperName;
-  const auto installed = ProgramFolder().parent_path() / VORN_HELPER_FOLDER / kHelperName;
-  return {std::filesystem::exists(built, failure) ? built.string() : installed.string(), options.root,
-          settings.administrators.name, settings.readers.name};
-}
-
-// Returns the number of a group of this system; std::nullopt, which is logged, if there is none.
-std::optional<gid_t> GroupId(const std::string& name) {
-  if (const group* found = getgrnam(name.c_str()); found != nullptr) return found->gr_gid;
-  syslog(LOG_NOTICE, "There is no group %s: nobody has its rights", name.c_str());
-  return std::nullopt;
-}
-
-// The groups in a trial root are not those of the processes that connect to its socket.
-LocalGroups GroupsAtSocket(const Options& options, const Settings& settings) {
-  if (options.root != "/") return {};
-  return {GroupId(settings.administrators.name), GroupId(settings.readers.name)};
-}
 
 // Printed, never logged.
 void PrintSignInLink(const std::vector<Listener>& listeners, Sessions* sessions) {
@@ -155,98 +102,6 @@ std::optional<std::vector<Listener>> Listen(const Settings& settings, const Runt
   return listeners;
 }
 
-// The file of the self-signed certificate. The state folder may be missing.
-std::string SelfSignedPath(const Options& options) {
-  return (options.root == "/" ? "" : options.root) + "/var/lib/vorn/self-signed.pem";
-}
-
-// Makes new connections use the identity, and logs its fingerprint if it is another one than before.
-void Use(const TlsIdentityPtr& identity, TlsServer* tls) {
-  const TlsIdentityPtr before = tls->identity();
-  tls->Replace(identity);
-  if (before && before->fingerprint() == identity->fingerprint()) return;
-  syslog(LOG_NOTICE, "The TLS certificate has the SHA-256 fingerprint %s", identity->fingerprint().c_str());
-}
-
-// Returns the value of the header; empty if it is not to be sent.
-std::string StrictTransport(const Settings& settings) {
-  const auto seconds = settings.strict_transport.time.count();
-  return seconds == 0 ? "" : "max-age=" + std::to_string(seconds);
-}
-
-// Looks after the certificate, which expires while the server runs.
-void Maintain(const Options& options, const Settings& settings, TlsServer* tls) {
-  if (tls == nullptr) return;
-  const std::time_t now = std::time(nullptr);
-  if (settings.certificate.path.empty()) {
-    std::string error;
-    const TlsIdentityPtr identity = OpenTlsIdentity(settings, SelfSignedPath(options), now, &error);
-    if (!identity) return syslog(LOG_ERR, "%s", error.c_str());
-    Use(identity, tls);
-  }
-  const std::string warning = ExpiryWarning(*tls->identity(), now);
-  if (!warning.empty()) syslog(LOG_WARNING, "%s", warning.c_str());
-}
-
-// The objects that a reload changes.
-struct Reloadable {
-  Sessions& sessions;
-  Authenticator& authenticator;
-  PasswordChecker& passwords;
-  OwnNames& names;
-  TlsServer* tls;  // null: no listener has TLS
-};
-
-PasswordChecker::Limits PasswordLimits(const Settings& settings) {
-  PasswordChecker::Limits limits;
-  limits.deadline = settings.password_time.time;
-  return limits;
-}
-
-Sessions::Limits SessionLimits(const Settings& settings) {
-  Sessions::Limits limits;
-  limits.idle = settings.session_idle.time;
-  limits.lifetime = settings.session_lifetime.time;
-  limits.per_account = settings.sessions_per_account.number;
-  limits.total = settings.sessions.number;
-  return limits;
-}
-
-// Applies the settings that may change while the server runs.
-void Apply(const Options& options, const Settings& settings, const Reloadable& parts) {
-  setlogmask(LOG_UPTO(settings.log_level.priority));
-  parts.sessions.SetLimits(SessionLimits(settings));
-  parts.authenticator.SetGroups(GroupsAtSocket(options, settings));
-  parts.passwords.SetCommand(PasswordHelper(options, settings));
-  parts.names.Set(settings.host_names.each);
-  if (parts.tls != nullptr) parts.tls->SetStrictTransport(StrictTransport(settings));
-}
-
-// Reads the configuration again. If it has a fault, nothing changes.
-void Reload(const Options& options, const Reloadable& parts, Settings* settings) {
-  NotifyReloading();
-  Configuration next = LoadConfiguration(options);
-  TlsIdentityPtr identity;
-  if (parts.tls != nullptr && next.faults.empty()) {
-    std::string error;
-    identity = OpenTlsIdentity(next.settings, SelfSignedPath(options), std::time(nullptr), &error);
-    if (!identity) next.faults.push_back(error);
-  }
-  for (const std::string& fault : next.faults) syslog(LOG_ERR, "%s", fault.c_str());
-  if (next.faults.empty()) {
-    for (const std::string& key : NeedRestart(*settings, next.settings)) {
-      syslog(LOG_WARNING, "%s has changed, which only a restart applies", key.c_str());
-    }
-    Apply(options, next.settings, parts);
-    if (identity) Use(identity, parts.tls);
-    *settings = std::move(next.settings);
-    syslog(LOG_NOTICE, "The configuration was read again");
-  } else {
-    syslog(LOG_ERR, "The configuration is not applied; the previous one stays in force");
-  }
-  Notify("READY=1");
-}
-
 // Handles signals until the server is to end.
 void Attend(const Options& options, const Reloadable& parts, Settings settings) {
   for (;;) {
@@ -257,10 +112,16 @@ void Attend(const Options& options, const Reloadable& parts, Settings settings) 
         Reload(options, parts, &settings);
         break;
       case Awaited::kTime:
-        Maintain(options, settings, parts.tls);
+        if (parts.tls != nullptr) MaintainTls(settings, SelfSignedPath(options), std::time(nullptr), parts.tls);
         break;
     }
   }
+}
+
+PasswordChecker::Limits PasswordLimits(const Settings& settings) {
+  PasswordChecker::Limits limits;
+  limits.deadline = settings.password_time.time;
+  return limits;
 }
 
 AccessLog::Sink AccessSink(const Settings& settings) {
@@ -300,21 +161,6 @@ std::string MachineName() {
   return gethostname(name, sizeof name - 1) == 0 ? name : "";
 }
 
-// Returns false, after logging the reason, if a listener needs TLS and it cannot be set up.
-bool OpenTls(const Options& options, const Settings& settings, std::unique_ptr<TlsServer>* tls) {
-  if (!WantsTls(settings)) return true;
-  std::string error;
-  const TlsIdentityPtr identity = OpenTlsIdentity(settings, SelfSignedPath(options), std::time(nullptr), &error);
-  if (!identity) {
-    syslog(LOG_ERR, "%s", error.c_str());
-    return false;
-  }
-  *tls = std::make_unique<TlsServer>(nullptr);
-  Use(identity, tls->get());
-  Maintain(options, settings, tls->get());
-  return true;
-}
-
 int Serve(const Options& options, const Settings& settings) {
   const std::optional<Folders> folders = OpenFolders(options);
   std::string error;
@@ -324,8 +170,10 @@ int Serve(const Options& options, const Settings& settings) {
   const std::vector<Module> modules = LoadModulesOf(settings);
   if (modules.empty()) return EXIT_FAILURE;
   std::unique_ptr<TlsServer> tls;
+  if (WantsTls(settings)) tls = OpenTlsServer(settings, SelfSignedPath(options), std::time(nullptr), &error);
+  if (!error.empty()) syslog(LOG_ERR, "%s", error.c_str());
   std::optional<std::vector<Listener>> listeners;
-  if (OpenTls(options, settings, &tls)) listeners = Listen(settings, folders->runtime);
+  if (error.empty()) listeners = Listen(settings, folders->runtime);
   if (!listeners) return EXIT_FAILURE;
 
   Sha256("");  // loads the algorithm
@@ -347,6 +195,7 @@ int Serve(const Options& options, const Settings& settings) {
   const std::vector<MetricsSource> figures = {[&] {
                                                 return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
                                               },
+                                              [&] { return UploadMetrics(folders->uploads); },
                                               [&] { return SessionMetrics(sessions); }, ProcessMetrics,
                                               VORN::ReadMetrics};
   Workers workers;  // after everything that a running call uses: its destructor waits for them
@@ -362,9 +211,9 @@ int Serve(const Options& options, const Settings& settings) {
               {sessions, passwords}});
   const HttpLimits limits = FitToDescriptors(HttpLimitsOf(settings), *listeners, DescriptorLimit());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log, tls.get()});
-  Notify("READY=1");
+  NotifyReady();
   Attend(options, reloadable, settings);
-  Notify("STOPPING=1");
+  NotifyStopping();
   server.Stop();
   workers.Close();
   passwords.Close();
@@ -385,18 +234,11 @@ bool SettleRoot(Options* options) {
   return false;
 }
 
-// Loads the certificate that the settings name, or the self-signed one if there is one. Returns nullptr, with the
-// reason in `error`, if it cannot be used.
-TlsIdentityPtr CheckTls(const Options& options, const Settings& settings, std::string* error) {
-  if (!settings.certificate.path.empty()) return ReadTlsFiles(settings, error);
-  return WantsTls(settings) ? ReadSelfSigned(SelfSignedPath(options), error) : nullptr;
-}
-
 // Prints what is wrong with the configuration.
 int Check(const Options& options, Configuration configuration) {
   std::string error;
   TlsIdentityPtr identity;
-  if (configuration.faults.empty()) identity = CheckTls(options, configuration.settings, &error);
+  if (configuration.faults.empty()) identity = CheckTls(configuration.settings, SelfSignedPath(options), &error);
   if (!error.empty()) configuration.faults.push_back(error);
   for (const std::string& fault : configuration.faults) std::fprintf(stderr, "%s\n", fault.c_str());
   if (!configuration.faults.empty()) return EXIT_FAILURE;

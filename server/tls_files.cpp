@@ -1,20 +1,16 @@
 #include "tls_files.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <syslog.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
 #include <optional>
+#include <utility>
 #include <vector>
 
 #include "private_file.h"
 #include "secret.h"
 #include "self_signed.h"
-#include "unique_fd.h"
+#include "small_file.h"
 
 namespace vorn::server {
 namespace {
@@ -22,23 +18,14 @@ namespace {
 constexpr std::time_t kDay = std::time_t{24} * 60 * 60;
 constexpr std::time_t kRenewal = 30 * kDay;
 constexpr std::time_t kWarning = 14 * kDay;
-constexpr off_t kMaxBytes = off_t{1} << 20;
 
-std::optional<std::string> Read(const std::string& path, bool is_secret, std::string* error) {
-  const UniqueFd file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  struct stat status {};
-  if (!file || fstat(file.get(), &status) != 0) {
-    *error = path + ": " + std::strerror(errno);
-  } else if (!S_ISREG(status.st_mode) || status.st_size > kMaxBytes) {
-    *error = path + ": not a regular file of at most 1 MiB";
-  } else if (is_secret && (status.st_mode & 07) != 0) {
-    *error = path + ": every user may use the key; its mode must be 0600 or 0640";
-  } else {
-    std::string text(static_cast<std::size_t>(status.st_size), '\0');
-    const ssize_t count = read(file.get(), text.data(), text.size());
-    text.resize(static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
-    return text;
-  }
+// A key that every user may read is refused.
+std::optional<std::string> ReadKey(const std::string& path, std::string* error) {
+  std::optional<SmallFile> file = ReadSmallFile(path, error);
+  if (!file) return std::nullopt;
+  if ((file->mode & 07) == 0) return std::move(file->text);
+  *error = path + ": every user may use the key; its mode must be 0600 or 0640";
+  Wipe(&file->text);
   return std::nullopt;
 }
 
@@ -72,11 +59,11 @@ bool WantsTls(const Settings& settings) {
 }
 
 TlsIdentityPtr ReadTlsFiles(const Settings& settings, std::string* error) {
-  const std::optional<std::string> certificates = Read(settings.certificate.path, false, error);
+  const std::optional<SmallFile> certificates = ReadSmallFile(settings.certificate.path, error);
   std::optional<std::string> key;
-  if (certificates) key = Read(settings.key.path, true, error);
+  if (certificates) key = ReadKey(settings.key.path, error);
   if (!key) return nullptr;
-  TlsIdentityPtr identity = TlsIdentity::Make(*certificates, *key, error);
+  TlsIdentityPtr identity = TlsIdentity::Make(certificates->text, *key, error);
   if (!identity) *error = settings.certificate.path + ", " + settings.key.path + ": " + *error;
   Wipe(&*key);
   return identity;

@@ -80,6 +80,7 @@ void Routes::PairWithReader(Route* route) const {
   }
 }
 
+// The x-shown-by of such a method is for the reader of the description: the server's own methods accept no If-Match.
 void Routes::Add(const Route& route) {
   const auto [place, added] = apis_[route.row.api][route.row.version].try_emplace(route.row.method, route);
   if (!added) syslog(LOG_ERR, "A module has a method of the server itself: %s", place->second.Name().c_str());

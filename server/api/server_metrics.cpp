@@ -165,6 +165,13 @@ std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& 
   return metrics;
 }
 
+std::vector<VORN::Metric> UploadMetrics(const UploadFolder& uploads) {
+  const UploadFolder::Contents contents = uploads.Count();
+  return {
+      {"vorn_uploads", "Uploaded files of calls that run", Kind::kGauge, {}, static_cast<double>(contents.files)},
+      {"vorn_upload_bytes", "Bytes of these uploaded files", Kind::kGauge, {}, static_cast<double>(contents.bytes)}};
+}
+
 std::vector<VORN::Metric> SessionMetrics(Sessions& sessions) {
   return {{"vorn_sessions",
            "Sessions that have not ended",

@@ -21,6 +21,7 @@
 #include "metrics.h"
 #include "routes.h"
 #include "sessions.h"
+#include "upload.h"
 #include "worker_pool.h"
 
 namespace vorn::server {
@@ -65,6 +66,9 @@ std::string WriteMetrics(const CallMetrics& calls, const Workers& workers, const
 // The figures of the transport: answers by status, and the memory of these budgets.
 using NamedBudgets = std::vector<std::pair<std::string, const Budget&>>;
 std::vector<VORN::Metric> HttpMetrics(const AccessLog& log, const NamedBudgets& budgets);
+
+// The uploaded files of the calls that have not ended.
+std::vector<VORN::Metric> UploadMetrics(const UploadFolder& uploads);
 
 // The number of sessions that have not ended.
 std::vector<VORN::Metric> SessionMetrics(Sessions& sessions);

@@ -66,6 +66,21 @@ std::optional<UploadFolder> UploadFolder::Open(const std::string& path, std::str
   return std::nullopt;
 }
 
+// A file may be removed while its size is read.
+UploadFolder::Contents UploadFolder::Count() const {
+  Contents contents;
+  std::error_code failure;
+  for (auto each = std::filesystem::directory_iterator(path_, failure); !failure && each != end(each);
+       each.increment(failure)) {
+    std::error_code removed;
+    const std::uintmax_t bytes = each->file_size(removed);
+    if (removed) continue;
+    ++contents.files;
+    contents.bytes += bytes;
+  }
+  return contents;
+}
+
 std::optional<Upload> UploadFolder::Create() const {
   std::string path = path_ + "/XXXXXX";
   UniqueFd file(mkostemp(path.data(), O_CLOEXEC));

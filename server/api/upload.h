@@ -2,6 +2,8 @@
 #ifndef VORN_SERVER_UPLOAD_H
 #define VORN_SERVER_UPLOAD_H
 
+#include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -37,6 +39,13 @@ class UploadFolder {
   // Creates the folder, or removes everything that a killed server left in it. Returns std::nullopt on failure,
   // with the reason in `error`.
   static std::optional<UploadFolder> Open(const std::string& path, std::string* error);
+
+  // The files that exist at the moment. A folder that cannot be read is empty.
+  struct Contents {
+    std::size_t files = 0;
+    std::uintmax_t bytes = 0;
+  };
+  Contents Count() const;
 
   // Creates an empty file with a unique name. Returns std::nullopt with errno set on failure.
   std::optional<Upload> Create() const;

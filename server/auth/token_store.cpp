@@ -6,6 +6,7 @@
 #include <chrono>
 #include <ctime>
 #include <exception>
+#include <tuple>
 #include <utility>
 
 #include "private_file.h"
@@ -58,8 +59,6 @@ bool TokenStore::Load(std::string* error) {
 bool TokenStore::Save(const Entries& entries, std::string* error) const {
   StoredTokens tokens;
   for (const auto& [digest, entry] : entries) tokens.emplace_back(digest, entry.token);
-  std::sort(tokens.begin(), tokens.end(),
-            [](const auto& a, const auto& b) { return a.second.created < b.second.created; });
   return ReplacePrivateFile(path_, FormatTokens(tokens), error);
 }
 
@@ -92,7 +91,8 @@ std::vector<Token> TokenStore::List() const {
   std::vector<Token> tokens;
   const std::lock_guard<std::mutex> lock(mutex_);
   for (const auto& [digest, entry] : entries_) tokens.push_back(entry.token);
-  std::sort(tokens.begin(), tokens.end(), [](const Token& a, const Token& b) { return a.created < b.created; });
+  std::sort(tokens.begin(), tokens.end(),
+            [](const Token& a, const Token& b) { return std::tie(a.created, a.name) < std::tie(b.created, b.name); });
   return tokens;
 }
 

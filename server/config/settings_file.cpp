@@ -1,21 +1,12 @@
 #include "settings_file.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
 #include <utility>
-
-#include "unique_fd.h"
 
 namespace vorn::server {
 namespace {
 
 constexpr std::string_view kBlanks = " \t";
-constexpr off_t kMaxBytes = off_t{1} << 20;
 
 bool IsControl(char c) { return (static_cast<unsigned char>(c) < 0x20 && c != '\t') || c == 0x7f; }
 
@@ -133,27 +124,5 @@ class Parser {
 }  // namespace
 
 SettingsFile ParseSettings(std::string_view text) { return Parser().Run(text); }
-
-std::optional<std::string> ReadSettingsText(const std::string& path, bool required, std::string* error) {
-  const UniqueFd file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  if (!file && errno == ENOENT && !required) return "";
-  struct stat status {};
-  if (!file || fstat(file.get(), &status) != 0) {
-    *error = path + ": " + std::strerror(errno);
-    return std::nullopt;
-  }
-  if (!S_ISREG(status.st_mode) || status.st_size > kMaxBytes) {
-    *error = path + (S_ISREG(status.st_mode) ? ": larger than 1 MiB" : ": not a regular file");
-    return std::nullopt;
-  }
-  std::string text(static_cast<std::size_t>(status.st_size), '\0');
-  const ssize_t count = read(file.get(), text.data(), text.size());
-  if (count < 0) {
-    *error = path + ": " + std::strerror(errno);
-    return std::nullopt;
-  }
-  text.resize(static_cast<std::size_t>(count));
-  return text;
-}
 
 }  // namespace vorn::server

@@ -3,7 +3,6 @@
 #define VORN_SERVER_SETTINGS_FILE_H
 
 #include <map>
-#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -33,10 +32,6 @@ struct SettingsFile {
 // Parses the whole text and reports every fault of a line: unknown sections and keys, keys and sections that are given
 // twice, values that are not accepted, and lines that are none of these. A setting with a fault has its default.
 SettingsFile ParseSettings(std::string_view text);
-
-// Returns the content of the file. A missing file is an empty one, unless `required`. Returns std::nullopt on failure,
-// with the reason in `error`.
-std::optional<std::string> ReadSettingsText(const std::string& path, bool required, std::string* error);
 
 }  // namespace vorn::server
 

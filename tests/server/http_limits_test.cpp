@@ -12,8 +12,6 @@
 namespace vorn::server {
 namespace {
 
-using testing::HasSubstr;
-
 constexpr std::chrono::seconds kShort{1};
 
 std::ptrdiff_t CountDescriptors() {

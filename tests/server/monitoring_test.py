@@ -7,6 +7,7 @@ Skipped (status 77) without Prometheus; in CI it must be there.
 import json
 import os
 import pathlib
+import re
 import shutil
 import socket
 import subprocess
@@ -119,6 +120,17 @@ class Monitoring(unittest.TestCase):
         self.assertTrue(content_type.startswith("text/plain; version=0.0.4"))
         check = subprocess.run(["promtool", "check", "metrics"], input=page, capture_output=True, check=False)
         self.assertEqual((check.returncode, check.stdout + check.stderr), (0, b""))
+
+    def test_every_metric_is_documented(self):
+        self.server.request("GET", "/metrics")  # counted by the next request
+        page = self.server.request("GET", "/metrics")[2].decode()
+        kinds = dict(re.findall(r"^# TYPE (\S+) (\S+)$", page, re.MULTILINE))
+        meanings = dict(re.findall(r"^# HELP (\S+) (.*)$", page, re.MULTILINE))
+        rows = re.findall(r"^\| `(\w+)` \| (\w+) \| .* \| (.*) \|$", (MONITORING / "metrics.md").read_text("utf-8"),
+                          re.MULTILINE)
+        self.assertIn("vorn_uploads", kinds)
+        self.assertEqual({name: (kind, meaning) for name, kind, meaning in rows},
+                         {name: (kind, meanings[name]) for name, kind in kinds.items()})
 
     def test_the_alerts_are_raised_when_they_should(self):
         check = subprocess.run(["promtool", "test", "rules", "alerts_test.yml"], cwd=MONITORING, capture_output=True,

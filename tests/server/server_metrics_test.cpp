@@ -2,13 +2,14 @@
 
 #include <gmock/gmock.h>
 
-#include <sstream>
+#include <optional>
+
+#include "sandbox.h"
 
 namespace vorn::server {
 namespace {
 
 using testing::HasSubstr;
-using testing::Not;
 
 void Nothing(VORN::APIRequest* /*request*/, VORN::APIResponse* /*response*/) {}
 
@@ -55,6 +56,24 @@ TEST(Metrics, OfTheWorkersCountTheCalls) {
 
 TEST(Metrics, OfTheProcessArePositive) {
   for (const VORN::Metric& metric : ProcessMetrics()) EXPECT_GT(metric.value, 0) << metric.name;
+}
+
+TEST(Metrics, OfUploadsCountTheFilesThatExist) {
+  const Sandbox sandbox;
+  std::string error;
+  const auto folder = UploadFolder::Open(sandbox.File("uploads"), &error);
+  ASSERT_TRUE(folder) << error;
+  const auto page = [&folder] {
+    return WriteMetrics(CallMetrics(), Workers(), {[&folder] { return UploadMetrics(*folder); }});
+  };
+  {
+    std::optional<Upload> first = folder->Create();
+    std::optional<Upload> second = folder->Create();
+    EXPECT_TRUE(first->Append("1234") && second->Append("56"));
+    EXPECT_THAT(page(), HasSubstr("\nvorn_uploads 2\n"));
+    EXPECT_THAT(page(), HasSubstr("\nvorn_upload_bytes 6\n"));
+  }
+  EXPECT_THAT(page(), HasSubstr("\nvorn_uploads 0\n"));
 }
 
 TEST(Metrics, OfTheTransportCountStatusesAndBudgets) {

@@ -72,25 +72,5 @@ TEST(SettingsFile, ReportsEveryFault) {
                           "7:11: modules: \"m\" is no absolute path"));
 }
 
-TEST(SettingsFile, MayBeMissingUnlessItIsRequired) {
-  const Sandbox sandbox;
-  std::string error;
-  EXPECT_EQ(ReadSettingsText(sandbox.File("none"), false, &error), "");
-  EXPECT_FALSE(ReadSettingsText(sandbox.File("none"), true, &error));
-  EXPECT_EQ(error, sandbox.File("none") + ": No such file or directory");
-}
-
-TEST(SettingsFile, IsARegularFileOfModestSize) {
-  const Sandbox sandbox;
-  std::string error;
-  EXPECT_FALSE(ReadSettingsText(sandbox.path(), false, &error));
-  EXPECT_EQ(error, sandbox.path() + ": not a regular file");
-  sandbox.Write("large", std::string((1 << 20) + 1, '#'));
-  EXPECT_FALSE(ReadSettingsText(sandbox.File("large"), false, &error));
-  EXPECT_EQ(error, sandbox.File("large") + ": larger than 1 MiB");
-  sandbox.Write("small", "[log]\n");
-  EXPECT_EQ(ReadSettingsText(sandbox.File("small"), true, &error), "[log]\n");
-}
-
 }  // namespace
 }  // namespace vorn::server

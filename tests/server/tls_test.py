@@ -15,11 +15,15 @@ import signal
 import socket
 import ssl
 import subprocess
+import sys
 import tempfile
 import time
 import unittest
 
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
+sys.path.insert(0, str(PROJECT / "scripts"))
+from trial_server import expect_no_secret  # noqa: E402 pylint: disable=wrong-import-position
+
 VORND = os.environ["VORND"]
 PAM_MODULE = os.environ["PAM_MODULE"]
 PATIENCE = 120  # seconds; reaching it is a failure
@@ -120,7 +124,9 @@ class Server:
 
     def __exit__(self, *_):
         self.stop()
+        log = self.log()
         shutil.rmtree(self.folder)
+        expect_no_secret(log)
 
     def stop(self):
         self._process.terminate()

@@ -51,7 +51,7 @@ BREAKS = [
           "systemd-run --quiet --unit=freeze /usr/bin/python3 /lab/breaks/freeze"),
     Break("restart-at-each-save", "clients are not interrupted by a save", "save_under_load",
           "systemd-run --quiet --unit=restarter --path-property=PathChanged=/etc/exports "
-          "sh -c \"if grep -q ' nfs4\\? ' /proc/mounts; then systemctl --no-block restart nfs-server; fi\""),
+          "--property=StartLimitIntervalSec=0 /bin/sh /lab/breaks/restart"),
     Break("others-rights-forgotten", "a save concerns its own share only", "scale",
           source=("HasLeftVolume(update) ? rights", "s/HasLeftVolume(update) ? rights/true || &/")),
     Break("lines-after-a-fault-lost", "a faulty line takes nothing from anybody", "faulty_lines", source=_WHOLE_TABLE,
@@ -95,8 +95,8 @@ BREAKS = [
           f"sed -i 's/^\\ttransfer_sizes$/\\texit 0/' {_SCRIPT}", select="sizes"),
     Break("any-password", "people get in by their password", "people",
           "sed -i 's/^@include common-auth/auth sufficient pam_permit.so/' /etc/pam.d/vornd", select="others"),
-    Break("helper-not-allowed", "people get in by their password", "people",
-          "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\nCapabilityBoundingSet=CAP_CHOWN\n' "
+    Break("passwords-out-of-reach", "people get in by their password", "people",
+          "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nInaccessiblePaths=/etc/shadow\\n' "
           f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="signs_in"),
     Break("accounts-not-created", "the package creates the accounts of the squash modes", "package",
           _package("sed -i 's/^  make_account /  : make_account /' postinst"), select="accounts"),

@@ -305,6 +305,20 @@ TEST(ReplaceFile, LosesNoEditWheneverItIsMade) {
   }
 }
 
+TEST(ReplaceFile, SaysThatAMountPointCannotBeReplaced) {
+  const TemporaryRoot root;
+  root.Write(kFile, "old");
+  ChildProcess writer([&] {
+    if (!FailSystemCall(SYS_renameat2, EBUSY)) return 99;
+    const Status status = Replace(root, "new");
+    const bool has_reason = status.reason().find("is a mount point") != std::string::npos;
+    return status.code() == EBUSY && has_reason ? 0 : 1;
+  });
+  EXPECT_EQ(writer.Wait(), 0);
+  EXPECT_EQ(root.Read(kFile), "old");
+  EXPECT_EQ(root.Names("/etc"), Names{"file"});
+}
+
 TEST(ReplaceFile, ReplacesOnAFileSystemThatCannotExchange) {
   for (const char* before : {"old", static_cast<const char*>(nullptr)}) {
     const TemporaryRoot root;

@@ -1,5 +1,6 @@
 #!/usr/bin/env python3
 """testssl_test: testssl.sh(1) finds nothing above "LOW" on the port with TLS, with a certificate of a test authority.
+With the certificate that the server makes, it finds that no authority has signed it, and nothing else.
 
 Skipped (status 77) without testssl.sh. No name is resolved, and nothing but loopback is connected to.
 """
@@ -17,14 +18,19 @@ import tls_test
 SKIPPED = 77
 PATIENCE = 1200
 HARMLESS = {"OK", "INFO", "LOW", "WARN", "DEBUG"}
+NOT_TRUSTED = {"cert_chain_of_trust", "cert_revocation", "cert_trust"}
 
 
-def findings(port, authority, folder):
-    """Runs testssl.sh; returns what it has found, by id."""
+def grave(found):
+    return [each for each in found if each["severity"] not in HARMLESS]
+
+
+def findings(port, authority, folder, *checks):
+    """Runs testssl.sh, with all its checks or the given ones. Returns what it has found."""
     output = pathlib.Path(folder) / "findings.json"
     done = subprocess.run(
         ["testssl", "--quiet", "--warnings", "off", "--nodns", "none", "--ip", "127.0.0.1", "--add-ca", authority,
-         "--openssl-timeout", "60", "--jsonfile", output, "--color", "0", "--fast", f"localhost:{port}"],
+         "--openssl-timeout", "60", "--jsonfile", output, "--color", "0", "--fast", *checks, f"localhost:{port}"],
         stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=PATIENCE, check=False)
     if not output.exists():
         raise AssertionError(done.stdout + done.stderr)
@@ -43,8 +49,15 @@ class Testssl(unittest.TestCase):
         names = {each["id"] for each in found}
         for name in ("TLS1_2", "TLS1_3", "cert_chain_of_trust", "secure_client_renego", "heartbleed"):
             self.assertIn(name, names, "testssl.sh has not run to its end")
-        grave = [each for each in found if each["severity"] not in HARMLESS]
-        self.assertEqual(grave, [])
+        self.assertEqual(grave(found), [])
+
+    def test_the_self_signed_certificate_is_only_not_trusted(self):
+        with tempfile.TemporaryDirectory() as folder, tls_test.Server() as server:
+            certificate = pathlib.Path(folder) / "self-signed.pem"
+            certificate.write_text(server.certificate(), encoding="ascii")
+            found = findings(server.port("tls:"), certificate, folder, "--server-defaults")
+        self.assertIn("cert_chain_of_trust", {each["id"] for each in found}, "testssl.sh has not run to its end")
+        self.assertLessEqual({each["id"] for each in grave(found)}, NOT_TRUSTED)
 
 
 if __name__ == "__main__":

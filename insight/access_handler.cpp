@@ -11,6 +11,9 @@
 #include "core.h"
 #include "json_text.h"
 #include "log.h"
+#include "owned.h"
+#include "page.h"
+#include "shared_folders.h"
 
 namespace {
 
@@ -21,9 +24,9 @@ constexpr char kNewestVersion[] = "4.2";
 constexpr int kLargestPort = 65535;
 
 // Reads the parameters of a question. The first faulty one is logged.
-class Reader {
+class ParameterReader {
  public:
-  explicit Reader(const Json::Value& params) : params_(params) {}
+  explicit ParameterReader(const Json::Value& params) : params_(params) {}
 
   bool ok() const { return ok_; }
 
@@ -51,6 +54,15 @@ class Reader {
     if (value.isInt() && value.asInt() >= 1 && value.asInt() <= kLargestPort) return value.asInt();
     Refuse(name);
     return 0;
+  }
+
+  // An integer; `fallback` if the parameter is absent or null.
+  int Integer(const char* name, int fallback) {
+    const Json::Value& value = params_[name];
+    if (value.isNull()) return fallback;
+    if (value.isInt()) return value.asInt();
+    Refuse(name);
+    return fallback;
   }
 
   std::vector<std::string> Texts(const char* name) {
@@ -83,11 +95,9 @@ class Reader {
   bool ok_ = true;
 };
 
-// nullopt if a parameter is not accepted.
-std::optional<VORN::AccessQuestion> ReadQuestion(const Json::Value& params) {
-  Reader reader(params);
+// The parameters that the methods have in common.
+VORN::AccessQuestion ReadClient(ParameterReader& reader) {
   VORN::AccessQuestion question;
-  question.share = reader.Text("share", true);
   question.client = reader.Text("client", true);
   question.flavor = reader.Word("sys", "flavor", kFlavors);
   question.version = reader.Word(kNewestVersion, "version", kVersions);
@@ -95,7 +105,6 @@ std::optional<VORN::AccessQuestion> ReadQuestion(const Json::Value& params) {
   question.port = reader.Port("port");
   question.user = reader.Text("user");
   question.groups = reader.Texts("groups");
-  if (!reader.ok()) return std::nullopt;
   return question;
 }
 
@@ -170,6 +179,33 @@ Json::Value ToJson(const VORN::AccessAnswer& answer) {
   return result;
 }
 
+// A row of the matrix.
+Json::Value ToRow(const std::string& share, const VORN::AccessAnswer& answer) {
+  Json::Value row;
+  row["share"] = share;
+  row["path"] = answer.path;
+  row["mountable"] = answer.mountable;
+  row["read"] = answer.read;
+  row["write"] = answer.write;
+  row["rule"] = answer.rule ? Json::Value(answer.rule->client) : Json::Value();
+  return row;
+}
+
+// The names of all shared folders in the order of their bytes; nullopt if they cannot be read.
+std::optional<std::vector<std::string>> ReadShareNames() {
+  StringHash shares(KLIBCSzHashAlloc(0));
+  StringList names(KLIBCSzListAlloc(0));
+  if (!shares || !names || VORNShareEnum(shares.slot()) < 0 || KLIBCSzHashEnumKey(shares.get(), names.slot()) < 0) {
+    LOG_ERROR("Failed to VORNShareEnum, vornerr=[0x%04X]", KLIBCErrGet());
+    return std::nullopt;
+  }
+  std::vector<std::string> sorted;
+  sorted.reserve(static_cast<std::size_t>(names.get()->count));
+  for (int i = 0; i < names.get()->count; ++i) sorted.emplace_back(KLIBCSzListGet(names.get(), i));
+  std::sort(sorted.begin(), sorted.end());
+  return sorted;
+}
+
 int CodeOf(int result) {
   if (result == VORN::kAccessNoShare) return kNoShare;
   if (result == VORN::kAccessNoUser) return kNoUser;
@@ -183,15 +219,44 @@ void AccessHandler::Explain() {
   AnswerWith(HERE, [this](Json::Value& result) { return ExplainData(Parameters(), result); });
 }
 
+void AccessHandler::Matrix() {
+  AnswerWith(HERE, [this](Json::Value& result) { return MatrixData(Parameters(), result); });
+}
+
 bool AccessHandler::ExplainData(const Json::Value& params, Json::Value& result) {
-  const std::optional<VORN::AccessQuestion> question = ReadQuestion(params);
-  if (!question) return Fail(kBadParameter);
+  ParameterReader reader(params);
+  VORN::AccessQuestion question = ReadClient(reader);
+  question.share = reader.Text("share", true);
+  if (!reader.ok()) return Fail(kBadParameter);
   VORN::AccessAnswer answer;
-  const int explained = VORN::ExplainAccess(*question, &answer);
+  const int explained = VORN::ExplainAccess(question, &answer);
   if (explained < 0) {
     LOG_ERROR("Failed to ExplainAccess, vornerr=[0x%04X]", KLIBCErrGet());
     return Fail(CodeOf(explained));
   }
   result = ToJson(answer);
+  return true;
+}
+
+bool AccessHandler::MatrixData(const Json::Value& params, Json::Value& result) {
+  ParameterReader reader(params);
+  const VORN::AccessQuestion question = ReadClient(reader);
+  const int offset = reader.Integer("offset", 0);
+  const int limit = reader.Integer("limit", -1);
+  if (!reader.ok()) return Fail(kBadParameter);
+  const std::optional<std::vector<std::string>> names = ReadShareNames();
+  if (!names) return Fail(kPlatformFailure);
+  const int count = static_cast<int>(names->size());
+  const Page page = Page::Of(count, offset, limit);
+  const std::vector<std::string> shares(names->begin() + page.begin, names->begin() + page.end);
+  std::vector<VORN::AccessAnswer> answers;
+  const int explained = VORN::ExplainAccesses(question, shares, &answers);
+  if (explained < 0) {
+    LOG_ERROR("Failed to ExplainAccesses, vornerr=[0x%04X]", KLIBCErrGet());
+    return Fail(CodeOf(explained));
+  }
+  result["access"] = Json::Value(Json::arrayValue);
+  for (std::size_t at = 0; at < answers.size(); ++at) result["access"].append(ToRow(shares[at], answers[at]));
+  result["total"] = count;
   return true;
 }

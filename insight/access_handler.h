@@ -17,11 +17,16 @@ class AccessHandler : public ServiceHandler {
 
   // The drivers of the methods. Each answers the request exactly once.
   void Explain();
+  void Matrix();
 
   // The data functions return true on success. On failure they log the reason, record an error code and return false.
 
   // Sets the members of VORN::AccessAnswer (access.h). Errors: 2301, 2302, 2370, 2380, 2381.
   bool ExplainData(const Json::Value& params, Json::Value& result);
+
+  // Sets "access", a page of rows: what the client may do in each shared folder, sorted by name, and "total". Errors:
+  // 2301, 2302, 2370 if a folder was removed meanwhile, 2380, 2381.
+  bool MatrixData(const Json::Value& params, Json::Value& result);
 };
 
 #endif  // VORN_INSIGHT_ACCESS_HANDLER_H

@@ -12,6 +12,7 @@ void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
 constexpr char kAccess[] = "VORN.Core.FileServ.NFS.Access";
 
 const APIRow kTable[] = {{kAccess, 1, "explain", Serve<AccessHandler, &AccessHandler::Explain>},
+                         {kAccess, 1, "matrix", Serve<AccessHandler, &AccessHandler::Matrix>},
                          {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace

@@ -89,6 +89,11 @@ enum : int {
 // Changes nothing. Returns one of the values above on failure; the reason is then in the error facility (core.h).
 int ExplainAccess(const AccessQuestion& question, AccessAnswer* answer);
 
+// Does the same for several shared folders by one reading of the box. The answers are in the order of `shares`; the
+// share of the question is not used.
+int ExplainAccesses(const AccessQuestion& question, const std::vector<std::string>& shares,
+                    std::vector<AccessAnswer>* answers);
+
 }  // namespace VORN
 
 #endif  // VORN_PLATFORM_ACCESS_H

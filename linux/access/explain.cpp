@@ -306,16 +306,24 @@ bool NeedsNames(const ExportList& exports) {
 
 }  // namespace
 
-Result<VORN::AccessAnswer> ExplainAccess(Box& box, const NameService& names, const VORN::AccessQuestion& question) {
-  Result<std::string> path = FindSharePath(box, question.share);
-  if (!path.ok()) return path.status();
+Result<std::vector<VORN::AccessAnswer>> ExplainAccesses(Box& box, const NameService& names,
+                                                        const VORN::AccessQuestion& question,
+                                                        const std::vector<std::string>& shares) {
   const Result<ExportsInForce> in_force = ReadExportsInForce(box, names, IsServing(box));
   if (!in_force.ok()) return in_force.status();
   const Result<std::vector<std::string>> mounts = MountsBelow(box, "/");
   if (!mounts.ok()) return mounts.status();
-  ClientHost client = FindClientHost(question.client, names, NeedsNames(in_force->exports));
-  Explanation explanation(box, question, std::move(*path), *in_force);
-  return explanation.Answer(names, std::move(client), {mounts->begin(), mounts->end()});
+  const ClientHost client = FindClientHost(question.client, names, NeedsNames(in_force->exports));
+  std::vector<VORN::AccessAnswer> answers;
+  for (const std::string& share : shares) {
+    Result<std::string> path = FindSharePath(box, share);
+    if (!path.ok()) return path.status();
+    Explanation explanation(box, question, std::move(*path), *in_force);
+    Result<VORN::AccessAnswer> answer = explanation.Answer(names, client, {mounts->begin(), mounts->end()});
+    if (!answer.ok()) return answer.status();
+    answers.push_back(std::move(*answer));
+  }
+  return answers;
 }
 
 }  // namespace vorn

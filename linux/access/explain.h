@@ -2,6 +2,9 @@
 #ifndef VORN_LINUX_ACCESS_EXPLAIN_H
 #define VORN_LINUX_ACCESS_EXPLAIN_H
 
+#include <string>
+#include <vector>
+
 #include "access.h"
 #include "box.h"
 #include "host_names.h"
@@ -9,9 +12,11 @@
 
 namespace vorn {
 
-// Answers the question. Fails with ENOENT if there is no such share, and with kNoSuchUser or kNoSuchGroup. The caller
-// owns no lock, because the name service may take its time.
-Result<VORN::AccessAnswer> ExplainAccess(Box& box, const NameService& names, const VORN::AccessQuestion& question);
+// Answers the question for each of the shares, in their order. Fails with ENOENT if there is no such share, and with
+// kNoSuchUser or kNoSuchGroup. The caller owns no lock, because the name service may take its time.
+Result<std::vector<VORN::AccessAnswer>> ExplainAccesses(Box& box, const NameService& names,
+                                                        const VORN::AccessQuestion& question,
+                                                        const std::vector<std::string>& shares);
 
 }  // namespace vorn
 

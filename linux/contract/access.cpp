@@ -20,10 +20,18 @@ int FailureOf(int code) {
 namespace VORN {
 
 int ExplainAccess(const AccessQuestion& question, AccessAnswer* answer) {
-  vorn::Result<AccessAnswer> explained =
-      vorn::ExplainAccess(vorn::CurrentBox(), vorn::NameService::OfSystem(), question);
+  std::vector<AccessAnswer> answers;
+  const int explained = ExplainAccesses(question, {question.share}, &answers);
+  if (explained == 0) *answer = std::move(answers.front());
+  return explained;
+}
+
+int ExplainAccesses(const AccessQuestion& question, const std::vector<std::string>& shares,
+                    std::vector<AccessAnswer>* answers) {
+  vorn::Result<std::vector<AccessAnswer>> explained =
+      vorn::ExplainAccesses(vorn::CurrentBox(), vorn::NameService::OfSystem(), question, shares);
   if (vorn::ToResult(explained.status()) != 0) return FailureOf(explained.status().code());
-  *answer = std::move(*explained);
+  *answers = std::move(*explained);
   return 0;
 }
 

@@ -96,6 +96,36 @@ class ServiceTest(BoxTest):
         self.assertRegex(shown, r"(?m)^Read size: +chosen by the system$")
 
 
+class ExplainTest(BoxTest):
+    """vorn explain."""
+
+    def test_names_the_rule_that_decides_and_those_that_lose(self):
+        self.vorn("nfs set --service on")
+        self.vorn("exports add data '*'")
+        self.vorn("exports add data 10.0.0.0/24 --access rw --squash guest")
+        shown = self.vorn("explain data 10.0.0.5 --user root")
+        self.assertRegex(shown, r"(?m)^May mount: +")
+        self.assertIn('The rule for "*" of /volume1/data (/etc/exports, line ', shown)
+        self.assertIn("a rule for a network comes first", shown)
+        self.assertIn("The rule squashes root (root_squash)", shown)
+        answer = self.json("explain data 10.0.0.5 --user root --groups 0,50 --security sys --nfs-version 3 --port 1000")
+        self.assertEqual(answer["rule"]["client"], "10.0.0.0/24")
+        self.assertEqual(answer["identity"]["groups"], [50])
+
+    def test_says_what_would_have_to_change(self):
+        self.vorn("exports add data 10.0.0.0/24")
+        shown = self.vorn("explain data 10.0.0.5 --port 40000 --nfs-version 4.1")
+        self.assertRegex(shown, r"(?m)^May mount: +no$")
+        self.assertIn("The NFS service is switched off. Switch NFS on.", shown)
+        self.assertIn("(\"insecure\")", shown)
+
+    def test_refuses_what_is_no_question(self):
+        self.refuses("explain none 10.0.0.5", Exit.FAILED, "(code 2370,")
+        self.refuses("explain data 10.0.0.5 --user nobody-of-this-name", Exit.FAILED, "(code 2380,")
+        self.refuses("explain data 10.0.0.5 --port many", Exit.USAGE, "many")
+        self.refuses("explain data 10.0.0.5 --security sis", Exit.USAGE, "sis")
+
+
 class ExportsTest(BoxTest):
     """vorn exports, vorn share."""
 

@@ -175,6 +175,13 @@ async function access() {
   assert.equal(unknown.error?.error.code, 2370);
 }
 
+async function matrix() {
+  const answer = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.Access/v1/matrix', { body: { client: '192.0.2.1' } }));
+  const shares: string[] = answer.access.map((row) => row.share);
+  assert.equal(shares.length, answer.total);
+  assert.ok(shares.includes('data'));
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -252,6 +259,7 @@ await idMap();
 await sharePrivilege();
 await shares();
 await access();
+await matrix();
 await revisions();
 await sessions();
 await tokens();

@@ -16,13 +16,17 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using CheckResult = VORN::AccessCheck::Result;
 
-Answer Explain(const std::string& params) {
+template <void (AccessHandler::*kDriver)()>
+Answer CallMethod(const std::string& params) {
   const auto entry = [](VORN::APIRequest* request, VORN::APIResponse* response) {
     AccessHandler handler(request, response);
-    handler.Explain();
+    (handler.*kDriver)();
   };
   return Call(entry, params);
 }
+
+constexpr auto Explain = CallMethod<&AccessHandler::Explain>;
+constexpr auto Matrix = CallMethod<&AccessHandler::Matrix>;
 
 constexpr char kQuestion[] = R"({"share": "data", "client": "10.0.0.5"})";
 
@@ -132,6 +136,34 @@ TEST_F(AccessTest, HasNullForWhatThereIsNot) {
   EXPECT_TRUE(data["identity"].isNull());
   EXPECT_EQ(data["others"], Json::Value(Json::arrayValue));
   EXPECT_EQ(data["checks"], Json::Value(Json::arrayValue));
+}
+
+TEST_F(AccessTest, IsListedForAllSharesByName) {
+  platform.shares = {{"music", "/volume2/sounds"}, {"data", "/volume1/data"}, {"backup", "/volume1/backup"}};
+  platform.access.path = "/volume1/any";
+  platform.access.mountable = true;
+  platform.access.rule = {"/volume1/any", "*", "everybody", "/etc/exports", 3, "decides", "It decides."};
+  EXPECT_EQ(Matrix(R"({"client": "c", "offset": 1, "limit": 1})").data, Parse(R"({"total": 3, "access": [
+      {"share": "data", "path": "/volume1/any", "mountable": true, "read": false, "write": false, "rule": "*"}]})"));
+  platform.access.rule.reset();
+  const Json::Value data = Matrix(R"({"client": "c", "user": "alice"})").data;
+  EXPECT_EQ(data["access"].size(), 3U);
+  EXPECT_TRUE(data["access"][0]["rule"].isNull());
+  EXPECT_THAT(Questions(), ElementsAre("ExplainAccesses  c sys 4.2 0 '' /data",
+                                       "ExplainAccesses  c sys 4.2 0 'alice' /backup /data /music"));
+  EXPECT_THAT(platform.live_objects, IsEmpty());
+}
+
+TEST_F(AccessTest, IsNotListedForFaultyParametersOrAFailingPlatform) {
+  for (const char* params : {"{}", R"({"client": "c", "offset": "1"})", R"({"client": "c", "limit": 1.5})"}) {
+    EXPECT_EQ(Matrix(params).code, kBadParameter) << params;
+  }
+  platform.Fail("ExplainAccesses");
+  platform.FailWith("ExplainAccesses", VORN::kAccessNoUser);
+  EXPECT_EQ(Matrix(R"({"client": "c"})").code, kNoUser);
+  platform.Fail("VORNShareEnum");
+  EXPECT_EQ(Matrix(R"({"client": "c"})").code, kPlatformFailure);
+  EXPECT_THAT(platform.LogTexts(), Contains("Failed to VORNShareEnum, vornerr=[0x00AB]"));
 }
 
 }  // namespace

@@ -84,9 +84,9 @@ class Explain : public testing::Test {
 
   VORN::AccessAnswer Ask(VORN::AccessQuestion question) {
     if (question.share.empty()) question.share = "data";
-    Result<VORN::AccessAnswer> answer = ExplainAccess(CurrentBox(), names_.service(), question);
-    EXPECT_TRUE(answer.ok()) << answer.status().reason();
-    return answer.ok() ? *answer : VORN::AccessAnswer();
+    const auto answers = ExplainAccesses(CurrentBox(), names_.service(), question, {question.share});
+    EXPECT_TRUE(answers.ok()) << answers.status().reason();
+    return answers.ok() ? answers->front() : VORN::AccessAnswer();
   }
 
   VORN::AccessAnswer Ask(const std::string& client, const std::string& user = "") {
@@ -258,11 +258,10 @@ TEST_F(Explain, RefusesUsersGroupsAndSharesThatTheBoxDoesNotHave) {
   Export({{"*", "rw"}});
   const auto code = [&](const char* share, const char* user, std::vector<std::string> groups) {
     VORN::AccessQuestion question;
-    question.share = share;
     question.client = "10.0.0.5";
     question.user = user;
     question.groups = std::move(groups);
-    return ExplainAccess(CurrentBox(), names_.service(), question).status().code();
+    return ExplainAccesses(CurrentBox(), names_.service(), question, {share}).status().code();
   };
   EXPECT_EQ(code("none", "", {}), ENOENT);
   EXPECT_EQ(code("data", "carol", {}), kNoSuchUser);

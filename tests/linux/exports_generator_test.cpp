@@ -4,8 +4,10 @@
 // of a generated file. Properties:
 //  - A load returns what exportfs exports.
 //  - After a successful save the clients of the share have the access that the request asks for: what it changed
-//    is changed, and every other option of every security flavour is as it was.
-//  - Every other directory is exported as before. Files of /etc/exports.d and lines with a fault stay as they are.
+//    is changed, and every other option of every security flavour is as it was. No flavour gets more than it had unless
+//    the request asks for more, and the next load returns what was saved.
+//  - Every other directory is exported as before. Files of /etc/exports.d and lines with a fault stay as they are, and
+//    no save repeats in /etc/exports a client that only one of those files had.
 //  - A refused save changes nothing.
 //  - FindExportFaults finds exactly the lines at which exportfs stops.
 //
@@ -414,6 +416,8 @@ struct Outcome {
   std::set<std::string> faulty_paths;
   ExportsSet raw;                      // `before` with the lines that have a fault
   std::set<std::string> faulty_files;  // those in which exportfs must stop
+
+  bool MayTakeFromOtherFiles() const { return saved && !before.foreign.empty(); }
 };
 
 List Load(const std::string& path) {
@@ -709,6 +713,26 @@ Row Expected(const ExportRule& rule, const Row* before) {
   return row;
 }
 
+// How much a squash option lets a client do: nothing as root or as its users, nothing as root, everything.
+int FreedomOf(const Access& access) { return access.all_squash ? 0 : access.root_squash ? 1 : 2; }
+int FreedomOf(const ExportRule& rule) {
+  return rule.squash == VORNNFS_SQUASH_ROOT ? 2 : rule.squash == VORNNFS_SQUASH_ALL_ADMIN ? 0 : 1;
+}
+
+// Whether a flavour of `after` may do what neither it nor any field of `shown` could, and `rule` does not ask for.
+bool IsWidened(const Row& before, const Row& after, const ExportRule& rule) {
+  const ExportRule shown = Shown(before);
+  return std::any_of(after.flavors.begin(), after.flavors.end(), [&](const auto& flavor) {
+    const auto former = before.flavors.find(flavor.first);
+    if (former == before.flavors.end()) return false;
+    const Access& old = former->second;
+    const Access& now = flavor.second;
+    return (old.read_only && !now.read_only && rule.privilege <= shown.privilege) ||
+           (!old.insecure && now.insecure && rule.insecure <= shown.insecure) ||
+           (FreedomOf(now) > FreedomOf(old) && FreedomOf(rule) <= FreedomOf(shown));
+  });
+}
+
 // The files in which exportfs stopped, as its messages name them: "/etc/exports:3: ..." or "/etc/exports: 3: ...".
 std::set<std::string> StoppedIn(const std::string& messages) {
   std::set<std::string> files;
@@ -746,6 +770,17 @@ class Properties {
     } else if (outcome_.faulty_paths.count(outcome_.path) == 0) {
       CheckSaved();
       CheckLoad(after_, outcome_.loaded_after, "after");
+    }
+  }
+
+  // Takes the tables of /etc/exports alone, without the other files. A client that only another file has keeps its rule
+  // there.
+  void CheckTakesNothing(const ExportfsVerdict& own_before, const ExportfsVerdict& own_after) const {
+    const auto all = RowsOf(before_, outcome_.path);
+    const auto before = RowsOf(Named(ParseTable(own_before.table)), outcome_.path);
+    for (const auto& [client, row] : RowsOf(Named(ParseTable(own_after.table)), outcome_.path)) {
+      const bool is_taken = before.count(client) == 0 && all.count(client) != 0;
+      EXPECT_FALSE(is_taken) << Where() << "\ntaken from another file: " << client;
     }
   }
 
@@ -809,6 +844,10 @@ class Properties {
       Row expected = Expected(*rule, old == before.end() ? nullptr : &old->second);
       if (old == before.end()) expected.rest = row->second.rest;
       EXPECT_EQ(Print(row->second), Print(expected)) << Where() << "\nclient " << rule->client;
+      EXPECT_EQ(Print(Shown(row->second)), Print(*rule)) << Where() << "\nnot what was saved: " << rule->client;
+      if (old != before.end()) {
+        EXPECT_FALSE(IsWidened(old->second, row->second, *rule)) << Where() << "\nmore access: " << rule->client;
+      }
       after.erase(row);
     }
     EXPECT_TRUE(after.empty()) << Where() << "\nstill exported: " << after.begin()->first;
@@ -842,13 +881,24 @@ int TryBox(unsigned seed, const ExportfsJudge& judge, const Spellings& spellings
     sets.push_back(outcomes.back().before);
     sets.push_back(outcomes.back().after);
     sets.push_back(outcomes.back().raw);
+    if (outcomes.back().MayTakeFromOtherFiles()) {
+      sets.push_back({outcomes.back().before.file, {}});
+      sets.push_back({outcomes.back().after.file, {}});
+    }
   }
   const auto verdicts = judge.JudgeSets(sets, kHosts, box.root().At("/mnt"));
   int saved = 0;
-  for (std::size_t i = 0; i < outcomes.size(); ++i) {
-    Properties(outcomes[i], spellings, verdicts[3 * i], verdicts[3 * i + 1]).Check();
-    CheckFaults(outcomes[i], verdicts[3 * i + 2].messages);
-    saved += outcomes[i].saved ? 1 : 0;
+  auto verdict = verdicts.begin();
+  for (const Outcome& outcome : outcomes) {
+    const Properties properties(outcome, spellings, verdict[0], verdict[1]);
+    properties.Check();
+    CheckFaults(outcome, verdict[2].messages);
+    verdict += 3;
+    if (outcome.MayTakeFromOtherFiles()) {
+      properties.CheckTakesNothing(verdict[0], verdict[1]);
+      verdict += 2;
+    }
+    saved += outcome.saved ? 1 : 0;
   }
   return saved;
 }

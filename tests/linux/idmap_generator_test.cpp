@@ -84,6 +84,8 @@ std::string FileText(Chance* chance) {
   if (chance->OneIn(4)) text += "[Static]\n" + StaticLine(chance);
   if (chance->OneIn(50)) text += "[environment]\nvar = $sys\nsys = $VAR\n";
   if (!text.empty() && chance->OneIn(3)) text.pop_back();
+  if (chance->OneIn(25))
+    text.insert(static_cast<std::size_t>(chance->Below(static_cast<int>(text.size()) + 1)), 1, '\0');
   return text;
 }
 
@@ -206,6 +208,7 @@ bool PutsMapping(const Change& change, const Users& static_before) {
 
 void ExpectOwnEffectOnly(const Change& change, bool puts, const Users& before, const Users& after,
                          const std::vector<LogLine>& log) {
+  EXPECT_FALSE(IsNamed(log, change.principal)) << "the change itself is named as a consequence";
   for (const auto& [principal, user] : after) {
     const bool is_same = user == before.at(principal);
     if (principal != change.principal) {

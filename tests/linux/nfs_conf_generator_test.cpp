@@ -75,6 +75,8 @@ std::string FileText(Chance* chance) {
   std::string text;
   for (int i = chance->Below(6); i > 0; --i) text += chance->OneIn(3) ? OtherLine(chance) : KeyLine(chance);
   if (!text.empty() && chance->OneIn(4)) text.pop_back();
+  if (chance->OneIn(25))
+    text.insert(static_cast<std::size_t>(chance->Below(static_cast<int>(text.size()) + 1)), 1, '\0');
   return text;
 }
 
@@ -83,8 +85,10 @@ GeneratedFiles MakeFiles(Chance* chance) {
   if (chance->OneIn(2)) files.emplace_back(kOwn, FileText(chance));
   if (chance->OneIn(3)) files.emplace_back("/etc/nfs.conf.d/local.conf", FileText(chance));
   if (chance->OneIn(3)) files.emplace_back("/etc/nfs.conf.d/zz.conf", FileText(chance));
-  if (chance->OneIn(6)) files.emplace_back("/etc/nfs.conf.d/zz10.conf", FileText(chance));
-  if (chance->OneIn(6)) files.emplace_back("/etc/nfs.conf.d/zz9.conf", FileText(chance));
+  if (chance->OneIn(4)) {  // two names whose order as versions is not that of their characters
+    files.emplace_back("/etc/nfs.conf.d/zz10.conf", FileText(chance));
+    files.emplace_back("/etc/nfs.conf.d/zz9.conf", FileText(chance));
+  }
   if (chance->OneIn(2)) files.emplace_back("/etc/part", FileText(chance));
   if (chance->OneIn(2)) files.emplace_back("/etc/nfs.conf.d/part", FileText(chance));
   return files;

@@ -17,6 +17,9 @@ struct CallDescription {
   std::string origin;  // the peer's address without a port, or "unix"
   std::string method;  // "VORN.Core.FileServ.NFS/v1/set"
 
+  // The parameters as JSON on one line, without secrets, for the history; may be empty.
+  std::string parameters;
+
   // Whether the call may change anything. In a call that may not, VornConf takes no lock, and each
   // operation that would write a file, drive a service, apply a live setting, reload the firewall or
   // run a program fails with EROFS in the error facility and changes nothing.

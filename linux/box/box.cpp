@@ -78,19 +78,32 @@ void Box::KeepDerived(const Key& key, Derived derived) {
 }
 
 Status Box::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {
+  return Change(path, text, expected, [&] { return store_->Replace(path, text, expected, mode); });
+}
+
+Status Box::Remove(const std::string& path, const Version& expected) {
+  return Change(path, std::nullopt, expected, [&]() -> Result<Version> {
+    Status status = store_->Remove(path, expected);
+    return status.ok() ? Result<Version>(Version{}) : status;
+  });
+}
+
+// Replaces the file with `text`, or removes it if there is none. `write` does so and returns the new version.
+Status Box::Change(const std::string& path, std::optional<std::string_view> text, const Version& expected,
+                   const std::function<Result<Version>()>& write) {
   if (Status status = CheckMayWrite(path); !status.ok()) return status;
   if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;
-  const Result<Version> written = store_->Replace(path, text, expected, mode);
+  if (recorder_ != nullptr) recorder_->Intend(path, text);
+  const Result<Version> written = write();
+  if (recorder_ != nullptr) recorder_->Settle(path, written.status());
   if (written.ok()) FirstReads::Renew(*this, path, *written);
   return written.status();
 }
 
-Status Box::Remove(const std::string& path, const Version& expected) {
-  if (Status status = CheckMayWrite(path); !status.ok()) return status;
-  if (Status status = FirstReads::Check(*this, path, expected); !status.ok()) return status;
-  Status status = store_->Remove(path, expected);
-  if (status.ok()) FirstReads::Renew(*this, path, Version{});
-  return status;
+void Box::NoteAction(const std::string& action, const Status& status) {
+  if (recorder_ == nullptr || !recorder_->IsOn()) return;
+  const ConfigurationLock lock(*this);
+  if (lock.status().ok()) recorder_->NoteAction(action, status);
 }
 
 Status Box::Confirm(const std::string& path) {

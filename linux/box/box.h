@@ -7,12 +7,14 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <typeindex>
 #include <utility>
 #include <vector>
 
+#include "change_recorder.h"
 #include "engine.h"
 #include "rehearsed_action.h"
 #include "root.h"
@@ -41,6 +43,15 @@ class Box {
 
   const Root& root() const { return root_; }
   const Store& store() const { return *store_; }
+
+  // Records the changes of the box from now on. Called before the box is used.
+  void RecordChanges(std::unique_ptr<ChangeRecorder> recorder) { recorder_ = std::move(recorder); }
+
+  // The recorder of the box's changes; null if they are not recorded, as in a draft.
+  ChangeRecorder* recorder() const { return recorder_.get(); }
+
+  // Records that the service operation `action` was attempted.
+  void NoteAction(const std::string& action, const Status& status);
 
   bool is_draft() const { return actions_ != nullptr; }
 
@@ -103,6 +114,9 @@ class Box {
   Result<std::unique_ptr<HeldLock>> Lock(const std::string& name, std::chrono::milliseconds limit);
 
  private:
+  Status Change(const std::string& path, std::optional<std::string_view> text, const Version& expected,
+                const std::function<Result<Version>()>& write);
+
   using Document = std::shared_ptr<const void>;
   struct Cached {
     Version version;
@@ -126,6 +140,7 @@ class Box {
 
   const Root root_;
   const std::unique_ptr<Store> store_;
+  std::unique_ptr<ChangeRecorder> recorder_;
   const EngineChooser choose_engine_;
   std::vector<RehearsedAction>* const actions_;  // null: this is no draft
   std::mutex mutex_;

@@ -54,6 +54,8 @@ Status Enter(Box& box, std::chrono::milliseconds limit) {
 void Leave(const Box& box) {
   Context* context = Find(box);
   if (context == nullptr || --context->depth > 0) return;
+  const bool is_outermost = layers.size() == 1;
+  if (is_outermost && context->lock != nullptr && box.recorder() != nullptr) box.recorder()->End();
   Layer& layer = layers.back();
   layer.erase(layer.begin() + (context - layer.data()));
 }

@@ -2,12 +2,16 @@
 
 #include <unistd.h>
 
+#include <charconv>
+
 #include "ini_file.h"
 
 namespace vorn {
 namespace {
 
 constexpr char kSection[] = "platform";
+
+constexpr std::size_t kFewestChanges = 1000;  // of the history; a checkpoint packs fewer
 
 // Whether the box was booted by systemd: sd_booted(3).
 bool IsBootedBySystemd(const Box& box) { return box.root().is_box() && access("/run/systemd/system", F_OK) == 0; }
@@ -34,6 +38,19 @@ Status ReadWord(const IniFile& file, const char* key, const Word<T> (&words)[kSi
   return file.Refuse(kSection, key, "is none of: " + known);
 }
 
+Status ReadNumber(const IniFile& file, const char* key, std::size_t least, std::size_t* result) {
+  const std::optional<std::string> text = file.document().Get(kSection, key);
+  if (!text) return {};
+  std::size_t number = 0;
+  const char* const end = text->data() + text->size();
+  const auto read = std::from_chars(text->data(), end, number);
+  if (read.ec != std::errc() || read.ptr != end || number < least) {
+    return file.Refuse(kSection, key, "is no number from " + std::to_string(least));
+  }
+  *result = number;
+  return {};
+}
+
 }  // namespace
 
 Result<PlatformSettings> PlatformSettings::Load(Box& box) {
@@ -49,6 +66,7 @@ Result<PlatformSettings> PlatformSettings::Read(const Box& box, const IniFile& f
   PlatformSettings settings;
   settings.engine = default_engine;
   settings.firewall = box.root().is_box();
+  settings.history = box.root().is_box();
 
   const Word<EngineKind> engines[] = {
       {"systemd", EngineKind::kSystemd}, {"local", EngineKind::kLocal}, {"auto", default_engine}};
@@ -58,6 +76,8 @@ Result<PlatformSettings> PlatformSettings::Read(const Box& box, const IniFile& f
   const Word<bool> switches[] = {{"yes", true}, {"no", false}};
   if (Status s = ReadWord(file, "firewall", switches, &settings.firewall); !s.ok()) return s;
   if (Status s = ReadWord(file, "withdraw_left_shares", switches, &settings.withdraw_left_shares); !s.ok()) return s;
+  if (Status s = ReadWord(file, "history", switches, &settings.history); !s.ok()) return s;
+  if (Status s = ReadNumber(file, "history_changes", kFewestChanges, &settings.history_changes); !s.ok()) return s;
   settings.admin_account = file.document().Get(kSection, "admin_account").value_or(settings.admin_account);
   settings.guest_account = file.document().Get(kSection, "guest_account").value_or(settings.guest_account);
   return settings;

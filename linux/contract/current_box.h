@@ -6,12 +6,17 @@
 
 namespace vorn {
 
+class History;
+
 // The box on which this thread works: the draft of its call context (call.h), else RealBox().
 Box& CurrentBox();
 
 // The box of this process's root directory (Root::Current). There is one object per root; it lives as long as the
 // process. May be called from any thread.
 Box& RealBox();
+
+// The history of RealBox().
+History& RealHistory();
 
 }  // namespace vorn
 

@@ -12,7 +12,6 @@
 namespace vorn {
 namespace {
 
-constexpr char kFile[] = "/etc/vorn/shares.conf";
 constexpr char kSection[] = "shares";
 constexpr char kHeading[] = "# The shared folders of this box: a line \"name = path\" for each.\n";
 constexpr std::size_t kLongestName = 255;
@@ -61,7 +60,7 @@ Status CheckIsNew(Box& box, const std::string& name, const std::string& path) {
 }  // namespace
 
 Result<std::string> FindSharePath(Box& box, const std::string& name) {
-  const Result<SharedIniFile> file = IniFile::Open(box, kFile);
+  const Result<SharedIniFile> file = IniFile::Open(box, kSharesFile);
   if (!file.ok()) return file.status();
   for (const IniEntry& share : (*file)->document().Entries(kSection)) {
     if (share.key == name) return CanonicalPath(box.root(), **file, share);
@@ -70,7 +69,7 @@ Result<std::string> FindSharePath(Box& box, const std::string& name) {
 }
 
 Result<std::vector<std::string>> ListSharePaths(Box& box) {
-  const Result<SharedIniFile> file = IniFile::Open(box, kFile);
+  const Result<SharedIniFile> file = IniFile::Open(box, kSharesFile);
   if (!file.ok()) return file.status();
   if (!(*file)->exists()) return Status::System(ENOENT, (*file)->location());
   std::vector<std::string> paths;
@@ -79,7 +78,7 @@ Result<std::vector<std::string>> ListSharePaths(Box& box) {
 }
 
 Result<std::vector<SharedFolder>> ListShares(Box& box) {
-  const Result<SharedIniFile> file = IniFile::Open(box, kFile);
+  const Result<SharedIniFile> file = IniFile::Open(box, kSharesFile);
   if (!file.ok()) return file.status();
   std::vector<SharedFolder> shares;
   for (const IniEntry& share : (*file)->document().Entries(kSection)) {
@@ -99,7 +98,7 @@ Status AddShare(Box& box, const std::string& name, const std::string& path) {
   const std::optional<IniValue> value = IniValue::From(*folder);
   if (!value) return Status::Failure(kRefusedText, "shares.conf cannot represent the path " + *folder);
   if (Status status = CheckIsNew(box, name, *folder); !status.ok()) return status;
-  Result<IniEditor> file = IniEditor::Open(box, kFile, kHeading);
+  Result<IniEditor> file = IniEditor::Open(box, kSharesFile, kHeading);
   if (!file.ok()) return file.status();
   file->document().Set(*IniSection::From(kSection), *key, *value);
   return file->Save();
@@ -108,7 +107,7 @@ Status AddShare(Box& box, const std::string& name, const std::string& path) {
 Status RemoveShare(Box& box, const std::string& name) {
   const ConfigurationLock lock(box);
   if (!lock.status().ok()) return lock.status();
-  Result<IniEditor> file = IniEditor::Open(box, kFile);
+  Result<IniEditor> file = IniEditor::Open(box, kSharesFile);
   if (!file.ok()) return file.status();
   for (const IniEntry& share : file->document().Entries(kSection)) {
     if (share.key != name) continue;

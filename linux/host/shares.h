@@ -10,6 +10,8 @@
 
 namespace vorn {
 
+inline constexpr char kSharesFile[] = "/etc/vorn/shares.conf";
+
 // The path of the share with this exact name: absolute, without links and dots, as exportfs(8) resolves it.
 // Fails with ENOENT if there is no such share.
 Result<std::string> FindSharePath(Box& box, const std::string& name);

@@ -28,13 +28,9 @@ Status RehearseProgram(Box& box, const std::string& program, const std::string& 
   return {};
 }
 
-}  // namespace
-
-Status RunBoxProgram(Box& box, const std::string& program, const std::vector<std::string>& arguments) {
-  const Result<std::string> path = box.root().Locate(program);
-  if (!path.ok()) return path.status();
-  if (Status status = CheckMayWrite(program); !status.ok()) return status;
-  if (box.is_draft()) return RehearseProgram(box, program, *path, arguments);
+// Releases the configuration locks of this thread meanwhile.
+Status RunPaused(const Box& box, const std::string& program, const std::string& path,
+                 const std::vector<std::string>& arguments) {
   const LockPause pause;
   ProgramOptions options;
   options.root = box.root().directory();
@@ -43,8 +39,20 @@ Status RunBoxProgram(Box& box, const std::string& program, const std::vector<std
     if (count++ >= kMostLines) return;
     syslog(LOG_INFO, "%s: %.*s", program.c_str(), static_cast<int>(line.size()), line.data());
   };
-  Status status = RunProgram(*path, arguments, log_line, options);
+  Status status = RunProgram(path, arguments, log_line, options);
   if (count > kMostLines) syslog(LOG_INFO, "%s: %d more lines", program.c_str(), count - kMostLines);
+  return status;
+}
+
+}  // namespace
+
+Status RunBoxProgram(Box& box, const std::string& program, const std::vector<std::string>& arguments) {
+  const Result<std::string> path = box.root().Locate(program);
+  if (!path.ok()) return path.status();
+  if (Status status = CheckMayWrite(program); !status.ok()) return status;
+  if (box.is_draft()) return RehearseProgram(box, program, *path, arguments);
+  Status status = RunPaused(box, program, *path, arguments);
+  box.NoteAction(arguments.empty() ? program : arguments.front(), status);
   return status;
 }
 

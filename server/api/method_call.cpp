@@ -129,6 +129,7 @@ Response Call::Execute() {
   description_.uploads = body_->Uploads();
   if (!route_.method.reads_only) {
     audited_parameters_ = TextForAudit(route_, object);
+    description_.parameters = audited_parameters_;
   }
   if (rehearses_) return Rehearse(route_, std::move(object), description_, if_match_, ShownContext(*caller_));
   if (route_.own) return route_.own(object, *caller_);

@@ -32,9 +32,10 @@ ALLOWED = {
         "linux/settings", "platform"},
     "linux/access": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "platform"},
+    "linux/history": {"linux/status", "linux/system", "linux/text", "linux/box", "platform"},
     "linux/contract": {
-        "linux/access", "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
-        "linux/idmap", "linux/kerberos", "linux/service", "platform"},
+        "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
+        "linux/access", "linux/history", "linux/idmap", "linux/kerberos", "linux/service", "platform"},
 }
 HEADERS = sorted(set(ALLOWED) | {"include", "platform", "linux/status", "server", "tests/support"})
 

@@ -10,7 +10,7 @@ import tempfile
 import time
 
 from host import process
-from host.log import say
+from host.log import LabError, say
 from host.process import output_of
 
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
@@ -48,7 +48,18 @@ class Cache:
         self._logs = logs
 
     def get(self, name, key, program):
-        """The folder that `program` fills for this key. Only the newest folder of each name is kept."""
+        """The folder that `program` fills for this key. Only the newest folder of each name is kept. Of a build that
+        fails nothing is kept.
+
+        >>> with tempfile.TemporaryDirectory() as folder:
+        ...     os.environ["VORN_LAB_CACHE"] = folder
+        ...     kept = Cache(pathlib.Path(folder))
+        ...     made = kept.get("disk", "1" * 16, "/bin/true").name
+        ...     with contextlib.suppress(LabError):
+        ...         kept.get("disk", "2" * 16, "/bin/false")
+        ...     made, sorted(path.name for path in pathlib.Path(folder).iterdir() if path.is_dir())
+        ('disk-1111111111111111', ['disk-1111111111111111'])
+        """
         with _locked(self._folder / "lock", fcntl.LOCK_EX):
             folder = self._folder / f"{name}-{key}"
             if not folder.is_dir():

@@ -1,4 +1,5 @@
 #include "access_handler.h"
+#include "history_handler.h"
 
 namespace {
 
@@ -10,9 +11,13 @@ void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
 }
 
 constexpr char kAccess[] = "VORN.Core.FileServ.NFS.Access";
+constexpr char kHistory[] = "VORN.Core.FileServ.NFS.History";
 
 const APIRow kTable[] = {{kAccess, 1, "explain", Serve<AccessHandler, &AccessHandler::Explain>},
                          {kAccess, 1, "matrix", Serve<AccessHandler, &AccessHandler::Matrix>},
+                         {kHistory, 1, "list", Serve<HistoryHandler, &HistoryHandler::List>},
+                         {kHistory, 1, "show", Serve<HistoryHandler, &HistoryHandler::Show>},
+                         {kHistory, 1, "undo", Serve<HistoryHandler, &HistoryHandler::Undo>},
                          {nullptr, 0, nullptr, nullptr}};
 
 }  // namespace

@@ -126,6 +126,37 @@ class ExplainTest(BoxTest):
         self.refuses("explain data 10.0.0.5 --security sis", Exit.USAGE, "sis")
 
 
+class HistoryTest(BoxTest):
+    """vorn history, vorn undo, vorn audit."""
+
+    def test_shows_and_takes_back_a_change(self):
+        self.vorn("exports add data 10.0.0.0/24 --access rw")
+        change = self.json("history --file /etc/exports")[0]
+        self.assertEqual((change["kind"], change["files"]), ("change", ["/etc/exports"]))
+        self.assertIn(change["id"][:12], self.vorn("history"))
+        self.assertIn("+/volume1/data 10.0.0.0/24", self.vorn(f"history {change['id'][:12]}"))
+        self.assertIn("10.0.0.0/24", self.vorn("audit --method SharePrivilege"))
+        self.assertIn("-/volume1/data 10.0.0.0/24", self.vorn(f"undo {change['id'][:12]} --rehearse"))
+        self.assertEqual(self.json("history")[0]["id"], change["id"], "a rehearsal leaves no trace")
+        self.vorn(f"undo {change['id'][:12]}")
+        self.assertEqual(self.json("history")[0]["undoes"], change["id"])
+        self.assertEqual(self.json("exports show data"), [])
+        self.refuses(f"undo {change['id']}", Exit.FAILED, "(code 2394,")
+        self.refuses("undo ffff", Exit.FAILED, "(code 2390,")
+
+    def test_shows_a_conflict(self):
+        self.vorn("exports add data 10.0.0.0/24 --access rw")
+        change = self.json("history")[0]["id"]
+        self.vorn("exports add data 10.0.0.0/24 --access ro")
+        self.refuses(f"undo {change}", Exit.FAILED, "(code 2391,", "10.0.0.0/24(ro")
+
+    def test_filters(self):
+        self.vorn("exports add data 10.0.0.0/24 --access rw")
+        self.assertEqual(self.json("history --caller nobody-of-this-name"), [])
+        self.assertEqual(self.json("history --file /etc/fstab --days 1 --limit 5"), [])
+        self.assertTrue(self.json("audit --days 1"))
+
+
 class ExportsTest(BoxTest):
     """vorn exports, vorn share."""
 

@@ -182,6 +182,17 @@ async function matrix() {
   assert.ok(shares.includes('data'));
 }
 
+async function history() {
+  const list = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.History/v1/list', { body: { limit: 1 } }));
+  const newest = list.changes[0];
+  if (newest !== undefined) {
+    const shown = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.History/v1/show', { body: { id: newest.id } }));
+    assert.deepEqual(shown.files, newest.files);
+  }
+  const unknown = await client.POST('/api/VORN.Core.FileServ.NFS.History/v1/undo', { body: { id: 'x' } });
+  assert.equal(unknown.error?.error.code, 2390);
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -260,6 +271,7 @@ await sharePrivilege();
 await shares();
 await access();
 await matrix();
+await history();
 await revisions();
 await sessions();
 await tokens();

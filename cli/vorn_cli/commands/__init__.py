@@ -1,6 +1,6 @@
 """All commands, in the order of the help."""
 
-from . import access, calls, explain, exports, idmap, keytab, service, shares, state
+from . import access, calls, explain, exports, history, idmap, keytab, service, shares, state
 
 GROUPS = {
     "nfs": "the NFS service",
@@ -14,4 +14,4 @@ GROUPS = {
 }
 
 COMMANDS = (service.COMMANDS + exports.COMMANDS + explain.COMMANDS + idmap.COMMANDS + keytab.COMMANDS + shares.COMMANDS + state.COMMANDS +
-            access.COMMANDS + calls.COMMANDS)
+            history.COMMANDS + access.COMMANDS + calls.COMMANDS)

@@ -36,11 +36,13 @@ Status CheckState(Box& box, AccessChecks* checks) {
 std::optional<bool> HasVersion(Box& box, const std::string& version) {
   const Result<StoredFile> file = box.Read(kVersionsInForce);
   if (!file.ok() || !file->version.exists || !IsServing(box)) return std::nullopt;
-  std::istringstream words(file->text);  // "-2 +3 +4 +4.0 +4.1 +4.2"
+  std::istringstream words(file->text);  // "-2 +3 +4 +4.1 +4.2"
+  bool is_implied = false;               // "+4" stands for 4.0, too, unless there is "-4.0"
   for (std::string word; words >> word;) {
     if (word.substr(1) == version) return word[0] == '+';
+    is_implied = is_implied || (word == "+4" && version == "4.0");
   }
-  return false;
+  return is_implied;
 }
 
 bool IsConfigured(const NFSConfiguration& configuration, const std::string& version) {

@@ -68,7 +68,7 @@ class Explain : public testing::Test {
   void Serve(const std::string& exports) {
     root_.Write("/etc/exports", exports);
     root_.Write("/proc/net/rpc/nfsd", "th 8 0\n");
-    root_.Write("/proc/fs/nfsd/versions", "-2 +3 +4 +4.0 +4.1 +4.2\n");
+    root_.Write("/proc/fs/nfsd/versions", "-2 +3 +4 +4.1 +4.2\n");
     std::string table;
     for (const auto& [client, options] : table_) table += "/srv/data\t" + client + "(" + options + ")\n";
     root_.Write("/var/lib/nfs/etab", table);
@@ -392,6 +392,12 @@ TEST_F(Explain, NeedsAFolder) {
 
 TEST_F(Explain, ChecksTheServiceAndItsVersions) {
   Export({{"*", "rw"}});
+  VORN::AccessQuestion question;
+  question.client = "10.0.0.5";
+  question.version = "4.0";
+  EXPECT_THAT(Failed(Ask(question)), IsEmpty());
+  root_.Write("/proc/fs/nfsd/versions", "-2 +3 +4 -4.0 +4.1 +4.2\n");
+  EXPECT_THAT(Failed(Ask(question)), ElementsAre("version"));
   root_.Write("/proc/fs/nfsd/versions", "-2 +3 -4 -4.0 -4.1 -4.2\n");
   EXPECT_THAT(Failed(Ask("10.0.0.5")), ElementsAre("version"));
   root_.Write("/proc/net/rpc/nfsd", "th 0 0\n");

@@ -20,7 +20,7 @@ namespace vorn {
 //                                             rules at the next save or start, instead of only being named in the log
 // history = yes | no                          default: yes if the root is "/"; whether changes are recorded in
 //                                             /var/lib/vorn/history.git
-// history_changes = N                         default 10000, at least 1000: the newest changes that are always kept
+// history_changes = N                         default 2000, at least 1000: the newest changes that are always kept
 struct PlatformSettings {
   enum class Kerberos { kAuto, kYes, kNo };
   enum class EngineKind { kSystemd, kLocal };
@@ -32,7 +32,7 @@ struct PlatformSettings {
   bool firewall = false;
   bool withdraw_left_shares = false;
   bool history = false;
-  std::size_t history_changes = 10000;
+  std::size_t history_changes = 2000;
 
   // Reads the settings of the box. A value that is not in the list above is a failure that names it.
   static Result<PlatformSettings> Load(Box& box);

@@ -39,7 +39,7 @@ class History : public ChangeRecorder {
  public:
   struct Settings {
     bool is_on = false;
-    std::size_t most_changes = 10000;  // as PlatformSettings
+    std::size_t most_changes = 2000;  // as PlatformSettings
   };
 
   struct Environment {

@@ -161,6 +161,14 @@ std::string MachineName() {
   return gethostname(name, sizeof name - 1) == 0 ? name : "";
 }
 
+// Returns false, after logging the reason, if a listener needs TLS and it cannot be set up.
+bool OpenTls(const Options& options, const Settings& settings, std::unique_ptr<TlsServer>* tls) {
+  std::string error;
+  if (WantsTls(settings)) *tls = OpenTlsServer(settings, SelfSignedPath(options), std::time(nullptr), &error);
+  if (!error.empty()) syslog(LOG_ERR, "%s", error.c_str());
+  return error.empty();
+}
+
 int Serve(const Options& options, const Settings& settings) {
   const std::optional<Folders> folders = OpenFolders(options);
   std::string error;
@@ -170,10 +178,8 @@ int Serve(const Options& options, const Settings& settings) {
   const std::vector<Module> modules = LoadModulesOf(settings);
   if (modules.empty()) return EXIT_FAILURE;
   std::unique_ptr<TlsServer> tls;
-  if (WantsTls(settings)) tls = OpenTlsServer(settings, SelfSignedPath(options), std::time(nullptr), &error);
-  if (!error.empty()) syslog(LOG_ERR, "%s", error.c_str());
   std::optional<std::vector<Listener>> listeners;
-  if (error.empty()) listeners = Listen(settings, folders->runtime);
+  if (OpenTls(options, settings, &tls)) listeners = Listen(settings, folders->runtime);
   if (!listeners) return EXIT_FAILURE;
 
   Sha256("");  // loads the algorithm

@@ -98,6 +98,9 @@ BREAKS = [
     Break("passwords-out-of-reach", "people get in by their password", "people",
           "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nInaccessiblePaths=/etc/shadow\\n' "
           f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="signs_in"),
+    Break("settings-not-read-again", "a reload applies the settings, and fails with a fault", "tls",
+          "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nExecReload=\\nExecReload=/bin/true\\n' "
+          f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="fault"),
     Break("accounts-not-created", "the package creates the accounts of the squash modes", "package",
           _package("sed -i 's/^  make_account /  : make_account /' postinst"), select="accounts"),
     Break("purge-takes-all", "a purge keeps what is the administrator's", "package",

@@ -2,13 +2,14 @@
 
 #include <endian.h>
 #include <sys/stat.h>
-#include <sys/statvfs.h>
 #include <sys/xattr.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstring>
+
+#include "mounts.h"
 
 namespace vorn {
 namespace {
@@ -103,11 +104,10 @@ Result<FolderPermissions> ReadFolderPermissions(Box& box, const std::string& pat
   const Result<std::string> location = box.root().Locate(path);
   if (!location.ok()) return location.status();
   struct stat stat {};
-  struct statvfs system {};
   if (::stat(location->c_str(), &stat) != 0) return Status::System(errno, *location);
-  if (statvfs(location->c_str(), &system) != 0) return Status::System(errno, *location);
-  return FolderPermissions{stat.st_uid, stat.st_gid, stat.st_mode & 0777, (system.f_flag & ST_RDONLY) != 0,
-                           ReadACL(*location)};
+  const Result<bool> is_read_only = IsFileSystemReadOnly(box, path);
+  if (!is_read_only.ok()) return is_read_only.status();
+  return FolderPermissions{stat.st_uid, stat.st_gid, stat.st_mode & 0777, *is_read_only, ReadACL(*location)};
 }
 
 }  // namespace vorn

@@ -62,6 +62,18 @@ bool IsUnexportable(libmnt_fs* entry, bool mounted_here) {
   return mounted_here && LacksHandles(mnt_fs_get_target(entry));
 }
 
+// The mount that has `path`: the last one of the innermost. nullptr if there is none.
+libmnt_fs* FindMountOf(libmnt_table* table, libmnt_iter* iterator, const std::string& path) {
+  libmnt_fs* entry = nullptr;
+  libmnt_fs* own = nullptr;
+  while (mnt_table_next_fs(table, iterator, &entry) == 0) {
+    const char* target = mnt_fs_get_target(entry);
+    if (target == nullptr || !IsBelow(path, target)) continue;
+    if (own == nullptr || IsBelow(target, mnt_fs_get_target(own))) own = entry;
+  }
+  return own;
+}
+
 // Null for a trial root without a mount table.
 Result<Table> ReadMounts(const Root& root) {
   const auto file = root.Locate(kMountInfo);
@@ -83,15 +95,24 @@ Result<bool> HasUnexportableMount(Box& box, const std::string& path) {
   const Iterator iterator(mnt_new_iter(MNT_ITER_FORWARD));
   if (!iterator) return Status::System(ENOMEM, "mount table");
   libmnt_fs* entry = nullptr;
-  libmnt_fs* own = nullptr;  // the mount that has `path`: the last one of the innermost
   while (mnt_table_next_fs(table->get(), iterator.get(), &entry) == 0) {
     const char* target = mnt_fs_get_target(entry);
-    if (target == nullptr) continue;
-    if (IsBelow(target, path) && IsUnexportable(entry, box.root().is_box())) return true;
-    const bool is_inner = own == nullptr || IsBelow(target, mnt_fs_get_target(own));
-    if (IsBelow(path, target) && is_inner) own = entry;
+    if (target != nullptr && IsBelow(target, path) && IsUnexportable(entry, box.root().is_box())) return true;
   }
+  mnt_reset_iter(iterator.get(), MNT_ITER_FORWARD);
+  libmnt_fs* own = FindMountOf(table->get(), iterator.get(), path);
   return own != nullptr && IsUnexportable(own, box.root().is_box());
+}
+
+Result<bool> IsFileSystemReadOnly(Box& box, const std::string& path) {
+  const auto table = ReadMounts(box.root());
+  if (!table.ok()) return table.status();
+  if (!*table) return false;
+  const Iterator iterator(mnt_new_iter(MNT_ITER_FORWARD));
+  if (!iterator) return Status::System(ENOMEM, "mount table");
+  libmnt_fs* own = FindMountOf(table->get(), iterator.get(), path);
+  const char* options = own == nullptr ? nullptr : mnt_fs_get_fs_options(own);
+  return options != nullptr && mnt_optstr_get_option(options, "ro", nullptr, nullptr) == 0;
 }
 
 Result<std::vector<std::string>> MountsBelow(Box& box, const std::string& path) {

@@ -14,6 +14,11 @@ namespace vorn {
 // network file system, FUSE, one of the kernel's own, or one without file handles (exportfs support).
 Result<bool> HasUnexportableMount(Box& box, const std::string& path);
 
+// Whether the file system of `path` itself is read-only. The flags of its mount do not count: a service with
+// ProtectSystem (systemd.exec(5)) sees read-only mounts where the kernel's server writes. False for a trial root
+// without a mount table.
+Result<bool> IsFileSystemReadOnly(Box& box, const std::string& path);
+
 // Returns the directories below `path` at which a file system is mounted, sorted. Empty for a trial root without a
 // mount table.
 Result<std::vector<std::string>> MountsBelow(Box& box, const std::string& path);

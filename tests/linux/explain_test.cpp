@@ -358,6 +358,16 @@ TEST_F(Explain, SaysThatARuleIsReadOnly) {
   EXPECT_EQ(TextOf(answer, "write"), "The rule is read-only.");
 }
 
+TEST_F(Explain, SaysThatAFileSystemIsReadOnlyWhateverTheFlagsOfItsMount) {
+  Export({{"*", "rw"}});
+  const std::string root = "1 0 0:1 / / ro shared:1 - ext4 source rw\n";  // as systemd's ProtectSystem shows it
+  root_.Write("/proc/self/mountinfo", root);
+  EXPECT_TRUE(Ask("10.0.0.5").write);
+  root_.Write("/proc/self/mountinfo", root + "2 1 0:2 / /srv rw shared:1 - ext4 source ro,errors=continue\n");
+  EXPECT_FALSE(Ask("10.0.0.5").write);
+  EXPECT_EQ(TextOf(Ask("10.0.0.5"), "write"), "The file system of /srv/data is mounted read-only.");
+}
+
 TEST_F(Explain, NeedsAWayThatNobodyMayEnterInVersion4) {
   Export({{"*", "rw"}});
   ASSERT_EQ(chmod(root_.At("/srv").c_str(), 0700), 0);

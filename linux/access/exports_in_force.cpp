@@ -8,6 +8,7 @@
 #include "export_table.h"
 #include "exports_client.h"
 #include "exports_files.h"
+#include "exports_text.h"
 #include "path_resolver.h"
 
 namespace vorn {
@@ -96,6 +97,34 @@ std::set<std::string> AddHosts(const std::set<std::string>& names, const NameSer
   return known;
 }
 
+// The table with the addresses of its host names. exportfs(8) lists a host by its name, and a plan lists its addresses.
+Result<std::string> ByAddress(std::string_view table, const HostAddresses& hosts) {
+  const Result<std::vector<ExportTableLine>> lines = ReadExportTable(table);
+  if (!lines.ok()) return lines.status();
+  std::string text;
+  for (const ExportTableLine& line : *lines) {
+    const auto host = hosts.find(ExportClientKey(line.client));
+    if (host == hosts.end()) {
+      text += line.text;
+      continue;
+    }
+    for (const std::string& address : host->second) {
+      text += EncodeExportsWord(line.path) + "\t" + address + "(" + std::string(line.options) + ")\n";
+    }
+  }
+  return text;
+}
+
+// The directories whose rules in the files are not those of the table.
+Result<std::set<std::string>> FindPending(const std::vector<SharedExportsFile>& files, std::string_view table,
+                                          const ExportPaths& paths, const HostAddresses& hosts) {
+  const Result<std::string> by_address = ByAddress(table, hosts);
+  if (!by_address.ok()) return by_address.status();
+  Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
+  if (!update.ok()) return update.status();
+  return std::move(update->changed);
+}
+
 }  // namespace
 
 Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bool is_serving) {
@@ -111,7 +140,11 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
   const BoxPaths paths(box.root());
   const Result<ExportTableUpdate> update = PlanExportTable(*files, table->text, paths, result.hosts, known);
   if (!update.ok()) return update.status();
-  if (is_serving) result.pending = update->changed;
+  if (is_serving) {
+    Result<std::set<std::string>> pending = FindPending(*files, table->text, paths, result.hosts);
+    if (!pending.ok()) return pending.status();
+    result.pending = std::move(*pending);
+  }
   const Places places = FindPlaces(*files, result.hosts, paths);
   Result<ExportList> exports = ReadExports(is_serving ? table->text : update->text, places);
   if (!exports.ok()) return exports.status();

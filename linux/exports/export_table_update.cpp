@@ -84,12 +84,13 @@ class OptionLists {
 };
 
 // exportfs(8) writes the clients of a path by kind, in this order, and those of one kind in the order of the files.
-enum class ClientKind { kName, kAddress, kPattern, kNetgroup, kEverybody };
+enum class ClientKind { kName, kAddress, kNetwork, kPattern, kNetgroup, kEverybody };
 
 ClientKind KindOf(std::string_view client) {
   if (client == "*") return ClientKind::kEverybody;
   if (client.substr(0, 1) == "@") return ClientKind::kNetgroup;
   if (client.find_first_of("*?[") != std::string_view::npos) return ClientKind::kPattern;
+  if (client.find('/') != std::string_view::npos) return ClientKind::kNetwork;
   return IsExportHostName(client) ? ClientKind::kName : ClientKind::kAddress;
 }
 

@@ -429,6 +429,20 @@ TEST_F(Explain, UsesTheTableInForceAndSaysThatTheFilesDiffer) {
   EXPECT_FALSE(Ask("10.0.0.5").rule) << "the files are what a start would put into force";
 }
 
+TEST_F(Explain, SaysThatTheFilesDifferOnlyIfTheHostsAddressHasOtherRules) {
+  names_.hosts = {{"c.example", "10.0.0.5"}};
+  Export({{"10.0.0.0/24", "ro"}, {"c.example", "rw"}});
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), IsEmpty()) << "as this platform orders the table";
+  table_ = {{"c.example", "rw"}, {"10.0.0.0/24", "ro"}};
+  Serve("/srv/data 10.0.0.0/24(ro) c.example(rw)\n");
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), IsEmpty()) << "as exportfs orders the table";
+  table_ = {{"10.0.0.5", "rw"}, {"10.0.0.0/24", "ro"}};
+  Serve("/srv/data 10.0.0.0/24(ro) 10.0.0.5(rw)\n");
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), IsEmpty()) << "by the address";
+  Serve("/srv/data 10.0.0.0/24(ro) c.example(ro)\n");
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), ElementsAre("reload"));
+}
+
 TEST_F(Explain, FindsTheLineOfAHostThatTheTableHasByItsAddress) {
   names_.hosts = {{"c.example", "10.0.0.5"}};
   root_.Write("/etc/exports", "\n\n/srv/data c.example(rw)\n");

@@ -208,11 +208,11 @@ class Explanation {
     checks_.Fail("keytab", "The box has no keytab, so no client can use Kerberos.", "Upload a keytab.");
   }
 
-  // Over version 4 the root user of the client walks to the folder. The folders above the rule's one are shown with
-  // root squashed to nobody, those below it under the options of the rule.
+  // Over version 4 the root user of the client walks to the folder. It remains root in the folders above the rule's
+  // one, except that Kerberos makes it nobody. The options of the rule count for the folders below.
   void CheckWay() {
     VORN::AccessIdentity root;
-    root.user_id = root.group_id = kNobody;
+    if (question_.flavor != "sys") root.user_id = root.group_id = kNobody;
     for (const std::string& folder : FoldersAbove(path_)) {
       const bool is_in_rule = decider_ != nullptr && folder.size() >= decider_->directory.size();
       if (is_in_rule && access_) root = Squash({}, *access_, *decider_);

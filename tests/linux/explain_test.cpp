@@ -368,14 +368,22 @@ TEST_F(Explain, SaysThatAFileSystemIsReadOnlyWhateverTheFlagsOfItsMount) {
   EXPECT_EQ(TextOf(Ask("10.0.0.5"), "write"), "The file system of /srv/data is mounted read-only.");
 }
 
-TEST_F(Explain, NeedsAWayThatNobodyMayEnterInVersion4) {
-  Export({{"*", "rw"}});
+TEST_F(Explain, NeedsAWayThatTheClientsRootMayEnterInVersion4) {
   ASSERT_EQ(chmod(root_.At("/srv").c_str(), 0700), 0);
+  ASSERT_EQ(chmod(root_.At("/srv/data").c_str(), 0700), 0);
   VORN::AccessQuestion question;
   question.client = "10.0.0.5";
+  Export({{"*", "rw"}});
+  EXPECT_THAT(Failed(Ask(question)), IsEmpty()) << "root is not squashed above the folder of the rule";
+  question.share = "inner";
   EXPECT_THAT(Failed(Ask(question)), ElementsAre("way"));
   question.version = "3";
   EXPECT_THAT(Failed(Ask(question)), IsEmpty());
+  question.version = "4.2";
+  Export({{"*", "rw,no_root_squash,sec=sys:krb5"}});
+  EXPECT_THAT(Failed(Ask(question)), IsEmpty());
+  question.flavor = "krb5";
+  EXPECT_THAT(Failed(Ask(question)), ElementsAre("keytab", "way")) << "Kerberos makes root nobody";
 }
 
 TEST_F(Explain, SaysThatAnOuterRuleDecides) {

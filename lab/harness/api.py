@@ -65,18 +65,18 @@ def slow_answers():
     return slow
 
 
-def _path(api, method, version=1):
-    return f"/api/VORN.Core.FileServ.{api}/v{version}/{method}"
+def _path(api, method, api_version=1):
+    return f"/api/VORN.Core.FileServ.{api}/v{api_version}/{method}"
 
 
-def answer(api, method, version=1, **parameters):
+def answer(api, method, api_version=1, **parameters):
     """The whole answer to a call, successful or not."""
-    return request("POST", _path(api, method, version), json.dumps(parameters))[1]
+    return request("POST", _path(api, method, api_version), json.dumps(parameters))[1]
 
 
-def call(api, method, version=1, **parameters):
+def call(api, method, api_version=1, **parameters):
     """The data of the answer. Raises Refused."""
-    return _data(answer(api, method, version, **parameters))
+    return _data(answer(api, method, api_version, **parameters))
 
 
 def upload(api, method, field, content):

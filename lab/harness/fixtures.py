@@ -12,6 +12,8 @@ _PROMISE_BROKEN = (AssertionError, OSError, api.Refused, network.MountFailed, pr
 def pytest_addoption(parser):
     parser.addoption("--boot", default="1/1", help="the number of this boot of the disk: NUMBER/COUNT")
     parser.addoption("--long", action="store_true", help="run the long stories, too")
+    parser.addoption("--seed", type=int, default=1, help="chooses the generated cases")
+    parser.addoption("--cases", type=int, help="the number of generated cases, instead of the story's own")
 
 
 def _this_boot(config):

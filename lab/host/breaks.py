@@ -110,6 +110,9 @@ BREAKS = [
     Break("lock-lost-at-restart", "the configuration lock of another program outlives a restart", "package",
           "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nRuntimeDirectoryPreserve=no\\n' "
           f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="lock_of_another"),
+    Break("kinds-in-reverse", "an explanation is what the kernel does", "explain",
+          source=("exports[a].kind < exports[b].kind", "s/exports\\[a\\].kind < exports\\[b\\].kind/"
+                  "exports[a].kind > exports[b].kind/")),
     Break("upgrade-restarts-nfs", "an upgrade leaves NFS alone", "package",
           _package("sed -i '$i systemctl restart nfs-server || true' postinst"), select="upgrade"),
 ]

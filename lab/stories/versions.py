@@ -70,17 +70,17 @@ def test_an_ipv4_rule_admits_nobody_over_ipv6_and_the_other_way_round(box, clien
 def test_version_2_of_the_api_reads_and_sets_the_same_settings(box, client):
     box.share("data")
     box.allow("data", {"client": client.address})
-    assert api.call("NFS", "get", version=2) == api.call("NFS", "get")
-    api.call("NFS", "set", version=2, enable_nfs=True, enable_nfs_v4=False)
+    assert api.call("NFS", "get", api_version=2) == api.call("NFS", "get")
+    api.call("NFS", "set", api_version=2, enable_nfs=True, enable_nfs_v4=False)
     assert not client.mounts("/srv/data", version="4.2")
     assert client.mounts("/srv/data", version="3")
-    api.call("NFS", "set", version=2, enable_nfs=True, enable_nfs_v4=True, nfs_v4_domain="second.example",
+    api.call("NFS", "set", api_version=2, enable_nfs=True, enable_nfs_v4=True, nfs_v4_domain="second.example",
              read_size=32768)
-    settings = api.call("NFS", "get", version=2)
+    settings = api.call("NFS", "get", api_version=2)
     assert settings == api.call("NFS", "get")
     assert settings["enable_nfs_v4"] and settings["nfs_v4_domain"] == "second.example"
     assert settings["read_size"] == 32768
     assert client.mounts("/srv/data", version="4.2")
-    api.call("NFS", "set", version=2, enable_nfs=False)
+    api.call("NFS", "set", api_version=2, enable_nfs=False)
     assert box.threads() == 0
     assert not client.mounts("/srv/data")

@@ -16,6 +16,7 @@ PROJECT = pathlib.Path(__file__).resolve().parent.parent
 VORND = os.environ.get("VORND", PROJECT / "build/release/bin/vornd")
 PATIENCE = 60  # seconds until vornd serves, and until it has ended
 BOUNDARY = "trial-server-boundary"
+CHANGE_ID = re.compile("[0-9a-f]{40}")  # of a change of the history
 
 # Tokens, sessions and codes, and the passwords of the tests.
 SECRET = re.compile(r"vorn[sc]?_[0-9a-f]{16}|Passphrase-of-|PRIVATE KEY")
@@ -129,10 +130,21 @@ class TrialServer:
         return content
 
 
+def newest_change(server):
+    """The id of the newest change of /etc/exports."""
+    changes = server.call("/api/VORN.Core.FileServ.NFS.History/v1/list", {"file": "/etc/exports", "limit": 1})[1]
+    return changes["data"]["changes"][0]["id"]
+
+
 def try_example(server, path, operation, name):
-    """The status and the answer of the example request `name` of an operation of the OpenAPI document."""
+    """The status and the answer of the example request `name` of an operation of the OpenAPI document.
+
+    An example that names a change of the history is tried with the newest change of /etc/exports.
+    """
     (content_type, media), = operation["requestBody"]["content"].items()
     value = media["examples"][name]["value"]
     if content_type == "application/json":
+        if CHANGE_ID.fullmatch(str(value.get("id"))):
+            value = {**value, "id": newest_change(server)}
         return server.call(path, value)
     return server.upload(path, next(iter(value)), server.keytab())

@@ -47,7 +47,7 @@ struct Settings {
   Duration body_time{std::chrono::seconds(60)};
   Duration idle_time{std::chrono::seconds(60)};
   Duration write_time{std::chrono::seconds(60)};
-  ByteCount body_memory{std::size_t{12} << 20};
+  ByteCount body_memory{std::size_t{8} << 20};
   ByteCount body_memory_per_address{std::size_t{4} << 20};
   ByteCount parameter_memory{std::size_t{48} << 20};
 

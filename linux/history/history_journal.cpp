@@ -111,7 +111,8 @@ Status HistoryJournal::Append(const Record& record, bool durable) {
   if (status.ok()) {
     read_ += static_cast<off_t>(text.size());
   } else {
-    // Nothing may follow an incomplete record. If this fails too, the next reader cuts the record off.
+    // A record that is appended after an incomplete one could not be read. If the journal cannot be truncated, the next
+    // reader truncates it.
     static_cast<void>(Truncate(read_));
   }
   return status;

@@ -22,8 +22,9 @@ namespace vorn {
 // the box at their paths: "etc/exports" is /etc/exports. A commit is named by its object id, 40 hexadecimal digits; an
 // empty string stands for no commit.
 //
-// Nothing is synced unless a function says so. An object is used by one thread; objects for one repository may be used
-// by several threads and processes, of which one at a time writes.
+// A function calls fsync(2) only if its comment says so; the journal (history_journal.h) restores what a loss of power
+// takes. An object is used by one thread. Several threads and processes may have an object each for one repository, but
+// only one of them may write at a time.
 class HistoryRepository {
  public:
   using Content = std::optional<std::string>;    // nullopt: the file does not exist

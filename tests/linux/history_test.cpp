@@ -228,7 +228,7 @@ TEST_F(HistoryTest, SurvivesALossOfWhatWasNotSynced) {
   const std::string log = Git(root, {"log"});
   TemporaryRoot after;
   std::filesystem::copy(root.At("/etc"), after.At("/etc"), std::filesystem::copy_options::recursive);
-  // Nothing of the repository has reached the disk but the state of the checkpoint.
+  // The disk has the repository as it was at the last checkpoint: empty.
   const Result<HistoryRepository> repository = HistoryRepository::Open(after.At(kHistoryFolder), true);
   ASSERT_TRUE(repository.ok()) << repository.status().reason();
   std::ofstream(after.At("/var/lib/vorn/history.git/refs/heads/main")) << "";

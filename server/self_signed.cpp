@@ -18,23 +18,13 @@
 #include <climits>
 #include <memory>
 
+#include "openssl_objects.h"
+
 namespace vorn::server {
 namespace {
 
 constexpr long kDay = 24L * 60 * 60;
 constexpr std::size_t kLongestCommonName = 64;  // RFC 5280, appendix A: ub-common-name
-
-template <typename T, void (*kFree)(T*)>
-struct Release {
-  void operator()(T* object) const { kFree(object); }
-};
-using Certificate = std::unique_ptr<X509, Release<X509, X509_free>>;
-using Key = std::unique_ptr<EVP_PKEY, Release<EVP_PKEY, EVP_PKEY_free>>;
-using Extension = std::unique_ptr<X509_EXTENSION, Release<X509_EXTENSION, X509_EXTENSION_free>>;
-struct FreeBio {
-  void operator()(BIO* bio) const { BIO_free(bio); }
-};
-using Bio = std::unique_ptr<BIO, FreeBio>;
 
 bool IsAddress(const std::string& name) {
   in6_addr address{};
@@ -54,7 +44,7 @@ bool SetSerial(X509* certificate) {
   std::array<unsigned char, 16> bytes{};
   if (RAND_bytes(bytes.data(), bytes.size()) != 1) return false;
   bytes[0] = static_cast<unsigned char>((bytes[0] & 0x7f) | 0x40);
-  const std::unique_ptr<BIGNUM, Release<BIGNUM, BN_free>> number(BN_bin2bn(bytes.data(), bytes.size(), nullptr));
+  const Number number(BN_bin2bn(bytes.data(), bytes.size(), nullptr));
   return number && BN_to_ASN1_INTEGER(number.get(), X509_get_serialNumber(certificate)) != nullptr;
 }
 

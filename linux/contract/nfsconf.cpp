@@ -20,6 +20,7 @@
 #include "lists.h"
 #include "live_settings.h"
 #include "nfs_record.h"
+#include "owned.h"
 #include "share_rules.h"
 #include "unicode.h"
 
@@ -54,10 +55,7 @@ struct IDMapState {
 
 IDMapState* StateOf(const _tag_nfs_id_map_& record) { return static_cast<IDMapState*>(record.platform[0]); }
 
-struct FreeRecord {
-  void operator()(_tag_nfs_id_map_* record) const { VORNNFSIDMapFree(record); }
-};
-using IDMapRecord = std::unique_ptr<_tag_nfs_id_map_, FreeRecord>;
+using IDMapRecord = Owned<_tag_nfs_id_map_, VORNNFSIDMapFree>;
 
 // A rehearsal starts nothing, also no question to a name server.
 std::string DefaultDomain(const Box& box) {
@@ -120,10 +118,7 @@ Status RemovePrincipals(KLIBSZHASH* table, const KLIBSZLIST* principals) {
 // ---------------------------------------------------------------------------------------------
 // Keytabs.
 
-struct FreeEntries {
-  void operator()(KeytabEntry* list) const { VORNNFSKeytabInfoFree(list); }
-};
-using Entries = std::unique_ptr<KeytabEntry, FreeEntries>;
+using Entries = Owned<KeytabEntry, VORNNFSKeytabInfoFree>;
 
 Status ListKeys(const char* path, KeytabEntry** list) {
   if (path == nullptr || list == nullptr) return Status::Failure(EINVAL, "no path, or no list");
@@ -145,10 +140,7 @@ Status ListKeys(const char* path, KeytabEntry** list) {
 // ---------------------------------------------------------------------------------------------
 // Export rules.
 
-struct FreeRules {
-  void operator()(ExportRuleList* list) const { VORNNFSRuleExtFree(list); }
-};
-using RuleList = std::unique_ptr<ExportRuleList, FreeRules>;
+using RuleList = Owned<ExportRuleList, VORNNFSRuleExtFree>;
 
 template <typename Record>
 Record* Allocate() {

@@ -11,6 +11,7 @@
 #include <unordered_map>
 
 #include "files.h"
+#include "owned.h"
 
 namespace vorn {
 namespace {
@@ -20,10 +21,6 @@ using Names = ExportPaths::Names;
 // More folders than a box has shares in; a limit for the memory of a process that sees many roots.
 constexpr std::size_t kMostFolders = 4096;
 
-struct CloseFolder {
-  void operator()(DIR* folder) const { closedir(folder); }
-};
-
 bool IsLink(const std::string& folder, const dirent& entry) {
   if (entry.d_type != DT_UNKNOWN) return entry.d_type == DT_LNK;
   struct stat stat {};
@@ -32,7 +29,7 @@ bool IsLink(const std::string& folder, const dirent& entry) {
 
 // Returns nullptr if the folder has no links, or cannot be read: exportfs(8) cannot follow them then, either.
 std::shared_ptr<const Names> ReadLinks(const std::string& location) {
-  const std::unique_ptr<DIR, CloseFolder> folder(opendir(location.c_str()));
+  const Owned<DIR, closedir> folder(opendir(location.c_str()));
   if (folder == nullptr) return nullptr;
   Names links;
   while (const dirent* entry = readdir(folder.get())) {

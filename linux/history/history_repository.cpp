@@ -13,6 +13,7 @@
 
 #include "file_descriptor.h"
 #include "files.h"
+#include "owned.h"
 
 namespace vorn {
 namespace {
@@ -23,18 +24,14 @@ constexpr char kBranch[] = "refs/heads/main";
 constexpr std::size_t kMostPacks = 16;
 constexpr std::size_t kIdSize = 40;
 
-template <typename T, void (*kFree)(T*)>
-struct Free {
-  void operator()(T* object) const { kFree(object); }
-};
-using Odb = std::unique_ptr<git_odb, Free<git_odb, git_odb_free>>;
-using Tree = std::unique_ptr<git_tree, Free<git_tree, git_tree_free>>;
-using Blob = std::unique_ptr<git_blob, Free<git_blob, git_blob_free>>;
-using CommitObject = std::unique_ptr<git_commit, Free<git_commit, git_commit_free>>;
-using Entry = std::unique_ptr<git_tree_entry, Free<git_tree_entry, git_tree_entry_free>>;
-using Signature = std::unique_ptr<git_signature, Free<git_signature, git_signature_free>>;
-using Reference = std::unique_ptr<git_reference, Free<git_reference, git_reference_free>>;
-using PackBuilder = std::unique_ptr<git_packbuilder, Free<git_packbuilder, git_packbuilder_free>>;
+using Odb = Owned<git_odb, git_odb_free>;
+using Tree = Owned<git_tree, git_tree_free>;
+using Blob = Owned<git_blob, git_blob_free>;
+using CommitObject = Owned<git_commit, git_commit_free>;
+using Entry = Owned<git_tree_entry, git_tree_entry_free>;
+using Signature = Owned<git_signature, git_signature_free>;
+using Reference = Owned<git_reference, git_reference_free>;
+using PackBuilder = Owned<git_packbuilder, git_packbuilder_free>;
 
 // The failure of the last function of libgit2 on this thread.
 Status GitFailure(int result, const std::string& what, const char* file = __builtin_FILE(),

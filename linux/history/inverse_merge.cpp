@@ -3,17 +3,14 @@
 #include <git2.h>
 
 #include <cerrno>
-#include <memory>
+
+#include "owned.h"
 
 namespace vorn {
 namespace {
 
 constexpr char kBegin[] = "<<<<<<< now";
 constexpr char kEnd[] = ">>>>>>> before the change";
-
-struct FreeResult {
-  void operator()(git_merge_file_result* result) const { git_merge_file_result_free(result); }
-};
 
 git_merge_file_input InputOf(const std::string& content) {
   git_merge_file_input input;
@@ -43,7 +40,7 @@ Result<InverseMerge> MergeText(const std::string& before, const std::string& aft
   options.their_label = "before the change";
   git_merge_file_result merged{};
   const int result = git_merge_file(&merged, &base, &ours, &theirs, &options);
-  const std::unique_ptr<git_merge_file_result, FreeResult> owned(&merged);
+  const Owned<git_merge_file_result, git_merge_file_result_free> owned(&merged);
   if (result < 0) return Status::Failure(EIO, "libgit2 cannot merge the versions of the file");
   std::string text(merged.ptr == nullptr ? "" : merged.ptr, merged.len);
   if (merged.automergeable != 0) return InverseMerge{false, "", std::move(text)};

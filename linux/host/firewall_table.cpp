@@ -3,7 +3,6 @@
 #include <nftables/libnftables.h>
 
 #include <cerrno>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -11,14 +10,11 @@
 #include "configured_ports.h"
 #include "foreign_firewalls.h"
 #include "notice.h"
+#include "owned.h"
 #include "platform_settings.h"
 
 namespace vorn {
 namespace {
-
-struct FreeContext {
-  void operator()(nft_ctx* context) const { nft_ctx_free(context); }
-};
 
 // One transaction: it deletes the old table and adds the new one, or fails and changes nothing.
 std::string Ruleset(const std::vector<ConfiguredPort>& ports) {
@@ -37,7 +33,7 @@ std::string Ruleset(const std::vector<ConfiguredPort>& ports) {
 }
 
 Status Load(const std::string& ruleset) {
-  const std::unique_ptr<nft_ctx, FreeContext> context(nft_ctx_new(NFT_CTX_DEFAULT));
+  const Owned<nft_ctx, nft_ctx_free> context(nft_ctx_new(NFT_CTX_DEFAULT));
   if (!context) return Status::Failure(ENOMEM, "libnftables has no context");
   nft_ctx_buffer_error(context.get());
   nft_ctx_buffer_output(context.get());
@@ -46,7 +42,7 @@ Status Load(const std::string& ruleset) {
 }
 
 std::optional<std::vector<std::string>> FindClosedPorts(const std::vector<ConfiguredPort>& ports) {
-  const std::unique_ptr<nft_ctx, FreeContext> context(nft_ctx_new(NFT_CTX_DEFAULT));
+  const Owned<nft_ctx, nft_ctx_free> context(nft_ctx_new(NFT_CTX_DEFAULT));
   if (!context) return std::nullopt;
   nft_ctx_buffer_error(context.get());
   nft_ctx_buffer_output(context.get());

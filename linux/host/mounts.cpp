@@ -7,23 +7,18 @@
 #include <array>
 #include <cerrno>
 #include <cstddef>
-#include <memory>
 #include <string>
 #include <string_view>
+
+#include "owned.h"
 
 namespace vorn {
 namespace {
 
 constexpr const char* kMountInfo = "/proc/self/mountinfo";
 
-struct ReleaseTable {
-  void operator()(libmnt_table* table) const { mnt_unref_table(table); }
-};
-struct ReleaseIterator {
-  void operator()(libmnt_iter* iterator) const { mnt_free_iter(iterator); }
-};
-using Table = std::unique_ptr<libmnt_table, ReleaseTable>;
-using Iterator = std::unique_ptr<libmnt_iter, ReleaseIterator>;
+using Table = Owned<libmnt_table, mnt_unref_table>;
+using Iterator = Owned<libmnt_iter, mnt_free_iter>;
 
 // File systems whose files are not on this box's disks: network file systems, FUSE, the kernel's own. They are
 // recognised by name, because asking for a file handle could block on a server or program that is gone.

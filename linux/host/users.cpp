@@ -10,17 +10,15 @@
 #include <sstream>
 #include <utility>
 
+#include "owned.h"
+
 namespace vorn {
 namespace {
-
-struct CloseFile {
-  void operator()(std::FILE* file) const { std::fclose(file); }
-};
 
 Result<Accounts> ParseAccounts(StoredFile file) {
   Accounts accounts;
   if (file.text.empty()) return accounts;
-  const std::unique_ptr<std::FILE, CloseFile> stream(fmemopen(file.text.data(), file.text.size(), "r"));
+  const Owned<std::FILE, std::fclose> stream(fmemopen(file.text.data(), file.text.size(), "r"));
   if (stream == nullptr) return Status::System(errno, file.location);
   std::vector<char> line(file.text.size() + 2);  // fgetpwent_r needs more than the longest line and a NUL byte
   passwd account{};
@@ -34,7 +32,7 @@ Result<Accounts> ParseAccounts(StoredFile file) {
 Result<Groups> ParseGroups(StoredFile file) {
   Groups groups;
   if (file.text.empty()) return groups;
-  const std::unique_ptr<std::FILE, CloseFile> stream(fmemopen(file.text.data(), file.text.size(), "r"));
+  const Owned<std::FILE, std::fclose> stream(fmemopen(file.text.data(), file.text.size(), "r"));
   if (stream == nullptr) return Status::System(errno, file.location);
   // fgetgrent_r also puts the list of members there, a pointer for at most each second byte of the line.
   std::vector<char> line((file.text.size() + 2) * sizeof(char*));

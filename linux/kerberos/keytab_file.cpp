@@ -4,26 +4,22 @@
 #include <profile.h>
 
 #include <cerrno>
-#include <memory>
 #include <utility>
 
 #include "keytab_frame.h"
 #include "memory_file.h"
+#include "owned.h"
 
 namespace vorn {
 namespace {
 
-struct Free {
-  void operator()(krb5_context context) const { krb5_free_context(context); }
-  void operator()(profile_t profile) const { profile_abandon(profile); }
-};
-using Context = std::unique_ptr<std::remove_pointer_t<krb5_context>, Free>;
+using Context = Owned<std::remove_pointer_t<krb5_context>, krb5_free_context>;
 
 // The context ignores krb5.conf(5), which has no influence on the format of a keytab.
 Result<Context> NewContext() {
   profile_t profile = nullptr;
   if (profile_init_path("/dev/null", &profile) != 0) return Status::Failure(ENOMEM, "libkrb5 has no profile");
-  const std::unique_ptr<std::remove_pointer_t<profile_t>, Free> owned(profile);
+  const Owned<std::remove_pointer_t<profile_t>, profile_abandon> owned(profile);
   krb5_context context = nullptr;
   if (krb5_init_context_profile(profile, 0, &context) != 0) return Status::Failure(ENOMEM, "libkrb5 has no context");
   return Context(context);

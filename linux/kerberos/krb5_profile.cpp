@@ -9,11 +9,11 @@ extern "C" {
 #include <cctype>
 #include <cerrno>
 #include <filesystem>
-#include <memory>
 #include <vector>
 
 #include "files.h"
 #include "memory_file.h"
+#include "owned.h"
 #include "root.h"
 
 namespace vorn {
@@ -131,11 +131,6 @@ Status Failure(long code, const std::string& path) {
   return Status::Failure(kSyntax, path + ": " + error_message(code));
 }
 
-struct Release {
-  void operator()(profile_t profile) const { profile_release(profile); }
-  void operator()(char* text) const { profile_release_string(text); }
-};
-
 }  // namespace
 
 Result<std::optional<std::string>> GetKrb5Value(const Root& root, const std::string& path, const std::string& section,
@@ -149,11 +144,11 @@ Result<std::optional<std::string>> GetKrb5Value(const Root& root, const std::str
 
   profile_t opened = nullptr;
   if (const long code = profile_init_path(PathOf(*file).c_str(), &opened); code != 0) return Failure(code, *location);
-  const std::unique_ptr<struct _profile_t, Release> profile(opened);
+  const Owned<struct _profile_t, profile_release> profile(opened);
   char* found = nullptr;
   const long code = profile_get_string(profile.get(), section.c_str(), key.c_str(), nullptr, nullptr, &found);
   if (code != 0) return Failure(code, *location);
-  const std::unique_ptr<char, Release> value(found);
+  const Owned<char, profile_release_string> value(found);
   if (value == nullptr) return std::optional<std::string>();
   return std::optional<std::string>(value.get());
 }

@@ -4,21 +4,17 @@
 
 #include <algorithm>
 #include <array>
-#include <memory>
 #include <sstream>
 #include <utility>
 
 #include "exports_client.h"
+#include "owned.h"
 #include "state_file.h"
 
 namespace vorn {
 namespace {
 
 constexpr char kHostsFile[] = "/var/lib/vorn/export-hosts";
-
-struct FreeAddresses {
-  void operator()(addrinfo* list) const { freeaddrinfo(list); }
-};
 
 }  // namespace
 
@@ -27,7 +23,7 @@ std::optional<std::vector<std::string>> ResolveHost(const std::string& name) {
   hints.ai_socktype = SOCK_DGRAM;  // each address once
   addrinfo* found = nullptr;
   const int error = getaddrinfo(name.c_str(), nullptr, &hints, &found);
-  const std::unique_ptr<addrinfo, FreeAddresses> owner(found);
+  const Owned<addrinfo, freeaddrinfo> owner(found);
   if (error == EAI_AGAIN || error == EAI_SYSTEM || error == EAI_FAIL) return std::nullopt;
   std::vector<std::string> addresses;
   for (const addrinfo* entry = found; error == 0 && entry != nullptr; entry = entry->ai_next) {

@@ -12,6 +12,7 @@
 #include "configured_ports.h"
 #include "engines.h"
 #include "name_changes.h"
+#include "owned.h"
 #include "state_file.h"
 
 namespace vorn {
@@ -26,14 +27,8 @@ constexpr char kDestination[] = "org.freedesktop.systemd1";
 constexpr char kManagerPath[] = "/org/freedesktop/systemd1";
 constexpr char kManager[] = "org.freedesktop.systemd1.Manager";
 
-struct CloseBus {
-  void operator()(sd_bus* bus) const { sd_bus_flush_close_unref(bus); }
-};
-struct UnrefMessage {
-  void operator()(sd_bus_message* message) const { sd_bus_message_unref(message); }
-};
-using Bus = std::unique_ptr<sd_bus, CloseBus>;
-using Message = std::unique_ptr<sd_bus_message, UnrefMessage>;
+using Bus = Owned<sd_bus, sd_bus_flush_close_unref>;
+using Message = Owned<sd_bus_message, sd_bus_message_unref>;
 
 // The error of a failed call.
 class BusError {

@@ -11,6 +11,8 @@
 #include <array>
 #include <cstddef>
 
+#include "openssl_objects.h"
+
 namespace vorn::server {
 namespace {
 
@@ -20,17 +22,6 @@ constexpr const char* kCiphers =
     "ECDHE-RSA-AES256-GCM-SHA384:ECDHE-ECDSA-CHACHA20-POLY1305:ECDHE-RSA-CHACHA20-POLY1305";
 constexpr const char* kGroups = "X25519:P-256:P-384";
 constexpr std::array<unsigned char, 9> kHttp11 = {8, 'h', 't', 't', 'p', '/', '1', '.', '1'};
-
-template <typename T, void (*kFree)(T*)>
-struct Release {
-  void operator()(T* object) const { kFree(object); }
-};
-using Certificate = std::unique_ptr<X509, Release<X509, X509_free>>;
-using Key = std::unique_ptr<EVP_PKEY, Release<EVP_PKEY, EVP_PKEY_free>>;
-struct FreeBio {
-  void operator()(BIO* bio) const { BIO_free(bio); }
-};
-using Bio = std::unique_ptr<BIO, FreeBio>;
 
 Bio Reader(std::string_view text) { return Bio(BIO_new_mem_buf(text.data(), static_cast<int>(text.size()))); }
 

@@ -1,15 +1,15 @@
 #include "history_handler.h"
 
 #include <algorithm>
+#include <climits>
 #include <cstdint>
-#include <optional>
-#include <string_view>
 
 #include "core.h"
 #include "firewall.h"
 #include "history.h"
-#include "json_text.h"
+#include "json_values.h"
 #include "log.h"
+#include "parameter_reader.h"
 
 namespace {
 
@@ -22,50 +22,14 @@ constexpr char kSettingsFile[] = "/etc/nfs.conf.d/vorn.conf";
 constexpr int kMostChanges = 1000;  // of a page
 constexpr int kUsualChanges = 50;
 
-// Reads a string without NUL bytes; an absent one is empty.
-bool ReadText(const Json::Value& params, const char* name, std::string* text) {
-  if (params[name].isNull()) return true;
-  const std::optional<std::string_view> given = TextOf(params[name]);
-  if (!given || given->find('\0') != std::string_view::npos) {
-    LOG_ERROR("variable '%s' is no string.", name);
-    return false;
-  }
-  *text = *given;
-  return true;
-}
-
-// Reads an integer from 0 to `most`. An absent one leaves `number` as it is.
-bool ReadNumber(const Json::Value& params, const char* name, std::int64_t most, std::int64_t* number) {
-  const Json::Value& given = params[name];
-  if (given.isNull()) return true;
-  if (!given.isInt64() || given.asInt64() < 0 || given.asInt64() > most) {
-    LOG_ERROR("variable '%s' is not accepted.", name);
-    return false;
-  }
-  *number = given.asInt64();
-  return true;
-}
-
-bool ReadFilter(const Json::Value& params, VORN::HistoryFilter* filter) {
-  return ReadText(params, "file", &filter->file) && ReadText(params, "method", &filter->method) &&
-         ReadText(params, "caller", &filter->caller) && ReadNumber(params, "since", INT64_MAX, &filter->since) &&
-         ReadNumber(params, "until", INT64_MAX, &filter->until);
-}
-
-// Reads the id of a change, which must not be empty.
-bool ReadID(const Json::Value& params, std::string* id) {
-  if (!ReadText(params, "id", id)) return false;
-  if (!id->empty()) return true;
-  LOG_ERROR("variable 'id' is missing.");
-  return false;
-}
-
-Json::Value OrNull(const std::string& text) { return text.empty() ? Json::Value() : Json::Value(text); }
-
-Json::Value ToArray(const std::vector<std::string>& texts) {
-  Json::Value array(Json::arrayValue);
-  for (const std::string& text : texts) array.append(text);
-  return array;
+VORN::HistoryFilter ReadFilter(ParameterReader& reader) {
+  VORN::HistoryFilter filter;
+  filter.file = reader.Text("file");
+  filter.method = reader.Text("method");
+  filter.caller = reader.Text("caller");
+  filter.since = reader.Integer("since", filter.since, 0, INT64_MAX);
+  filter.until = reader.Integer("until", filter.until, 0, INT64_MAX);
+  return filter;
 }
 
 Json::Value ToJson(const VORN::HistoryEntry& entry) {
@@ -78,8 +42,15 @@ Json::Value ToJson(const VORN::HistoryEntry& entry) {
   item["method"] = OrNull(entry.method);
   item["parameters"] = OrNull(entry.parameters);
   item["undoes"] = OrNull(entry.undoes);
-  item["files"] = ToArray(entry.files);
-  item["actions"] = ToArray(entry.actions);
+  item["files"] = ArrayOf(entry.files);
+  item["actions"] = ArrayOf(entry.actions);
+  return item;
+}
+
+Json::Value ToJson(const VORN::HistoryFile& file) {
+  Json::Value item;
+  item["path"] = file.path;
+  item["difference"] = file.difference;
   return item;
 }
 
@@ -119,28 +90,26 @@ void HistoryHandler::Undo() {
 }
 
 bool HistoryHandler::ListData(const Json::Value& params, Json::Value& result) {
-  VORN::HistoryFilter filter;
-  std::int64_t offset = 0;
-  std::int64_t limit = kUsualChanges;
-  if (!ReadFilter(params, &filter) || !ReadNumber(params, "offset", INT32_MAX, &offset) ||
-      !ReadNumber(params, "limit", kMostChanges, &limit)) {
-    return Fail(kBadParameter);
-  }
+  ParameterReader reader(HERE, params);
+  const VORN::HistoryFilter filter = ReadFilter(reader);
+  const auto offset = static_cast<int>(reader.Integer("offset", 0, 0, INT_MAX));
+  const auto limit = static_cast<int>(reader.Integer("limit", kUsualChanges, 0, kMostChanges));
+  if (!reader.ok()) return Fail(kBadParameter);
   std::vector<VORN::HistoryEntry> entries;
   int total = 0;
-  if (VORN::ListHistory(filter, static_cast<int>(offset), static_cast<int>(limit), &entries, &total) < 0) {
+  if (VORN::ListHistory(filter, offset, limit, &entries, &total) < 0) {
     LOG_ERROR("Failed to ListHistory, vornerr=[0x%04X]", KLIBCErrGet());
     return Fail(kPlatformFailure);
   }
-  result["changes"] = Json::Value(Json::arrayValue);
-  for (const VORN::HistoryEntry& entry : entries) result["changes"].append(ToJson(entry));
+  result["changes"] = ArrayOf(entries, ToJson);
   result["total"] = total;
   return true;
 }
 
 bool HistoryHandler::ShowData(const Json::Value& params, Json::Value& result) {
-  std::string id;
-  if (!ReadID(params, &id)) return Fail(kBadParameter);
+  ParameterReader reader(HERE, params);
+  const std::string id = reader.NeededText("id");
+  if (!reader.ok()) return Fail(kBadParameter);
   VORN::HistoryEntry entry;
   std::vector<VORN::HistoryFile> files;
   const int shown = VORN::ShowHistory(id, &entry, &files);
@@ -149,19 +118,14 @@ bool HistoryHandler::ShowData(const Json::Value& params, Json::Value& result) {
     return Fail(CodeOf(shown));
   }
   result = ToJson(entry);
-  result["differences"] = Json::Value(Json::arrayValue);
-  for (const VORN::HistoryFile& file : files) {
-    Json::Value item;
-    item["path"] = file.path;
-    item["difference"] = file.difference;
-    result["differences"].append(item);
-  }
+  result["differences"] = ArrayOf(files, ToJson);
   return true;
 }
 
 bool HistoryHandler::UndoData(const Json::Value& params) {
-  std::string id;
-  if (!ReadID(params, &id)) return Fail(kBadParameter);
+  ParameterReader reader(HERE, params);
+  const std::string id = reader.NeededText("id");
+  if (!reader.ok()) return Fail(kBadParameter);
   const VornConf configuration;
   std::vector<std::string> files;
   const int undone = VORN::UndoChange(id, &files);

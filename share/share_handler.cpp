@@ -1,17 +1,18 @@
 #include "share_handler.h"
 
+#include <algorithm>
 #include <cstring>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "core.h"
-#include "json_text.h"
+#include "folder_listing.h"
 #include "log.h"
 #include "nfsconf.h"
 #include "owned.h"
 #include "page.h"
+#include "parameter_reader.h"
 #include "shared_folders.h"
 
 namespace {
@@ -24,49 +25,26 @@ bool LogFailure(const char* operation) {
   return false;
 }
 
-// Returns the parameter if it is a string with at least one character and no NUL, which no name or path has.
-std::optional<std::string> TextParameter(const Json::Value& params, const char* name) {
-  const std::optional<std::string_view> text = TextOf(params[name]);
-  if (text && !text->empty() && text->find('\0') == std::string_view::npos) return std::string(*text);
-  LOG_ERROR("string variable '%s' is missing or empty.", name);
-  return std::nullopt;
-}
-
-bool ReadShares(StringHash* shares, StringList* names) {
-  if (!*shares || !*names) return LogFailure("allocate");
-  if (VORNShareEnum(shares->slot()) < 0) return LogFailure("VORNShareEnum");
-  if (KLIBCSzHashEnumKey(shares->get(), names->slot()) < 0) return LogFailure("KLIBCSzHashEnumKey");
-  static_cast<void>(KLIBCSzListSortItems(names->get(), KLIBSZLIST_SORT_TEXT));
-  return true;
-}
-
-// A shared folder as it is listed. The pointers belong to the hash and the list of all folders.
-struct Folder {
-  const char* name;
-  const char* path;
-};
-
 // strcasestr(3) ignores the case of ASCII letters.
 bool Matches(const Folder& folder, const std::string& filter) {
-  return strcasestr(folder.name, filter.c_str()) != nullptr || strcasestr(folder.path, filter.c_str()) != nullptr;
+  return strcasestr(folder.name.c_str(), filter.c_str()) != nullptr ||
+         strcasestr(folder.path.c_str(), filter.c_str()) != nullptr;
 }
 
-std::vector<Folder> MatchingFolders(const KLIBSZHASH* shares, const KLIBSZLIST* names, const std::string& filter) {
-  std::vector<Folder> folders;
-  for (int i = 0; i < names->count; ++i) {
-    const char* const name = KLIBCSzListGet(names, i);
-    const char* const path = name == nullptr ? nullptr : KLIBCSzHashGetValue(shares, name);
-    if (path != nullptr && Matches({name, path}, filter)) folders.push_back({name, path});
-  }
-  return folders;
+// Returns the folder with exactly this name; null if there is none. The folders are sorted by name.
+const Folder* Find(const std::vector<Folder>& folders, const std::string& name) {
+  const auto found =
+      std::lower_bound(folders.begin(), folders.end(), name,
+                       [](const Folder& folder, const std::string& wanted) { return folder.name < wanted; });
+  return found != folders.end() && found->name == name ? &*found : nullptr;
 }
 
 // Returns the number of export rules of the folder, or std::nullopt if they cannot be read. An entry that an
 // administrator wrote with a relative path cannot have any.
-std::optional<int> CountRules(const char* path) {
-  if (path[0] != '/') return 0;
+std::optional<int> CountRules(const std::string& path) {
+  if (path.empty() || path.front() != '/') return 0;
   ExportRuleList* list = nullptr;
-  const int found = VORNNFSRuleExtGet(kExportsFile, path, &list);
+  const int found = VORNNFSRuleExtGet(kExportsFile, path.c_str(), &list);
   const ExportRules rules(list);
   if (found < 0) {
     LogFailure("VORNNFSRuleExtGet");
@@ -88,14 +66,6 @@ Json::Value ToJson(const Folder& folder) {
   item["path"] = folder.path;
   item["rules"] = *rules;
   return item;
-}
-
-bool CheckListing(const Json::Value& params) {
-  const auto is_integer_or_absent = [&](const char* name) { return params[name].isNull() || params[name].isInt(); };
-  const bool has_filter = params["filter"].isNull() || params["filter"].isString();
-  if (is_integer_or_absent("offset") && is_integer_or_absent("limit") && has_filter) return true;
-  LOG_ERROR("Invalid type of input.");
-  return false;
 }
 
 int CodeOf(int result) {
@@ -124,17 +94,20 @@ void ShareHandler::Delete() {
 }
 
 bool ShareHandler::ListData(const Json::Value& params, Json::Value& result) {
-  if (!CheckListing(params)) return Fail(kBadParameter);
-  StringHash shares(KLIBCSzHashAlloc(0));
-  StringList names(KLIBCSzListAlloc(0));
-  if (!ReadShares(&shares, &names)) return Fail(kPlatformFailure);
-  const std::vector<Folder> folders = MatchingFolders(shares.get(), names.get(), params["filter"].asString());
-  const int count = static_cast<int>(folders.size());
-  const int limit = params["limit"].isNull() ? -1 : params["limit"].asInt();
-  const Page page = Page::Of(count, params["offset"].asInt(), limit);
+  ParameterReader reader(HERE, params);
+  const std::string filter = reader.Text("filter");
+  const int offset = reader.Integer("offset", 0);
+  const int limit = reader.Integer("limit", -1);
+  if (!reader.ok()) return Fail(kBadParameter);
+  std::optional<std::vector<Folder>> folders = ReadFolders(HERE);
+  if (!folders) return Fail(kPlatformFailure);
+  folders->erase(std::remove_if(folders->begin(), folders->end(), [&](const Folder& f) { return !Matches(f, filter); }),
+                 folders->end());
+  const int count = static_cast<int>(folders->size());
+  const Page page = Page::Of(count, offset, limit);
   Json::Value items(Json::arrayValue);
   for (int i = page.begin; i < page.end; ++i) {
-    items.append(ToJson(folders[static_cast<std::size_t>(i)]));
+    items.append(ToJson((*folders)[static_cast<std::size_t>(i)]));
     if (items[items.size() - 1].isNull()) return Fail(kPlatformFailure);
   }
   result["shares"] = items;
@@ -143,43 +116,44 @@ bool ShareHandler::ListData(const Json::Value& params, Json::Value& result) {
 }
 
 bool ShareHandler::GetData(const Json::Value& params, Json::Value& result) {
-  const std::optional<std::string> name = TextParameter(params, "name");
-  if (!name) return Fail(kBadParameter);
-  StringHash shares(KLIBCSzHashAlloc(0));
-  StringList names(KLIBCSzListAlloc(0));
-  if (!ReadShares(&shares, &names)) return Fail(kPlatformFailure);
-  const char* const path = KLIBCSzHashGetValue(shares.get(), name->c_str());
-  if (path == nullptr) return Fail(kNoShare);
-  result = ToJson({name->c_str(), path});
+  ParameterReader reader(HERE, params);
+  const std::string name = reader.NeededText("name");
+  if (!reader.ok()) return Fail(kBadParameter);
+  const std::optional<std::vector<Folder>> folders = ReadFolders(HERE);
+  if (!folders) return Fail(kPlatformFailure);
+  const Folder* const folder = Find(*folders, name);
+  if (folder == nullptr) return Fail(kNoShare);
+  result = ToJson(*folder);
   return !result.isNull() || Fail(kPlatformFailure);
 }
 
 bool ShareHandler::CreateData(const Json::Value& params) {
-  const std::optional<std::string> name = TextParameter(params, "name");
-  const std::optional<std::string> path = TextParameter(params, "path");
-  if (!name || !path) return Fail(kBadParameter);
-  const int created = VORNShareCreate(name->c_str(), path->c_str());
+  ParameterReader reader(HERE, params);
+  const std::string name = reader.NeededText("name");
+  const std::string path = reader.NeededText("path");
+  if (!reader.ok()) return Fail(kBadParameter);
+  const int created = VORNShareCreate(name.c_str(), path.c_str());
   if (created >= 0) return true;
   LogFailure("VORNShareCreate");
   return Fail(CodeOf(created));
 }
 
 bool ShareHandler::DeleteData(const Json::Value& params) {
-  const std::optional<std::string> name = TextParameter(params, "name");
-  if (!name) return Fail(kBadParameter);
+  ParameterReader reader(HERE, params);
+  const std::string name = reader.NeededText("name");
+  if (!reader.ok()) return Fail(kBadParameter);
   const VornConf configuration;  // nobody adds a rule between the check and the removal
-  StringHash shares(KLIBCSzHashAlloc(0));
-  StringList names(KLIBCSzListAlloc(0));
-  if (!ReadShares(&shares, &names)) return Fail(kPlatformFailure);
-  const char* const path = KLIBCSzHashGetValue(shares.get(), name->c_str());
-  if (path == nullptr) return Fail(kNoShare);
-  const std::optional<int> rules = CountRules(path);
+  const std::optional<std::vector<Folder>> folders = ReadFolders(HERE);
+  if (!folders) return Fail(kPlatformFailure);
+  const Folder* const folder = Find(*folders, name);
+  if (folder == nullptr) return Fail(kNoShare);
+  const std::optional<int> rules = CountRules(folder->path);
   if (!rules) return Fail(kPlatformFailure);
   if (*rules > 0) {
     LOG_ERROR("The shared folder has export rules.");
     return Fail(kShareHasRules);
   }
-  const int deleted = VORNShareDelete(name->c_str());
+  const int deleted = VORNShareDelete(name.c_str());
   if (deleted >= 0) return true;
   LogFailure("VORNShareDelete");
   return Fail(CodeOf(deleted));

@@ -70,7 +70,7 @@ TEST_F(ThreeShares, AreNotListedForParametersOfAnotherType) {
   for (const char* params : {R"({"offset": "1"})", R"({"limit": 1.5})", R"({"filter": 1})"}) {
     EXPECT_EQ(kList(params).code, kBadParameter) << params;
   }
-  EXPECT_THAT(platform.LogTexts(), Contains("Invalid type of input."));
+  EXPECT_THAT(platform.LogTexts(), Contains("variable 'filter' is missing or not accepted."));
   EXPECT_THAT(platform.calls, Not(Contains(StartsWith("VORNShareEnum"))));
 }
 
@@ -99,13 +99,13 @@ TEST_F(ShareTest, NeedsANameOfOneCharacterOrMore) {
     EXPECT_EQ(kDelete(params).code, kBadParameter) << params;
     EXPECT_EQ(kCreate(params).code, kBadParameter) << params;
   }
-  EXPECT_THAT(platform.LogTexts(), Contains("string variable 'name' is missing or empty."));
+  EXPECT_THAT(platform.LogTexts(), Contains("variable 'name' is missing or not accepted."));
 }
 
 TEST_F(ShareTest, NeedsAPath) {
   EXPECT_EQ(kCreate(R"({"name": "a"})").code, kBadParameter);
   EXPECT_EQ(kCreate(R"({"name": "a", "path": "/a\u0000b"})").code, kBadParameter);
-  EXPECT_THAT(platform.LogTexts(), Contains("string variable 'path' is missing or empty."));
+  EXPECT_THAT(platform.LogTexts(), Contains("variable 'path' is missing or not accepted."));
 }
 
 TEST_F(ShareTest, IsCreatedByThePlatform) {

@@ -12,9 +12,10 @@
 #include "client_identity.h"
 #include "export_decision.h"
 #include "exports_in_force.h"
+#include "folder_path.h"
 #include "folder_permissions.h"
 #include "keytab.h"
-#include "mounts.h"
+#include "mount_table.h"
 #include "service_checks.h"
 #include "shares.h"
 #include "unicode.h"
@@ -91,13 +92,16 @@ VORN::AccessRule OtherRule(const TableExport& one, const TableExport* decider, E
 // Answers one question.
 class Explanation {
  public:
-  Explanation(Box& box, const VORN::AccessQuestion& question, std::string path, const ExportsInForce& in_force)
-      : box_(box), question_(question), path_(std::move(path)), in_force_(in_force) {}
+  Explanation(Box& box, const VORN::AccessQuestion& question, std::string path, const ExportsInForce& in_force,
+              const MountTable& mounts)
+      : box_(box), question_(question), path_(std::move(path)), in_force_(in_force), mounts_(mounts) {}
 
-  Result<VORN::AccessAnswer> Answer(const NameService& names, ClientHost client, std::set<std::string> mount_points) {
+  Result<VORN::AccessAnswer> Answer(const NameService& names, ClientHost client) {
     HostAddresses hosts = in_force_.hosts;
     const auto matches = [&](const TableExport& one) { return MatchesExport(&client, one, names, &hosts); };
-    decision_ = DecideExport(in_force_.exports, {path_, question_.version != "3", std::move(mount_points), matches});
+    const std::vector<std::string> points = mounts_.FoldersBelow("/");
+    decision_ =
+        DecideExport(in_force_.exports, {path_, question_.version != "3", {points.begin(), points.end()}, matches});
     if (decision_.decider) decider_ = &in_force_.exports[*decision_.decider];
     AddRules();
     if (Status status = CheckService(box_, question_.version, &checks_); !status.ok()) return status;
@@ -213,7 +217,8 @@ class Explanation {
   void CheckWay() {
     VORN::AccessIdentity root;
     if (question_.flavor != "sys") root.user_id = root.group_id = kNobody;
-    for (const std::string& folder : FoldersAbove(path_)) {
+    for (const std::string& folder : WayTo(path_)) {
+      if (folder == path_) break;
       const bool is_in_rule = decider_ != nullptr && folder.size() >= decider_->directory.size();
       if (is_in_rule && access_) root = Squash({}, *access_, *decider_);
       const Result<FolderPermissions> permissions = ReadFolderPermissions(box_, folder);
@@ -223,14 +228,6 @@ class Explanation {
                               ", as whom the client's root user walks to the share.",
                           "Let others enter " + folder + ", or mount with version 3.");
     }
-  }
-
-  static std::vector<std::string> FoldersAbove(const std::string& path) {
-    std::vector<std::string> folders = {"/"};
-    for (std::size_t end = path.find('/', 1); end != std::string::npos; end = path.find('/', end + 1)) {
-      folders.push_back(path.substr(0, end));
-    }
-    return folders;
   }
 
   // Checks the rights of the user in the folder itself.
@@ -269,7 +266,7 @@ class Explanation {
   void CheckWrite(const FolderPermissions& folder) {
     if (access_->read_only) {
       checks_.Fail("write", "The rule is read-only.", "Give the rule the privilege to write.");
-    } else if (folder.is_read_only) {
+    } else if (mounts_.IsReadOnly(path_)) {
       checks_.Fail("write", "The file system of " + path_ + " is mounted read-only.", "Mount it for writing.");
     } else {
       CheckPermission("write", kChange | kEnter, "change", folder);
@@ -291,6 +288,7 @@ class Explanation {
   const VORN::AccessQuestion& question_;
   const std::string path_;
   const ExportsInForce& in_force_;
+  const MountTable& mounts_;
   ExportDecision decision_;
   const TableExport* decider_ = nullptr;
   std::optional<ExportAccess> access_;  // of the flavour of the question
@@ -311,15 +309,15 @@ Result<std::vector<VORN::AccessAnswer>> ExplainAccesses(Box& box, const NameServ
                                                         const std::vector<std::string>& shares) {
   const Result<ExportsInForce> in_force = ReadExportsInForce(box, names, IsServing(box));
   if (!in_force.ok()) return in_force.status();
-  const Result<std::vector<std::string>> mounts = MountsBelow(box, "/");
+  const Result<MountTable> mounts = MountTable::Read(box);
   if (!mounts.ok()) return mounts.status();
   const ClientHost client = FindClientHost(question.client, names, NeedsNames(in_force->exports));
   std::vector<VORN::AccessAnswer> answers;
   for (const std::string& share : shares) {
     Result<std::string> path = FindSharePath(box, share);
     if (!path.ok()) return path.status();
-    Explanation explanation(box, question, std::move(*path), *in_force);
-    Result<VORN::AccessAnswer> answer = explanation.Answer(names, client, {mounts->begin(), mounts->end()});
+    Explanation explanation(box, question, std::move(*path), *in_force, *mounts);
+    Result<VORN::AccessAnswer> answer = explanation.Answer(names, client);
     if (!answer.ok()) return answer.status();
     answers.push_back(std::move(*answer));
   }

@@ -2,35 +2,21 @@
 
 #include <algorithm>
 
+#include "folder_path.h"
+
 namespace vorn {
 namespace {
 
 using Outcome = ExportDecision::Outcome;
-
-bool IsInside(const std::string& directory, const std::string& outer) {
-  if (outer == "/") return directory != "/";
-  return directory.size() > outer.size() && directory[outer.size()] == '/' &&
-         directory.compare(0, outer.size(), outer) == 0;
-}
-
-// The directories from "/" to `directory`.
-std::vector<std::string> WayTo(const std::string& directory) {
-  std::vector<std::string> way = {"/"};
-  for (std::size_t end = 1; end < directory.size();) {
-    end = std::min(directory.find('/', end + 1), directory.size());
-    way.push_back(directory.substr(0, end));
-  }
-  return way;
-}
 
 class Decider {
  public:
   Decider(const ExportList& exports, const ExportQuestion& question) : exports_(exports), question_(question) {
     for (std::size_t index = 0; index < exports.size(); ++index) {
       const TableExport& one = exports[index];
-      if (IsInside(one.directory, question.directory)) {
+      if (IsBelow(one.directory, question.directory)) {
         has_inner_ = has_inner_ || question.matches(one);
-      } else if (one.directory == question.directory || IsInside(question.directory, one.directory)) {
+      } else if (one.directory == question.directory || IsBelow(question.directory, one.directory)) {
         if (question.matches(one)) matching_.push_back(index);
       }
     }
@@ -62,7 +48,7 @@ class Decider {
     std::optional<std::size_t> nearest;
     for (const std::size_t index : matching_) {
       const TableExport& one = exports_[index];
-      if (!one.options.crossmnt || !IsInside(mount_point, one.directory)) continue;
+      if (!one.options.crossmnt || !IsBelow(mount_point, one.directory)) continue;
       if (!nearest || one.directory.size() > exports_[*nearest].directory.size()) nearest = index;
     }
     return nearest;
@@ -70,7 +56,7 @@ class Decider {
 
   bool IsMountPointBetween(const std::string& outer) const {
     return std::any_of(question_.mount_points.begin(), question_.mount_points.end(), [&](const std::string& point) {
-      return IsInside(point, outer) && (point == question_.directory || IsInside(question_.directory, point));
+      return IsBelow(point, outer) && (point == question_.directory || IsBelow(question_.directory, point));
     });
   }
 

@@ -138,15 +138,18 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
   result.hosts = std::move(*hosts);
   const std::set<std::string> known = AddHosts(HostNames(*files), names, &result);
   const BoxPaths paths(box.root());
-  const Result<ExportTableUpdate> update = PlanExportTable(*files, table->text, paths, result.hosts, known);
-  if (!update.ok()) return update.status();
+  std::string text = table->text;
   if (is_serving) {
-    Result<std::set<std::string>> pending = FindPending(*files, table->text, paths, result.hosts);
+    Result<std::set<std::string>> pending = FindPending(*files, text, paths, result.hosts);
     if (!pending.ok()) return pending.status();
     result.pending = std::move(*pending);
+  } else {
+    Result<ExportTableUpdate> update = PlanExportTable(*files, text, paths, result.hosts, known);
+    if (!update.ok()) return update.status();
+    text = std::move(update->text);
   }
   const Places places = FindPlaces(*files, result.hosts, paths);
-  Result<ExportList> exports = ReadExports(is_serving ? table->text : update->text, places);
+  Result<ExportList> exports = ReadExports(text, places);
   if (!exports.ok()) return exports.status();
   result.exports = std::move(*exports);
   return result;

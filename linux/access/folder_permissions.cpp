@@ -9,8 +9,6 @@
 #include <cerrno>
 #include <cstring>
 
-#include "mounts.h"
-
 namespace vorn {
 namespace {
 
@@ -105,9 +103,7 @@ Result<FolderPermissions> ReadFolderPermissions(Box& box, const std::string& pat
   if (!location.ok()) return location.status();
   struct stat stat {};
   if (::stat(location->c_str(), &stat) != 0) return Status::System(errno, *location);
-  const Result<bool> is_read_only = IsFileSystemReadOnly(box, path);
-  if (!is_read_only.ok()) return is_read_only.status();
-  return FolderPermissions{stat.st_uid, stat.st_gid, stat.st_mode & 0777, *is_read_only, ReadACL(*location)};
+  return FolderPermissions{stat.st_uid, stat.st_gid, stat.st_mode & 0777, ReadACL(*location)};
 }
 
 }  // namespace vorn

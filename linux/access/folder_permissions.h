@@ -15,9 +15,8 @@ namespace vorn {
 struct FolderPermissions {
   std::uint32_t owner = 0;
   std::uint32_t group = 0;
-  unsigned mode = 0;          // the last nine bits
-  bool is_read_only = false;  // the file system
-  std::string acl;            // the value of system.posix_acl_access (acl(5)); empty if there is none
+  unsigned mode = 0;  // the last nine bits
+  std::string acl;    // the value of system.posix_acl_access (acl(5)); empty if there is none
 
   // The bits of `wanted` (4: list, 2: change, 1: enter) that the user has. Root has all of them.
   unsigned Of(const VORN::AccessIdentity& identity, unsigned wanted) const;

@@ -4,7 +4,7 @@
 
 #include "current_box.h"
 #include "error.h"
-#include "mounts.h"
+#include "mount_table.h"
 
 namespace vorn {
 namespace {
@@ -12,7 +12,9 @@ namespace {
 Result<bool> HasMountPoint(const char* path, int type) {
   if (type != VORNFS_MOUNT_UNEXPORTABLE) return Status::Failure(kUnsupported, "no such type of mount points");
   if (path == nullptr || path[0] != '/') return Status::Failure(EINVAL, "the path of mount points is not absolute");
-  return HasUnexportableMount(CurrentBox(), path);
+  const Result<MountTable> mounts = MountTable::Read(CurrentBox());
+  if (!mounts.ok()) return mounts.status();
+  return mounts->HasUnexportable(path);
 }
 
 }  // namespace

@@ -4,7 +4,7 @@
 
 #include "box_paths.h"
 #include "exports_client.h"
-#include "mounts.h"
+#include "mount_table.h"
 
 namespace vorn {
 namespace {
@@ -27,11 +27,11 @@ std::vector<std::string> DescribeCrossedVolumes(Box& box, const std::vector<Shar
     if (entry.options.crossmnt) crossing.push_back(entry.client);
   }
   if (crossing.empty()) return {};
-  const Result<std::vector<std::string>> volumes = MountsBelow(box, path);
-  if (!volumes.ok()) return {};
+  const Result<MountTable> mounts = MountTable::Read(box);
+  if (!mounts.ok()) return {};
   const BoxPaths paths(box.root());
   std::vector<std::string> sentences;
-  for (const std::string& volume : *volumes) {
+  for (const std::string& volume : mounts->FoldersBelow(path)) {
     const std::set<std::string> clients = ClientsOf(files, volume, paths);
     std::string opened;
     for (const std::string& client : crossing) {

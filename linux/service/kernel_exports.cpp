@@ -13,6 +13,7 @@
 
 #include "export_table.h"
 #include "exports_client.h"
+#include "folder_path.h"
 #include "kernel_cache.h"
 
 namespace vorn {
@@ -39,11 +40,6 @@ Status ExpireEntries(const KernelCache& cache, const Expire& expire) {
 
 // In seconds since the epoch.
 std::string Past() { return std::to_string(std::time(nullptr) - 1); }
-
-bool IsBelow(const std::string& path, const std::string& folder) {
-  return folder == "/" ||
-         (path.size() > folder.size() && path[folder.size()] == '/' && path.compare(0, folder.size(), folder) == 0);
-}
 
 // Whether rights in `path` may depend on the exports of a changed directory: it may be below it on another volume
 // (crossmnt), or above it in the tree that NFSv4 clients see.

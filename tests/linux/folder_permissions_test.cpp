@@ -26,7 +26,7 @@ VORN::AccessIdentity User(std::uint32_t user, std::uint32_t group, std::vector<s
 constexpr unsigned kAll = 7;
 
 TEST(FolderPermissions, AreThoseOfTheFirstClassThatTheUserIsIn) {
-  const FolderPermissions folder{2001, 50, 0751, false, ""};
+  const FolderPermissions folder{2001, 50, 0751, ""};
   EXPECT_EQ(folder.Of(User(2001, 50), kAll), 7U);
   EXPECT_EQ(folder.Of(User(2002, 50), kAll), 5U);
   EXPECT_EQ(folder.Of(User(2002, 2002, {7, 50}), kAll), 5U);
@@ -35,14 +35,14 @@ TEST(FolderPermissions, AreThoseOfTheFirstClassThatTheUserIsIn) {
 }
 
 TEST(FolderPermissions, KeepNothingFromRoot) {
-  EXPECT_EQ((FolderPermissions{2001, 50, 0, false, ""}.Of(User(0, 0), kAll)), kAll);
+  EXPECT_EQ((FolderPermissions{2001, 50, 0, ""}.Of(User(0, 0), kAll)), kAll);
 }
 
 TEST(FolderPermissions, FollowAnAccessControlList) {
   const std::string acl = std::string("\x02\0\0\0", 4) + Entry(0x01, 7, ~0U) + Entry(0x02, 7, 2002) +
                           Entry(0x04, 4, ~0U) + Entry(0x08, 1, 60) + Entry(0x08, 7, 70) + Entry(0x10, 5, ~0U) +
                           Entry(0x20, 0, ~0U);
-  const FolderPermissions folder{2001, 50, 0770, false, acl};
+  const FolderPermissions folder{2001, 50, 0770, acl};
   EXPECT_EQ(folder.Of(User(2001, 50), kAll), 7U) << "the mask does not concern the owner";
   EXPECT_EQ(folder.Of(User(2002, 1), kAll), 5U) << "a named user within the mask";
   EXPECT_EQ(folder.Of(User(2003, 50), kAll), 4U) << "the folder's group";

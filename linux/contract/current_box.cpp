@@ -23,11 +23,6 @@ struct Registry {
   std::map<std::string, std::unique_ptr<Box>> boxes;  // by root directory
 };
 
-// A keytab is recorded as what klist(1) prints of it, because its content is secret.
-std::string ShownInHistory(const std::string& path, const std::string& content) {
-  return path == kKeytabFile ? PrintKeytab(content) : content;
-}
-
 // A configuration that cannot be read records nothing; the operations that need it fail.
 History::Settings HistorySettings(Box& box) {
   const Result<PlatformSettings> settings = PlatformSettings::Load(box);
@@ -37,7 +32,7 @@ History::Settings HistorySettings(Box& box) {
 std::unique_ptr<Box> MakeBox(const Root& root) {
   auto box = std::make_unique<Box>(root, std::make_unique<FileStore>(root), MakeEngineChooser());
   const auto settings = [box = box.get()] { return HistorySettings(*box); };
-  box->RecordChanges(std::make_unique<History>(root, box->store(), History::Environment{settings, ShownInHistory}));
+  box->RecordChanges(std::make_unique<History>(root, box->store(), History::Environment{settings, WithoutKeys}));
   return box;
 }
 

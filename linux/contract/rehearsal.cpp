@@ -20,14 +20,12 @@ namespace {
 
 using ChangedFile = DraftStore::ChangedFile;
 
-// A keytab is shown by what klist(1) prints of it, because its content is secret.
-std::optional<std::string> Shown(const std::string& path, const std::optional<std::string>& content) {
-  return path == kKeytabFile && content ? PrintKeytab(*content) : content;
-}
-
 VORN::Rehearsal::File Describe(const ChangedFile& file, int context) {
-  const std::optional<std::string> before = Shown(file.path, file.before);
-  const std::optional<std::string> after = Shown(file.path, file.after);
+  std::optional<std::string> before = file.before;
+  std::optional<std::string> after = file.after;
+  for (std::optional<std::string>* content : {&before, &after}) {
+    if (*content) *content = WithoutKeys(file.path, **content);
+  }
   return {ToValidUtf8(file.path), ToValidUtf8(UnifiedDiff(file.path, before, after, context))};
 }
 

@@ -108,4 +108,8 @@ Result<std::vector<KeytabKey>> ListKeytab(Box& box, const std::string& path) {
   return ReadKeytab(file->text);
 }
 
+std::string WithoutKeys(const std::string& path, const std::string& content) {
+  return path == kKeytabFile ? PrintKeytab(content) : content;
+}
+
 }  // namespace vorn

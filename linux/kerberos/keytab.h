@@ -23,6 +23,10 @@ Status ImportKeytab(Box& box, const std::string& path);
 // The keys of the keytab at the box's `path`, in file order; none if there is no file.
 Result<std::vector<KeytabKey>> ListKeytab(Box& box, const std::string& path);
 
+// The content of the file at the box's `path` without secrets: a keytab becomes what klist(1) prints of it, every other
+// content stays as it is.
+std::string WithoutKeys(const std::string& path, const std::string& content);
+
 }  // namespace vorn
 
 #endif  // VORN_LINUX_KERBEROS_KEYTAB_H

@@ -4,18 +4,14 @@
 
 #include <atomic>
 #include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <set>
 #include <thread>
 #include <vector>
 
-#include "api_table.h"
-#include "entry_function.h"
 #include "foretold.h"
 #include "json_input.h"
 #include "keytab_maker.h"
-#include "temporary_root.h"
+#include "module_box.h"
 #include "tree_state.h"
 
 namespace vorn::server {
@@ -30,15 +26,6 @@ constexpr char kSave[] = "VORN.Core.FileServ.NFS.SharePrivilege/v1/save";
 constexpr char kLoad[] = "VORN.Core.FileServ.NFS.SharePrivilege/v1/load";
 constexpr char kSet[] = "VORN.Core.FileServ.NFS/v1/set";
 
-std::vector<Module> NfsModule() {
-  std::ifstream file(NFS_DESCRIPTOR);
-  const std::string text{std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-  std::string error;
-  std::vector<APIRow> rows;
-  for (const APIRow* row = gTable; row->api != nullptr; ++row) rows.push_back(*row);
-  return {{"nfs.so", std::move(rows), Descriptor::Parse(text, &error).value()}};
-}
-
 Json::Value Parsed(const std::string& json) {
   std::string error;
   const auto value = ParseJsonObject(json, &error);
@@ -52,15 +39,11 @@ std::string RuleOf(const std::string& client, const std::string& privilege = "rw
              "security_flavor": {"sys": true}}]})";
 }
 
-class RehearsalTest : public testing::Test {
+class RehearsalTest : public ModuleBox {
  protected:
   static void SetUpTestSuite() { setenv("TMPDIR", "/dev/shm", 1); }
 
   RehearsalTest() {
-    root_.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\nkerberos = yes\nfirewall = no\n");
-    root_.Write("/etc/vorn/shares.conf", "[shares]\ndata = /volume1/data\nmore = /volume1/more\n");
-    root_.Write("/volume1/data/README", "");
-    root_.Write("/volume1/more/README", "");
     root_.Write("/etc/exports", "# ours\n/volume1/more *(ro)\n/volume1/data 10.0.0.1(rw,no_root_squash)\n");
     root_.Write("/etc/idmapd.conf", "# ours\n[General]\nDomain = lab.test\n[Static]\nalice@LAB.TEST = alice\n");
     root_.Write("/etc/nfs/krb5.conf", "[libdefaults]\n    default_realm = LAB.TEST\n");
@@ -71,24 +54,17 @@ class RehearsalTest : public testing::Test {
     std::filesystem::permissions(root_.At(kScript), std::filesystem::perms::owner_all);
   }
 
-  const Route& RouteOf(const std::string& id) const {
-    std::string unknown;
-    const Route* route = routes_.Find("/api/" + id, &unknown);
-    if (route == nullptr) throw std::runtime_error(unknown);
-    return *route;
-  }
-
   Response Rehearsed(const std::string& id, const std::string& json,
                      const std::optional<std::string>& if_match = std::nullopt, int context = 3) const {
     VORN::CallDescription description;
     description.method = id;
-    return Rehearse(RouteOf(id), Parsed(json), description, if_match, context);
+    return Rehearse(RouteOf("/api/" + id), Parsed(json), description, if_match, context);
   }
 
   Response Done(const std::string& id, const std::string& json) const {
     VORN::CallDescription description;
-    description.may_write = !RouteOf(id).method.reads_only;
-    return RunAndAnswer(RouteOf(id), Parsed(json), description);
+    description.may_write = !RouteOf("/api/" + id).method.reads_only;
+    return RunAndAnswer(RouteOf("/api/" + id), Parsed(json), description);
   }
 
   static Json::Value RehearsalOf(const Response& response) { return Parsed(response.body)["rehearsal"]; }
@@ -100,16 +76,12 @@ class RehearsalTest : public testing::Test {
     if (parameters["keytab_file_tmp"].isString()) uploads.push_back(parameters["keytab_file_tmp"].asString());
     const auto call = [&] {
       VORN::CallDescription description = VORN::CallContext::Current()->description();
-      const Outcome outcome = RunEntryFunction(RouteOf(id), parameters, description);
+      const Outcome outcome = RunEntryFunction(RouteOf("/api/" + id), parameters, description);
       if (outcome.code() == 0) succeeded->insert(id);
-      return AnswerTo(RouteOf(id), outcome).body;
+      return AnswerTo(RouteOf("/api/" + id), outcome).body;
     };
     ExpectForetold(root_, call, uploads);
   }
-
-  const TemporaryRoot root_;
-  const std::vector<Module> modules_ = NfsModule();
-  const Routes routes_{modules_};
 };
 
 // Several calls of each changing method; the later ones find what the earlier ones did.
@@ -159,7 +131,8 @@ TEST_F(RehearsalTest, ForetellsTheAnswerAndTheFilesOfEachMethod) {
   }
   for (const APIRow* row = gTable; row->api != nullptr; ++row) {
     const std::string id = std::string(row->api) + "/v" + std::to_string(row->version) + "/" + row->method;
-    EXPECT_EQ(succeeded.count(id), RouteOf(id).method.reads_only ? 0U : 1U) << id << " is not among the calls";
+    EXPECT_EQ(succeeded.count(id), RouteOf("/api/" + id).method.reads_only ? 0U : 1U)
+        << id << " is not among the calls";
   }
 }
 

@@ -1,17 +1,12 @@
 // Changes with If-Match: the real module on the Linux platform, with concurrent clients and an editor.
-#include <gtest/gtest.h>
 #include <json/writer.h>
 
 #include <atomic>
-#include <fstream>
-#include <iterator>
 #include <thread>
 #include <vector>
 
-#include "api_table.h"
-#include "entry_function.h"
 #include "json_input.h"
-#include "temporary_root.h"
+#include "module_box.h"
 
 namespace vorn::server {
 namespace {
@@ -19,15 +14,6 @@ namespace {
 constexpr int kClients = 16;
 constexpr char kSettings[] = "/api/VORN.Core.FileServ.NFS/v1/";
 constexpr char kRules[] = "/api/VORN.Core.FileServ.NFS.SharePrivilege/v1/";
-
-std::vector<Module> NfsModule() {
-  std::ifstream file(NFS_DESCRIPTOR);
-  const std::string text{std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-  std::string error;
-  std::vector<APIRow> rows;
-  for (const APIRow* row = gTable; row->api != nullptr; ++row) rows.push_back(*row);
-  return {{"nfs.so", std::move(rows), Descriptor::Parse(text, &error).value()}};
-}
 
 Json::Value RuleFor(int client) {
   Json::Value rule;
@@ -45,26 +31,16 @@ struct Answer {
   std::string tag;
 };
 
-class Revisions : public testing::Test {
+class Revisions : public ModuleBox {
  protected:
-  Revisions() {
-    root_.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\nkerberos = yes\nfirewall = no\n");
-    root_.Write("/etc/vorn/shares.conf", "[shares]\ndata = /volume1/data\nmore = /volume1/more\n");
-    root_.Write("/volume1/data/README", "");
-    root_.Write("/volume1/more/README", "");
-    root_.Write("/etc/exports", "# ours\n");
-    root_.Write("/etc/passwd", "root:x:0:0::/:/bin/sh\nadmin:x:999:999::/:/bin/sh\nnobody:x:65534:65534::/:/bin/sh\n");
-  }
-
   Answer Call(const std::string& path, const Json::Value& parameters, const std::string& if_match = "") const {
-    std::string unknown;
-    const Route* route = routes_.Find(path, &unknown);
-    if (route == nullptr) throw std::runtime_error(unknown);
+    const Route& route = RouteOf(path);
     VORN::CallDescription description;
-    description.may_write = !route->method.reads_only;
-    const Response response = if_match.empty() ? RunAndAnswer(*route, parameters, description)
-                                               : RunIfUnchanged(*route, parameters, description, if_match);
-    Answer answer{response.status, ParseJsonObject(response.body, &unknown).value(), ""};
+    description.may_write = !route.method.reads_only;
+    const Response response = if_match.empty() ? RunAndAnswer(route, parameters, description)
+                                               : RunIfUnchanged(route, parameters, description, if_match);
+    std::string error;
+    Answer answer{response.status, ParseJsonObject(response.body, &error).value(), ""};
     for (const auto& [name, value] : response.headers) {
       if (name == "ETag") answer.tag = value;
     }
@@ -96,10 +72,6 @@ class Revisions : public testing::Test {
       rules = saved.envelope["error"]["details"]["rule"];
     }
   }
-
-  TemporaryRoot root_;
-  const std::vector<Module> modules_ = NfsModule();
-  const Routes routes_{modules_};
 };
 
 TEST_F(Revisions, LetNoClientLoseTheChangeOfAnother) {

@@ -34,6 +34,16 @@ def expect_no_secret(log, secrets=()):
         raise AssertionError(f"a secret is logged: {found[:3]}")
 
 
+def make_trial_root(folder):
+    """Copies the trial root, with the service script of the box, into the folder. Returns the root."""
+    root = folder / "root"
+    shutil.copytree(PROJECT / "scripts/trial", root)
+    services = root / "usr/vorn/etc/rc.sysv"
+    services.mkdir(parents=True)
+    shutil.copy(PROJECT / "linux/service/S83nfsd.sh", services)
+    return root
+
+
 class UnixConnection(http.client.HTTPConnection):
     """HTTP over a Unix socket."""
 
@@ -53,11 +63,7 @@ class TrialServer:
     def __enter__(self):
         self._keys = []
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))  # a short path: a socket has 107 bytes at most
-        self.root = self.folder / "root"
-        shutil.copytree(PROJECT / "scripts/trial", self.root)
-        services = self.root / "usr/vorn/etc/rc.sysv"
-        services.mkdir(parents=True)
-        shutil.copy(PROJECT / "linux/service/S83nfsd.sh", services)
+        self.root = make_trial_root(self.folder)
         self.socket = self.folder / "socket"
         with open(self.folder / "log", "wb") as log:
             self._process = subprocess.Popen(  # pylint: disable=consider-using-with

@@ -22,7 +22,8 @@ import unittest
 
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(PROJECT / "scripts"))
-from trial_server import expect_no_secret  # noqa: E402 pylint: disable=wrong-import-position
+from trial_server import (  # noqa: E402 pylint: disable=wrong-import-position
+    UnixConnection, expect_no_secret, make_trial_root)
 
 VORND = os.environ["VORND"]
 PAM_MODULE = os.environ["PAM_MODULE"]
@@ -70,30 +71,13 @@ class Authority:
         return certificate, key
 
 
-class Unix(http.client.HTTPConnection):
-    """A connection to a Unix socket."""
-
-    def __init__(self, path):
-        super().__init__("localhost", timeout=PATIENCE)
-        self._path = path
-
-    def connect(self):
-        self.sock = socket.socket(socket.AF_UNIX)
-        self.sock.settimeout(PATIENCE)
-        self.sock.connect(str(self._path))
-
-
 class Server:
     """A vornd on a trial root, until the end of the "with" statement."""
 
     def __init__(self, configuration="", options=()):
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))
-        self.root = self.folder / "root"
+        self.root = make_trial_root(self.folder)
         self.socket = self.folder / "socket"
-        shutil.copytree(PROJECT / "scripts/trial", self.root)
-        services = self.root / "usr/vorn/etc/rc.sysv"
-        services.mkdir(parents=True)
-        shutil.copy(PROJECT / "linux/service/S83nfsd.sh", services)
         self._add_accounts()
         self.configure(configuration)
         self._options = options
@@ -160,7 +144,7 @@ class Server:
 
     def connect(self, way, authority=None):
         if way == "unix":
-            return Unix(self.socket)
+            return UnixConnection(self.socket)
         if way == "plain":
             return http.client.HTTPConnection("127.0.0.1", self.port(), PATIENCE)
         context = ssl.create_default_context(cadata=authority or self.certificate())

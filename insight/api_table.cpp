@@ -1,4 +1,5 @@
 #include "access_handler.h"
+#include "health_handler.h"
 #include "history_handler.h"
 
 namespace {
@@ -11,10 +12,12 @@ void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
 }
 
 constexpr char kAccess[] = "VORN.Core.FileServ.NFS.Access";
+constexpr char kHealth[] = "VORN.Core.FileServ.NFS.Health";
 constexpr char kHistory[] = "VORN.Core.FileServ.NFS.History";
 
 const APIRow kTable[] = {{kAccess, 1, "explain", Serve<AccessHandler, &AccessHandler::Explain>},
                          {kAccess, 1, "matrix", Serve<AccessHandler, &AccessHandler::Matrix>},
+                         {kHealth, 1, "check", Serve<HealthHandler, &HealthHandler::Check>},
                          {kHistory, 1, "list", Serve<HistoryHandler, &HistoryHandler::List>},
                          {kHistory, 1, "show", Serve<HistoryHandler, &HistoryHandler::Show>},
                          {kHistory, 1, "undo", Serve<HistoryHandler, &HistoryHandler::Undo>},

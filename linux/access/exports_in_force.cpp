@@ -115,16 +115,6 @@ Result<std::string> ByAddress(std::string_view table, const HostAddresses& hosts
   return text;
 }
 
-// The directories whose rules in the files are not those of the table.
-Result<std::set<std::string>> FindPending(const std::vector<SharedExportsFile>& files, std::string_view table,
-                                          const ExportPaths& paths, const HostAddresses& hosts) {
-  const Result<std::string> by_address = ByAddress(table, hosts);
-  if (!by_address.ok()) return by_address.status();
-  Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
-  if (!update.ok()) return update.status();
-  return std::move(update->changed);
-}
-
 }  // namespace
 
 Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bool is_serving) {
@@ -140,7 +130,7 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
   const BoxPaths paths(box.root());
   std::string text = table->text;
   if (is_serving) {
-    Result<std::set<std::string>> pending = FindPending(*files, text, paths, result.hosts);
+    Result<std::set<std::string>> pending = FindPendingExports(*files, text, paths, result.hosts);
     if (!pending.ok()) return pending.status();
     result.pending = std::move(*pending);
   } else {
@@ -153,6 +143,15 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
   if (!exports.ok()) return exports.status();
   result.exports = std::move(*exports);
   return result;
+}
+
+Result<std::set<std::string>> FindPendingExports(const std::vector<SharedExportsFile>& files, std::string_view table,
+                                                 const ExportPaths& paths, const HostAddresses& hosts) {
+  const Result<std::string> by_address = ByAddress(table, hosts);
+  if (!by_address.ok()) return by_address.status();
+  Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
+  if (!update.ok()) return update.status();
+  return std::move(update->changed);
 }
 
 }  // namespace vorn

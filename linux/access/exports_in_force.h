@@ -5,6 +5,8 @@
 #include <memory>
 #include <set>
 #include <string>
+#include <string_view>
+#include <vector>
 
 #include "box.h"
 #include "export_decision.h"
@@ -25,6 +27,11 @@ struct ExportsInForce {
 // there. Asks the name service for the hosts in the rules whose addresses are not remembered, up to the first one for
 // which it does not answer.
 Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bool is_serving);
+
+// Returns the directories whose rules in the files are not those of `table`, the table of exports. `hosts` are the
+// addresses of host names that are known.
+Result<std::set<std::string>> FindPendingExports(const std::vector<SharedExportsFile>& files, std::string_view table,
+                                                 const ExportPaths& paths, const HostAddresses& hosts);
 
 }  // namespace vorn
 

@@ -53,16 +53,14 @@ bool IsConfigured(const NFSConfiguration& configuration, const std::string& vers
 }
 
 Status CheckVersion(Box& box, const std::string& version, AccessChecks* checks) {
-  const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
-  if (!configuration.ok()) return configuration.status();
-  const bool is_configured = IsConfigured(*configuration, version);
-  const bool is_on = HasVersion(box, version).value_or(is_configured);
-  if (is_on) {
+  const Result<VersionState> state = ReadVersionState(box, version);
+  if (!state.ok()) return state.status();
+  if (state->in_force.value_or(state->is_configured)) {
     checks->Pass("version", "The service accepts version " + version + " of NFS.");
   } else {
     checks->Fail("version", "The service does not accept version " + version + " of NFS.",
-                 is_configured ? "Restart NFS: the version is switched on since its start."
-                               : "Switch the version on (nfs.conf, section nfsd), or mount with another one.");
+                 state->is_configured ? "Restart NFS: the version is switched on since its start."
+                                      : "Switch the version on (nfs.conf, section nfsd), or mount with another one.");
   }
   return {};
 }
@@ -99,6 +97,12 @@ Status CheckFirewall(Box& box, bool is_version_3, AccessChecks* checks) {
 bool IsServing(Box& box) {
   const Result<StoredFile> file = box.Read(kKernelStatistics);
   return file.ok() && file->version.exists && ParseKernelStatistics(file->text).threads > 0;
+}
+
+Result<VersionState> ReadVersionState(Box& box, const std::string& version) {
+  const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
+  if (!configuration.ok()) return configuration.status();
+  return VersionState{IsConfigured(*configuration, version), HasVersion(box, version)};
 }
 
 Status CheckService(Box& box, const std::string& version, AccessChecks* checks) {

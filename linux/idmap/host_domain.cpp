@@ -3,16 +3,17 @@
 #include <netdb.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <climits>
 #include <memory>
 #include <mutex>
 #include <optional>
-#include <sstream>
 #include <system_error>
 #include <thread>
 #include <utility>
 
 #include "files.h"
+#include "hosts_text.h"
 
 namespace vorn {
 namespace {
@@ -50,16 +51,8 @@ std::string DomainOf(const std::string& host) {
 }  // namespace
 
 std::string CanonicalName(const std::string& hosts, const std::string& host) {
-  std::istringstream lines(hosts);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line.substr(0, line.find('#')));
-    std::string address;
-    std::string canonical;
-    words >> address >> canonical;
-    if (canonical == host) return canonical;
-    for (std::string alias; words >> alias;) {
-      if (alias == host) return canonical;
-    }
+  for (const HostsLine& line : ReadHosts(hosts)) {
+    if (std::find(line.names.begin(), line.names.end(), host) != line.names.end()) return line.names.front();
   }
   return host;
 }

@@ -2,9 +2,13 @@
 
 #include <syslog.h>  // LOG_WARNING
 
+#include <cerrno>
+#include <map>
+#include <optional>
 #include <set>
 #include <sstream>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "box_paths.h"
@@ -54,29 +58,42 @@ void NameLeft(const std::string& directory) {
                            kExportsFile + ", or set withdraw_left_shares = yes in /etc/vorn/platform.conf");
 }
 
+// The exported directories that are or were shares, with whether each is one now. nullopt if there is no shares.conf.
+using ExportedShares = std::optional<std::map<std::string, bool>>;
+
+Result<ExportedShares> FindExportedShares(Box& box, const ExportsDocument& exports) {
+  const Result<std::vector<std::string>> paths = ListSharePaths(box);
+  if (!paths.ok() && paths.status().code() == ENOENT) return ExportedShares();
+  if (!paths.ok()) return paths.status();
+  const Result<Directories> remembered = ReadRemembered(box);
+  if (!remembered.ok()) return remembered.status();
+  const BoxPaths links(box.root());
+  PathResolver resolver(links);
+  Directories shares;
+  for (const std::string& path : *paths) shares.insert(resolver.Resolve(NormalExportPath(path)));
+  std::map<std::string, bool> exported;
+  const auto lines = exports.Lines();
+  for (const ExportLine& line : *lines) {
+    const std::string directory = resolver.Resolve(line.path);
+    const bool is_share = shares.count(directory) != 0;
+    if (is_share || remembered->count(directory) != 0) exported[directory] = is_share;
+  }
+  return ExportedShares(std::move(exported));
+}
+
 }  // namespace
 
 Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports) {
   const Result<PlatformSettings> settings = PlatformSettings::Load(box);
   if (!settings.ok()) return settings.status();
-  const Result<std::vector<std::string>> paths = ListSharePaths(box);
-  if (!paths.ok()) return paths.status().code() == ENOENT ? Result<bool>(false) : paths.status();
-  const Result<Directories> remembered = ReadRemembered(box);
-  if (!remembered.ok()) return remembered.status();
-
-  const BoxPaths links(box.root());
-  PathResolver resolver(links);
-  Directories shares;
-  for (const std::string& path : *paths) shares.insert(resolver.Resolve(NormalExportPath(path)));
-  Directories exported;
-  const auto lines = exports.Lines();
-  for (const ExportLine& line : *lines) {
-    const std::string directory = resolver.Resolve(line.path);
-    if (shares.count(directory) != 0 || remembered->count(directory) != 0) exported.insert(directory);
-  }
+  const Result<ExportedShares> exported = FindExportedShares(box, exports);
+  if (!exported.ok()) return exported.status();
+  if (!*exported) return false;
   bool withdrawn = false;
-  for (const std::string& directory : exported) {
-    if (shares.count(directory) != 0) continue;
+  Directories directories;
+  for (const auto& [directory, is_share] : **exported) {
+    directories.insert(directory);
+    if (is_share) continue;
     if (!settings->withdraw_left_shares) {
       NameLeft(directory);
     } else if (Status status = Withdraw(box, directory); !status.ok()) {
@@ -85,8 +102,19 @@ Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports) {
       withdrawn = true;
     }
   }
-  if (Status status = Remember(box, exported); !status.ok()) return status;
+  if (Status status = Remember(box, directories); !status.ok()) return status;
   return withdrawn;
+}
+
+Result<std::vector<std::string>> FindLeftShares(Box& box, const ExportsDocument& exports) {
+  const Result<ExportedShares> exported = FindExportedShares(box, exports);
+  if (!exported.ok()) return exported.status();
+  std::vector<std::string> left;
+  if (!*exported) return left;
+  for (const auto& [directory, is_share] : **exported) {
+    if (!is_share) left.push_back(directory);
+  }
+  return left;
 }
 
 }  // namespace vorn

@@ -2,6 +2,9 @@
 #ifndef VORN_LINUX_SERVICE_LEFT_SHARES_H
 #define VORN_LINUX_SERVICE_LEFT_SHARES_H
 
+#include <string>
+#include <vector>
+
 #include "box.h"
 #include "exports_document.h"
 #include "status.h"
@@ -16,6 +19,9 @@ namespace vorn {
 //
 // `exports` is the content of /etc/exports. Returns whether rules were removed from the file.
 Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports);
+
+// Returns the directories that CheckLeftShares would name or withdraw. Changes nothing.
+Result<std::vector<std::string>> FindLeftShares(Box& box, const ExportsDocument& exports);
 
 }  // namespace vorn
 

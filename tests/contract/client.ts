@@ -193,6 +193,13 @@ async function history() {
   assert.equal(unknown.error?.error.code, 2390);
 }
 
+async function health() {
+  const answer = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.Health/v1/check', { body: { severity: 'warning' } }));
+  assert.equal(answer.total, answer.counts.error + answer.counts.warning);
+  const kinds: string[] = answer.findings.map((finding) => finding.kind);
+  assert.equal(kinds.length, answer.total);
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -271,6 +278,7 @@ await sharePrivilege();
 await shares();
 await access();
 await matrix();
+await health();
 await history();
 await revisions();
 await sessions();

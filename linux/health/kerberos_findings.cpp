@@ -1,0 +1,137 @@
+#include "kerberos_findings.h"
+
+#include <sys/timex.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <set>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "ascii.h"
+#include "host_domain.h"
+#include "keytab.h"
+
+namespace vorn {
+namespace {
+
+constexpr char kHostName[] = "/etc/hostname";
+constexpr char kSynchronised[] = "/run/systemd/timesync/synchronized";  // systemd-timesyncd.service(8)
+constexpr char kHosts[] = "/etc/hosts";
+
+VORN::HealthSubject OfKeytab() {
+  VORN::HealthSubject subject;
+  subject.file = kKeytabFile;
+  return subject;
+}
+
+// The first rule that accepts Kerberos; null if there is none.
+const ExportedLine* FindKerberosRule(const HealthInput& input) {
+  const auto uses_kerberos = [](const ExportFlavor& flavor) { return flavor.name.compare(0, 4, "krb5") == 0; };
+  for (const ExportedLine& exported : input.exported) {
+    for (const ExportEntry& entry : exported.line->entries) {
+      const auto& flavors = entry.options.flavors;
+      if (std::any_of(flavors.begin(), flavors.end(), uses_kerberos)) return &exported;
+    }
+  }
+  return nullptr;
+}
+
+// The name that the box gives itself: of a trial root that in its own file.
+Result<std::string> OwnName(Box& box) {
+  char name[HOST_NAME_MAX + 1] = "";
+  if (box.root().is_box()) return std::string(gethostname(name, sizeof name - 1) == 0 ? name : "");
+  const Result<StoredFile> file = box.Read(kHostName);
+  if (!file.ok()) return file.status();
+  return file->text.substr(0, file->text.find_first_of(" \t\n"));
+}
+
+// The full name of the host, in lower case.
+Result<std::string> FullName(Box& box) {
+  const Result<std::string> own = OwnName(box);
+  if (!own.ok()) return own.status();
+  const Result<StoredFile> hosts = box.Read(kHosts);
+  if (!hosts.ok()) return hosts.status();
+  std::string name = CanonicalName(hosts->text, *own);
+  if (name.find('.') != std::string::npos) return LowerAscii(name);
+  return Status::Failure(kUnsupported,
+                         "The host's full name is not in /etc/hosts, and the name service is not asked for it.");
+}
+
+bool IsWeak(const std::string& type) {
+  const auto begins = [&](const char* prefix) { return type.rfind(prefix, 0) == 0; };
+  return begins("des-") || begins("des3-") || begins("arcfour-");
+}
+
+}  // namespace
+
+Status FindMissingKeytab(const HealthInput& input, Findings* findings) {
+  const ExportedLine* const rule = FindKerberosRule(input);
+  if (rule == nullptr) return {};
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
+  if (!keys.ok() && keys.status().code() != kNoKeytab) return keys.status();
+  if (keys.ok() && !keys->empty()) return {};
+  const std::string state = keys.ok() ? " has no key" : " is no keytab";
+  findings->Error(rule->Subject(),
+                  rule->Name() + " demands Kerberos for " + rule->Exported() + ", and " + kKeytabFile + state +
+                      ": clients cannot mount with Kerberos.",
+                  "Upload a keytab with keys of nfs/HOST (VORN.Core.FileServ.NFS.Kerberos, upload_key).");
+  return {};
+}
+
+Status FindMissingHostKey(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
+  if (!keys.ok()) return keys.status();
+  if (keys->empty()) return {};
+  const Result<std::string> host = FullName(input.box);
+  if (!host.ok()) return host.status();
+  const std::string wanted = "nfs/" + *host + "@";
+  for (const KeytabKey& key : *keys) {
+    if (LowerAscii(key.principal).compare(0, wanted.size(), wanted) == 0) return {};
+  }
+  findings->Error(OfKeytab(),
+                  "The keytab has no key of nfs/" + *host +
+                      ", for which clients that mount from this name get a ticket: "
+                      "they cannot mount with Kerberos.",
+                  "Upload a keytab with keys of nfs/" + *host + " (VORN.Core.FileServ.NFS.Kerberos, upload_key).");
+  return {};
+}
+
+Status FindWeakKeys(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
+  if (!keys.ok()) return keys.status();
+  std::set<std::pair<std::string, std::string>> weak;
+  for (const KeytabKey& key : *keys) {
+    if (IsWeak(key.enc_type)) weak.emplace(key.principal, key.enc_type);
+  }
+  for (const auto& [principal, type] : weak) {
+    findings->Warning(OfKeytab(),
+                      "The keytab has a key of " + principal + " of the type " + type +
+                          ", which is deprecated: whoever records the traffic may find the key.",
+                      "Make keys of an AES type for the principal, and upload the new keytab.");
+  }
+  return {};
+}
+
+Status FindUnsynchronisedClock(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
+  if (keys.ok() && keys->empty()) return {};
+  if (!input.box.root().is_box()) {
+    return Status::Failure(kUnsupported, "The clock is not that of this root.");
+  }
+  timex state{};
+  const int result = adjtimex(&state);
+  if (result < 0 && input.box.Exists(kSynchronised)) return {};
+  if (result < 0) return Status::System(errno, "The state of the clock cannot be read");
+  if (result != TIME_ERROR) return {};
+  findings->Warning({},
+                    "No time service keeps the clock of the box right. Kerberos refuses clients whose clock differs by "
+                    "more than five minutes.",
+                    "Run a time service, for example systemd-timesyncd or chrony.");
+  return {};
+}
+
+}  // namespace vorn

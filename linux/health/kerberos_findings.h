@@ -1,0 +1,25 @@
+// Checks of what Kerberos needs: the keytab and the clock.
+#ifndef VORN_LINUX_HEALTH_KERBEROS_FINDINGS_H
+#define VORN_LINUX_HEALTH_KERBEROS_FINDINGS_H
+
+#include "findings.h"
+#include "health_input.h"
+#include "status.h"
+
+namespace vorn {
+
+// Rules that need Kerberos on a box without a usable keytab; at most one finding.
+Status FindMissingKeytab(const HealthInput& input, Findings* findings);
+
+// A keytab without a key for "nfs/HOST"; at most one finding.
+Status FindMissingHostKey(const HealthInput& input, Findings* findings);
+
+// Keys of encryption types that RFC 6649 and RFC 8429 deprecate.
+Status FindWeakKeys(const HealthInput& input, Findings* findings);
+
+// A clock that nothing keeps right, on a box that uses Kerberos; at most one finding.
+Status FindUnsynchronisedClock(const HealthInput& input, Findings* findings);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_HEALTH_KERBEROS_FINDINGS_H

@@ -1,4 +1,5 @@
 #include "access_handler.h"
+#include "clients_handler.h"
 #include "health_handler.h"
 #include "history_handler.h"
 
@@ -12,11 +13,14 @@ void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
 }
 
 constexpr char kAccess[] = "VORN.Core.FileServ.NFS.Access";
+constexpr char kClient[] = "VORN.Core.FileServ.NFS.Client";
 constexpr char kHealth[] = "VORN.Core.FileServ.NFS.Health";
 constexpr char kHistory[] = "VORN.Core.FileServ.NFS.History";
 
 const APIRow kTable[] = {{kAccess, 1, "explain", Serve<AccessHandler, &AccessHandler::Explain>},
                          {kAccess, 1, "matrix", Serve<AccessHandler, &AccessHandler::Matrix>},
+                         {kClient, 1, "list", Serve<ClientsHandler, &ClientsHandler::List>},
+                         {kClient, 1, "disconnect", Serve<ClientsHandler, &ClientsHandler::Disconnect>},
                          {kHealth, 1, "check", Serve<HealthHandler, &HealthHandler::Check>},
                          {kHistory, 1, "list", Serve<HistoryHandler, &HistoryHandler::List>},
                          {kHistory, 1, "show", Serve<HistoryHandler, &HistoryHandler::Show>},

@@ -20,8 +20,8 @@ struct Rehearsal {
 
   // An operation on the service, in the order of the operations.
   struct Action {
-    std::string action;                // "start", "stop", "restart", "reload", ...
-    std::string clients;               // what clients notice: "nothing", "reload", "restart", "start" or "stop"
+    std::string action;   // "start", "stop", "restart", "reload", ...
+    std::string clients;  // what clients notice: "nothing", "reload", "restart", "start", "stop" or "disconnect"
     std::optional<int> grace_seconds;  // of a restart: how long no new file is opened and no new lock is granted
     std::string effect;                // a sentence for an administrator
   };

@@ -14,6 +14,7 @@ enum class RehearsedAction {
   kUnixPermissions,   // told to the daemons at the next start
   kReloadIdentities,  // S83nfsd.sh reloadidmap
   kFirewall,          // the firewall table is replaced
+  kDisconnect,        // the state of a client of NFSv4 ends
 };
 
 }  // namespace vorn

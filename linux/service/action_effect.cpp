@@ -60,6 +60,12 @@ ActionEffect EffectOf(RehearsedAction action, Box& draft) {
               "interruption for clients."};
     case RehearsedAction::kFirewall:
       return {"firewall", "nothing", {}, "The firewall opens the ports that are configured then, and no others."};
+    case RehearsedAction::kDisconnect:
+      return {"disconnect",
+              "disconnect",
+              {},
+              "The client loses its open files and locks over NFSv4. It gets them again if nobody else has them "
+              "meanwhile."};
   }
   return {"", "nothing", {}, ""};
 }

@@ -11,7 +11,7 @@ namespace vorn {
 
 struct ActionEffect {
   const char* action;   // "restart"
-  const char* clients;  // "nothing", "reload", "restart", "start" or "stop"
+  const char* clients;  // "nothing", "reload", "restart", "start", "stop" or "disconnect"
   std::optional<int> grace_seconds;
   std::string effect;  // a sentence
 };

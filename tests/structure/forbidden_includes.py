@@ -32,12 +32,14 @@ ALLOWED = {
         "linux/settings", "platform"},
     "linux/access": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "platform"},
+    "linux/clients": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/access", "linux/exports",
+        "linux/service", "platform"},
     "linux/health": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "linux/access", "platform"},
     "linux/history": {"linux/status", "linux/system", "linux/text", "linux/box", "platform"},
     "linux/contract": {
         "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",
-        "linux/access", "linux/health", "linux/history", "linux/idmap", "linux/kerberos", "linux/service", "platform"},
+        "linux/access", "linux/clients", "linux/health", "linux/history", "linux/idmap", "linux/kerberos", "linux/service", "platform"},
 }
 HEADERS = sorted(set(ALLOWED) | {"include", "platform", "linux/status", "server", "tests/support"})
 

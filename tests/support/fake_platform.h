@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "access.h"
+#include "clients.h"
 #include "core.h"
 #include "health.h"
 #include "history.h"
@@ -63,6 +64,7 @@ class FakePlatform {
   std::vector<std::string> files;           // that KLIBCFileExist finds, besides those of the system
   std::vector<std::string> port_conflicts;  // "nfs_statd 4000"
   VORN::AccessAnswer access;                // what every access is explained with
+  VORN::NFSClient client;                   // the only one of the list
   VORN::HealthReport health;                // of every check
   VORN::HistoryEntry change;                // the only one of the history
   int done = 3;  // what an operation answers on success where every non-negative number says so

@@ -1,0 +1,24 @@
+// The clients of a box, from what the kernel's server and rpc.mountd(8) know.
+#ifndef VORN_LINUX_CLIENTS_CLIENT_LIST_H
+#define VORN_LINUX_CLIENTS_CLIENT_LIST_H
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+#include "box.h"
+#include "clients.h"
+
+namespace vorn {
+
+struct ClientPage {
+  std::vector<VORN::NFSClient> clients;
+  std::size_t total = 0;  // of all pages
+};
+
+// Lists the clients as VORN::ListClients() says. The states of NFSv4 are counted for the clients of the page only.
+Result<ClientPage> ListClients(Box& box, const std::string& filter, std::size_t offset, std::size_t limit);
+
+}  // namespace vorn
+
+#endif  // VORN_LINUX_CLIENTS_CLIENT_LIST_H

@@ -101,6 +101,9 @@ class TrialServer:
     def log(self):
         return (self.folder / "log").read_text("utf-8", "replace")
 
+    def process_id(self):
+        return self._process.pid
+
     def sign_in_code(self):
         """The code that vornd has printed, which signs in once."""
         return re.search("#code=(vornc_[0-9a-f]+)", self.log()).group(1)

@@ -23,6 +23,7 @@
 #include "browser_guard.h"
 #include "budget.h"
 #include "configuration.h"
+#include "console.h"
 #include "http.h"
 #include "listener.h"
 #include "memory.h"
@@ -197,6 +198,7 @@ int Serve(const Options& options, const Settings& settings) {
   Budget bodies(settings.body_memory.bytes, settings.body_memory_per_address.bytes);
   const AuditSink audit = StartedBySystemd() ? JournalAudit() : SyslogAudit();
   AccessLog log(AccessSink(settings));
+  const Console console(ConsoleFolder());
   CallMetrics metrics;
   const std::vector<MetricsSource> figures = {[&] {
                                                 return HttpMetrics(log, {{"bodies", bodies}, {"parameters", memory}});
@@ -214,7 +216,8 @@ int Serve(const Options& options, const Settings& settings) {
               metrics,
               figures,
               authenticator,
-              {sessions, passwords}});
+              {sessions, passwords},
+              console});
   const HttpLimits limits = FitToDescriptors(HttpLimitsOf(settings), *listeners, DescriptorLimit());
   HttpServer server(api, std::move(*listeners), limits, {&bodies, &log, tls.get()});
   NotifyReady();

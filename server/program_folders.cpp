@@ -14,15 +14,18 @@ std::filesystem::path ProgramFolder() {
   return std::filesystem::read_symlink("/proc/self/exe", failure).parent_path();
 }
 
-}  // namespace
-
-std::string DefaultModuleFolder() {
+// Returns `built`, a folder of the build tree, if there is one; otherwise `installed`. Both are relative to the folder
+// above the program's own.
+std::string FolderOf(const char* built, const char* installed) {
   std::error_code failure;
   const auto prefix = ProgramFolder().parent_path();
-  const auto installed = prefix / VORN_MODULE_FOLDER;
-  const auto built = prefix / "modules";
-  return std::filesystem::is_directory(built, failure) ? built.string() : installed.string();
+  return std::filesystem::is_directory(prefix / built, failure) ? prefix / built : prefix / installed;
 }
+
+}  // namespace
+
+std::string DefaultModuleFolder() { return FolderOf("modules", VORN_MODULE_FOLDER); }
+std::string ConsoleFolder() { return FolderOf("page", VORN_CONSOLE_FOLDER); }
 
 // In the build tree it is beside this program.
 std::string PasswordHelperPath() {

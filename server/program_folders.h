@@ -9,6 +9,9 @@ namespace vorn::server {
 // The folder of the modules that are loaded by default.
 std::string DefaultModuleFolder();
 
+// The folder of the console's files.
+std::string ConsoleFolder();
+
 // The path of the program that checks passwords.
 std::string PasswordHelperPath();
 

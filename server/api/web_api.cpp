@@ -21,6 +21,12 @@ namespace {
 
 using NewBody = std::variant<std::unique_ptr<Body>, Response>;
 
+// A link of another site may lead to the console: the page is the same for everybody, and what it loads and calls is
+// fetched by itself.
+bool FollowsLink(const Head& head) {
+  return Console::IsPage(head.target) && head.method == "GET" && head.Header("Sec-Fetch-Mode") == "navigate";
+}
+
 std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& names) {
   const std::string_view host = head.host.value_or("");
   if (!head.peer.credentials && !names.Include(host, head.secure)) {
@@ -28,7 +34,8 @@ std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& name
   }
   const std::optional<std::string_view> origin = head.Header("Origin");
   const bool own_origin = !origin || names.AreOrigin(*origin, host, head.secure);
-  if (own_origin && IsOwnFetch(head.Header("Sec-Fetch-Site").value_or("none"))) return std::nullopt;
+  const bool own_fetch = IsOwnFetch(head.Header("Sec-Fetch-Site").value_or("none")) || FollowsLink(head);
+  if (own_origin && own_fetch) return std::nullopt;
   return Refusal(403, "Web pages of other sites, and of other ports, may not use this server.");
 }
 
@@ -122,6 +129,13 @@ std::optional<Response> RefuseOtherThanPost(const Head& head) {
   return std::nullopt;
 }
 
+// Answers a request for a resource that is not made with GET or HEAD, or that has a query.
+std::optional<Response> RefuseOtherThanGet(const Head& head) {
+  if (head.method == "OPTIONS") return Options("GET, HEAD");
+  if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
+  return RefuseQuery(head.query);
+}
+
 constexpr std::string_view kRehearse = "rehearse=true";
 
 // Refuses a call with a query, except one that asks for the rehearsal of a module's changing method.
@@ -183,6 +197,7 @@ std::variant<std::shared_ptr<Exchange>, Response> WebApi::Begin(const Head& head
       std::find_if(kPages.begin(), kPages.end(), [&head](const Page& each) { return each.path == head.target; });
   if (page == kPages.end()) page = nullptr;
   if (page != nullptr && page->is_public) return BeginPage(*page, head);
+  if (parts_.console.Owns(head.target)) return BeginConsole(head);
   const CallerPtr caller =
       parts_.authenticator.Identify(head, parts_.names.AreSecure(head.host.value_or(""), head.secure));
   if (!caller) return Unauthenticated("Sign in first, or send a valid token.");
@@ -238,10 +253,13 @@ WebApi::Begun WebApi::BeginSignIn(const Head& head) const {
 Response WebApi::Refuse(int status, std::string_view text) const { return Refusal(status, text); }
 
 WebApi::Begun WebApi::BeginPage(const Page& page, const Head& head) const {
-  if (head.method == "OPTIONS") return Options("GET, HEAD");
-  if (head.method != "GET" && head.method != "HEAD") return MethodNotAllowed(head.target, "GET, HEAD");
-  if (auto refusal = RefuseQuery(head.query)) return *std::move(refusal);
+  if (auto refusal = RefuseOtherThanGet(head)) return *std::move(refusal);
   return (this->*page.begin)(head);
+}
+
+WebApi::Begun WebApi::BeginConsole(const Head& head) const {
+  if (auto refusal = RefuseOtherThanGet(head)) return *std::move(refusal);
+  return parts_.console.Get(head);
 }
 
 WebApi::Begun WebApi::List(const Head& /*head*/) const { return list_; }

@@ -1,4 +1,5 @@
-// The resources of the server: the methods of the loaded modules, their list and description, and the health checks.
+// The resources of the server: the methods of the loaded modules, their list and description, the health checks,
+// and the console.
 #ifndef VORN_SERVER_WEB_API_H
 #define VORN_SERVER_WEB_API_H
 
@@ -15,6 +16,7 @@
 #include "authenticator.h"
 #include "browser_guard.h"
 #include "budget.h"
+#include "console.h"
 #include "http.h"
 #include "routes.h"
 #include "server_metrics.h"
@@ -43,6 +45,7 @@ class WebApi : public Service {
     const std::vector<MetricsSource>& figures;  // for "/metrics", beside those of the calls
     const Authenticator& authenticator;
     SignInCall::Environment sign_in;
+    const Console& console;
   };
 
   explicit WebApi(Parts parts);
@@ -67,6 +70,7 @@ class WebApi : public Service {
   Begun BeginFor(const CallerPtr& caller, const Page* page, const Head& head) const;
   Begun BeginSignIn(const Head& head) const;
   Begun BeginPage(const Page& page, const Head& head) const;
+  Begun BeginConsole(const Head& head) const;
   Begun List(const Head& head) const;
   Begun OpenApi(const Head& head) const;
   Begun Docs(const Head& head) const;

@@ -57,12 +57,6 @@ const std::string* FindHeader(const Response& response, std::string_view name) {
   return FindHeader(const_cast<Response&>(response), name);
 }
 
-// Another representation of the same data needs another strong tag (RFC 9110, 8.8.3.3).
-std::string CodedTag(const std::string& tag) {
-  if (tag.empty() || tag.front() != '"') return tag;
-  return tag.substr(0, tag.size() - 1) + std::string(kCodedSuffix);
-}
-
 // std::nullopt if zlib has no memory or the text does not become shorter.
 std::optional<std::string> Gzip(const std::string& text) {
   z_stream stream{};
@@ -155,6 +149,12 @@ std::string WriteHead(const AnswerForm& form, const Response& response, bool kee
     AddLine(&head, "Content-Length", std::to_string(size));
   }
   return head.append("\r\n");
+}
+
+// Another representation of the same data needs another strong tag (RFC 9110, 8.8.3.3).
+std::string CodedTag(const std::string& tag) {
+  if (tag.empty() || tag.front() != '"') return tag;
+  return tag.substr(0, tag.size() - 1) + std::string(kCodedSuffix);
 }
 
 std::string UncodedTag(std::string_view tag) {

@@ -34,6 +34,10 @@ Framing FramingOf(const AnswerForm& form, const Response& response);
 // The status line, all headers and the empty line after them.
 std::string WriteHead(const AnswerForm& form, const Response& response, bool keep_alive, std::string_view date);
 
+// The strong entity tag of a compressed answer; `tag` is the one of the same answer without a content coding. A weak
+// tag is the same for both.
+std::string CodedTag(const std::string& tag);
+
 // The entity tag of the same answer without a content coding: the transport gives a compressed answer a tag of its own,
 // and a client sends that back.
 std::string UncodedTag(std::string_view tag);

@@ -93,6 +93,7 @@ class WebApiTest : public testing::Test {
   Sessions sessions_{Sessions::Limits{}};
   PasswordChecker passwords_{{"/bin/false"}, PasswordChecker::Limits{}};
   const Authenticator authenticator_{tokens_, sessions_, {}};
+  const Console console_;
   Workers workers_{FewOfALane()};  // end before what their calls use
   WebApi api_{{routes_,
                *uploads_,
@@ -103,7 +104,8 @@ class WebApiTest : public testing::Test {
                metrics_,
                figures_,
                authenticator_,
-               {sessions_, passwords_}}};
+               {sessions_, passwords_},
+               console_}};
 };
 
 TEST_F(WebApiTest, CallsAMethodByPost) {

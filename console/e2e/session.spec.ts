@@ -1,0 +1,99 @@
+import { expect, signIn, test } from './base';
+
+test.describe('without a session', () => {
+  test.use({ foreseen: [/401 \(Unauthorized\)|503 \(Service Unavailable\)/] });
+
+  test('asks for an account, and says why it is refused', async ({ page, box, axe }) => {
+    await page.goto(box.url);
+    await expect(page.getByRole('heading', { name: 'Sign in to the storage console' })).toBeVisible();
+    await axe();
+    await page.getByLabel('Account').fill('nobody-of-this-name');
+    await page.getByLabel('Password').fill('Passphrase-of-nobody');
+    await page.getByRole('button', { name: 'Sign in' }).click();
+    await expect(page.getByText('Signing in failed')).toBeVisible();
+    await expect(page.getByText(/Error code (401|503)/)).toBeVisible();
+    await expect(page.getByLabel('Password')).toHaveValue('');
+  });
+
+  test('a code signs in once', async ({ page, box, context }) => {
+    await signIn(page, box);
+    expect(page.url()).not.toContain('code');
+    await expect(page.getByRole('heading', { name: 'Overview' })).toBeVisible();
+    const other = await context.newPage();
+    await other.goto(`${box.url}#code=${box.code}`);
+    await expect(other.getByText('Signing in failed')).toBeVisible();
+  });
+
+  test('signing out ends the session', async ({ page, box }) => {
+    await signIn(page, box);
+    const token = await page.evaluate(() => sessionStorage.getItem('session'));
+    await page.getByRole('button', { name: 'Sign out' }).click();
+    await expect(page.getByRole('heading', { name: 'Sign in to the storage console' })).toBeVisible();
+    expect(await page.evaluate(() => sessionStorage.getItem('session'))).toBeNull();
+    const answer = await fetch(`${box.url}api`, { headers: { Authorization: `Bearer ${token ?? ''}` } });
+    expect(answer.status).toBe(401);
+  });
+
+  test('the end of a session keeps what was typed', async ({ page, box, axe }) => {
+    await signIn(page, box, '/service');
+    await page.getByRole('textbox', { name: 'NFSv4 domain' }).fill('typed.example');
+    const [session] = (await box.call('VORN.Server.Session/v1/list', {})) as [{ id: string }];
+    await box.call('VORN.Server.Session/v1/end', { id: session.id });
+    await page.getByRole('button', { name: 'Review and save' }).click();
+    await expect(page.getByRole('dialog', { name: 'Your session has ended' })).toBeVisible();
+    await axe();
+  });
+});
+
+test('a reader sees everything and changes nothing', async ({ page, box, axe }) => {
+  const { token } = (await box.call('VORN.Server.Token/v1/create', { name: 'auditor', role: 'reader' })) as {
+    token: string;
+  };
+  await page.goto(`${box.url}docs`);
+  await page.evaluate((secret) => {
+    sessionStorage.setItem('session', secret);
+  }, token);
+  await page.goto(`${box.url}#/service`);
+  await expect(page.getByText('You may look, but not change anything')).toBeVisible();
+  await expect(page.getByText('Token auditor')).toBeVisible();
+  await expect(page.getByRole('textbox', { name: 'NFSv4 domain' })).toBeDisabled();
+  await expect(page.getByRole('switch', { name: 'NFS service' })).toBeDisabled();
+  await expect(page.getByRole('button', { name: 'Review and save' })).toHaveCount(0);
+  await axe();
+});
+
+test.describe('without a connection', () => {
+  test.use({ foreseen: [/Failed to load resource/] });
+
+  test('the page says so, and goes on when the box is back', async ({ page, box, axe }) => {
+    await signIn(page, box, '/service');
+    const domain = page.getByRole('textbox', { name: 'NFSv4 domain' });
+    await domain.fill('typed.example');
+    await page.route('**/*', (route) => route.abort());
+    await page.getByRole('button', { name: 'Review and save' }).click();
+    await expect(page.getByRole('heading', { name: 'The box does not answer.' })).toBeVisible();
+    await page.keyboard.press('Escape');
+    await expect(page.getByRole('heading', { name: 'The box does not answer' })).toBeVisible();
+    await axe();
+    await page.unroute('**/*');
+    await expect(page.getByRole('heading', { name: 'The box does not answer' })).toHaveCount(0);
+    await expect(domain).toHaveValue('typed.example');
+  });
+});
+
+test('speaks German', async ({ page, box }) => {
+  await signIn(page, box);
+  await page.getByLabel('Language').selectOption('de');
+  await expect(page.getByRole('heading', { name: 'Übersicht' })).toBeVisible();
+  await expect(page.locator('html')).toHaveAttribute('lang', 'de');
+  await page.reload();
+  await expect(page.getByRole('heading', { name: 'Übersicht' })).toBeVisible();
+});
+
+test('works by keyboard', async ({ page, box }) => {
+  await signIn(page, box);
+  await page.keyboard.press('Tab');
+  await expect(page.getByRole('link', { name: 'Skip to the content' })).toBeFocused();
+  await page.keyboard.press('Enter');
+  await expect(page.getByRole('main')).toBeFocused();
+});

@@ -1,0 +1,25 @@
+import { expect, open, picture, signIn, test } from './base';
+
+const PAGES = [
+  ['overview', '/', 'Overview'],
+  ['service', '/service', 'Service'],
+  ['advanced', '/advanced', 'Advanced'],
+] as const;
+
+// One test a view: signing in takes longer than a picture.
+test('all pages @view', async ({ page, box, axe }, { project }) => {
+  await signIn(page, box);
+  for (const [name, address, heading] of PAGES) {
+    await open(page, address);
+    await expect(page.getByRole('heading', { level: 1, name: heading })).toBeVisible();
+    await expect(page.locator('.pf-v6-c-skeleton')).toHaveCount(0);
+    await page.waitForLoadState('networkidle');
+    await picture(page, name, project.name);
+    await axe();
+    const { scroll, client } = await page.evaluate(() => ({
+      scroll: document.documentElement.scrollWidth,
+      client: document.documentElement.clientWidth,
+    }));
+    expect(scroll, `${name} scrolls sideways`).toBeLessThanOrEqual(client);
+  }
+});

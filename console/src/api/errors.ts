@@ -1,0 +1,25 @@
+// Written by scripts/console from the descriptions of the API.
+
+export const errorTexts: Record<number, string> = {
+  2301: /*i18n*/ "A parameter is missing, has the wrong type or a value that is not accepted.",
+  2302: /*i18n*/ "The system could not carry out the operation. Its log names the step that failed.",
+  2303: /*i18n*/ "A port conflicts with another service. Choose a port that nothing else uses.",
+  2330: /*i18n*/ "This system does not support Kerberos for NFS.",
+  2331: /*i18n*/ "The uploaded file is not a keytab. Export it again from the Kerberos server and upload that file unchanged.",
+  2332: /*i18n*/ "No keytab was uploaded. Choose the file to upload.",
+  2351: /*i18n*/ "A Kerberos principal is mapped to a local user already. Change or delete that mapping first.",
+  2352: /*i18n*/ "The name is not that of a local user.",
+  2353: /*i18n*/ "A Kerberos principal may not contain \"=\".",
+  2370: /*i18n*/ "The shared folder cannot be found.",
+  2371: /*i18n*/ "The shared folder contains a mounted file system that cannot be exported. Unmount it first.",
+  2372: /*i18n*/ "There is a shared folder with this name or this path already.",
+  2373: /*i18n*/ "The shared folder has export rules. Remove them first.",
+  2374: /*i18n*/ "There is no folder at this path.",
+  2380: /*i18n*/ "The box has no such user.",
+  2381: /*i18n*/ "The box has no such group.",
+  2390: /*i18n*/ "The history has no such change.",
+  2391: /*i18n*/ "Later changes touch the same lines.",
+  2392: /*i18n*/ "Without the change, a file would be faulty.",
+  2393: /*i18n*/ "A change of this kind cannot be taken back.",
+  2394: /*i18n*/ "The change was taken back already.",
+};

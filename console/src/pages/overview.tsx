@@ -1,0 +1,124 @@
+import { i18n } from '@lingui/core';
+import {
+  Card,
+  CardBody,
+  CardTitle,
+  Content,
+  DescriptionList,
+  DescriptionListDescription,
+  DescriptionListGroup,
+  DescriptionListTerm,
+  Gallery,
+  Label,
+} from '@patternfly/react-core';
+import type { ReactNode } from 'react';
+import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
+import { useRead } from '../shared/use-read';
+import { ChangeTable } from './changes';
+
+function Fact({ term, children }: { term: string; children: ReactNode }) {
+  return (
+    <DescriptionListGroup>
+      <DescriptionListTerm>{term}</DescriptionListTerm>
+      <DescriptionListDescription>{children}</DescriptionListDescription>
+    </DescriptionListGroup>
+  );
+}
+
+function OnOff({ on }: { on: boolean }) {
+  return <Label color={on ? 'green' : 'grey'}>{on ? i18n._('On') : i18n._('Off')}</Label>;
+}
+
+function ServiceCard() {
+  const service = useRead('VORN.Core.FileServ.NFS/v1/get', {});
+  const kerberos = useRead('VORN.Core.FileServ.NFS.Kerberos/v1/get', {});
+  return (
+    <Card>
+      <CardTitle component="h2">{i18n._('Service')}</CardTitle>
+      <CardBody>
+        <Loaded query={service}>
+          {({ data }) => (
+            <DescriptionList isCompact isHorizontal>
+              <Fact term={i18n._('NFS service')}>
+                <OnOff on={data.enable_nfs} /> {!data.enable_nfs && <a href="#/service">{i18n._('Switch it on')}</a>}
+              </Fact>
+              <Fact term={i18n._('NFSv4')}>
+                <OnOff on={data.enable_nfs_v4} />
+              </Fact>
+              <Fact term={i18n._('NFSv4 domain')}>{data.nfs_v4_domain || i18n._('none')}</Fact>
+              <Fact term={i18n._('Kerberos principal')}>
+                <Loaded query={kerberos}>{(answer) => answer.data.kerberos_principal || i18n._('none')}</Loaded>
+              </Fact>
+            </DescriptionList>
+          )}
+        </Loaded>
+      </CardBody>
+    </Card>
+  );
+}
+
+function SharesCard() {
+  const shares = useRead('VORN.Core.Share/v1/list', {});
+  return (
+    <Card>
+      <CardTitle component="h2">{i18n._('Shared folders')}</CardTitle>
+      <CardBody>
+        <Loaded query={shares}>
+          {({ data }) => {
+            const open = data.shares.filter((share) => share.rules > 0).length;
+            return (
+              <>
+                <Content component="p">
+                  {i18n._(
+                    '{n, plural, =0 {No client has access to a folder.} one {Clients have access to # folder of {total}.} other {Clients have access to # folders of {total}.}}',
+                    { n: open, total: data.total },
+                  )}
+                </Content>
+              </>
+            );
+          }}
+        </Loaded>
+      </CardBody>
+    </Card>
+  );
+}
+
+function ChangesCard() {
+  const changes = useRead('VORN.Core.FileServ.NFS.History/v1/list', { limit: 5 });
+  return (
+    <Card>
+      <CardTitle component="h2">{i18n._('Last changes')}</CardTitle>
+      <CardBody>
+        <Loaded query={changes}>
+          {({ data }) =>
+            data.changes.length === 0 ? (
+              <Content component="p">{i18n._('Nothing has been changed yet.')}</Content>
+            ) : (
+              <>
+                <ChangeTable changes={data.changes} label={i18n._('Last changes')} />
+              </>
+            )
+          }
+        </Loaded>
+      </CardBody>
+    </Card>
+  );
+}
+
+export default function OverviewPage() {
+  return (
+    <PageFrame
+      title={i18n._('Overview')}
+      purpose={i18n._('Whether NFS serves its clients, and what was changed last.')}
+    >
+      <div className="stack">
+        <ReadOnlyNotice />
+        <Gallery hasGutter minWidths={{ default: 'min(24rem, 100%)' }}>
+          <ServiceCard />
+          <SharesCard />
+        </Gallery>
+        <ChangesCard />
+      </div>
+    </PageFrame>
+  );
+}

@@ -1,0 +1,171 @@
+import { useState, type ReactNode } from 'react';
+import { useMutation, useQuery, useQueryClient } from '@tanstack/react-query';
+import { i18n } from '@lingui/core';
+import { Button, Modal, ModalBody, ModalFooter, ModalHeader, Spinner } from '@patternfly/react-core';
+import { call, Failure, type Answer, type Data, type Method, type Parameters } from '../api/call';
+import { Conflict, type Fact } from './conflict';
+import { readAgain, REHEARSAL } from './read-again';
+import { Problem, Warnings } from './problem';
+import { RehearsalView } from './rehearsal';
+import { toast } from './toasts';
+
+/** A changing call that has not been made yet. */
+export interface Change<M extends Method> {
+  method: M;
+  parameters: Parameters<M>;
+  /** The entity tag of the data that it changes; null if it may change any. */
+  tag: string | null;
+  form?: FormData;
+}
+
+/** How to decide between this change and one that somebody else made meanwhile. */
+interface Decision {
+  /** The values of this change, in words. */
+  mine: Fact[];
+  /** The values of the data that is stored now. */
+  describe: (stored: unknown) => Fact[];
+  /** Gives this change up, and shows what is stored. */
+  onTakeTheirs: () => void;
+}
+
+interface Props<M extends Method> {
+  title: string;
+  confirm: string;
+  done: string;
+  change: Change<M>;
+  decision?: Decision;
+  isDanger?: boolean;
+  onDone: (answer: Answer<Data<M>>) => void;
+  onClose: () => void;
+  children?: ReactNode;
+}
+
+/** Makes a change, and has everything that is shown read again. */
+export function useChange<M extends Method>(done: string, onDone: (answer: Answer<Data<M>>) => void) {
+  const client = useQueryClient();
+  return useMutation({
+    mutationFn: ({ method, parameters, tag, form }: Change<M>) =>
+      call(method, parameters, { ifMatch: tag, ...(form && { form }) }),
+    onSuccess: async (answer) => {
+      await readAgain(client);
+      toast(done, answer.warnings);
+      onDone(answer);
+    },
+  });
+}
+
+function useRehearsal<M extends Method>({ method, parameters, tag, form }: Change<M>) {
+  const [attempt] = useState(() => crypto.randomUUID());
+  return useQuery({
+    queryKey: [REHEARSAL, method, tag, attempt],
+    queryFn: ({ signal }) => call(method, parameters, { ifMatch: tag, rehearse: true, signal, ...(form && { form }) }),
+    staleTime: Infinity,
+    gcTime: 0,
+  });
+}
+
+const conflictOf = (error: unknown) => (error instanceof Failure && error.isConflict ? error : null);
+
+/** Shows what a change would do, and makes it if that is wanted. */
+export function ChangeDialog<M extends Method>(props: Props<M>) {
+  const { title, confirm, done, decision, isDanger = false, onDone, onClose, children } = props;
+  const [tag, setTag] = useState(props.change.tag);
+  const change = { ...props.change, tag };
+  const rehearsal = useRehearsal(change);
+  const save = useChange<M>(done, onDone);
+  const error = save.error ?? rehearsal.error;
+  const conflict = conflictOf(error);
+  const client = useQueryClient();
+  const takeTheirs = () => {
+    decision?.onTakeTheirs();
+    void readAgain(client);
+  };
+  const keepMine = () => {
+    save.reset();
+    setTag(conflict?.tag ?? null);
+  };
+  return (
+    <Modal isOpen variant="medium" onClose={onClose} aria-labelledby="change-title">
+      <ModalHeader title={title} labelId="change-title" />
+      <ModalBody tabIndex={0}>
+        {children}
+        {rehearsal.isPending && <Spinner size="lg" aria-label={i18n._('Finding out what would change')} />}
+        {conflict && decision && <Conflict mine={decision.mine} theirs={decision.describe(conflict.details)} />}
+        {error && !(conflict && decision) && <Problem error={error} />}
+        {!error && rehearsal.data?.rehearsal && (
+          <>
+            <Warnings warnings={rehearsal.data.warnings} />
+            <RehearsalView rehearsal={rehearsal.data.rehearsal} />
+          </>
+        )}
+      </ModalBody>
+      <ModalFooter>
+        {conflict && decision ? (
+          <>
+            <Button onClick={keepMine}>{i18n._('Keep mine')}</Button>
+            <Button variant="secondary" onClick={takeTheirs}>
+              {i18n._('Take what is stored')}
+            </Button>
+          </>
+        ) : (
+          <Button
+            variant={isDanger ? 'danger' : 'primary'}
+            isLoading={save.isPending}
+            isDisabled={!rehearsal.isSuccess || save.isPending}
+            onClick={() => {
+              save.mutate(change);
+            }}
+          >
+            {confirm}
+          </Button>
+        )}
+        <Button variant="link" onClick={onClose}>
+          {i18n._('Cancel')}
+        </Button>
+      </ModalFooter>
+    </Modal>
+  );
+}
+
+/** Asks before a change that cannot be rehearsed. */
+export function ConfirmDialog<M extends Method>({
+  title,
+  confirm,
+  done,
+  change,
+  onClose,
+  children,
+}: {
+  title: string;
+  confirm: string;
+  done: string;
+  change: Change<M>;
+  onClose: () => void;
+  children: ReactNode;
+}) {
+  const save = useChange<M>(done, onClose);
+  return (
+    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="confirm-title">
+      <ModalHeader title={title} labelId="confirm-title" />
+      <ModalBody>
+        {save.error && <Problem error={save.error} />}
+        {children}
+      </ModalBody>
+      <ModalFooter>
+        <Button
+          variant="danger"
+          isLoading={save.isPending}
+          isDisabled={save.isPending}
+          onClick={() => {
+            save.mutate(change);
+          }}
+        >
+          {confirm}
+        </Button>
+        <Button variant="link" onClick={onClose}>
+          {i18n._('Cancel')}
+        </Button>
+      </ModalFooter>
+    </Modal>
+  );
+}

@@ -1,0 +1,166 @@
+// Fields of forms. All of them are switched off for readers.
+import { useId, type ReactNode } from 'react';
+import {
+  FormGroup,
+  FormHelperText,
+  FormSelect,
+  FormSelectOption,
+  HelperText,
+  HelperTextItem,
+  Switch,
+  TextInput,
+} from '@patternfly/react-core';
+import { useMayWrite } from '../session/session';
+
+interface FieldProps {
+  label: string;
+  help?: ReactNode;
+  error?: string | undefined;
+  isDisabled?: boolean;
+}
+
+function Help({ id, help, error }: { id: string; help?: ReactNode; error?: string | undefined }) {
+  if (!help && !error) return null;
+  return (
+    <FormHelperText>
+      <HelperText id={id} isLiveRegion={error !== undefined}>
+        {error ? <HelperTextItem variant="error">{error}</HelperTextItem> : <HelperTextItem>{help}</HelperTextItem>}
+      </HelperText>
+    </FormHelperText>
+  );
+}
+
+export function SwitchField({
+  label,
+  help,
+  isDisabled,
+  value,
+  onChange,
+}: FieldProps & {
+  value: boolean;
+  onChange: (value: boolean) => void;
+}) {
+  const id = useId();
+  const mayWrite = useMayWrite();
+  return (
+    <FormGroup>
+      <Switch
+        id={id}
+        label={label}
+        aria-describedby={`${id}-help`}
+        isChecked={value}
+        isDisabled={isDisabled === true || !mayWrite}
+        onChange={(_event, checked) => {
+          onChange(checked);
+        }}
+      />
+      <Help id={`${id}-help`} help={help} />
+    </FormGroup>
+  );
+}
+
+export function TextField({
+  label,
+  help,
+  error,
+  isDisabled,
+  value,
+  onChange,
+  isRequired = false,
+  type = 'text',
+  list,
+}: FieldProps & {
+  value: string;
+  onChange: (value: string) => void;
+  isRequired?: boolean;
+  type?: 'text' | 'number';
+  /** The id of a <datalist>. */
+  list?: string;
+}) {
+  const id = useId();
+  const mayWrite = useMayWrite();
+  return (
+    <FormGroup label={label} fieldId={id} isRequired={isRequired}>
+      <TextInput
+        id={id}
+        type={type}
+        value={value}
+        list={list}
+        isRequired={isRequired}
+        autoComplete="off"
+        spellCheck={false}
+        aria-describedby={`${id}-help`}
+        isDisabled={isDisabled === true || !mayWrite}
+        validated={error ? 'error' : 'default'}
+        onChange={(_event, text) => {
+          onChange(text);
+        }}
+      />
+      <Help id={`${id}-help`} help={help} error={error} />
+    </FormGroup>
+  );
+}
+
+/** A whole number; NaN while the field has none. */
+export function NumberField({
+  value,
+  onChange,
+  ...field
+}: FieldProps & {
+  value: number;
+  onChange: (value: number) => void;
+}) {
+  return (
+    <TextField
+      {...field}
+      type="number"
+      value={Number.isNaN(value) ? '' : String(value)}
+      onChange={(text) => {
+        onChange(/^-?\d+$/.test(text) ? Number(text) : NaN);
+      }}
+    />
+  );
+}
+
+export interface Choice<T extends string | number> {
+  value: T;
+  text: string;
+}
+
+export function ChoiceField<T extends string | number>({
+  label,
+  help,
+  isDisabled,
+  value,
+  choices,
+  onChange,
+  needsRight = true,
+}: FieldProps & {
+  value: T;
+  choices: Choice<T>[];
+  onChange: (value: T) => void;
+  /** Whether the field is switched off for readers. */
+  needsRight?: boolean;
+}) {
+  const id = useId();
+  const mayWrite = useMayWrite() || !needsRight;
+  return (
+    <FormGroup label={label} fieldId={id}>
+      <FormSelect
+        id={id}
+        value={value}
+        aria-describedby={`${id}-help`}
+        isDisabled={isDisabled === true || !mayWrite}
+        onChange={(_event, text) => {
+          const chosen = choices.find((choice) => String(choice.value) === text);
+          if (chosen) onChange(chosen.value);
+        }}
+      >
+        {choices.map((choice) => (
+          <FormSelectOption key={choice.value} value={choice.value} label={choice.text} />
+        ))}
+      </FormSelect>
+      <Help id={`${id}-help`} help={help} />
+    </FormGroup>
+  );
+}

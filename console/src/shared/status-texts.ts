@@ -1,0 +1,21 @@
+// Texts for the statuses of the server itself. The texts of the answers are written for programs.
+export const statusTexts: Record<number, string> = {
+  400: /*i18n*/ 'The server did not understand the request.',
+  401: /*i18n*/ 'The account or the password is wrong, or the session has ended.',
+  403: /*i18n*/ 'You may not do this.',
+  404: /*i18n*/ 'This does not exist, or no longer.',
+  405: /*i18n*/ 'The server does not offer this.',
+  408: /*i18n*/ 'The request did not arrive in time.',
+  409: /*i18n*/ 'This is not possible at the moment.',
+  412: /*i18n*/ 'Somebody else has changed the settings meanwhile.',
+  413: /*i18n*/ 'The request is too large.',
+  415: /*i18n*/ 'The server does not accept this kind of data.',
+  417: /*i18n*/ 'The server did not understand the request.',
+  421: /*i18n*/ 'The server does not know the name in the address line.',
+  429: /*i18n*/ 'There were too many attempts to sign in.',
+  431: /*i18n*/ 'The browser sent too many headers.',
+  500: /*i18n*/ 'The server failed to answer.',
+  501: /*i18n*/ 'The server does not offer this.',
+  503: /*i18n*/ 'The server is busy or stopping.',
+  504: /*i18n*/ 'The operation takes longer than a minute. It goes on.',
+};

@@ -12,6 +12,8 @@ class Exit(enum.IntEnum):
     NOT_PERMITTED = 3  # the credentials are missing, wrong, or not enough
     NO_CONNECTION = 4  # the box cannot be reached, or its certificate is not the known one
     CHANGED_MEANWHILE = 5  # somebody else changed the same thing; nothing was done
+    HEALTH_WARNINGS = 6  # only "vorn health": the worst finding is a warning
+    HEALTH_ERRORS = 7  # only "vorn health": the worst finding is an error
     USAGE = 64  # the command line is wrong; nothing was done
 
 

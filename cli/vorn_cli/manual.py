@@ -13,6 +13,8 @@ _STATUS = {
     Exit.NOT_PERMITTED: "The credentials are missing or wrong, or do not permit the call.",
     Exit.NO_CONNECTION: "The box cannot be reached, or its certificate is not the known one.",
     Exit.CHANGED_MEANWHILE: "Somebody else changed the same thing meanwhile. The call changed nothing.",
+    Exit.HEALTH_WARNINGS: "Only \"vorn health\": the worst finding is a warning.",
+    Exit.HEALTH_ERRORS: "Only \"vorn health\": the worst finding is an error.",
     Exit.USAGE: "The command line is wrong. Nothing was done.",
 }
 

@@ -1,8 +1,15 @@
 #include "metrics.h"
 
+#include <chrono>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
 #include <string>
 
 #include "current_box.h"
+#include "health.h"
+#include "health_counts.h"
 #include "kernel_statistics.h"
 
 namespace VORN {
@@ -65,12 +72,36 @@ void AddOperations(const vorn::KernelStatistics& kernel, List* list) {
   }
 }
 
+// The last check of the current root. Never destroyed: other threads may still read figures while the process exits.
+vorn::RecentHealth& HealthOf(const std::string& root) {
+  constexpr std::chrono::minutes kAge{1};
+  static auto* mutex = new std::mutex;
+  static auto* checks = new std::map<std::string, std::unique_ptr<vorn::RecentHealth>>;
+  const std::lock_guard lock(*mutex);
+  std::unique_ptr<vorn::RecentHealth>& recent = (*checks)[root];
+  if (recent == nullptr) recent = std::make_unique<vorn::RecentHealth>(CheckHealth, kAge);
+  return *recent;
+}
+
+void AddHealth(const vorn::Box& box, List* list) {
+  const std::optional<vorn::HealthCounts> counts = HealthOf(box.root().directory()).Get();
+  if (!counts) return;
+  for (const auto& [finding, count] : counts->findings) {
+    list->Gauge("vorn_health_findings", "Findings of the last check by kind and severity", count,
+                {{"kind", finding.first}, {"severity", finding.second}});
+  }
+  for (const auto& [kind, count] : counts->not_checked) {
+    list->Gauge("vorn_health_not_checked", "Checks that could not be made, or not completely", count, {{"kind", kind}});
+  }
+}
+
 }  // namespace
 
 std::vector<Metric> ReadMetrics() {
   List list;
   vorn::Box& box = vorn::CurrentBox();
   AddEnabledState(box, &list);
+  AddHealth(box, &list);
   const vorn::Result<vorn::StoredFile> file = box.Read(vorn::kKernelStatistics);
   if (!file.ok() || !file->version.exists) return list.Take();
   const vorn::KernelStatistics kernel = vorn::ParseKernelStatistics(file->text);

@@ -126,6 +126,42 @@ class ExplainTest(BoxTest):
         self.refuses("explain data 10.0.0.5 --security sis", Exit.USAGE, "sis")
 
 
+class HealthTest(BoxTest):
+    """vorn health."""
+
+    def write(self, path, text):
+        file = self.server.root / path
+        file.parent.mkdir(parents=True, exist_ok=True)
+        file.write_text(text, "utf-8")
+
+    def test_ends_well_on_a_box_that_has_only_notices(self):
+        shown = self.vorn("health")
+        self.assertIn("notice: shared_file_system: backup\n", shown)
+        self.assertIn("not checked: closed_port: ", shown)
+        self.assertIn("The box has 1 notice.", shown)
+        self.assertIn("Nothing is wrong as far as it was checked.", self.vorn("health --severity warning"))
+        self.assertEqual(self.json("health --kind left_share")["total"], 0)
+
+    def test_tells_the_worst_finding_by_its_status(self):
+        self.write("etc/idmapd.conf", "[Translation]\nMethod = static\n[Static]\nroot@X = root\n")
+        done = self.refuses("health", Exit.HEALTH_WARNINGS, "The box has 1 warning, 1 notice.")
+        self.assertIn("warning: mapping_to_root: root@X /etc/idmapd.conf:4\n", done.stdout)
+        self.assertIn("""vorn call VORN.Core.FileServ.NFS.IDMap v1/delete '{"id": ["root@X"]}'""", done.stdout)
+        self.write("etc/exports", "/volume1/data *(foo)\n")
+        done = self.refuses("--json health --share data", Exit.HEALTH_ERRORS, "The box has 1 error.")
+        self.assertEqual(json.loads(done.stdout)["findings"][0]["kind"], "exports_fault")
+
+    def test_prints_a_call_that_can_be_run(self):
+        self.write("etc/idmapd.conf", "[Translation]\nMethod = static\n[Static]\nroot@X = root\n")
+        done = self.run_vorn("health --kind mapping_to_root")
+        line = next(line for line in done.stdout.splitlines() if line.startswith("    vorn call "))
+        self.vorn(line.removeprefix("    vorn "))
+        self.assertEqual(self.json("health --kind mapping_to_root")["findings"], [])
+
+    def test_refuses_what_is_no_question(self):
+        self.refuses("health --severity fatal", Exit.USAGE, "fatal")
+
+
 class HistoryTest(BoxTest):
     """vorn history, vorn undo, vorn audit."""
 

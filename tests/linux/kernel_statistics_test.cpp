@@ -79,20 +79,34 @@ std::vector<std::string> NamesOfMetrics() {
   return names;
 }
 
-TEST(Metrics, OfABoxWithoutANfsServerHaveTheEnabledStateAlone) {
+TEST(Metrics, OfABoxWithoutANfsServerHaveTheEnabledStateAndItsHealth) {
   const TemporaryRoot root;
   root.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\n");
-  EXPECT_THAT(NamesOfMetrics(), testing::ElementsAre("vorn_nfs_enabled"));
+  EXPECT_THAT(NamesOfMetrics(), testing::ElementsAre("vorn_nfs_enabled", "vorn_health_not_checked"));
 }
 
 TEST(Metrics, AreGroupedByName) {
   const TemporaryRoot root;
   root.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\n");
   root.Write("/proc/net/rpc/nfsd", kText);
-  EXPECT_THAT(NamesOfMetrics(), testing::ElementsAre("vorn_nfs_enabled", "vorn_nfs_threads", "vorn_nfs_bytes_total",
-                                                     "vorn_nfs_tcp_connections_total", "vorn_nfs_rpc_calls_total",
-                                                     "vorn_nfs_rpc_refused_total", "vorn_nfs_reply_cache_total",
-                                                     "vorn_nfs_operations_total"));
+  EXPECT_THAT(NamesOfMetrics(), testing::ElementsAre("vorn_nfs_enabled", "vorn_health_not_checked", "vorn_nfs_threads",
+                                                     "vorn_nfs_bytes_total", "vorn_nfs_tcp_connections_total",
+                                                     "vorn_nfs_rpc_calls_total", "vorn_nfs_rpc_refused_total",
+                                                     "vorn_nfs_reply_cache_total", "vorn_nfs_operations_total"));
+}
+
+TEST(Metrics, CountTheFindingsOfTheLastCheck) {
+  const TemporaryRoot root;
+  root.Write("/etc/vorn/platform.conf", "[platform]\nservice_engine = local\n");
+  root.Write("/etc/vorn/shares.conf", "[shares]\na = /srv/a\nb = /srv/b\n");
+  for (int i = 0; i < 2; ++i) {
+    std::map<std::string, double> findings;
+    for (const VORN::Metric& metric : VORN::ReadMetrics()) {
+      if (metric.name == "vorn_health_findings") findings[metric.labels[0].second] = metric.value;
+    }
+    EXPECT_EQ(findings, (std::map<std::string, double>{{"missing_folder", 2}}));
+    root.Write("/srv/a/file", "");  // the check is not made again
+  }
 }
 
 }  // namespace

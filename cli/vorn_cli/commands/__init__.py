@@ -1,6 +1,6 @@
 """All commands, in the order of the help."""
 
-from . import access, calls, explain, exports, history, idmap, keytab, service, shares, state
+from . import access, calls, explain, exports, health, history, idmap, keytab, service, shares, state
 
 GROUPS = {
     "nfs": "the NFS service",
@@ -13,5 +13,5 @@ GROUPS = {
     "session": "sessions of people",
 }
 
-COMMANDS = (service.COMMANDS + exports.COMMANDS + explain.COMMANDS + idmap.COMMANDS + keytab.COMMANDS + shares.COMMANDS + state.COMMANDS +
+COMMANDS = (service.COMMANDS + exports.COMMANDS + explain.COMMANDS + health.COMMANDS + idmap.COMMANDS + keytab.COMMANDS + shares.COMMANDS + state.COMMANDS +
             history.COMMANDS + access.COMMANDS + calls.COMMANDS)

@@ -17,13 +17,6 @@
 namespace vorn {
 namespace {
 
-// Whether the kernel's server runs. Fails where no kernel's server can be seen.
-Result<bool> IsServingHere(Box& box) {
-  if (IsServing(box)) return true;
-  if (box.Exists("/proc/net/rpc")) return false;
-  return Status::Failure(kUnsupported, "The kernel's NFS server cannot be seen from here.");
-}
-
 // Says which lines of its file exportfs(8) does not reach because of a fault. `faulty` is the index of the line, and
 // `end` of the first line of another file.
 std::string DescribeHidden(const HealthInput& input, std::size_t faulty, std::size_t end) {
@@ -44,9 +37,8 @@ std::map<const ExportsFile*, std::size_t> EndsOfFiles(const HealthInput& input) 
 }  // namespace
 
 Status FindExportsNotInForce(const HealthInput& input, Findings* findings) {
-  const Result<bool> is_serving = IsServingHere(input.box);
-  if (!is_serving.ok()) return is_serving.status();
-  if (!*is_serving) return {};  // a start reads the files
+  if (Status status = CheckKernelIsSeen(input.box); !status.ok()) return status;
+  if (!IsServing(input.box)) return {};  // a start reads the files
   const Result<StoredFile> table = input.box.Read(kExportTable);
   if (!table.ok()) return table.status();
   const Result<HostAddresses> hosts = ReadExportHosts(input.box);

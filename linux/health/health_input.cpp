@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "box_paths.h"
+#include "kernel_statistics.h"
 #include "path_resolver.h"
 
 namespace vorn {
@@ -72,6 +73,11 @@ std::optional<dev_t> DeviceOfFolder(const Box& box, const std::string& path) {
   struct stat folder {};
   if (!location.ok() || stat(location->c_str(), &folder) != 0 || !S_ISDIR(folder.st_mode)) return std::nullopt;
   return folder.st_dev;
+}
+
+Status CheckKernelIsSeen(const Box& box) {
+  if (box.root().is_box() || box.Exists(kKernelStatistics)) return {};
+  return Status::Failure(kUnsupported, "The kernel's NFS server cannot be seen from here.");
 }
 
 VORN::HealthSubject ExportedLine::Subject() const {

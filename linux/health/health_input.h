@@ -22,6 +22,9 @@ namespace vorn {
 // The file system of a folder of the box; nullopt if there is no folder.
 std::optional<dev_t> DeviceOfFolder(const Box& box, const std::string& path);
 
+// Fails with the reason if the box is a folder without the files of a kernel's NFS server.
+Status CheckKernelIsSeen(const Box& box);
+
 // A line of a file of exports(5).
 struct ExportedLine {
   const ExportsFile* file = nullptr;

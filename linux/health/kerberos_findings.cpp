@@ -108,9 +108,10 @@ Status FindWeakKeys(const HealthInput& input, Findings* findings) {
     if (IsWeak(key.enc_type)) weak.emplace(key.principal, key.enc_type);
   }
   for (const auto& [principal, type] : weak) {
-    findings->Warning(OfKeytab(),
-                      "The keytab has a key of " + principal + " of the type " + type +
-                          ", which is deprecated: whoever records the traffic may find the key.",
+    std::string text = "The keytab has a key of ";
+    text.append(principal).append(" of the type ").append(type);
+    text += ", which is deprecated: whoever records the traffic may find the key.";
+    findings->Warning(OfKeytab(), std::move(text),
                       "Make keys of an AES type for the principal, and upload the new keytab.");
   }
   return {};

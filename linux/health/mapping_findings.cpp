@@ -77,12 +77,11 @@ Status FindMappingsToNobody(const HealthInput& input, Findings* findings) {
   for (std::size_t at = 0; at < pairs.size(); ++at) {
     const auto& [principal, name] = pairs[at];
     if (ids->count(name) != 0) continue;
+    std::string text = principal;
+    text.append(" is mapped to the user ").append(name);
+    text += ", who does not exist: the server refuses it, or takes it for nobody.";
     findings
-        ->Warning(SubjectOf(input.box, **map, at),
-                  principal + " is mapped to the user " + name +
-                      ", who does not exist: the server refuses it, or "
-                      "takes it for nobody.",
-                  "Map it to another user, or remove the mapping.")
+        ->Warning(SubjectOf(input.box, **map, at), std::move(text), "Map it to another user, or remove the mapping.")
         .call = RemoveMapping(principal);
   }
   return {};

@@ -187,9 +187,10 @@ Status FindNestedShares(const HealthInput& input, Findings* findings) {
     const std::vector<std::string> clients = ForeignClients(around, RulesByClientOf(input, lines->second));
     if (clients.empty()) continue;
     const ExportedLine& line = input.exported[lines->second.front()];
-    findings->Warning(line.Subject(),
-                      "The share \"" + share.name + "\" is inside " + outer + ", which is exported, too. Over NFSv4 " +
-                          Join(clients) + " reaches it with the rights of " + outer + ", whatever its own rules say.",
+    std::string text = "The share \"" + share.name + "\" is inside " + outer;
+    text.append(", which is exported, too. Over NFSv4 ").append(Join(clients));
+    text.append(" reaches it with the rights of ").append(outer).append(", whatever its own rules say.");
+    findings->Warning(line.Subject(), std::move(text),
                       "Give both the same rules, or put the share on a file system of its own.");
   }
   return {};

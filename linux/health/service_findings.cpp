@@ -15,7 +15,6 @@
 
 #include "configured_ports.h"
 #include "firewall_table.h"
-#include "kernel_statistics.h"
 #include "nfs_configuration.h"
 #include "nfs_settings.h"
 #include "service_checks.h"
@@ -97,9 +96,7 @@ Status FindStoppedService(const HealthInput& input, Findings* findings) {
   const Result<bool> is_enabled = (*engine)->IsEnabled();
   if (!is_enabled.ok()) return is_enabled.status();
   if (!*is_enabled || IsServing(input.box)) return {};
-  if (!input.box.root().is_box() && !input.box.Exists(kKernelStatistics)) {
-    return Status::Failure(kUnsupported, "The kernel's NFS server cannot be seen from here.");
-  }
+  if (Status status = CheckKernelIsSeen(input.box); !status.ok()) return status;
   findings->Error(
       {}, "NFS is switched on and does not serve: clients wait." + WhyItDoesNotStart(input.box),
       "Correct the cause and restart NFS; \"systemctl status nfs-server\" shows the log of the last start.");

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <charconv>
 #include <utility>
@@ -64,6 +65,7 @@ Result<std::vector<KernelClient>> KernelClients::List() const {
     if (!text.ok()) return text.status();
     clients.push_back({*number, ParseClientInfo(*text)});
   }
+  std::sort(clients.begin(), clients.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
   return clients;
 }
 

@@ -27,7 +27,8 @@ class KernelClients {
   // `folder` is kKernelClients on a box.
   explicit KernelClients(std::string folder) : folder_(std::move(folder)) {}
 
-  // Returns the clients; none if there is no such folder. A client that leaves meanwhile is not among them.
+  // Returns the clients in the order of their numbers; none if there is no such folder. A client that leaves meanwhile
+  // is not among them.
   Result<std::vector<KernelClient>> List() const;
 
   // Counts the client's states; nullopt if the client has left, or they are more than 64 MiB.

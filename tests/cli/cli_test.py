@@ -162,6 +162,42 @@ class HealthTest(BoxTest):
         self.refuses("health --severity fatal", Exit.USAGE, "fatal")
 
 
+class ClientsTest(BoxTest):
+    """vorn clients. The trial root has one client of NFSv4."""
+
+    def add_client(self, number, address):
+        """Adds a client of NFSv4 to the kernel of the trial root."""
+        folder = self.server.root / "proc/fs/nfsd/clients" / str(number)
+        folder.mkdir()
+        (folder / "info").write_text(f'clientid: 0x{number:x}\naddress: "{address}:871"\nname: "c{number}"\n', "ascii")
+        (folder / "ctl").touch()
+        return folder / "ctl"
+
+    def test_lists_clients(self):
+        shown = self.vorn("clients list")
+        self.assertRegex(shown, r"(?m)^10\.0\.0\.5 +4\.2 +confirmed .* 2 +1 +/volume1/data +- +7 +Linux NFSv4\.2 work05")
+        self.assertEqual(self.json("clients list --filter work05")[0]["client_id"], "0x2e7d35d86553f100")
+        self.assertEqual(self.json("clients list --filter nobody"), [])
+        self.add_client(8, "10.0.0.6")
+        self.assertEqual([client["id"] for client in self.json("clients list")], [7, 8])
+        self.assertEqual([client["id"] for client in self.json("clients list --offset 1")], [8])
+        self.assertIn("1 of 2", self.vorn("clients list --limit 1"))
+        self.refuses("clients list --limit -1", Exit.USAGE, "not negative")
+
+    def test_disconnects_one_client(self):
+        control = self.server.root / "proc/fs/nfsd/clients/7/ctl"
+        self.assertIn("disconnect: The client loses", self.vorn("clients disconnect 10.0.0.5 --rehearse"))
+        self.assertEqual(control.read_text("ascii"), "")
+        self.assertIn("has ended", self.vorn("clients disconnect 10.0.0.5"))
+        self.assertEqual(control.read_text("ascii"), "expire\n")
+        self.assertEqual(self.json("history")[0]["actions"], ["disconnect: done"])
+        second = self.add_client(8, "10.0.0.5")
+        self.refuses("clients disconnect 10.0.0.5", Exit.USAGE, "several clients of NFSv4: name one of 7, 8")
+        self.vorn("clients disconnect 8")
+        self.assertEqual(second.read_text("ascii"), "expire\n")
+        self.refuses("clients disconnect 10.0.0.9", Exit.FAILED, "no client of NFSv4")
+
+
 class HistoryTest(BoxTest):
     """vorn history, vorn undo, vorn audit."""
 

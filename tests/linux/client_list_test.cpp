@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
 #include <ctime>
 #include <string>
 #include <vector>
@@ -143,6 +144,14 @@ TEST_F(ClientList, IsOrderedByAddressAndPaged) {
   EXPECT_THAT(List("", 6, 100), IsEmpty());
   EXPECT_THAT(List("", 100, 100), IsEmpty());
   EXPECT_THAT(List("", 0, 0), IsEmpty());
+}
+
+TEST_F(ClientList, HasTheClientsOfAnAddressInTheOrderOfTheirNumbers) {
+  for (const int number : {30, 4, 100, 9}) AddClient(number, "0x9", "10.9.0.20:871", "same", 2);
+  List("10.9.0.20");
+  std::vector<std::uint64_t> numbers;
+  for (const VORN::NFSClient& client : clients_) numbers.push_back(client.id.value_or(0));
+  EXPECT_THAT(numbers, ElementsAre(4, 9, 30, 100));
 }
 
 TEST_F(ClientList, IsFilteredByTextOfTheClient) {

@@ -28,7 +28,7 @@ struct ClientExport {
 // Requests of a client that were turned away.
 struct ClientRefusal {
   std::string path;                  // what the client asked for; empty if it is not known
-  std::string reason;                // "no_rule", "not_exported", "port", "path" or "name"
+  std::string reason;                // "no_rule", "not_exported", "port" or "path"
   std::string text;                  // a sentence that says so
   int count = 0;                     // 0: not known
   std::optional<std::int64_t> last;  // the time of the last request, in seconds since the epoch
@@ -57,7 +57,7 @@ struct NFSClient {
   std::optional<std::uint64_t> delegations;
 
   std::vector<ClientExport> exports;    // in the order of their paths
-  std::vector<ClientRefusal> refusals;  // of the address, in the order of their paths
+  std::vector<ClientRefusal> refusals;  // of the address, in the order of their paths; the newest of many
 };
 
 enum : int {

@@ -51,6 +51,7 @@ struct Sources {
   std::vector<RecordedMount> mounts;
   ServedExports served;
   ExportTraffics traffics;
+  const MountLog* log = nullptr;
 };
 
 Result<std::string> ReadText(Box& box, const char* path) {
@@ -121,23 +122,46 @@ std::vector<VORN::ClientExport> ExportsOf(const Sources& sources, const std::str
   return exports;
 }
 
-std::vector<VORN::ClientRefusal> RefusalsOf(const ServedExports& served, const std::string& address) {
-  std::vector<VORN::ClientRefusal> refusals;
-  if (served.refused.count(address) != 0) {
-    refusals.push_back({"", "no_rule", "No export rule is for this address.", 0, {}});
+const char* SentenceOf(const std::string& reason) {
+  if (reason == "no_rule") return "No export rule is for this address.";
+  if (reason == "port") return "The export rule accepts requests from reserved ports only.";
+  return reason == "path" ? "There is no such path." : "The path is not exported to this address.";
+}
+
+// The refusals that mountd has logged.
+void AddLogged(const MountLog& log, const std::string& address, std::vector<VORN::ClientRefusal>* refusals) {
+  const auto logged = log.refused.find(address);
+  if (logged == log.refused.end()) return;
+  for (const auto& [request, refused] : logged->second) {
+    const auto& [path, reason] = request;
+    refusals->push_back({ToValidUtf8(path), reason, SentenceOf(reason), refused.count, refused.last});
   }
+}
+
+// The refusals that the kernel's server remembers.
+void AddRemembered(const ServedExports& served, const std::string& address,
+                   std::vector<VORN::ClientRefusal>* refusals) {
+  if (served.refused.count(address) != 0) refusals->push_back({"", "no_rule", SentenceOf("no_rule"), 0, {}});
   const auto rule = served.rules.find(address);
-  if (rule == served.rules.end()) return refusals;
+  if (rule == served.rules.end()) return;
   const auto paths = served.unserved.find(rule->second);
-  if (paths == served.unserved.end()) return refusals;
+  if (paths == served.unserved.end()) return;
   for (const std::string& path : paths->second) {
-    const std::string clients = ToValidUtf8(rule->second);
-    refusals.push_back({ToValidUtf8(path),
-                        "not_exported",
-                        "A client of \"" + clients + "\" asked for a path that is not exported to it.",
-                        0,
-                        {}});
+    refusals->push_back({ToValidUtf8(path),
+                         "not_exported",
+                         "A client of the rule \"" + ToValidUtf8(rule->second) +
+                             "\" asked for a path that is not exported to these clients.",
+                         0,
+                         {}});
   }
+}
+
+std::vector<VORN::ClientRefusal> RefusalsOf(const Sources& sources, const std::string& address) {
+  std::vector<VORN::ClientRefusal> refusals;
+  AddRemembered(sources.served, address, &refusals);
+  AddLogged(*sources.log, address, &refusals);
+  const auto by_path = [](const auto& a, const auto& b) { return a.path < b.path; };
+  std::stable_sort(refusals.begin(), refusals.end(), by_path);
   return refusals;
 }
 
@@ -168,6 +192,7 @@ class Rows {
     for (const auto& [client, paths] : mounts_) Add(client, "3", connected_.count(client) ? "connected" : "mounted");
     for (const std::string& address : connected_) AddUnknown(address, "connected");
     for (const std::string& address : sources_.served.refused) AddUnknown(address, "refused");
+    for (const auto& [address, refused] : sources_.log->refused) AddUnknown(address, "refused");
     return std::move(rows_);
   }
 
@@ -190,6 +215,8 @@ class Rows {
     const std::string order = OrderOf(client);
     (order[0] == '9' ? row.name : row.address) = ToValidUtf8(client);
     row.version = version;
+    const auto admitted = sources_.log->admitted.find(client);
+    if (row.version == "3" && admitted != sources_.log->admitted.end()) row.since = admitted->second;
     row.state = state;
     Add(std::move(row), nullptr);
   }
@@ -199,7 +226,7 @@ class Rows {
     addresses_.insert(address);
     const auto mounts = kernel == nullptr ? mounts_.find(address.empty() ? client.name : address) : mounts_.end();
     client.exports = ExportsOf(sources_, address, mounts == mounts_.end() ? no_mounts_ : mounts->second);
-    client.refusals = RefusalsOf(sources_.served, address);
+    client.refusals = RefusalsOf(sources_, address);
     std::string order = OrderOf(address);
     rows_.push_back({std::move(client), std::move(order), kernel});
   }
@@ -239,12 +266,14 @@ void Complete(const KernelClients& kernel, Row* row) {
 
 }  // namespace
 
-Result<ClientPage> ListClients(Box& box, const std::string& filter, std::size_t offset, std::size_t limit) {
+Result<ClientPage> ListClients(Box& box, const MountLog& log, const std::string& filter, std::size_t offset,
+                               std::size_t limit) {
   const Result<std::string> folder = box.root().Locate(kKernelClients);
   if (!folder.ok()) return folder.status();
   const KernelClients kernel(*folder);
-  const Result<Sources> sources = ReadSources(box, kernel);
+  Result<Sources> sources = ReadSources(box, kernel);
   if (!sources.ok()) return sources.status();
+  sources->log = &log;
   std::vector<Row> rows = Rows(*sources).Make();
   if (!filter.empty()) RemoveOthers(filter, &rows);
   std::stable_sort(rows.begin(), rows.end(), [](const Row& a, const Row& b) { return a.order < b.order; });

@@ -8,6 +8,7 @@
 
 #include "box.h"
 #include "clients.h"
+#include "mount_log.h"
 
 namespace vorn {
 
@@ -16,8 +17,10 @@ struct ClientPage {
   std::size_t total = 0;  // of all pages
 };
 
-// Lists the clients as VORN::ListClients() says. The states of NFSv4 are counted for the clients of the page only.
-Result<ClientPage> ListClients(Box& box, const std::string& filter, std::size_t offset, std::size_t limit);
+// Lists the clients as VORN::ListClients() says; `log` has the mounts of NFSv3 that were admitted and refused. The
+// states of NFSv4 are counted for the clients of the page only.
+Result<ClientPage> ListClients(Box& box, const MountLog& log, const std::string& filter, std::size_t offset,
+                               std::size_t limit);
 
 }  // namespace vorn
 

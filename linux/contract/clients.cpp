@@ -11,8 +11,11 @@
 namespace VORN {
 
 int ListClients(const std::string& filter, int offset, int limit, std::vector<NFSClient>* clients, int* total) {
+  vorn::Box& box = vorn::CurrentBox();
+  const vorn::MountLog log =
+      box.root().is_box() ? vorn::ReadMountLog() : vorn::MountLog();  // the journal is this box's
   vorn::Result<vorn::ClientPage> page =
-      vorn::ListClients(vorn::CurrentBox(), filter, static_cast<std::size_t>(offset), static_cast<std::size_t>(limit));
+      vorn::ListClients(box, log, filter, static_cast<std::size_t>(offset), static_cast<std::size_t>(limit));
   if (vorn::ToResult(page.status()) != 0) return kClientsFailed;
   *clients = std::move(page->clients);
   *total = static_cast<int>(page->total);

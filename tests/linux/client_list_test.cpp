@@ -1,4 +1,6 @@
 // The clients of a box whose kernel is made of files.
+#include "client_list.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -9,6 +11,7 @@
 
 #include "call.h"
 #include "clients.h"
+#include "current_box.h"
 #include "kernel_caches.h"
 #include "rehearsal.h"
 #include "temporary_root.h"
@@ -119,6 +122,26 @@ TEST_F(ClientList, SaysWhyAnAddressWasTurnedAway) {
   ASSERT_EQ(clients_[0].refusals.size(), 1U);
   EXPECT_EQ(clients_[0].refusals[0].reason, "no_rule");
   EXPECT_EQ(clients_[0].refusals[0].path, "");
+}
+
+TEST_F(ClientList, HasTheMountsThatWereLogged) {
+  vorn::MountLog log;
+  log.Add({"10.9.0.12", "/srv/old", ""}, 1700000000);
+  log.Add({"10.9.0.12", "/a", "port"}, 1700000001);
+  log.Add({"10.9.0.77", "/b", "path"}, 1700000002);
+  const auto page = vorn::ListClients(vorn::RealBox(), log, "10.9.0.", 2, 10);
+  ASSERT_TRUE(page.ok());
+  ASSERT_EQ(page->clients.size(), 2U);
+  EXPECT_EQ(page->clients[0].since, 1700000000);
+  ASSERT_EQ(page->clients[0].refusals.size(), 2U);
+  EXPECT_EQ(page->clients[0].refusals[0].path, "/a");
+  EXPECT_EQ(page->clients[0].refusals[0].reason, "port");
+  EXPECT_EQ(page->clients[0].refusals[0].count, 1);
+  EXPECT_EQ(page->clients[0].refusals[0].last, 1700000001);
+  EXPECT_EQ(page->clients[0].refusals[1].path, "/srv/secret");
+  EXPECT_EQ(page->clients[1].address, "10.9.0.77");
+  EXPECT_EQ(page->clients[1].state, "refused");
+  EXPECT_EQ(page->clients[1].refusals[0].text, "There is no such path.");
 }
 
 // The address is in the byte order of this machine, and so are the words of the table.

@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include "health.h"
+
 namespace VORN {
 
 // The changes that the calls on a draft would have made. All strings are valid UTF-8.
@@ -39,6 +41,13 @@ struct Rehearsal {
     std::vector<Change> changes;
   };
 
+  // The findings of a check (health.h) that the change would add or remove. Those that depend on the running service
+  // are not foreseen.
+  struct Findings {
+    std::vector<HealthFinding> added;
+    std::vector<HealthFinding> removed;
+  };
+
   std::vector<File> files;
   std::vector<Action> actions;
   std::vector<Rule> rules;
@@ -61,6 +70,10 @@ class Draft {
   // Returns what the calls on the draft would have done so far. A difference has `context` unchanged lines around each
   // change.
   Rehearsal Report(int context = 3) const;
+
+  // Makes the check on the draft and on the box, and compares the findings; none if no file was changed. They may
+  // concern any shared folder.
+  Rehearsal::Findings CompareFindings() const;
 
   struct State;  // the platform's own
   State& state() const;

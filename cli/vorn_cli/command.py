@@ -88,6 +88,11 @@ def show_rehearsal(out, answer):
     for rule in rehearsal.get("rules", []):
         effects = ", ".join(change["text"] for change in rule["changes"])
         out.text(f"- {rule['client']} at {rule['directory']}: {effects}")
+    findings = rehearsal.get("findings", {"added": [], "removed": []})
+    for finding in findings["added"]:
+        out.text(f"- new {finding['severity']}: {finding['text']} {finding['remedy']}")
+    for finding in findings["removed"]:
+        out.text(f"- no more {finding['severity']}: {finding['text']}")
 
 
 def switch(text):

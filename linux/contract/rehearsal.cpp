@@ -9,6 +9,7 @@
 #include "draft.h"
 #include "engines.h"
 #include "exports_files.h"
+#include "find_faults.h"
 #include "keytab.h"
 #include "keytab_file.h"
 #include "rule_changes.h"
@@ -91,6 +92,13 @@ Rehearsal Draft::Report(int context) const {
     report.actions.push_back({effect.action, effect.clients, effect.grace_seconds, std::move(effect.effect)});
   }
   return report;
+}
+
+Rehearsal::Findings Draft::CompareFindings() const {
+  if (state_->store->Changes().empty()) return {};
+  const HealthReport before = vorn::FindFaultsOfFiles(vorn::RealBox());
+  const HealthReport after = vorn::FindFaultsOfFiles(state_->box);
+  return {vorn::FindAdded(before.findings, after.findings), vorn::FindAdded(after.findings, before.findings)};
 }
 
 }  // namespace VORN

@@ -1,7 +1,9 @@
 #include "find_faults.h"
 
 #include <algorithm>
+#include <array>
 #include <iterator>
+#include <map>
 #include <utility>
 
 #include "call.h"
@@ -25,20 +27,21 @@ struct Check {
   Status (*find)(const HealthInput& input, Findings* findings);
   bool needs_exports = false;
   bool needs_shares = false;
+  bool depends_on_service = false;  // compares with the running service, or with what it finds
 };
 
 // In the order of a report: the service, its settings, the shares and their rules, users, Kerberos.
 constexpr Check kChecks[] = {
-    {"not_serving", FindStoppedService},
-    {"closed_port", FindClosedPorts},
-    {"full_file_system", FindFullFileSystems, false, true},
-    {"exports_not_in_force", FindExportsNotInForce, true, false},
+    {"not_serving", FindStoppedService, false, false, true},
+    {"closed_port", FindClosedPorts, false, false, true},
+    {"full_file_system", FindFullFileSystems, false, true, true},
+    {"exports_not_in_force", FindExportsNotInForce, true, false, true},
     {"exports_fault", FindExportFaults, true, false},
     {"settings_fault", FindSettingFaults},
     {"ignored_setting", FindIgnoredSettings},
     {"overridden_setting", FindOverriddenSettings},
-    {"version_not_in_force", FindVersionsNotInForce},
-    {"unknown_host", FindUnknownHosts, true, false},
+    {"version_not_in_force", FindVersionsNotInForce, false, false, true},
+    {"unknown_host", FindUnknownHosts, true, false, true},
     {"moved_host", FindMovedHosts, true, false},
     {"missing_folder", FindMissingFolders, false, true},
     {"left_share", FindExportsOfLeftShares, true, true},
@@ -74,12 +77,11 @@ void MakeValid(VORN::HealthFinding* finding) {
   }
 }
 
-}  // namespace
-
-VORN::HealthReport FindFaults(Box& box) {
+VORN::HealthReport RunChecks(Box& box, bool with_service) {
   const HealthInput input(box);
   VORN::HealthReport report;
   for (const Check& check : kChecks) {
+    if (check.depends_on_service && !with_service) continue;
     Findings findings(check.kind);
     const Status status = Run(check, input, &findings);
     if (!status.ok()) report.not_checked.push_back({check.kind, ToValidUtf8(status.reason())});
@@ -90,6 +92,31 @@ VORN::HealthReport FindFaults(Box& box) {
   std::stable_sort(report.findings.begin(), report.findings.end(),
                    [](const auto& a, const auto& b) { return a.severity < b.severity; });
   return report;
+}
+
+// The object of a finding without the number of its line.
+using Identity = std::array<std::string, 6>;
+
+Identity IdentityOf(const VORN::HealthFinding& finding) {
+  const VORN::HealthSubject& subject = finding.subject;
+  return {finding.kind, subject.share, subject.client, subject.file, subject.setting, subject.mapping};
+}
+
+}  // namespace
+
+VORN::HealthReport FindFaults(Box& box) { return RunChecks(box, !box.is_draft()); }
+
+VORN::HealthReport FindFaultsOfFiles(Box& box) { return RunChecks(box, false); }
+
+std::vector<VORN::HealthFinding> FindAdded(const std::vector<VORN::HealthFinding>& before,
+                                           const std::vector<VORN::HealthFinding>& now) {
+  std::map<Identity, int> known;
+  for (const VORN::HealthFinding& finding : before) ++known[IdentityOf(finding)];
+  std::vector<VORN::HealthFinding> added;
+  for (const VORN::HealthFinding& finding : now) {
+    if (known[IdentityOf(finding)]-- <= 0) added.push_back(finding);
+  }
+  return added;
 }
 
 std::vector<std::string> KindsOfFaults() {

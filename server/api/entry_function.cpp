@@ -94,7 +94,12 @@ std::vector<std::string> ReasonsOf(const Route& route, int code, const VORN::Cal
   return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
 }
 
-std::string ReportOf(const VORN::Draft& draft, int context) { return WriteJson(RehearsalJson(draft.Report(context))); }
+// A caller with a token for some shared folders sees nothing of others: no unchanged lines, and no findings.
+std::string ReportOf(const VORN::Draft& draft, bool sees_all) {
+  Json::Value report = RehearsalJson(sees_all ? draft.Report() : draft.Report(0));
+  if (sees_all) report["findings"] = FindingsJson(draft.CompareFindings());
+  return WriteJson(report);
+}
 
 }  // namespace
 
@@ -132,15 +137,15 @@ Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDe
 }
 
 Response Rehearse(const Route& route, Json::Value parameters, VORN::CallDescription description,
-                  const std::optional<std::string>& if_match, int context) {
+                  const std::optional<std::string>& if_match, bool sees_all) {
   const VORN::Draft draft;
   description.draft = &draft;
   if (if_match) {
     PresentData present(route, parameters, description);
-    if (!IsUnchanged(*if_match, &present)) return present.Refuse(ReportOf(draft, context));
+    if (!IsUnchanged(*if_match, &present)) return present.Refuse(ReportOf(draft, sees_all));
   }
   Outcome outcome = RunEntryFunction(route, std::move(parameters), std::move(description));
-  outcome.remarks.rehearsal = ReportOf(draft, context);
+  outcome.remarks.rehearsal = ReportOf(draft, sees_all);
   return AnswerTo(route, outcome);
 }
 

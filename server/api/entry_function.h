@@ -42,9 +42,10 @@ Response RunIfUnchanged(const Route& route, Json::Value parameters, VORN::CallDe
 
 // Rehearses a changing method: answers what RunAndAnswer, or with a condition RunIfUnchanged, would answer, and what
 // the call would have changed. Nothing is changed, and no lock is taken: the reading method and the changing one work
-// on one draft. `context` is the number of unchanged lines that are shown around a change of a file.
+// on one draft. `sees_all`: the caller may see unchanged lines of files and the findings that the change would add or
+// remove, which may be about any shared folder.
 Response Rehearse(const Route& route, Json::Value parameters, VORN::CallDescription description,
-                  const std::optional<std::string>& if_match, int context);
+                  const std::optional<std::string>& if_match, bool sees_all);
 
 }  // namespace vorn::server
 

@@ -56,9 +56,6 @@ bool MayNameShare(const Caller& caller, const Route& route, const Json::Value& p
   return share.isString() && Permits(caller.shares, share.asString());
 }
 
-// The number of unchanged lines that a caller sees around the changes of a file. They may be about other shares.
-int ShownContext(const Caller& caller) { return caller.shares.empty() ? 3 : 0; }
-
 }  // namespace
 
 Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
@@ -131,7 +128,7 @@ Response Call::Execute() {
     audited_parameters_ = TextForAudit(route_, object);
     description_.parameters = audited_parameters_;
   }
-  if (rehearses_) return Rehearse(route_, std::move(object), description_, if_match_, ShownContext(*caller_));
+  if (rehearses_) return Rehearse(route_, std::move(object), description_, if_match_, caller_->shares.empty());
   if (route_.own) return route_.own(object, *caller_);
   if (!if_match_) return RunAndAnswer(route_, std::move(object), description_);
   return RunIfUnchanged(route_, std::move(object), description_, *if_match_);

@@ -1,5 +1,7 @@
 #include "rehearsal_answer.h"
 
+#include <cstddef>
+
 namespace vorn::server {
 namespace {
 
@@ -28,6 +30,16 @@ Json::Value ToJson(const VORN::Rehearsal::Rule::Change& change) {
   return object;
 }
 
+Json::Value ToJson(const VORN::HealthFinding& finding) {
+  constexpr const char* kSeverities[] = {"error", "warning", "notice"};
+  Json::Value object;
+  object["kind"] = finding.kind;
+  object["severity"] = kSeverities[static_cast<std::size_t>(finding.severity)];
+  object["text"] = finding.text;
+  object["remedy"] = finding.remedy;
+  return object;
+}
+
 template <typename Item>
 Json::Value ListOf(const std::vector<Item>& items);
 
@@ -53,6 +65,13 @@ Json::Value RehearsalJson(const VORN::Rehearsal& rehearsal) {
   object["files"] = ListOf(rehearsal.files);
   object["actions"] = ListOf(rehearsal.actions);
   object["rules"] = ListOf(rehearsal.rules);
+  return object;
+}
+
+Json::Value FindingsJson(const VORN::Rehearsal::Findings& findings) {
+  Json::Value object;
+  object["added"] = ListOf(findings.added);
+  object["removed"] = ListOf(findings.removed);
   return object;
 }
 

@@ -11,6 +11,9 @@ namespace vorn::server {
 // {"files": [...], "actions": [...], "rules": [...]}
 Json::Value RehearsalJson(const VORN::Rehearsal& rehearsal);
 
+// {"added": [...], "removed": [...]}
+Json::Value FindingsJson(const VORN::Rehearsal::Findings& findings);
+
 }  // namespace vorn::server
 
 #endif  // VORN_SERVER_REHEARSAL_ANSWER_H

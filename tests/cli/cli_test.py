@@ -151,6 +151,14 @@ class HealthTest(BoxTest):
         done = self.refuses("--json health --share data", Exit.HEALTH_ERRORS, "The box has 1 error.")
         self.assertEqual(json.loads(done.stdout)["findings"][0]["kind"], "exports_fault")
 
+    def test_tells_the_findings_that_a_rehearsed_change_adds_or_removes(self):
+        self.write("etc/idmapd.conf", "[Translation]\nMethod = static\n[Static]\nmallory@X = mallory\n")
+        shown = self.vorn("idmap add root@X root --rehearse")
+        self.assertIn("- new warning: root@X is mapped to root", shown)
+        shown = self.vorn("idmap remove mallory@X --rehearse")
+        self.assertIn("- no more warning: mallory@X is mapped to the user mallory", shown)
+        self.assertNotIn("- new", shown)
+
     def test_prints_a_call_that_can_be_run(self):
         self.write("etc/idmapd.conf", "[Translation]\nMethod = static\n[Static]\nroot@X = root\n")
         done = self.run_vorn("health --kind mapping_to_root")

@@ -271,6 +271,41 @@ TEST_F(Rehearsals, NameTheRulesThatChange) {
   EXPECT_EQ(report.rules[1].changes[0].change, "added");
 }
 
+std::vector<std::string> KindsOf(const std::vector<VORN::HealthFinding>& findings) {
+  std::vector<std::string> kinds;
+  for (const VORN::HealthFinding& finding : findings) kinds.push_back(finding.kind);
+  return kinds;
+}
+
+TEST_F(Rehearsals, NameTheFindingsThatTheyAddAndRemove) {
+  root_.Write("/etc/idmapd.conf", "[Static]\na@X = nobody-of-this-name\nb@X = root\n");
+  Draft draft;
+  EXPECT_THAT(KindsOf(draft.CompareFindings().added), IsEmpty());
+  EXPECT_THAT(KindsOf(draft.CompareFindings().removed), IsEmpty());
+  {
+    const CallContext context(On(draft, root_));
+    const vorn::ConfigurationLock lock(vorn::CurrentBox());
+    const auto before = vorn::CurrentBox().Read("/etc/idmapd.conf");
+    ASSERT_TRUE(before.ok());
+    const char* const text = "# more\n[Static]\na@X = nobody-of-this-name\nc@X = nobody-else\n";
+    EXPECT_TRUE(vorn::CurrentBox().Replace("/etc/idmapd.conf", text, before->version).ok());
+  }
+  const VORN::Rehearsal::Findings findings = draft.CompareFindings();
+  ASSERT_THAT(KindsOf(findings.added), ElementsAre("mapping_to_nobody"));
+  EXPECT_EQ(findings.added[0].subject.mapping, "c@X");
+  EXPECT_THAT(KindsOf(findings.removed), ElementsAre("mapping_to_root"));
+}
+
+// The effect of a change on the running service is told by the actions of the rehearsal.
+TEST_F(Rehearsals, CompareNothingWithTheRunningService) {
+  root_.Write("/proc/net/rpc/nfsd", "th 8 0\n");
+  Draft draft;
+  const CallContext context(On(draft, root_));
+  EXPECT_EQ(AllChanges(root_)[0].make(), 0);
+  EXPECT_THAT(KindsOf(draft.CompareFindings().added), Not(Contains("exports_not_in_force")));
+  EXPECT_THAT(KindsOf(VORN::CheckHealth().findings), Not(Contains("exports_not_in_force")));
+}
+
 TEST_F(Rehearsals, ShowOnlyChangedLinesWithoutContext) {
   Draft draft;
   {

@@ -55,10 +55,10 @@ class RehearsalTest : public ModuleBox {
   }
 
   Response Rehearsed(const std::string& id, const std::string& json,
-                     const std::optional<std::string>& if_match = std::nullopt, int context = 3) const {
+                     const std::optional<std::string>& if_match = std::nullopt, bool sees_all = true) const {
     VORN::CallDescription description;
     description.method = id;
-    return Rehearse(RouteOf("/api/" + id), Parsed(json), description, if_match, context);
+    return Rehearse(RouteOf("/api/" + id), Parsed(json), description, if_match, sees_all);
   }
 
   Response Done(const std::string& id, const std::string& json) const {
@@ -154,6 +154,20 @@ TEST_F(RehearsalTest, TellsWhatAChangeOfARuleMeans) {
   EXPECT_EQ(StateOfTree(root_.directory()), before);
 }
 
+TEST_F(RehearsalTest, TellsTheFindingsThatAChangeAdds) {
+  const Json::Value none = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.1", "ro")))["findings"];
+  EXPECT_EQ(none, Parsed(R"({"added": [], "removed": []})"));
+  const char* const mapping = R"({"idmap": [{"kerberos_principal": "r@X", "local_name": "root"}]})";
+  const Json::Value findings = RehearsalOf(Rehearsed("VORN.Core.FileServ.NFS.IDMap/v1/create", mapping))["findings"];
+  ASSERT_EQ(findings["added"].size(), 1U) << findings;
+  EXPECT_EQ(findings["added"][0]["kind"], "mapping_to_root");
+  EXPECT_EQ(findings["added"][0]["severity"], "warning");
+  EXPECT_THAT(findings["added"][0]["text"].asString(), HasSubstr("r@X"));
+  ASSERT_EQ(findings["removed"].size(), 1U) << findings;
+  EXPECT_EQ(findings["removed"][0]["kind"], "mapping_without_effect")
+      << "a new mapping makes static mappings the first";
+}
+
 TEST_F(RehearsalTest, TellsWhatClientsNotice) {
   EXPECT_EQ(Done(kSet, R"({"enable_nfs": true})").status, 200);
   const Json::Value actions =
@@ -194,13 +208,14 @@ TEST_F(RehearsalTest, ComparesTheConditionWithTheSameDraft) {
   EXPECT_EQ(StateOfTree(root_.directory()), before);
 }
 
-TEST_F(RehearsalTest, ShowsNoLineOfAnotherShareWithoutContext) {
-  const std::string all = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.2")))["files"][0]["difference"].asString();
-  const std::string own =
-      RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.2"), std::nullopt, 0))["files"][0]["difference"].asString();
-  EXPECT_THAT(all, HasSubstr("/volume1/more"));
-  EXPECT_THAT(own, Not(HasSubstr("/volume1/more")));
-  EXPECT_THAT(own, HasSubstr("/volume1/data"));
+TEST_F(RehearsalTest, ShowsNothingOfAnotherShareToACallerForSomeShares) {
+  const Json::Value all = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.2")));
+  const Json::Value own = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.2"), std::nullopt, false));
+  EXPECT_THAT(all["files"][0]["difference"].asString(), HasSubstr("/volume1/more"));
+  EXPECT_THAT(own["files"][0]["difference"].asString(), Not(HasSubstr("/volume1/more")));
+  EXPECT_THAT(own["files"][0]["difference"].asString(), HasSubstr("/volume1/data"));
+  EXPECT_TRUE(all.isMember("findings"));
+  EXPECT_FALSE(own.isMember("findings"));
 }
 
 // Readers rehearse while others change the same file: each rehearsal sees one state of it, and none has an effect.

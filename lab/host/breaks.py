@@ -113,6 +113,9 @@ BREAKS = [
     Break("kinds-in-reverse", "an explanation is what the kernel does", "explain",
           source=("exports[a].kind < exports[b].kind", "s/exports\\[a\\].kind < exports\\[b\\].kind/"
                   "exports[a].kind > exports[b].kind/")),
+    Break("pending-rules-unseen", "a check finds what is not in force", "health",
+          source=("return std::move(update->changed);", "s/return std::move(update->changed);/"
+                  "return std::set<std::string>();/"), select="not_in_force"),
     Break("upgrade-restarts-nfs", "an upgrade leaves NFS alone", "package",
           _package("sed -i '$i systemctl restart nfs-server || true' postinst"), select="upgrade"),
 ]

@@ -4,6 +4,10 @@ const PAGES = [
   ['overview', '/', 'Overview'],
   ['service', '/service', 'Service'],
   ['advanced', '/advanced', 'Advanced'],
+  ['shares', '/shares', 'Shared folders'],
+  ['share', '/shares/media', 'media'],
+  ['access', '/access', 'Access check'],
+  ['history', '/history', 'History'],
 ] as const;
 
 // One test a view: signing in takes longer than a picture.

@@ -13,7 +13,10 @@ interface Page {
 export const pages: Page[] = [
   { name: '', title: /*i18n*/ 'Overview', Component: lazy(() => import('./pages/overview')) },
   { name: 'service', title: /*i18n*/ 'Service', Component: lazy(() => import('./pages/service')) },
+  { name: 'shares', title: /*i18n*/ 'Shared folders', Component: lazy(() => import('./pages/shares')) },
+  { name: 'access', title: /*i18n*/ 'Access check', Component: lazy(() => import('./pages/access')) },
   { name: 'advanced', title: /*i18n*/ 'Advanced', Component: lazy(() => import('./pages/advanced')) },
+  { name: 'history', title: /*i18n*/ 'History', Component: lazy(() => import('./pages/history')) },
 ];
 
 /** The page at the address. */

@@ -66,7 +66,14 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
   const method = 'VORN.Core.FileServ.NFS.AdvancedSetting/v1/set';
   const preview = usePreview(draft.dirty && isValid ? { method, parameters, tag: draft.tag } : null);
   return (
-    <SettingsForm draft={draft} method={method} parameters={parameters} describe={describe} isValid={isValid}>
+    <SettingsForm
+      draft={draft}
+      method={method}
+      parameters={parameters}
+      mine={describe(value)}
+      describe={(stored) => describe(stored as Stored)}
+      isValid={isValid}
+    >
       <SwitchField
         label={i18n._('Fixed ports')}
         help={i18n._(

@@ -74,6 +74,7 @@ function SharesCard() {
                     { n: open, total: data.total },
                   )}
                 </Content>
+                <a href="#/shares">{i18n._('Show the shared folders')}</a>
               </>
             );
           }}
@@ -96,6 +97,7 @@ function ChangesCard() {
             ) : (
               <>
                 <ChangeTable changes={data.changes} label={i18n._('Last changes')} />
+                <a href="#/history">{i18n._('Show the whole history')}</a>
               </>
             )
           }

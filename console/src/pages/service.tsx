@@ -24,7 +24,14 @@ function ServiceForm({ answer }: { answer: Answer<Settings> }) {
   const draft = useDraft(answer.data, answer.tag);
   const { value, change } = draft;
   return (
-    <SettingsForm draft={draft} method="VORN.Core.FileServ.NFS/v1/set" parameters={value} describe={describe} isValid>
+    <SettingsForm
+      draft={draft}
+      method="VORN.Core.FileServ.NFS/v1/set"
+      parameters={value}
+      mine={describe(value)}
+      describe={(stored) => describe(stored as Settings)}
+      isValid
+    >
       <SwitchField
         label={i18n._('NFS service')}
         help={i18n._('While the service is off, no client can use a shared folder over NFS.')}

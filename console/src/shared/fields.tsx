@@ -59,38 +59,36 @@ export function SwitchField({
   );
 }
 
-export function TextField({
-  label,
-  help,
-  error,
-  isDisabled,
-  value,
-  onChange,
-  isRequired = false,
-  type = 'text',
-  list,
-}: FieldProps & {
+interface TextProps extends FieldProps {
   value: string;
   onChange: (value: string) => void;
   isRequired?: boolean;
   type?: 'text' | 'number';
-  /** The id of a <datalist>. */
-  list?: string;
-}) {
+}
+
+/** A text that may be entered by everybody. Settings use TextField. */
+export function Text({
+  label,
+  help,
+  error,
+  isDisabled = false,
+  value,
+  onChange,
+  isRequired = false,
+  type = 'text',
+}: TextProps) {
   const id = useId();
-  const mayWrite = useMayWrite();
   return (
     <FormGroup label={label} fieldId={id} isRequired={isRequired}>
       <TextInput
         id={id}
         type={type}
         value={value}
-        list={list}
         isRequired={isRequired}
         autoComplete="off"
         spellCheck={false}
         aria-describedby={`${id}-help`}
-        isDisabled={isDisabled === true || !mayWrite}
+        isDisabled={isDisabled}
         validated={error ? 'error' : 'default'}
         onChange={(_event, text) => {
           onChange(text);
@@ -99,6 +97,11 @@ export function TextField({
       <Help id={`${id}-help`} help={help} error={error} />
     </FormGroup>
   );
+}
+
+export function TextField({ isDisabled = false, ...field }: TextProps) {
+  const mayWrite = useMayWrite();
+  return <Text {...field} isDisabled={isDisabled || !mayWrite} />;
 }
 
 /** A whole number; NaN while the field has none. */
@@ -127,30 +130,29 @@ export interface Choice<T extends string | number> {
   text: string;
 }
 
-export function ChoiceField<T extends string | number>({
-  label,
-  help,
-  isDisabled,
-  value,
-  choices,
-  onChange,
-  needsRight = true,
-}: FieldProps & {
+interface ChoiceProps<T extends string | number> extends FieldProps {
   value: T;
   choices: Choice<T>[];
   onChange: (value: T) => void;
-  /** Whether the field is switched off for readers. */
-  needsRight?: boolean;
-}) {
+}
+
+/** A choice for everybody. Settings use ChoiceField. */
+export function Choices<T extends string | number>({
+  label,
+  help,
+  isDisabled = false,
+  value,
+  choices,
+  onChange,
+}: ChoiceProps<T>) {
   const id = useId();
-  const mayWrite = useMayWrite() || !needsRight;
   return (
     <FormGroup label={label} fieldId={id}>
       <FormSelect
         id={id}
         value={value}
         aria-describedby={`${id}-help`}
-        isDisabled={isDisabled === true || !mayWrite}
+        isDisabled={isDisabled}
         onChange={(_event, text) => {
           const chosen = choices.find((choice) => String(choice.value) === text);
           if (chosen) onChange(chosen.value);
@@ -163,4 +165,9 @@ export function ChoiceField<T extends string | number>({
       <Help id={`${id}-help`} help={help} />
     </FormGroup>
   );
+}
+
+export function ChoiceField<T extends string | number>({ isDisabled = false, ...field }: ChoiceProps<T>) {
+  const mayWrite = useMayWrite();
+  return <Choices {...field} isDisabled={isDisabled || !mayWrite} />;
 }

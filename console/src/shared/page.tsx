@@ -9,21 +9,22 @@ import { Problem } from './problem';
 export function PageFrame({
   title,
   purpose,
-  actions,
+  above,
   children,
 }: {
   title: string;
   purpose: string;
-  actions?: ReactNode;
+  /** What stands above the title. */
+  above?: ReactNode;
   children: ReactNode;
 }) {
   return (
     <>
       <title>{`${title} · ${i18n._('Storage console')}`}</title>
       <PageSection>
+        {above}
         <div className="page-head">
           <Title headingLevel="h1">{title}</Title>
-          {actions}
         </div>
         <Content component="p">{purpose}</Content>
       </PageSection>

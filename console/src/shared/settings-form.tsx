@@ -14,15 +14,22 @@ export function SettingsForm<T, M extends Method>({
   draft,
   method,
   parameters,
+  mine,
   describe,
   isValid,
+  isWide = false,
   children,
 }: {
   draft: Draft<T>;
   method: M;
   parameters: Parameters<M>;
-  describe: (settings: T) => Fact[];
+  /** The values of the draft, in words. */
+  mine: Fact[];
+  /** The values of data that the server has stored, in words. */
+  describe: (stored: unknown) => Fact[];
   isValid: boolean;
+  /** Whether the form has tables, which need the whole width. */
+  isWide?: boolean;
   children: ReactNode;
 }) {
   const [reviewed, setReviewed] = useState(false);
@@ -32,7 +39,7 @@ export function SettingsForm<T, M extends Method>({
   };
   return (
     <Form
-      isWidthLimited
+      isWidthLimited={!isWide}
       onSubmit={(event) => {
         event.preventDefault();
         if (draft.dirty && isValid) setReviewed(true);
@@ -58,8 +65,8 @@ export function SettingsForm<T, M extends Method>({
           done={i18n._('Saved')}
           change={{ method, parameters, tag: draft.tag }}
           decision={{
-            mine: describe(draft.value),
-            describe: (stored) => describe(stored as T),
+            mine,
+            describe,
             onTakeTheirs: () => {
               close();
               draft.reset();

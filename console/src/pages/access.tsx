@@ -1,0 +1,134 @@
+import { useState } from 'react';
+import { i18n } from '@lingui/core';
+import { Button, Content, Form, FormGroup, Title } from '@patternfly/react-core';
+import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
+import type { Data, Parameters } from '../api/call';
+import { Choices, Text } from '../shared/fields';
+import { Loaded, PageFrame } from '../shared/page';
+import { go, linkTo } from '../shared/router';
+import { useRead } from '../shared/use-read';
+import { Explanation } from './access/explanation';
+
+type Question = Omit<Parameters<'VORN.Core.FileServ.NFS.Access/v1/matrix'>, 'offset' | 'limit'>;
+type Access = Data<'VORN.Core.FileServ.NFS.Access/v1/matrix'>['access'][number];
+
+const FLAVORS = (['sys', 'krb5', 'krb5i', 'krb5p'] as const).map((value) => ({ value, text: value }));
+const VERSIONS = (['4.2', '4.1', '4.0', '3'] as const).map((value) => ({ value, text: `NFSv${value}` }));
+
+const rightsOf = ({ mountable, read, write }: Access) => {
+  if (!mountable) return i18n._('cannot mount');
+  if (write) return i18n._('read and write');
+  return read ? i18n._('read only') : i18n._('can mount, but not read');
+};
+
+/** Asks for a client, and for how it mounts. */
+function QuestionForm({ onAsk }: { onAsk: (question: Question) => void }) {
+  const [client, setClient] = useState('');
+  const [user, setUser] = useState('');
+  const [flavor, setFlavor] = useState<(typeof FLAVORS)[number]['value']>('sys');
+  const [version, setVersion] = useState<(typeof VERSIONS)[number]['value']>('4.2');
+  return (
+    <Form
+      isWidthLimited
+      onSubmit={(event) => {
+        event.preventDefault();
+        onAsk({ client, flavor, version, user });
+      }}
+    >
+      <Text
+        label={i18n._('Client')}
+        help={i18n._('A host name or an address.')}
+        value={client}
+        isRequired
+        onChange={setClient}
+      />
+      <Text
+        label={i18n._('User of the client (optional)')}
+        help={i18n._(
+          'With sys a user of the box or a user ID, with Kerberos a principal. Then the permissions of the folder count, too.',
+        )}
+        value={user}
+        onChange={setUser}
+      />
+      <Choices label={i18n._('Security')} value={flavor} choices={FLAVORS} onChange={setFlavor} />
+      <Choices label={i18n._('Version of NFS')} value={version} choices={VERSIONS} onChange={setVersion} />
+      <FormGroup>
+        <Button type="submit" isDisabled={!client}>
+          {i18n._('Check')}
+        </Button>
+      </FormGroup>
+    </Form>
+  );
+}
+
+/** The rights of a client in all shared folders. A folder leads to the explanation. */
+function Matrix({ question, chosen }: { question: Question; chosen: string | undefined }) {
+  const matrix = useRead('VORN.Core.FileServ.NFS.Access/v1/matrix', question);
+  return (
+    <Loaded query={matrix}>
+      {({ data }) => (
+        <Table
+          aria-label={i18n._('Rights of {client}', { client: question.client })}
+          variant="compact"
+          gridBreakPoint="grid-md"
+        >
+          <Thead>
+            <Tr>
+              <Th>{i18n._('Shared folder')}</Th>
+              <Th>{i18n._('Rights')}</Th>
+              <Th>{i18n._('Rule that decides')}</Th>
+              <Th screenReaderText={i18n._('Actions')} />
+            </Tr>
+          </Thead>
+          <Tbody>
+            {data.access.map((access) => (
+              <Tr key={access.share} isRowSelected={access.share === chosen}>
+                <Td dataLabel={i18n._('Shared folder')}>{access.share}</Td>
+                <Td dataLabel={i18n._('Rights')}>{rightsOf(access)}</Td>
+                <Td dataLabel={i18n._('Rule that decides')}>
+                  {access.rule ? <code>{access.rule}</code> : i18n._('none')}
+                </Td>
+                <Td isActionCell>
+                  <Button
+                    variant="link"
+                    isInline
+                    aria-label={i18n._('Why has the client these rights in {share}?', { share: access.share })}
+                    onClick={() => {
+                      go(linkTo('access', access.share).slice(1));
+                    }}
+                  >
+                    {i18n._('Why?')}
+                  </Button>
+                </Td>
+              </Tr>
+            ))}
+          </Tbody>
+        </Table>
+      )}
+    </Loaded>
+  );
+}
+
+/** Who can get in, and why: #/access, or #/access/SHARE with the explanation for one folder. */
+export default function AccessPage({ rest }: { rest: string[] }) {
+  const [share] = rest;
+  const [question, setQuestion] = useState<Question | null>(null);
+  return (
+    <PageFrame
+      title={i18n._('Access check')}
+      purpose={i18n._('What a client may do in the shared folders, and why it can or cannot mount one of them.')}
+    >
+      <div className="stack">
+        <QuestionForm onAsk={setQuestion} />
+        {question && (
+          <section aria-live="polite">
+            <Title headingLevel="h2">{i18n._('Rights of {client}', { client: question.client })}</Title>
+            <Matrix question={question} chosen={share} />
+          </section>
+        )}
+        {question && share && <Explanation question={{ ...question, share }} />}
+        {question && !share && <Content component="p">{i18n._('Choose "Why?" to see what decides.')}</Content>}
+      </div>
+    </PageFrame>
+  );
+}

@@ -1,0 +1,156 @@
+import { useState } from 'react';
+import { i18n } from '@lingui/core';
+import {
+  Button,
+  Content,
+  EmptyState,
+  Modal,
+  ModalBody,
+  ModalFooter,
+  ModalHeader,
+  Pagination,
+} from '@patternfly/react-core';
+import { useMayWrite } from '../session/session';
+import { ChangeDialog } from '../shared/change-dialog';
+import { Difference } from '../shared/difference';
+import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
+import { useRead } from '../shared/use-read';
+import { time } from '../shared/words';
+import { ChangeTable, subjectOf, type HistoryChange } from './changes';
+
+const PAGE_SIZE = 20;
+
+/** The differences of one change. */
+function ShowChange({ change, onClose }: { change: HistoryChange; onClose: () => void }) {
+  const shown = useRead('VORN.Core.FileServ.NFS.History/v1/show', { id: change.id });
+  return (
+    <Modal isOpen variant="large" onClose={onClose} aria-labelledby="show-change">
+      <ModalHeader title={subjectOf(change)} description={time(change.time)} labelId="show-change" />
+      <ModalBody tabIndex={0}>
+        <Loaded query={shown}>
+          {({ data }) =>
+            data.differences.length === 0 ? (
+              <Content component="p">{i18n._('No difference of a file is known.')}</Content>
+            ) : (
+              <div className="stack">
+                {data.differences.map((file) => (
+                  <Difference key={file.path} {...file} />
+                ))}
+              </div>
+            )
+          }
+        </Loaded>
+      </ModalBody>
+      <ModalFooter>
+        <Button onClick={onClose}>{i18n._('Close')}</Button>
+      </ModalFooter>
+    </Modal>
+  );
+}
+
+function UndoChange({ change, onClose }: { change: HistoryChange; onClose: () => void }) {
+  return (
+    <ChangeDialog
+      title={i18n._('What undoing this change does')}
+      confirm={i18n._('Undo the change')}
+      done={i18n._('The change was undone')}
+      change={{ method: 'VORN.Core.FileServ.NFS.History/v1/undo', parameters: { id: change.id }, tag: null }}
+      onDone={onClose}
+      onClose={onClose}
+    />
+  );
+}
+
+interface Chosen {
+  change: HistoryChange;
+  wish: 'show' | 'undo';
+}
+
+function Actions({ change, onChoose }: { change: HistoryChange; onChoose: (chosen: Chosen) => void }) {
+  const mayWrite = useMayWrite();
+  const canBeUndone = mayWrite && change.kind !== 'found' && change.files.length > 0;
+  const about = { subject: subjectOf(change), time: time(change.time) };
+  return (
+    <>
+      <Button
+        variant="link"
+        isInline
+        aria-label={i18n._('Show {subject}, {time}', about)}
+        onClick={() => {
+          onChoose({ change, wish: 'show' });
+        }}
+      >
+        {i18n._('Show')}
+      </Button>{' '}
+      {canBeUndone && (
+        <Button
+          variant="link"
+          isInline
+          aria-label={i18n._('Undo {subject}, {time}', about)}
+          onClick={() => {
+            onChoose({ change, wish: 'undo' });
+          }}
+        >
+          {i18n._('Undo')}
+        </Button>
+      )}
+    </>
+  );
+}
+
+export default function HistoryPage() {
+  const [page, setPage] = useState(1);
+  const [chosen, setChosen] = useState<Chosen | null>(null);
+  const history = useRead('VORN.Core.FileServ.NFS.History/v1/list', {
+    offset: (page - 1) * PAGE_SIZE,
+    limit: PAGE_SIZE,
+  });
+  const close = () => {
+    setChosen(null);
+  };
+  return (
+    <PageFrame
+      title={i18n._('History')}
+      purpose={i18n._('Who changed which file of the box, and when. Edits by hand are listed, too.')}
+    >
+      <ReadOnlyNotice />
+      <Loaded query={history}>
+        {({ data }) =>
+          data.total === 0 ? (
+            <EmptyState headingLevel="h2" titleText={i18n._('Nothing has been changed yet.')} />
+          ) : (
+            <>
+              <ChangeTable
+                changes={data.changes}
+                label={i18n._('Changes')}
+                actions={(change) => <Actions change={change} onChoose={setChosen} />}
+              />
+              {data.total > PAGE_SIZE && (
+                <Pagination
+                  itemCount={data.total}
+                  perPage={PAGE_SIZE}
+                  perPageOptions={[]}
+                  page={page}
+                  titles={{
+                    paginationAriaLabel: i18n._('Pages of the history'),
+                    toNextPageAriaLabel: i18n._('Older changes'),
+                    toPreviousPageAriaLabel: i18n._('Newer changes'),
+                    toFirstPageAriaLabel: i18n._('Newest changes'),
+                    toLastPageAriaLabel: i18n._('Oldest changes'),
+                    currPageAriaLabel: i18n._('Page'),
+                    ofWord: i18n._('of'),
+                  }}
+                  onSetPage={(_event, next) => {
+                    setPage(next);
+                  }}
+                />
+              )}
+            </>
+          )
+        }
+      </Loaded>
+      {chosen?.wish === 'show' && <ShowChange change={chosen.change} onClose={close} />}
+      {chosen?.wish === 'undo' && <UndoChange change={chosen.change} onClose={close} />}
+    </PageFrame>
+  );
+}

@@ -1,0 +1,84 @@
+import { useState } from 'react';
+import { i18n } from '@lingui/core';
+import { Button, Content, Form, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
+import { ChangeDialog } from '../../shared/change-dialog';
+import { TextField } from '../../shared/fields';
+import { go, linkTo } from '../../shared/router';
+
+/** Asks for the name and the path of a new shared folder, and then for a confirmation. */
+export function CreateShare({ onClose }: { onClose: () => void }) {
+  const [name, setName] = useState('');
+  const [path, setPath] = useState('');
+  const [reviewed, setReviewed] = useState(false);
+  if (reviewed) {
+    return (
+      <ChangeDialog
+        title={i18n._('What sharing the folder does')}
+        confirm={i18n._('Share the folder')}
+        done={i18n._('The folder is shared. Now add rules for its clients.')}
+        change={{ method: 'VORN.Core.Share/v1/create', parameters: { name, path }, tag: null }}
+        onDone={() => {
+          onClose();
+          go(linkTo('shares', name).slice(1));
+        }}
+        onClose={() => {
+          setReviewed(false);
+        }}
+      />
+    );
+  }
+  return (
+    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="create-share">
+      <ModalHeader title={i18n._('Share a folder')} labelId="create-share" />
+      <ModalBody>
+        <Form
+          id="create-share-form"
+          onSubmit={(event) => {
+            event.preventDefault();
+            setReviewed(true);
+          }}
+        >
+          <TextField
+            label={i18n._('Name')}
+            help={i18n._('How the folder is called here. Clients mount it by its path.')}
+            value={name}
+            isRequired
+            onChange={setName}
+          />
+          <TextField
+            label={i18n._('Folder on the box')}
+            help={i18n._('The whole path of a folder that exists, for example /volume1/photos.')}
+            value={path}
+            isRequired
+            error={path && !path.startsWith('/') ? i18n._('A path begins with /.') : undefined}
+            onChange={setPath}
+          />
+        </Form>
+      </ModalBody>
+      <ModalFooter>
+        <Button type="submit" form="create-share-form" isDisabled={!name || !path.startsWith('/')}>
+          {i18n._('Review')}
+        </Button>
+        <Button variant="link" onClick={onClose}>
+          {i18n._('Cancel')}
+        </Button>
+      </ModalFooter>
+    </Modal>
+  );
+}
+
+export function DeleteShare({ name, onClose }: { name: string; onClose: () => void }) {
+  return (
+    <ChangeDialog
+      title={i18n._('Stop sharing {name}?', { name })}
+      confirm={i18n._('Stop sharing')}
+      done={i18n._('The folder is no longer shared')}
+      isDanger
+      change={{ method: 'VORN.Core.Share/v1/delete', parameters: { name }, tag: null }}
+      onDone={onClose}
+      onClose={onClose}
+    >
+      <Content component="p">{i18n._('The folder and its files stay on the box.')}</Content>
+    </ChangeDialog>
+  );
+}

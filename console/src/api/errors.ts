@@ -22,4 +22,5 @@ export const errorTexts: Record<number, string> = {
   2392: /*i18n*/ "Without the change, a file would be faulty.",
   2393: /*i18n*/ "A change of this kind cannot be taken back.",
   2394: /*i18n*/ "The change was taken back already.",
+  2395: /*i18n*/ "There is no such client any more.",
 };

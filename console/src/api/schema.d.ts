@@ -104,6 +104,46 @@ export interface paths {
         patch?: never;
         trace?: never;
     };
+    "/api/VORN.Core.FileServ.NFS.Client/v1/disconnect": {
+        parameters: {
+            query?: never;
+            header?: never;
+            path?: never;
+            cookie?: never;
+        };
+        get?: never;
+        put?: never;
+        /**
+         * Ends the state of a client of NFSv4.
+         * @description The server forgets the open files, locks and sessions of the client, and other clients can have them. A client that lives notices it at its next request and gets its files and locks again if nobody else has them meanwhile. To keep a client out, change the export rules. The call returns when the server has done so.
+         */
+        post: operations["VORN.Core.FileServ.NFS.Client/v1/disconnect"];
+        delete?: never;
+        options?: never;
+        head?: never;
+        patch?: never;
+        trace?: never;
+    };
+    "/api/VORN.Core.FileServ.NFS.Client/v1/list": {
+        parameters: {
+            query?: never;
+            header?: never;
+            path?: never;
+            cookie?: never;
+        };
+        get?: never;
+        put?: never;
+        /**
+         * Lists the clients of the NFS service.
+         * @description Clients of NFSv4, addresses that have mounted with NFSv3 or are connected, and addresses that were turned away, in the order of their addresses. A client of NFSv4 has a row of its own; the other facts are about an address. The server keeps rights per export rule: the exports and bytes are those of all clients of the rule. What the box cannot see is null; "explain" of the API VORN.Core.FileServ.NFS.Access tells why an address gets what it gets.
+         */
+        post: operations["VORN.Core.FileServ.NFS.Client/v1/list"];
+        delete?: never;
+        options?: never;
+        head?: never;
+        patch?: never;
+        trace?: never;
+    };
     "/api/VORN.Core.FileServ.NFS.Health/v1/check": {
         parameters: {
             query?: never;
@@ -1056,6 +1096,60 @@ export interface components {
             /** @description Number of changes that match. */
             total: number;
         };
+        /** @description An export that a client uses. */
+        ClientExport: {
+            /** @description Bytes that all clients of the rule have read from the export; null if the kernel does not count them, which Linux does from 5.13 on. */
+            bytes_read: number | null;
+            /** @description Bytes that they have written. */
+            bytes_written: number | null;
+            /** @description Whether a mount of NFSv3 by this address is recorded. The record of a client that died stays. */
+            mounted: boolean;
+            /** @description Path of the export. */
+            path: string;
+            /** @description The clients of the export rules whose rights the address has. Null if the server has asked for no rights of these clients for half an hour. */
+            rule: string | null;
+            /** @description Since when the bytes are counted, in seconds since 1970-01-01 UTC. */
+            since: number | null;
+        };
+        /** @description A client of NFSv4, as "list" shows it. */
+        ClientIdentity: {
+            /** @description Its client id, so that another client that has the number by now is left alone. */
+            client_id: string;
+            /** @description Its number. */
+            id: number;
+        };
+        /** @description A condition, and a page. */
+        ClientListing: {
+            /** @description Only clients with this text in their address, name, version or in a path that they use or were refused, without regard to case. An empty text is no condition. */
+            filter?: string;
+            /** @description Largest number of clients to list; 50 if it is absent. */
+            limit?: number;
+            /** @description Number of clients to skip. */
+            offset?: number;
+        };
+        /** @description A page of clients. */
+        ClientPage: {
+            /** @description The clients of the page. */
+            clients: components["schemas"]["NFSClient"][];
+            /** @description Number of clients that match, on all pages. */
+            total: number;
+        };
+        /** @description Requests of a client that were turned away. */
+        ClientRefusal: {
+            /** @description Number of requests; null if it is not known. */
+            count: number | null;
+            /** @description When the last one was made, in seconds since 1970-01-01 UTC; null if it is not known. */
+            last: number | null;
+            /** @description What the client asked for; null if it is not known. */
+            path: string | null;
+            /**
+             * @description "no_rule": no export rule is for the address; "not_exported": the path is not exported to it; "port": the rule accepts reserved ports only; "path": there is no such path.
+             * @enum {string}
+             */
+            reason: "no_rule" | "not_exported" | "port" | "path";
+            /** @description A sentence that says so. */
+            text: string;
+        };
         /** @description Whether clients may enter file systems that are mounted below the folder. */
         Crossmnt: boolean;
         Error: {
@@ -1255,6 +1349,37 @@ export interface components {
         };
         /** @description Name of a local user, or "root". Another name is refused with 2352. */
         LocalName: string;
+        /** @description A client of NFSv4, or an address without one. */
+        NFSClient: {
+            /** @description The address; null for a client whose host name alone is known. */
+            address: string | null;
+            /** @description The client id of NFSv4, which "disconnect" needs; null for other rows. */
+            client_id: string | null;
+            /** @description Number of files that are delegated to the client of NFSv4. */
+            delegations: number | null;
+            /** @description The exports in use. */
+            exports: components["schemas"]["ClientExport"][];
+            /** @description The number of the client of NFSv4, which "disconnect" needs; null for other rows. */
+            id: number | null;
+            /** @description What the client of NFSv4.1 or later says of its software. */
+            implementation: string | null;
+            /** @description Number of owners of locks, per file, of the client of NFSv4; an owner may have locked several ranges. NFSv3: null, its locks cannot be told by client. */
+            locks: number | null;
+            /** @description The name by which the client of NFSv4 calls itself, or the host name that was recorded with a mount of NFSv3. The client chooses it. */
+            name: string | null;
+            /** @description Number of files that the client of NFSv4 has open. */
+            open_files: number | null;
+            /** @description What the address was refused, as far as the kernel remembers and mountd has logged in the last day; at most 20 logged ones. */
+            refusals: components["schemas"]["ClientRefusal"][];
+            /** @description Seconds since the client of NFSv4 renewed its lease. */
+            renewed: number | null;
+            /** @description When the server got to know the client of NFSv4, in seconds since 1970-01-01 UTC: its last mount, reboot or restart of the service. Of NFSv3: its last mount that mountd has logged in the last day. Null if it is not known. */
+            since: number | null;
+            /** @description Of NFSv4: "confirmed"; "unconfirmed"; "courtesy": the lease has expired, and the state is kept until somebody needs it; "expirable": somebody needs it. Otherwise "connected" over TCP; "mounted": a mount is recorded, without a connection, and the client may be gone for long; "refused": the address was turned away and has nothing else. */
+            state: string | null;
+            /** @description The version of NFS; null if it cannot be told, as of a connection without a recorded mount. */
+            version: string | null;
+        };
         /** @description A mapping to be added. */
         NewIdMapping: {
             kerberos_principal: components["schemas"]["NewPrincipal"];
@@ -1354,12 +1479,12 @@ export interface components {
                  * @description The operation.
                  * @enum {string}
                  */
-                action: "start" | "stop" | "restart" | "reload" | "refresh_names" | "transfer_sizes" | "unix_permissions" | "reload_identities" | "firewall";
+                action: "start" | "stop" | "restart" | "reload" | "refresh_names" | "transfer_sizes" | "unix_permissions" | "reload_identities" | "firewall" | "disconnect";
                 /**
-                 * @description What clients notice: nothing, new rights or identities without an interruption, an interruption with a grace period, that the service is there, or that it is gone.
+                 * @description What clients notice: nothing, new rights or identities without an interruption, an interruption with a grace period, that the service is there, that it is gone, or that one client loses its state.
                  * @enum {string}
                  */
-                clients: "nothing" | "reload" | "restart" | "start" | "stop";
+                clients: "nothing" | "reload" | "restart" | "start" | "stop" | "disconnect";
                 /** @description The effect in words. */
                 effect: string;
                 /** @description Only of a restart: for how many seconds clients can open no further files over NFSv4 and get no new locks. */
@@ -2299,6 +2424,189 @@ export interface operations {
                             text: components["schemas"]["ErrorText"];
                         };
                         rehearsal?: components["schemas"]["Rehearsal"];
+                        /** @constant */
+                        success: false;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            501: components["responses"]["Status501"];
+            503: components["responses"]["Status503"];
+            504: components["responses"]["Status504"];
+        };
+    };
+    "VORN.Core.FileServ.NFS.Client/v1/disconnect": {
+        parameters: {
+            query?: {
+                /** @description With the value true the call changes nothing: the answer is that of the call, and its member "rehearsal" tells what the call would have done. A caller who may only read may rehearse. */
+                rehearse?: components["parameters"]["Rehearse"];
+            };
+            header?: never;
+            path?: never;
+            cookie?: never;
+        };
+        requestBody: {
+            content: {
+                "application/json": components["schemas"]["ClientIdentity"];
+            };
+        };
+        responses: {
+            /** @description The state of the client has ended. */
+            200: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        data: components["schemas"]["Nothing"];
+                        rehearsal?: components["schemas"]["Rehearsal"];
+                        /** @constant */
+                        success: true;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            /** @description 2301: A parameter does not match the schema. 400: The request is malformed. */
+            400: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        error: {
+                            /** @enum {integer} */
+                            code: 2301 | 400;
+                            reasons?: components["schemas"]["Reasons"];
+                            text: components["schemas"]["ErrorText"];
+                        };
+                        rehearsal?: components["schemas"]["Rehearsal"];
+                        /** @constant */
+                        success: false;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            401: components["responses"]["Status401"];
+            403: components["responses"]["Status403"];
+            /** @description 2395: The client has left, or the number belongs to another client since the service was restarted. */
+            404: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        error: {
+                            /** @enum {integer} */
+                            code: 2395;
+                            reasons?: components["schemas"]["Reasons"];
+                            text: components["schemas"]["ErrorText"];
+                        };
+                        rehearsal?: components["schemas"]["Rehearsal"];
+                        /** @constant */
+                        success: false;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            408: components["responses"]["Status408"];
+            413: components["responses"]["Status413"];
+            415: components["responses"]["Status415"];
+            417: components["responses"]["Status417"];
+            421: components["responses"]["Status421"];
+            431: components["responses"]["Status431"];
+            /** @description 2302: The server cannot be told. */
+            500: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        error: {
+                            /** @enum {integer} */
+                            code: 2302;
+                            reasons?: components["schemas"]["Reasons"];
+                            text: components["schemas"]["ErrorText"];
+                        };
+                        rehearsal?: components["schemas"]["Rehearsal"];
+                        /** @constant */
+                        success: false;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            501: components["responses"]["Status501"];
+            503: components["responses"]["Status503"];
+            504: components["responses"]["Status504"];
+        };
+    };
+    "VORN.Core.FileServ.NFS.Client/v1/list": {
+        parameters: {
+            query?: never;
+            header?: never;
+            path?: never;
+            cookie?: never;
+        };
+        requestBody?: {
+            content: {
+                "application/json": components["schemas"]["ClientListing"];
+            };
+        };
+        responses: {
+            /** @description The clients. */
+            200: {
+                headers: {
+                    ETag: components["headers"]["ETag"];
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        data: components["schemas"]["ClientPage"];
+                        /** @constant */
+                        success: true;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            /** @description 2301: A parameter does not match the schema. 400: The request is malformed. */
+            400: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        error: {
+                            /** @enum {integer} */
+                            code: 2301 | 400;
+                            reasons?: components["schemas"]["Reasons"];
+                            text: components["schemas"]["ErrorText"];
+                        };
+                        /** @constant */
+                        success: false;
+                        warnings?: components["schemas"]["Warnings"];
+                    };
+                };
+            };
+            401: components["responses"]["Status401"];
+            403: components["responses"]["Status403"];
+            408: components["responses"]["Status408"];
+            413: components["responses"]["Status413"];
+            415: components["responses"]["Status415"];
+            417: components["responses"]["Status417"];
+            421: components["responses"]["Status421"];
+            431: components["responses"]["Status431"];
+            /** @description 2302: What the NFS service knows of its clients cannot be read. */
+            500: {
+                headers: {
+                    [name: string]: unknown;
+                };
+                content: {
+                    "application/json": {
+                        error: {
+                            /** @enum {integer} */
+                            code: 2302;
+                            reasons?: components["schemas"]["Reasons"];
+                            text: components["schemas"]["ErrorText"];
+                        };
                         /** @constant */
                         success: false;
                         warnings?: components["schemas"]["Warnings"];

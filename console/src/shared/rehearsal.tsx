@@ -16,6 +16,7 @@ const ACTIONS: Record<Action['action'], string> = {
   unix_permissions: /*i18n*/ 'The lookup of groups is handed to the NFS service.',
   reload_identities: /*i18n*/ 'The NFS service reads its ID mappings again.',
   firewall: /*i18n*/ 'The firewall opens and closes ports.',
+  disconnect: /*i18n*/ 'The client is disconnected.',
 };
 
 const NOTICES: Record<Action['clients'], string> = {
@@ -24,6 +25,7 @@ const NOTICES: Record<Action['clients'], string> = {
   restart: /*i18n*/ 'Clients wait until the service is there again.',
   start: /*i18n*/ 'Clients can mount from then on.',
   stop: /*i18n*/ 'Clients lose the access to their mounts.',
+  disconnect: /*i18n*/ 'The client loses its open files and locks.',
 };
 
 const CHANGES: Record<RuleChange['change'], string> = {

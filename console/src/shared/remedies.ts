@@ -39,4 +39,5 @@ export const remedies: Record<number, string> = {
   2392: /*i18n*/ 'Change the setting by hand.',
   2393: /*i18n*/ 'Change the setting by hand.',
   2394: /*i18n*/ 'There is nothing to do.',
+  2395: /*i18n*/ 'Reload the page: the client has gone meanwhile.',
 };

@@ -1,4 +1,4 @@
-// What the client of an export rule stands for, as exports(5) reads it.
+// The meaning of the client of an export rule, as exports(5) describes it.
 
 export type ClientKind = 'empty' | 'everybody' | 'netgroup' | 'pattern' | 'network' | 'address' | 'name' | 'faulty';
 

@@ -41,6 +41,16 @@ struct Rehearsal {
     std::vector<Change> changes;
   };
 
+  // A client that uses an export in which its rights change (clients.h).
+  struct Client {
+    std::string address;
+    std::string name;
+    std::string version;
+    std::string path;                   // of the export
+    std::vector<Rule::Change> changes;  // never empty
+    bool is_certain = true;             // false: rules for the names of hosts, which are not asked for, may decide
+  };
+
   // The findings of a check (health.h) that the change would add or remove. Those that depend on the running service
   // are not foreseen.
   struct Findings {
@@ -51,6 +61,7 @@ struct Rehearsal {
   std::vector<File> files;
   std::vector<Action> actions;
   std::vector<Rule> rules;
+  std::vector<Client> clients;
 };
 
 // A draft of this process's box. Its files are those of the box, each as it is at its first read, and its service is in

@@ -88,6 +88,10 @@ def show_rehearsal(out, answer):
     for rule in rehearsal.get("rules", []):
         effects = ", ".join(change["text"] for change in rule["changes"])
         out.text(f"- {rule['client']} at {rule['directory']}: {effects}")
+    for client in rehearsal.get("clients", []):
+        effects = ", ".join(change["text"] for change in client["changes"])
+        doubt = "" if client["certain"] else " (not certain: rules for host names may decide)"
+        out.text(f"- connected: {client['address']} ({client['name']}) at {client['path']}: {effects}{doubt}")
     findings = rehearsal.get("findings", {"added": [], "removed": []})
     for finding in findings["added"]:
         out.text(f"- new {finding['severity']}: {finding['text']} {finding['remedy']}")

@@ -81,8 +81,9 @@ Status ReadTables(Box& box, Sources* sources) {
   return {};
 }
 
-Result<Sources> ReadSources(Box& box, const KernelClients& kernel) {
+Result<Sources> ReadSources(Box& box, const KernelClients& kernel, const MountLog& log) {
   Sources sources;
+  sources.log = &log;
   Result<std::vector<KernelClient>> clients = kernel.List();
   if (!clients.ok()) return clients.status();
   sources.clients = std::move(*clients);
@@ -271,9 +272,8 @@ Result<ClientPage> ListClients(Box& box, const MountLog& log, const std::string&
   const Result<std::string> folder = box.root().Locate(kKernelClients);
   if (!folder.ok()) return folder.status();
   const KernelClients kernel(*folder);
-  Result<Sources> sources = ReadSources(box, kernel);
+  const Result<Sources> sources = ReadSources(box, kernel, log);
   if (!sources.ok()) return sources.status();
-  sources->log = &log;
   std::vector<Row> rows = Rows(*sources).Make();
   if (!filter.empty()) RemoveOthers(filter, &rows);
   std::stable_sort(rows.begin(), rows.end(), [](const Row& a, const Row& b) { return a.order < b.order; });
@@ -283,6 +283,17 @@ Result<ClientPage> ListClients(Box& box, const MountLog& log, const std::string&
     page.clients.push_back(std::move(rows[at].client));
   }
   return page;
+}
+
+Result<std::vector<VORN::NFSClient>> ListClientsWithoutStates(Box& box) {
+  const Result<std::string> folder = box.root().Locate(kKernelClients);
+  if (!folder.ok()) return folder.status();
+  const MountLog no_log;
+  const Result<Sources> sources = ReadSources(box, KernelClients(*folder), no_log);
+  if (!sources.ok()) return sources.status();
+  std::vector<VORN::NFSClient> clients;
+  for (Row& row : Rows(*sources).Make()) clients.push_back(std::move(row.client));
+  return clients;
 }
 
 }  // namespace vorn

@@ -22,6 +22,10 @@ struct ClientPage {
 Result<ClientPage> ListClients(Box& box, const MountLog& log, const std::string& filter, std::size_t offset,
                                std::size_t limit);
 
+// Lists all clients in no particular order, without what the kernel keeps per client beyond its description: since when
+// it is known, and its open files and locks.
+Result<std::vector<VORN::NFSClient>> ListClientsWithoutStates(Box& box);
+
 }  // namespace vorn
 
 #endif  // VORN_LINUX_CLIENTS_CLIENT_LIST_H

@@ -1,6 +1,7 @@
 #include "rehearsal.h"
 
 #include <algorithm>
+#include <set>
 #include <utility>
 
 #include "action_effect.h"
@@ -13,6 +14,7 @@
 #include "keytab.h"
 #include "keytab_file.h"
 #include "rule_changes.h"
+#include "touched_clients.h"
 #include "unicode.h"
 #include "unified_diff.h"
 
@@ -35,27 +37,39 @@ const char* NameOf(RightChange::Access access) {
   return access == RightChange::Access::kMore ? "more" : "other";
 }
 
-VORN::Rehearsal::Rule Describe(const RuleChange& rule) {
-  VORN::Rehearsal::Rule described{ToValidUtf8(rule.directory), ToValidUtf8(rule.client), {}};
-  for (const RightChange& right : rule.rights) {
-    described.changes.push_back({right.change, NameOf(right.access), right.flavor, right.text});
+std::vector<VORN::Rehearsal::Rule::Change> Describe(const std::vector<RightChange>& rights) {
+  std::vector<VORN::Rehearsal::Rule::Change> changes;
+  for (const RightChange& right : rights) {
+    changes.push_back({right.change, NameOf(right.access), right.flavor, right.text});
   }
-  return described;
+  return changes;
 }
 
 // Files that cannot be read have no rules: the call has then failed for the same reason.
-std::vector<VORN::Rehearsal::Rule> CompareExports(Box& box, const ChangedFile& own) {
-  std::vector<VORN::Rehearsal::Rule> rules;
+std::vector<RuleChange> CompareExports(Box& box, const ChangedFile& own) {
   const Result<std::vector<SharedExportsFile>> files = OpenAllExports(box);
-  if (!files.ok()) return rules;
+  if (!files.ok()) return {};
   std::vector<const ExportsDocument*> others;
   for (auto file = files->begin() + 1; file != files->end(); ++file) others.push_back(&(*file)->document);
   const ExportsDocument before(own.before.value_or(""));
   const ExportsDocument& after = files->front()->document;
-  for (const RuleChange& rule : CompareRules(before, after, others, BoxPaths(box.root()))) {
-    rules.push_back(Describe(rule));
+  return CompareRules(before, after, others, BoxPaths(box.root()));
+}
+
+// Adds the changed rules, and the clients that they touch. Clients that cannot be listed are left out: what the call
+// would do does not depend on them.
+void AddRules(Box& real, Box& draft, const ChangedFile& own, VORN::Rehearsal* report) {
+  std::set<std::string> directories;
+  for (const RuleChange& rule : CompareExports(draft, own)) {
+    directories.insert(rule.directory);
+    report->rules.push_back({ToValidUtf8(rule.directory), ToValidUtf8(rule.client), Describe(rule.rights)});
   }
-  return rules;
+  if (directories.empty()) return;
+  const Result<std::vector<TouchedClient>> touched = FindTouchedClients(real, draft, directories);
+  if (!touched.ok()) return;
+  for (const TouchedClient& one : *touched) {
+    report->clients.push_back({one.address, one.name, one.version, one.path, Describe(one.rights), one.is_certain});
+  }
 }
 
 }  // namespace
@@ -85,7 +99,7 @@ Rehearsal Draft::Report(int context) const {
   Rehearsal report;
   for (const vorn::ChangedFile& file : state_->store->Changes()) {
     report.files.push_back(vorn::Describe(file, context));
-    if (file.path == vorn::kExportsFile) report.rules = vorn::CompareExports(state_->box, file);
+    if (file.path == vorn::kExportsFile) vorn::AddRules(vorn::RealBox(), state_->box, file, &report);
   }
   for (const vorn::RehearsedAction action : state_->actions) {
     vorn::ActionEffect effect = vorn::EffectOf(action, state_->box);

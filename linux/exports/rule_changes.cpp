@@ -165,6 +165,13 @@ std::set<std::string> ChangedDirectories(const ExportsDocument& before, const Ex
 
 }  // namespace
 
+std::vector<RightChange> CompareRights(const ExportOptions* before, const ExportOptions* after) {
+  if (before == nullptr && after == nullptr) return {};
+  if (before == nullptr) return {Made(kAdded)};
+  if (after == nullptr) return {Made(kRemoved)};
+  return CompareOptions(*before, *after);
+}
+
 std::vector<std::string> AllRightChanges() {
   std::vector<std::string> names;
   for (const Direction& one : {kRemoved, kAdded, kFlavorRemoved, kFlavorAdded, kOtherAccount, kOtherOptions}) {

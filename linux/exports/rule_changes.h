@@ -7,6 +7,7 @@
 
 #include "export_paths.h"
 #include "exports_document.h"
+#include "exports_options.h"
 
 namespace vorn {
 
@@ -26,6 +27,9 @@ struct RuleChange {
   std::string client;
   std::vector<RightChange> rights;  // never empty
 };
+
+// Compares the options that a client has in an export; nullptr: no rule admits it.
+std::vector<RightChange> CompareRights(const ExportOptions* before, const ExportOptions* after);
 
 // The names of all changes that RightChange::change can have.
 std::vector<std::string> AllRightChanges();

@@ -51,6 +51,17 @@ Json::Value ToJson(const VORN::Rehearsal::Rule& rule) {
   return object;
 }
 
+Json::Value ToJson(const VORN::Rehearsal::Client& client) {
+  Json::Value object;
+  object["address"] = client.address;
+  object["name"] = client.name;
+  object["version"] = client.version;
+  object["path"] = client.path;
+  object["changes"] = ListOf(client.changes);
+  object["certain"] = client.is_certain;
+  return object;
+}
+
 template <typename Item>
 Json::Value ListOf(const std::vector<Item>& items) {
   Json::Value list(Json::arrayValue);
@@ -65,6 +76,7 @@ Json::Value RehearsalJson(const VORN::Rehearsal& rehearsal) {
   object["files"] = ListOf(rehearsal.files);
   object["actions"] = ListOf(rehearsal.actions);
   object["rules"] = ListOf(rehearsal.rules);
+  object["clients"] = ListOf(rehearsal.clients);
   return object;
 }
 

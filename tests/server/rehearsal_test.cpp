@@ -151,7 +151,19 @@ TEST_F(RehearsalTest, TellsWhatAChangeOfARuleMeans) {
   EXPECT_EQ(rehearsal["rules"][0]["changes"][0]["change"], "read_only");
   EXPECT_EQ(rehearsal["rules"][0]["changes"][0]["access"], "less");
   EXPECT_EQ(rehearsal["rules"][0]["changes"][0]["flavor"], "sys");
+  EXPECT_EQ(rehearsal["clients"], Json::Value(Json::arrayValue));  // nobody is connected
   EXPECT_EQ(StateOfTree(root_.directory()), before);
+}
+
+TEST_F(RehearsalTest, NamesTheClientsWhoseRightsChange) {
+  root_.Write("/var/lib/nfs/rmtab", "10.0.0.1:/volume1/data:0x00000001\n10.0.0.9:/volume1/data:0x00000001\n");
+  const Json::Value clients = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.1", "ro")))["clients"];
+  ASSERT_EQ(clients.size(), 1U) << clients;
+  EXPECT_EQ(clients[0]["address"], "10.0.0.1");
+  EXPECT_EQ(clients[0]["version"], "3");
+  EXPECT_EQ(clients[0]["path"], "/volume1/data");
+  EXPECT_EQ(clients[0]["changes"][0]["change"], "read_only");
+  EXPECT_TRUE(clients[0]["certain"].asBool());
 }
 
 TEST_F(RehearsalTest, TellsTheFindingsThatAChangeAdds) {

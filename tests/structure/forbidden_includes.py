@@ -33,7 +33,7 @@ ALLOWED = {
     "linux/access": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "platform"},
     "linux/clients": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/access", "linux/exports",
-        "linux/service", "platform"},
+        "linux/host", "linux/service", "platform"},
     "linux/health": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
         "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "linux/access", "platform"},
     "linux/history": {"linux/status", "linux/system", "linux/text", "linux/box", "platform"},

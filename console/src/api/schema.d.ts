@@ -1490,6 +1490,21 @@ export interface components {
                 /** @description Only of a restart: for how many seconds clients can open no further files over NFSv4 and get no new locks. */
                 grace_seconds?: number;
             }[];
+            /** @description The clients that use an export in which their rights would change, by NFSv4 or a recorded mount of NFSv3. The kernel keeps exports in use by rule, so a client may be named for an export that another client of its rule uses. Empty if no export rule would change. */
+            clients: {
+                /** @description The address of the client. */
+                address: string;
+                /** @description False if rules for the names of hosts may decide otherwise: a rehearsal asks no name service. */
+                certain: boolean;
+                /** @description Each change of its rights. */
+                changes: components["schemas"]["RehearsedChange"][];
+                /** @description The name by which it calls itself; may be empty. */
+                name: string;
+                /** @description The path of the export. */
+                path: string;
+                /** @description The version of NFS; empty if it is not known. */
+                version: string;
+            }[];
             /** @description The files that would have another content, in the order of their paths. */
             files: {
                 /** @description The difference in the unified format of diff(1). A keytab is shown as klist(1) prints it, without keys. A caller with a token for some shared folders sees no unchanged lines. */
@@ -1497,30 +1512,63 @@ export interface components {
                 /** @description The path of the file on the box. */
                 path: string;
             }[];
+            /** @description The findings of VORN.Core.FileServ.NFS.Health that the change would add or remove, as far as they do not depend on the running service. Absent for a caller with a token for some shared folders. */
+            findings?: {
+                /** @description New findings. */
+                added: {
+                    /** @description The kind of finding. */
+                    kind: string;
+                    /** @description What to do. */
+                    remedy: string;
+                    /**
+                     * @description The severity.
+                     * @enum {string}
+                     */
+                    severity: "error" | "warning" | "notice";
+                    /** @description What it means for clients. */
+                    text: string;
+                }[];
+                /** @description Findings that would be settled. */
+                removed: {
+                    /** @description The kind of finding. */
+                    kind: string;
+                    /** @description What to do. */
+                    remedy: string;
+                    /**
+                     * @description The severity.
+                     * @enum {string}
+                     */
+                    severity: "error" | "warning" | "notice";
+                    /** @description What it means for clients. */
+                    text: string;
+                }[];
+            };
             /** @description The clients of export rules whose rights would change. Clients are compared as the rules name them. */
             rules: {
                 /** @description Each change of its rights. */
-                changes: {
-                    /**
-                     * @description Whether the client gets less access, more, or another one.
-                     * @enum {string}
-                     */
-                    access: "less" | "more" | "other";
-                    /**
-                     * @description The change.
-                     * @enum {string}
-                     */
-                    change: "removed" | "added" | "flavor_removed" | "flavor_added" | "other_account" | "other_options" | "read_only" | "read_write" | "root_squashed" | "root_not_squashed" | "all_squashed" | "all_not_squashed" | "any_port" | "reserved_ports_only" | "crossmnt" | "no_crossmnt" | "async" | "sync";
-                    /** @description The security flavour that it concerns, as in exports(5). Absent if it concerns all. */
-                    flavor?: string;
-                    /** @description The change in words. */
-                    text: string;
-                }[];
+                changes: components["schemas"]["RehearsedChange"][];
                 /** @description The client as the rule names it. */
                 client: string;
                 /** @description The exported directory. */
                 directory: string;
             }[];
+        };
+        /** @description A change of the rights of a client. */
+        RehearsedChange: {
+            /**
+             * @description Whether the client gets less access, more, or another one.
+             * @enum {string}
+             */
+            access: "less" | "more" | "other";
+            /**
+             * @description The change.
+             * @enum {string}
+             */
+            change: "removed" | "added" | "flavor_removed" | "flavor_added" | "other_account" | "other_options" | "read_only" | "read_write" | "root_squashed" | "root_not_squashed" | "all_squashed" | "all_not_squashed" | "any_port" | "reserved_ports_only" | "crossmnt" | "no_crossmnt" | "async" | "sync";
+            /** @description The security flavour that it concerns, as in exports(5). Absent if it concerns all. */
+            flavor?: string;
+            /** @description The change in words. */
+            text: string;
         };
         /**
          * @description Mapping of users. "root": nobody is mapped. "admin": the client's root user becomes the administrator account. "guest": the client's root user becomes the guest account. "all_admin": every user becomes the administrator account.

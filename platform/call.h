@@ -4,6 +4,7 @@
 #ifndef VORN_PLATFORM_CALL_H
 #define VORN_PLATFORM_CALL_H
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -36,8 +37,8 @@ struct CallDescription {
 
 // The context of the calling thread, from construction to destruction. Contexts of one thread nest:
 // the innermost one counts. Construct and destroy an object in the same thread, around the entry
-// function. Without a context a thread may write and has no uploads, and reasons and warnings are
-// only logged.
+// function, and call End() behind it. Without a context a thread may write and has no uploads, and reasons and warnings
+// are only logged.
 class CallContext {
  public:
   explicit CallContext(CallDescription description);
@@ -50,6 +51,10 @@ class CallContext {
 
   const CallDescription& description() const;
 
+  // Ends the call: the platform completes what it postponed to this moment, which may add warnings. A second call does
+  // nothing; the destructor calls it. Throws nothing.
+  void End() noexcept;
+
   // Sentences for the caller, in the order in which the platform found them, each once.
   const std::vector<std::string>& reasons() const;   // why operations of the call failed
   const std::vector<std::string>& warnings() const;  // what a caller should know of a call that succeeded
@@ -58,10 +63,16 @@ class CallContext {
   void AddReason(const std::string& sentence);
   void AddWarning(const std::string& sentence);
 
+  // For the platform: postpones `action`, which must throw nothing, to the end of the call.
+  void AtEnd(std::function<void()> action);
+  bool has_ended() const;
+
  private:
   CallDescription description_;
   std::vector<std::string> reasons_;
   std::vector<std::string> warnings_;
+  std::vector<std::function<void()>> postponed_;
+  bool has_ended_ = false;
   CallContext* outer_;
 };
 

@@ -33,7 +33,15 @@ void Add(std::string sentence, std::vector<std::string>* sentences) {
 CallContext::CallContext(CallDescription description)
     : description_(std::move(description)), outer_(std::exchange(current, this)) {}
 
-CallContext::~CallContext() { current = outer_; }
+CallContext::~CallContext() {
+  End();
+  current = outer_;
+}
+
+void CallContext::End() noexcept {
+  has_ended_ = true;
+  for (const std::function<void()>& action : std::exchange(postponed_, {})) action();
+}
 
 CallContext* CallContext::Current() { return current; }
 
@@ -44,5 +52,8 @@ const std::vector<std::string>& CallContext::warnings() const { return warnings_
 // A sentence may quote a file, which need not be UTF-8.
 void CallContext::AddReason(const std::string& sentence) { Add(vorn::ToValidUtf8(sentence), &reasons_); }
 void CallContext::AddWarning(const std::string& sentence) { Add(vorn::ToValidUtf8(sentence), &warnings_); }
+
+void CallContext::AtEnd(std::function<void()> action) { postponed_.push_back(std::move(action)); }
+bool CallContext::has_ended() const { return has_ended_; }
 
 }  // namespace VORN

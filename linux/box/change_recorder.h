@@ -11,8 +11,9 @@
 namespace vorn {
 
 // A box calls these on the thread that makes the change, which owns the configuration lock. A change is everything that
-// one thread does between the construction and the destruction of its outermost ConfigurationLock. No operation fails:
-// a change that cannot be recorded is made all the same, and a warning (notice.h) says so.
+// one thread does between the construction and the destruction of its outermost ConfigurationLock; in a call
+// (platform/call.h) it is everything that the call does, with the service operations for which it releases the lock. No
+// operation fails: a change that cannot be recorded is made all the same, and a warning (notice.h) says so.
 class ChangeRecorder {
  public:
   ChangeRecorder() = default;
@@ -33,8 +34,15 @@ class ChangeRecorder {
   // The service operation `action` was attempted.
   virtual void NoteAction(const std::string& action, const Status& status) = 0;
 
-  // The change is complete.
-  virtual void End() = 0;
+  // The change is complete. Throws nothing.
+  virtual void End() noexcept = 0;
+
+  // The thread releases the lock before its change is complete. Returns whether it has begun a change for which this is
+  // the first time.
+  virtual bool Postpone() = 0;
+
+  // The thread cannot own the lock again to end its change; `reason` says why. Called without the lock. Throws nothing.
+  virtual void Abandon(const Status& reason) noexcept = 0;
 };
 
 }  // namespace vorn

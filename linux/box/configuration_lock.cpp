@@ -3,8 +3,10 @@
 #include <algorithm>
 #include <map>
 #include <memory>
+#include <new>
 #include <vector>
 
+#include "call.h"
 #include "call_rights.h"
 #include "files.h"
 
@@ -51,11 +53,29 @@ Status Enter(Box& box, std::chrono::milliseconds limit) {
   return {};
 }
 
-void Leave(const Box& box) {
+// Ends the change of a call whose lock was released before.
+void EndPostponedChange(Box& box) {
+  const ConfigurationLock lock(box);
+  if (!lock.status().ok()) box.recorder()->Abandon(lock.status());
+}
+
+// The change of a call ends with the call: the service operations that follow without the lock belong to it.
+void EndChange(Box& box) {
+  VORN::CallContext* call = VORN::CallContext::Current();
+  if (call == nullptr || call->has_ended()) return box.recorder()->End();
+  if (!box.recorder()->Postpone()) return;
+  try {
+    call->AtEnd([&box] { EndPostponedChange(box); });
+  } catch (const std::bad_alloc&) {
+    box.recorder()->End();
+  }
+}
+
+void Leave(Box& box) {
   Context* context = Find(box);
   if (context == nullptr || --context->depth > 0) return;
   const bool is_outermost = layers.size() == 1;
-  if (is_outermost && context->lock != nullptr && box.recorder() != nullptr) box.recorder()->End();
+  if (is_outermost && context->lock != nullptr && box.recorder() != nullptr) EndChange(box);
   Layer& layer = layers.back();
   layer.erase(layer.begin() + (context - layer.data()));
 }

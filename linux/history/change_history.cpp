@@ -1,5 +1,6 @@
 #include "change_history.h"
 
+#include <malloc.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -7,7 +8,7 @@
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
-#include <memory>
+#include <new>
 #include <set>
 #include <utility>
 
@@ -26,6 +27,7 @@ using Content = HistoryRepository::Content;
 constexpr std::size_t kMostCommits = 256;
 constexpr off_t kLargestJournal = off_t{16} << 20;
 
+constexpr char kNotYet[] = "A change is not in the history yet";
 constexpr char kBootId[] = "/proc/sys/kernel/random/boot_id";
 
 // The change that this thread is making.
@@ -33,6 +35,7 @@ struct Mine {
   std::string name;  // in the journal; empty before the first file
   std::string undoes;
   std::vector<std::string> actions;
+  bool is_postponed = false;
 };
 
 std::map<const History*, Mine>& ChangesOfThread() {
@@ -113,22 +116,26 @@ History::History(Root root, const Store& store, Environment environment)
 void History::Intend(const std::string& path, std::optional<std::string_view> text) {
   if (!IsRecorded(path) || !IsOn()) return;
   const std::lock_guard lock(mutex_);
-  const Status status = TryIntend(path, Shown(path, text));
-  if (status.ok()) return;
-  missed_.insert(path);
-  Warn("The history has no record of a change of " + path, status);
+  try {
+    const Status status = TryIntend(path, Shown(path, text));
+    if (status.ok()) return;
+    missed_.insert(path);
+    Warn("The history has no record of a change of " + path, status);
+  } catch (const std::bad_alloc&) {
+    is_stale_ = true;
+    throw;
+  }
 }
 
 Status History::TryIntend(const std::string& path, const Content& content) {
-  std::unique_ptr<HistoryRepository> repository;
-  if (Status status = Load(&repository); !status.ok()) return status;
+  if (Status status = Load(); !status.ok()) return status;
   Mine& mine = ChangesOfThread()[this];
   const bool begins = open_.count(mine.name) == 0;
   if (begins) {
     mine.name.clear();
-    if (Status status = CompleteOthers(repository.get()); !status.ok()) return status;
+    if (Status status = CompleteOthers(); !status.ok()) return status;
   }
-  if (Status status = CommitEdits({path}, begins, repository.get()); !status.ok()) return status;
+  if (Status status = CommitEdits({path}, begins); !status.ok()) return status;
   const std::string name = begins ? NewName() : mine.name;
   Open change = begins ? Open{DescribeCaller(), SecondsNow(), {}} : open_[name];
   Status status = journal_.Append(IntentRecord(name, change.time, change.message, path, content), true);
@@ -159,67 +166,99 @@ void History::NoteAction(const std::string& action, const Status& status) {
 
 void History::NoteUndo(const std::string& id) { ChangesOfThread()[this].undoes = id; }
 
-void History::End() {
+// If there is no memory, the next change completes this one from the journal.
+void History::End() noexcept {
   const auto mine = ChangesOfThread().find(this);
   if (mine == ChangesOfThread().end()) return;
   const std::lock_guard lock(mutex_);
-  const Status status = TryEnd();
+  try {
+    if (const Status status = TryEnd(); !status.ok()) Warn(kNotYet, status);
+  } catch (const std::bad_alloc&) {
+    is_stale_ = true;
+  }
+  repository_.reset();
   ChangesOfThread().erase(mine);
-  if (!status.ok()) Warn("A change is not in the history yet", status);
+}
+
+bool History::Postpone() {
+  const auto mine = ChangesOfThread().find(this);
+  return mine != ChangesOfThread().end() && !std::exchange(mine->second.is_postponed, true);
+}
+
+void History::Abandon(const Status& reason) noexcept {
+  const std::lock_guard lock(mutex_);
+  repository_.reset();
+  ChangesOfThread().erase(this);
+  try {
+    Notice(std::string(kNotYet) + ": " + reason.reason());
+  } catch (const std::bad_alloc&) {  // the next change completes this one all the same
+  }
 }
 
 Status History::TryEnd() {
   const Mine& mine = ChangesOfThread()[this];
   if (mine.name.empty() && mine.actions.empty()) return {};
-  std::unique_ptr<HistoryRepository> repository;
-  if (Status status = Load(&repository); !status.ok()) return status;
+  if (Status status = Load(); !status.ok()) return status;
   const auto found = open_.find(mine.name);
   Open change = found == open_.end() ? Open{DescribeCaller(), SecondsNow(), {}} : found->second;
   change.message.actions = mine.actions;
   change.message.undoes = mine.undoes;
   if (!mine.undoes.empty()) change.message.kind = kUndo;
   const std::string name = mine.name.empty() ? NewName() : mine.name;
-  if (Status status = Commit(name, std::move(change), repository.get()); !status.ok()) return status;
+  if (Status status = Commit(name, std::move(change)); !status.ok()) return status;
   const bool is_due = commits_ >= kMostCommits || journal_.size() >= kLargestJournal;
-  return is_due && open_.empty() ? Checkpoint(repository.get()) : Status();
+  return is_due && open_.empty() ? Checkpoint() : Status();
 }
 
 void History::Recover(const std::vector<std::string>& paths) {
   if (!IsOn()) return;
   const std::lock_guard lock(mutex_);
-  std::unique_ptr<HistoryRepository> repository;
-  Status status = Load(&repository);
-  if (status.ok()) status = CompleteOthers(repository.get());
-  if (status.ok()) status = CommitEdits(paths, true, repository.get());
+  Status status = Load();
+  if (status.ok()) status = CompleteOthers();
+  if (status.ok()) status = CommitEdits(paths, true);
+  repository_.reset();
   if (!status.ok()) Warn("The history cannot be brought up to date", status);
 }
 
-// Opens the repository, and reads what other processes have added to the journal.
-Status History::Load(std::unique_ptr<HistoryRepository>* repository) {
+// Opens the repository, unless it is open since the begin of the change.
+Status History::OpenRepository() {
+  if (repository_) return {};
   Result<HistoryRepository> opened = HistoryRepository::Open(Located(root_, kHistoryFolder), true);
   if (!opened.ok()) return opened.status();
-  *repository = std::make_unique<HistoryRepository>(std::move(*opened));
+  repository_.emplace(std::move(*opened));
+  return {};
+}
+
+// Reads what other processes have added to the journal. A process that begins a new journal may have removed commits.
+Status History::Load() {
+  if (std::exchange(is_stale_, false)) {
+    journal_ = HistoryJournal(Located(root_, kHistoryJournal));
+    open_.clear();
+    repository_.reset();
+  }
   bool is_new = false;
   const Result<std::vector<Record>> records = journal_.ReadNew(&is_new);
   if (!records.ok()) return records.status();
-  if (!is_new) return Replay(*records, false, repository->get());
+  if (is_new) repository_.reset();
+  if (Status status = OpenRepository(); !status.ok()) return status;
+  if (!is_new) return Replay(*records, false);
   open_.clear();
   checkpoint_.clear();
   commits_ = 0;
-  if (records->empty()) return Checkpoint(repository->get());
+  if (records->empty()) return Checkpoint();
   const Record& first = records->front();
   if (first.kind != Kind::kCheckpoint || first.fields.size() < 2) return Malformed();
   checkpoint_ = first.fields[1];
-  if (first.fields[0] == CurrentBoot()) return Replay(*records, false, repository->get());
+  if (first.fields[0] == CurrentBoot()) return Replay(*records, false);
   // The system has been started again: what the commits since the checkpoint wrote need not have reached the disk.
-  Status status = (*repository)->Reset(checkpoint_);
-  if (status.ok()) status = Replay(*records, true, repository->get());
-  if (status.ok()) status = CompleteOthers(repository->get());
-  return status.ok() ? Checkpoint(repository->get()) : status;
+  Status status = repository_->Reset(checkpoint_);
+  if (status.ok()) status = Replay(*records, true);
+  if (status.ok()) status = CompleteOthers();
+  return status.ok() ? Checkpoint() : status;
 }
 
 // Follows the records. With `commits`, makes their commits again.
-Status History::Replay(const std::vector<Record>& records, bool commits, HistoryRepository* repository) {
+Status History::Replay(const std::vector<Record>& records, bool commits) {
   for (const Record& record : records) {
     Status status;
     if (record.kind == Kind::kIntent && record.fields.size() == 5) {
@@ -230,7 +269,7 @@ Status History::Replay(const std::vector<Record>& records, bool commits, History
     } else if (record.kind == Kind::kDropped && record.fields.size() == 2) {
       open_[record.fields[0]].files.erase(record.fields[1]);
     } else if (record.kind == Kind::kCommit && record.fields.size() >= 5) {
-      if (commits && !record.fields[4].empty()) status = CommitAgain(record, repository);
+      if (commits && !record.fields[4].empty()) status = CommitAgain(record);
       open_.erase(record.fields[0]);
       ++commits_;
     } else if (record.kind != Kind::kCheckpoint) {
@@ -241,7 +280,7 @@ Status History::Replay(const std::vector<Record>& records, bool commits, History
   return {};
 }
 
-Status History::CommitAgain(const Record& record, HistoryRepository* repository) {
+Status History::CommitAgain(const Record& record) {
   HistoryRepository::NewCommit commit{
       record.fields[1], record.fields[2], std::strtoll(record.fields[3].c_str(), nullptr, 10), record.fields[4], {}};
   for (const std::string& path : ParseMessage(commit.message).files) {
@@ -251,11 +290,11 @@ Status History::CommitAgain(const Record& record, HistoryRepository* repository)
   for (std::size_t i = 5; i + 1 < record.fields.size(); i += 2) {
     commit.files[record.fields[i]] = Decode(record.fields[i + 1]);
   }
-  return repository->Add(commit).status();
+  return repository_->Add(commit).status();
 }
 
 // Commits the open changes of other threads and processes, as far as they took effect.
-Status History::CompleteOthers(HistoryRepository* repository) {
+Status History::CompleteOthers() {
   const std::string& mine = ChangesOfThread()[this].name;
   std::map<std::string, Open> others = open_;
   others.erase(mine);
@@ -265,24 +304,24 @@ Status History::CompleteOthers(HistoryRepository* repository) {
       if (!present.ok()) return present.status();
       file = ContentOf(file->first, *present) == file->second ? std::next(file) : change.files.erase(file);
     }
-    if (Status status = Commit(name, std::move(change), repository); !status.ok()) return status;
+    if (Status status = Commit(name, std::move(change)); !status.ok()) return status;
   }
   return {};
 }
 
 // Commits the edits by hand of these files, and with `all` of every file of the history.
-Status History::CommitEdits(const std::vector<std::string>& paths, bool all, HistoryRepository* repository) {
+Status History::CommitEdits(const std::vector<std::string>& paths, bool all) {
   std::set<std::string> checked(paths.begin(), paths.end());
-  const Result<std::string> tip = repository->Tip();
+  const Result<std::string> tip = repository_->Tip();
   if (!tip.ok()) return tip.status();
   if (all) {
-    const Result<std::vector<std::string>> known = repository->Paths(*tip);
+    const Result<std::vector<std::string>> known = repository_->Paths(*tip);
     if (!known.ok()) return known.status();
     checked.insert(known->begin(), known->end());
   }
   for (const std::string& path : checked) {
     if (!IsRecorded(path) || IsOpen(path)) continue;
-    if (Status status = CommitEdit(path, repository); !status.ok()) return status;
+    if (Status status = CommitEdit(path); !status.ok()) return status;
   }
   return {};
 }
@@ -292,20 +331,20 @@ bool History::IsOpen(const std::string& path) const {
                      [&](const auto& change) { return change.second.files.count(path) != 0; });
 }
 
-Status History::CommitEdit(const std::string& path, HistoryRepository* repository) {
+Status History::CommitEdit(const std::string& path) {
   const Result<Version> version = store_.VersionOf(path);
   const auto recorded = recorded_.find(path);
   if (version.ok() && recorded != recorded_.end() && recorded->second == *version) return {};
   const Result<StoredFile> file = store_.Read(path);
   if (!file.ok()) return {};  // whoever changes it fails, too
-  const Result<std::string> tip = repository->Tip();
+  const Result<std::string> tip = repository_->Tip();
   if (!tip.ok()) return tip.status();
   const Content content = ContentOf(path, *file);
-  if (!repository->Has(*tip, path, content)) {
+  if (!repository_->Has(*tip, path, content)) {
     Open edit{{}, SecondsNow(), {{path, content}}};
-    edit.message.kind = repository->Has(*tip, path, Content()) ? kFound : kByHand;
+    edit.message.kind = repository_->Has(*tip, path, Content()) ? kFound : kByHand;
     if (missed_.erase(path) != 0) edit.message.kind = kUnrecorded;
-    if (Status status = Commit("", std::move(edit), repository); !status.ok()) return status;
+    if (Status status = Commit("", std::move(edit)); !status.ok()) return status;
   }
   // A file that is missing has the same version as before it was created.
   if (file->is_settled && file->version.exists) recorded_[path] = file->version;
@@ -313,12 +352,12 @@ Status History::CommitEdit(const std::string& path, HistoryRepository* repositor
 }
 
 // Makes a commit of what differs from the newest one, and closes the change.
-Status History::Commit(const std::string& name, Open change, HistoryRepository* repository) {
-  const Result<std::string> tip = repository->Tip();
+Status History::Commit(const std::string& name, Open change) {
+  const Result<std::string> tip = repository_->Tip();
   if (!tip.ok()) return tip.status();
   HistoryRepository::NewCommit commit;
   for (auto& [path, content] : change.files) {
-    if (repository->Has(*tip, path, content)) continue;
+    if (repository_->Has(*tip, path, content)) continue;
     change.message.files.push_back(path);
     commit.files.emplace(path, std::move(content));
   }
@@ -328,7 +367,7 @@ Status History::Commit(const std::string& name, Open change, HistoryRepository* 
   commit.time = change.time;
   commit.message = is_empty ? "" : FormatMessage(change.message);
   if (!is_empty) {
-    if (const Result<std::string> added = repository->Add(commit); !added.ok()) return added.status();
+    if (const Result<std::string> added = repository_->Add(commit); !added.ok()) return added.status();
     ++commits_;
   }
   if (!is_empty || open_.count(name) != 0) {  // without a message the record only closes the change
@@ -338,10 +377,11 @@ Status History::Commit(const std::string& name, Open change, HistoryRepository* 
   return {};
 }
 
-Status History::Checkpoint(HistoryRepository* repository) {
-  const Result<std::string> tip = repository->Tip();
+Status History::Checkpoint() {
+  const Result<std::string> tip = repository_->Tip();
   if (!tip.ok()) return tip.status();
-  if (Status status = repository->Pack(checkpoint_, environment_.settings().most_changes); !status.ok()) return status;
+  if (Status status = repository_->Pack(checkpoint_, environment_.settings().most_changes); !status.ok()) return status;
+  malloc_trim(0);  // packing takes megabytes, which the allocator of a server would keep
   const Record record{Kind::kCheckpoint, {CurrentBoot(), *tip, std::to_string(NanosecondsNow())}};
   if (Status status = journal_.Restart(record); !status.ok()) return status;
   checkpoint_ = *tip;
@@ -358,10 +398,9 @@ Content History::ContentOf(const std::string& path, const StoredFile& file) cons
   return Shown(path, file.version.exists ? std::optional<std::string_view>(file.text) : std::nullopt);
 }
 
-// Forgets what was read of the journal, because it was perhaps not applied: the next change reads it from its begin.
+// What was read of the journal is perhaps not applied.
 void History::Warn(const std::string& what, const Status& status) {
-  journal_ = HistoryJournal(Located(root_, kHistoryJournal));
-  open_.clear();
+  is_stale_ = true;
   Notice(what + ": " + status.reason());
 }
 

@@ -55,7 +55,9 @@ class History : public ChangeRecorder {
   void Intend(const std::string& path, std::optional<std::string_view> text) override;
   void Settle(const std::string& path, const Status& status) override;
   void NoteAction(const std::string& action, const Status& status) override;
-  void End() override;
+  void End() noexcept override;
+  bool Postpone() override;
+  void Abandon(const Status& reason) noexcept override;
 
   // Says that the change of this thread takes back the change `id`.
   void NoteUndo(const std::string& id);
@@ -98,14 +100,15 @@ class History : public ChangeRecorder {
 
   Status TryIntend(const std::string& path, const Content& content);
   Status TryEnd();
-  Status Load(std::unique_ptr<HistoryRepository>* repository);
-  Status Replay(const std::vector<HistoryJournal::Record>& records, bool commits, HistoryRepository* repository);
-  Status CommitAgain(const HistoryJournal::Record& record, HistoryRepository* repository);
-  Status CompleteOthers(HistoryRepository* repository);
-  Status CommitEdits(const std::vector<std::string>& paths, bool all, HistoryRepository* repository);
-  Status CommitEdit(const std::string& path, HistoryRepository* repository);
-  Status Commit(const std::string& name, Open change, HistoryRepository* repository);
-  Status Checkpoint(HistoryRepository* repository);
+  Status OpenRepository();
+  Status Load();
+  Status Replay(const std::vector<HistoryJournal::Record>& records, bool commits);
+  Status CommitAgain(const HistoryJournal::Record& record);
+  Status CompleteOthers();
+  Status CommitEdits(const std::vector<std::string>& paths, bool all);
+  Status CommitEdit(const std::string& path);
+  Status Commit(const std::string& name, Open change);
+  Status Checkpoint();
   bool IsOpen(const std::string& path) const;
   Content Shown(const std::string& path, std::optional<std::string_view> text) const;
   Content ContentOf(const std::string& path, const StoredFile& file) const;
@@ -116,11 +119,13 @@ class History : public ChangeRecorder {
   const Environment environment_;
   mutable std::mutex mutex_;
   HistoryJournal journal_;
-  std::map<std::string, Open> open_;         // by the name of the change
-  std::map<std::string, Version> recorded_;  // versions whose content is in the history
-  std::set<std::string> missed_;             // files that were changed while the history could not be written
-  std::string checkpoint_;                   // the newest commit at the begin of the journal
-  std::size_t commits_ = 0;                  // since then
+  std::optional<HistoryRepository> repository_;  // open from the first file of a change to its end
+  std::map<std::string, Open> open_;             // by the name of the change
+  std::map<std::string, Version> recorded_;      // versions whose content is in the history
+  bool is_stale_ = false;                        // whether the state must be read again from the begin of the journal
+  std::set<std::string> missed_;                 // files that were changed while the history could not be written
+  std::string checkpoint_;                       // the newest commit at the begin of the journal
+  std::size_t commits_ = 0;                      // since then
 };
 
 }  // namespace vorn

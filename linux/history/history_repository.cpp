@@ -50,6 +50,7 @@ void Initialize() {
       git_libgit2_opts(GIT_OPT_SET_SEARCH_PATH, level, "");
     }
     git_libgit2_opts(GIT_OPT_SET_OWNER_VALIDATION, 0);
+    git_libgit2_opts(GIT_OPT_SET_CACHE_MAX_SIZE, ssize_t{4} << 20);  // all repositories together; bytes
     return result;
   }();
   static_cast<void>(initialized);
@@ -184,9 +185,13 @@ Result<HistoryRepository> HistoryRepository::Open(const std::string& location, b
     result = git_repository_open_bare(&repository, location.c_str());
   }
   if (result < 0) return GitFailure(result, location);
-  // The oldest commit, if older ones were removed.
-  const Result<FileText> shallow = ReadFileOrNothing(location + "/shallow");
-  return HistoryRepository(location, repository, shallow.ok() ? shallow->text.substr(0, kIdSize) : "");
+  return HistoryRepository(location, repository);
+}
+
+HistoryRepository::HistoryRepository(std::string location, git_repository* repository)
+    : location_(std::move(location)), repository_(repository) {
+  const Result<FileText> shallow = ReadFileOrNothing(location_ + "/shallow");
+  if (shallow.ok()) oldest_ = shallow->text.substr(0, kIdSize);
 }
 
 Result<std::string> HistoryRepository::Tip() const {

@@ -24,7 +24,7 @@ namespace vorn {
 //
 // A function calls fsync(2) only if its comment says so; the journal (history_journal.h) restores what a loss of power
 // takes. An object is used by one thread. Several threads and processes may have an object each for one repository, but
-// only one of them may write at a time.
+// only one of them may write at a time. An object does not notice when another one removes old commits.
 class HistoryRepository {
  public:
   using Content = std::optional<std::string>;    // nullopt: the file does not exist
@@ -84,8 +84,7 @@ class HistoryRepository {
     void operator()(git_repository* repository) const;
   };
 
-  HistoryRepository(std::string location, git_repository* repository, std::string oldest)
-      : location_(std::move(location)), repository_(repository), oldest_(std::move(oldest)) {}
+  HistoryRepository(std::string location, git_repository* repository);
 
   Status PackFrom(const std::function<bool(const Commit&)>& is_wanted, Commit* last);
   Status Consolidate(std::size_t most);

@@ -104,10 +104,11 @@ std::string ReportOf(const VORN::Draft& draft, bool sees_all) {
 }  // namespace
 
 Outcome RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallDescription description) {
-  const VORN::CallContext context(std::move(description));
+  VORN::CallContext context(std::move(description));
   VORN::APIRequest request(std::move(parameters));
   auto response = std::make_unique<VORN::APIResponse>();
   route.row.handler(&request, response.get());
+  context.End();
   if (!response->answered()) throw std::runtime_error("the method ended without one");
   Remarks remarks{{}, context.warnings()};
   if (const int code = response->error(); code != 0) remarks.reasons = ReasonsOf(route, code, context, request);

@@ -128,6 +128,62 @@ TEST_F(HistoryTest, SaysWhoChangedWhichFilesInWhichCall) {
   ExpectValid(root);
 }
 
+TEST_F(HistoryTest, HasAllStepsOfACallAsOneChange) {
+  {
+    VORN::CallContext call(CallOf("alice"));
+    ASSERT_TRUE(Save(kFile, "/a *(ro)\n").ok());
+    ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
+    EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
+    EXPECT_THAT(Changes(), IsEmpty());
+    call.End();
+    EXPECT_THAT(Changes(), SizeIs(1));
+  }
+  const std::vector<History::Change> changes = Changes();
+  ASSERT_THAT(changes, SizeIs(1));
+  EXPECT_THAT(changes[0].message.files, ElementsAre(kFile, kOther));
+  EXPECT_THAT(changes[0].message.actions, ElementsAre("reload: done"));
+}
+
+TEST_F(HistoryTest, HasAChangeBeforeThoseOfTheNextWriter) {
+  VORN::CallContext call(CallOf("alice"));
+  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  std::thread([] { EXPECT_TRUE(Save(kOther, "[nfsd]\n").ok()); }).join();
+  EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
+  call.End();
+  const std::vector<History::Change> changes = Changes();
+  ASSERT_THAT(changes, SizeIs(3));
+  EXPECT_THAT(changes[0].message.actions, ElementsAre("reload: done"));
+  EXPECT_THAT(changes[1].message.files, ElementsAre(kOther));
+  EXPECT_THAT(changes[2].message.files, ElementsAre(kFile));
+  EXPECT_EQ(changes[2].message.caller, "alice");
+}
+
+TEST_F(HistoryTest, LeavesAChangeThatCannotEndToTheNextWriter) {
+  VORN::CallContext call(CallOf("alice"));
+  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  const std::string lock = root.At(kConfigurationLockFile);
+  std::filesystem::remove(lock);
+  std::filesystem::create_directory(lock);
+  call.End();
+  EXPECT_THAT(call.warnings(), ElementsAre(StartsWith("A change is not in the history yet: ")));
+  EXPECT_THAT(Changes(), IsEmpty());
+  std::filesystem::remove(lock);
+  const VORN::CallContext next(CallOf("bob"));
+  std::thread([] { EXPECT_TRUE(Save(kOther, "[nfsd]\n").ok()); }).join();
+  EXPECT_THAT(Kinds(), ElementsAre(kByCall, kByCall));
+  EXPECT_EQ(Changes()[1].message.caller, "alice");
+  TakeLog();
+}
+
+TEST_F(HistoryTest, GoesOnInAFolderThatReplacedItsOwn) {
+  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  std::filesystem::remove_all(root.At(kHistoryFolder));
+  std::filesystem::remove(root.At(kHistoryJournal));
+  ASSERT_TRUE(Save(kFile, "b\n").ok());
+  EXPECT_THAT(Kinds(), ElementsAre(kByCall, kFound));
+  ExpectValid(root);
+}
+
 TEST_F(HistoryTest, NamesTheProgramOfAChangeWithoutACall) {
   ASSERT_TRUE(Save(kFile, "a\n").ok());
   EXPECT_EQ(Changes()[0].message.caller, program_invocation_short_name);
@@ -263,7 +319,7 @@ TEST_F(HistoryTest, IsBoundedAndStaysValid) {
 
 TEST_F(HistoryTest, ThatCannotBeWrittenIsAWarningAndFailsNoChange) {
   root.Write("/var/lib/vorn", "no folder");
-  const VORN::CallContext call(CallOf("alice"));
+  VORN::CallContext call(CallOf("alice"));
   TakeLog();
   EXPECT_TRUE(Save(kFile, "a\n").ok());
   EXPECT_EQ(root.Read(kFile), "a\n");
@@ -271,6 +327,7 @@ TEST_F(HistoryTest, ThatCannotBeWrittenIsAWarningAndFailsNoChange) {
   EXPECT_THAT(TakeLog(), Contains(Field(&LogLine::text, HasSubstr("The history has no record"))));
   std::filesystem::remove(root.At("/var/lib/vorn"));
   EXPECT_TRUE(Save(kFile, "b\n").ok());
+  call.End();
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kUnrecorded)) << "it was not edited by hand";
 }
 

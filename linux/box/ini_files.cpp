@@ -160,10 +160,9 @@ void IniFiles::Reject(const Source& source, const Opened* including, const std::
 Status IniFiles::AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft) {
   const Source& source = opened.source;
   for (const IniInclude& include : source.file->document().Includes()) {
-    std::optional<std::string> section = include.section;
-    if (section == IniDocument::kInherited) section = source.inherited;
-    const bool is_in_section = section.has_value() || include.section != IniDocument::kInherited;
-    if (!is_in_section) continue;  // the reader ignores every line outside of a section
+    std::optional<Inherited> section = source.inherited;
+    if (include.section != IniDocument::kInherited) section = Inherited{include.section, include.has_argument};
+    if (!section) continue;
     Source included{IncludedPath(source.path, include.file), nullptr, section,
                     PositionOf(source.position, include.line)};
     if (Status status = Add(box, std::move(included), draft, &opened); !status.ok()) return status;
@@ -171,19 +170,24 @@ Status IniFiles::AddIncludes(Box& box, const Opened& opened, const std::optional
   return {};
 }
 
+bool IniFiles::Inherits(const Source& source, std::string_view section) {
+  return source.inherited && source.inherited->name == LowerAscii(section);
+}
+
 std::optional<IniFound> IniFiles::FindStored(std::string_view section, std::string_view key) const {
   std::optional<Placed> last;
-  const auto consider = [&](const Source& source, std::string_view name) {
+  const auto consider = [&](const Source& source, std::string_view name, bool has_argument) {
     const std::optional<IniSetting> setting = source.file->document().FindLast(name, key);
     if (!setting) return;
     std::vector<int> position = PositionOf(source.position, setting->line);
     if (last && position < last->position) return;
-    last = Placed{
-        {setting->key, setting->value, setting->value, source.file.get(), setting->line}, position, setting->is_hidden};
+    last = Placed{{setting->key, setting->value, setting->value, source.file.get(), setting->line},
+                  position,
+                  has_argument || setting->is_hidden};
   };
   for (const Source& source : sources_) {
-    consider(source, section);
-    if (source.inherited == LowerAscii(section)) consider(source, IniDocument::kInherited);
+    consider(source, section, false);
+    if (Inherits(source, section)) consider(source, IniDocument::kInherited, source.inherited->has_argument);
   }
   if (!last || last->is_hidden) return std::nullopt;
   return last->found;
@@ -205,7 +209,8 @@ void IniFiles::CheckReferences() {
   for (const Source& source : sources_) {
     for (const IniReference& reference : source.file->document().References()) {
       const bool is_inherited = reference.section == IniDocument::kInherited;
-      const std::string section = is_inherited ? source.inherited.value_or("") : reference.section;
+      if (is_inherited && !source.inherited) continue;
+      const std::string section = is_inherited ? source.inherited->name : reference.section;
       const std::optional<IniFound> found = FindStored(section, reference.key);
       if (section == kEnvironment || !found || !Resolve(found->stored).is_circular) continue;
       readable_ = Status::Failure(kSyntax, found->Where() + ": the value of " + std::string(found->key) +
@@ -234,7 +239,10 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
       settings.reserve(settings.size() + own.size());
       for (const IniSetting& s : own) settings.push_back({s.key, s.value, s.value, source.file.get(), s.line});
     };
-    if (source.inherited == LowerAscii(section)) add(IniDocument::kInherited);
+    if (Inherits(source, section)) {
+      contributing += source.inherited->has_argument ? 1 : 0;  // its lines only hide others
+      add(IniDocument::kInherited);
+    }
     add(section);
   }
   std::set<std::string> seen;  // a file that is included twice gives a key twice

@@ -73,11 +73,19 @@ class IniFiles {
   static Status NoteOwnWrite(Box& box, const std::string& path);
 
  private:
+  // The section that a file is included in: the lines before its first section header belong to it.
+  struct Inherited {
+    std::string name;  // lower case
+    bool has_argument;
+
+    bool operator==(const Inherited& other) const { return name == other.name && has_argument == other.has_argument; }
+  };
+
   struct Source {
     std::string path;
     SharedIniFile file;
-    std::optional<std::string> inherited;  // the section of the include line
-    std::vector<int> position;             // of the include lines that lead to the file; orders the sources
+    std::optional<Inherited> inherited;  // nullopt: the reader ignores these lines
+    std::vector<int> position;           // of the include lines that lead to the file; orders the sources
   };
 
   // A file whose lines are being read, and the one that includes it.
@@ -87,6 +95,9 @@ class IniFiles {
 
     bool Has(const Source& other) const;
   };
+
+  // Whether the lines of a file before its first section header are in [section], or in one with an argument.
+  static bool Inherits(const Source& source, std::string_view section);
 
   // Returns the value with its references replaced; nullopt if it refers to nothing, or to itself.
   struct Resolved {

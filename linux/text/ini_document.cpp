@@ -221,8 +221,7 @@ std::vector<IniInclude> IniDocument::Includes() const {
   std::vector<IniInclude> includes;
   for (const Place place : includes_) {
     const Line& line = lines_[place];
-    includes.push_back({std::nullopt, std::string(line.value), line.number});
-    if (!line.has_argument) includes.back().section = sections_[line.section].name;
+    includes.push_back({sections_[line.section].name, line.has_argument, std::string(line.value), line.number});
   }
   return includes;
 }

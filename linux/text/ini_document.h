@@ -30,7 +30,8 @@ struct IniEntry {
 
 // A line "include = file" with a value. The reader reads the file as if it were in the place of the line.
 struct IniInclude {
-  std::optional<std::string> section;  // in which the file begins; nullopt if no section name can ask for it
+  std::string section;        // in which the file begins, in lower case
+  bool has_argument = false;  // whether that is [section "argument"]
   std::string file;
   int line = 0;
 };

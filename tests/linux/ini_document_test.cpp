@@ -112,7 +112,9 @@ TEST(IniDocument, ListsIncludesWithTheSectionThatTheyAreIn) {
   EXPECT_EQ(includes[1].section, "a");
   EXPECT_EQ(includes[1].file, "y");
   EXPECT_EQ(includes[1].line, 3);
-  EXPECT_FALSE(includes[2].section.has_value());
+  EXPECT_EQ(includes[2].section, "b");
+  EXPECT_FALSE(includes[1].has_argument);
+  EXPECT_TRUE(includes[2].has_argument);
 }
 
 TEST(IniDocument, ListsASectionsKeysInOrder) {

@@ -59,6 +59,8 @@ std::string OtherLine(Chance* chance) {
                                "\n",
                                "[nfsd\n",
                                "[statd \"x\"]\n",
+                               "[mountd \"x\"]\ninclude = part\n",
+                               "[statd \"x\"]\ninclude = part\n",
                                "port = 4002\n",
                                "vers4 = n\n",
                                "[STATD]\n",

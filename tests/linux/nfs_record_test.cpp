@@ -358,6 +358,8 @@ TEST(NFSConf, RefusesToChangeWhatIncludesItself) {
       {"[statd]\nport = 4000\ninclude = part\n", "\ninclude = nfs.conf\n", "/etc/nfs.conf:3: the file includes itself"},
       {"[statd]\nport = 4000\ninclude = part\n", "include = ./part\n", "/etc/part:1: the file includes itself"},
       {"[statd]\nport = 4000\ninclude = part\n", "include = ../etc/part\n", "/etc/part:1: the file includes itself"},
+      {"[statd]\nport = 4000\n[a \"b\"]\ninclude = part\n", "include = part\n",
+       "/etc/part:1: the file includes itself"},
       {"[statd]\nport = 1\ninclude = part\n", "port = 4000\n[lockd]\ninclude = part\n", "/etc/part:3: the file inc"},
   };
   for (const auto& c : cases) {
@@ -377,6 +379,19 @@ TEST(NFSConf, RefusesToChangeWhatIncludesItself) {
     EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
     EXPECT_THAT(LastText(TakeLog()), testing::HasSubstr(c.reason)) << c.reason;
     EXPECT_FALSE(root.Read(kFile).has_value());
+  }
+}
+
+TEST(NFSConf, HasNoValueThatAnIncludedFileHides) {
+  for (const char* include : {"[statd \"a\"]\ninclude = part\n", "[Statd \"a\"]\ninclude = middle\n"}) {
+    const TemporaryRoot root;
+    root.Write("/etc/nfs.conf", std::string("[statd]\nport = 4000\n[lockd]\nport = 4001\n") + include);
+    root.Write("/etc/part", "port = 4002\n[lockd]\nport = 4003\n");
+    root.Write("/etc/middle", "include = part\n");
+    EXPECT_EQ(Judged(root, "statd", "port"), "") << "hidden by [statd \"a\"]";
+    EXPECT_EQ(Judged(root, "lockd", "port"), "4003");
+    EXPECT_EQ(Get().statd_port, 0);
+    EXPECT_EQ(Get().nlm_port, 4003);
   }
 }
 

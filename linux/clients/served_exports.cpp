@@ -24,7 +24,7 @@ using ExportKey = std::pair<std::string, std::string>;
 std::optional<ExportKey> ReadHeading(const std::string& line, std::int64_t* begun) {
   const std::size_t rule = line.find('\t');
   const std::size_t time = line.rfind('\t');
-  if (rule == time || !ReadNumber(std::string_view(line).substr(time + 1), begun)) return std::nullopt;
+  if (rule == time || !ReadNumber(line.substr(time + 1), begun)) return std::nullopt;
   return ExportKey(UnescapeWord(line.substr(0, rule)), UnescapeWord(line.substr(rule + 1, time - rule - 1)));
 }
 

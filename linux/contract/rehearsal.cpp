@@ -39,6 +39,7 @@ const char* NameOf(RightChange::Access access) {
 
 std::vector<VORN::Rehearsal::Rule::Change> Describe(const std::vector<RightChange>& rights) {
   std::vector<VORN::Rehearsal::Rule::Change> changes;
+  changes.reserve(rights.size());
   for (const RightChange& right : rights) {
     changes.push_back({right.change, NameOf(right.access), right.flavor, right.text});
   }

@@ -7,6 +7,9 @@ const PAGES = [
   ['shares', '/shares', 'Shared folders'],
   ['share', '/shares/media', 'media'],
   ['access', '/access', 'Access check'],
+  ['idmap', '/idmap', 'ID mapping'],
+  ['kerberos', '/kerberos', 'Kerberos'],
+  ['people', '/people', 'People and tokens'],
   ['history', '/history', 'History'],
 ] as const;
 

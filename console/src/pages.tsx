@@ -15,8 +15,11 @@ export const pages: Page[] = [
   { name: 'service', title: /*i18n*/ 'Service', Component: lazy(() => import('./pages/service')) },
   { name: 'shares', title: /*i18n*/ 'Shared folders', Component: lazy(() => import('./pages/shares')) },
   { name: 'access', title: /*i18n*/ 'Access check', Component: lazy(() => import('./pages/access')) },
+  { name: 'idmap', title: /*i18n*/ 'ID mapping', Component: lazy(() => import('./pages/idmap')) },
+  { name: 'kerberos', title: /*i18n*/ 'Kerberos', Component: lazy(() => import('./pages/kerberos')) },
   { name: 'advanced', title: /*i18n*/ 'Advanced', Component: lazy(() => import('./pages/advanced')) },
   { name: 'history', title: /*i18n*/ 'History', Component: lazy(() => import('./pages/history')) },
+  { name: 'people', title: /*i18n*/ 'People and tokens', Component: lazy(() => import('./pages/people')) },
 ];
 
 /** The page at the address. */

@@ -15,6 +15,7 @@ import type { ReactNode } from 'react';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
 import { ChangeTable } from './changes';
+import { Health } from './health';
 
 function Fact({ term, children }: { term: string; children: ReactNode }) {
   return (
@@ -70,7 +71,7 @@ function SharesCard() {
               <>
                 <Content component="p">
                   {i18n._(
-                    '{n, plural, =0 {No client has access to a folder.} one {Clients have access to # folder of {total}.} other {Clients have access to # folders of {total}.}}',
+                    '{n, plural, =0 {No folder has rules for clients.} one {# folder of {total} has rules for clients.} other {# folders of {total} have rules for clients.}}',
                     { n: open, total: data.total },
                   )}
                 </Content>
@@ -79,6 +80,17 @@ function SharesCard() {
             );
           }}
         </Loaded>
+      </CardBody>
+    </Card>
+  );
+}
+
+function HealthCard() {
+  return (
+    <Card>
+      <CardTitle component="h2">{i18n._('What needs attention')}</CardTitle>
+      <CardBody>
+        <Health />
       </CardBody>
     </Card>
   );
@@ -119,6 +131,7 @@ export default function OverviewPage() {
           <ServiceCard />
           <SharesCard />
         </Gallery>
+        <HealthCard />
         <ChangesCard />
       </div>
     </PageFrame>

@@ -20,12 +20,18 @@ function remedyOf(error: unknown): string {
   return remedy ? i18n._(remedy) : i18n._('Reload the page and try again.');
 }
 
+/** The principals that are mapped already: the only details that an error of a change has. */
+function conflictsOf({ details }: Failure): string[] {
+  const conflicts = (details as { principal_conflict?: string[] } | null | undefined)?.principal_conflict;
+  return conflicts ?? [];
+}
+
 /** Why it happened, in the server's own words. */
 function reasonsOf(error: unknown): string[] {
   if (!(error instanceof Failure))
     return error instanceof Error && !(error instanceof Unreachable) ? [error.message] : [];
   const isStatus = error.code < 1000;
-  return isStatus && error.message ? [error.message, ...error.reasons] : error.reasons;
+  return isStatus && error.message ? [error.message, ...error.reasons] : [...error.reasons, ...conflictsOf(error)];
 }
 
 function Reasons({ reasons }: { reasons: string[] }) {

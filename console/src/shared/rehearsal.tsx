@@ -1,3 +1,4 @@
+import type { ReactNode } from 'react';
 import { i18n } from '@lingui/core';
 import { Alert, Content, Label, List, ListItem, Title } from '@patternfly/react-core';
 import type { Rehearsal } from '../api/call';
@@ -82,6 +83,18 @@ function Actions({ actions }: { actions: Action[] }) {
   );
 }
 
+/** One change of the rights of a client, which `who` names. */
+function RightsItem({ who, change }: { who: ReactNode; change: RuleChange }) {
+  return (
+    <ListItem>
+      {who} {change.flavor && <Label isCompact>{change.flavor}</Label>} {i18n._(CHANGES[change.change])}{' '}
+      <Label isCompact color={COLORS[change.access]}>
+        {i18n._(ACCESS[change.access])}
+      </Label>
+    </ListItem>
+  );
+}
+
 function Rules({ rules }: { rules: Rehearsal['rules'] }) {
   if (rules.length === 0) return null;
   return (
@@ -92,13 +105,39 @@ function Rules({ rules }: { rules: Rehearsal['rules'] }) {
       <List>
         {rules.flatMap((rule) =>
           rule.changes.map((change) => (
-            <ListItem key={[rule.directory, rule.client, change.change, change.flavor].join(' ')}>
-              <code>{rule.client}</code> {change.flavor && <Label isCompact>{change.flavor}</Label>}{' '}
-              {i18n._(CHANGES[change.change])}{' '}
-              <Label isCompact color={COLORS[change.access]}>
-                {i18n._(ACCESS[change.access])}
-              </Label>
-            </ListItem>
+            <RightsItem
+              key={[rule.directory, rule.client, change.change, change.flavor].join(' ')}
+              who={<code>{rule.client}</code>}
+              change={change}
+            />
+          )),
+        )}
+      </List>
+    </section>
+  );
+}
+
+function nameOf({ address, name, certain }: Rehearsal['clients'][number]): string {
+  const text = name ? `${name} (${address})` : address;
+  return certain ? text : i18n._('{client}, perhaps', { client: text });
+}
+
+/** The clients that use the folder at this moment. */
+function Connected({ clients }: { clients: Rehearsal['clients'] }) {
+  if (clients.length === 0) return null;
+  return (
+    <section>
+      <Title headingLevel="h2" size="md">
+        {i18n._('Clients that are connected now')}
+      </Title>
+      <List>
+        {clients.flatMap((client) =>
+          client.changes.map((change) => (
+            <RightsItem
+              key={[client.path, client.address, change.change, change.flavor].join(' ')}
+              who={<strong>{nameOf(client)}</strong>}
+              change={change}
+            />
           )),
         )}
       </List>
@@ -122,7 +161,7 @@ function Files({ files }: { files: Rehearsal['files'] }) {
 
 /** What a change would do, in words: to the service and its clients, and to the files of the box. */
 export function RehearsalView({ rehearsal }: { rehearsal: Rehearsal }) {
-  const { actions, rules, files } = rehearsal;
+  const { actions, rules, clients, files } = rehearsal;
   if (actions.length + rules.length + files.length === 0) {
     return <Alert variant="info" isInline component="h2" title={i18n._('This changes nothing on the box.')} />;
   }
@@ -130,6 +169,7 @@ export function RehearsalView({ rehearsal }: { rehearsal: Rehearsal }) {
     <div className="rehearsal">
       <Actions actions={actions} />
       <Rules rules={rules} />
+      <Connected clients={clients} />
       <Files files={files} />
     </div>
   );

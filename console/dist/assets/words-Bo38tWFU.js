@@ -1,1 +1,0 @@
-import{Dt as e}from"./problem-BkUG2pLx.js";var t=t=>t?e._(`yes`):e._(`no`);function n(t){return t>=1<<20&&t%(1<<20)==0?`${e.number(t/(1<<20))} MiB`:t>=1024&&t%1024==0?`${e.number(t/1024)} KiB`:e._(`{count} bytes`,{count:e.number(t)})}var r=t=>t===0?e._(`The system chooses`):n(t),i=t=>e.date(new Date(t*1e3),{dateStyle:`medium`,timeStyle:`short`});export{r as n,t as r,i as t};

@@ -1,0 +1,98 @@
+import { expect, signIn, test } from './base';
+
+test.describe('ID mappings', () => {
+  test.use({ foreseen: [/409 \(Conflict\)/] });
+
+  test('are added, found, changed and deleted, and conflicts are named', async ({ page, box, axe }) => {
+    await signIn(page, box, '/idmap');
+    await page.getByRole('button', { name: 'Add mappings' }).click();
+    const dialog = page.getByRole('dialog');
+    const lines = dialog.getByRole('textbox', { name: 'Mappings' });
+    await lines.fill('alice@STORAGE.EXAMPLE');
+    await expect(dialog.getByText('These lines are no mappings: 1')).toBeVisible();
+    await lines.fill('one@STORAGE.EXAMPLE, root\ntwo@STORAGE.EXAMPLE, root\n');
+    await axe();
+    await dialog.getByRole('button', { name: 'Review' }).click();
+    await expect(dialog.getByText('+one@STORAGE.EXAMPLE = root')).toBeVisible();
+    await dialog.getByRole('button', { name: 'Add', exact: true }).click();
+    await expect(dialog).toBeHidden();
+
+    await page.getByRole('button', { name: 'Add mappings' }).click();
+    await lines.fill('one@STORAGE.EXAMPLE, root');
+    await dialog.getByRole('button', { name: 'Review' }).click();
+    await expect(dialog.getByText('Error code 2351')).toBeVisible();
+    await expect(dialog.getByRole('listitem').getByText('one@STORAGE.EXAMPLE')).toBeVisible();
+    await dialog.getByRole('button', { name: 'Cancel' }).click();
+    await dialog.getByRole('button', { name: 'Cancel' }).click();
+
+    await page.getByRole('textbox', { name: 'Filter' }).fill('two@');
+    await expect(page.getByText('1 mapping', { exact: true })).toBeVisible();
+    await page.getByRole('button', { name: 'Change the mapping of two@STORAGE.EXAMPLE' }).click();
+    await dialog.getByRole('textbox', { name: 'Principal' }).fill('three@STORAGE.EXAMPLE');
+    await dialog.getByRole('button', { name: 'Review and save' }).click();
+    await dialog.getByRole('button', { name: 'Save', exact: true }).click();
+    await expect(dialog).toBeHidden();
+    await page.getByRole('textbox', { name: 'Filter' }).fill('three@');
+    await page.getByRole('button', { name: 'Delete the mapping of three@STORAGE.EXAMPLE' }).click();
+    await dialog.getByRole('button', { name: 'Delete', exact: true }).click();
+    await expect(dialog).toBeHidden();
+    await expect(page.getByText('No mapping', { exact: true })).toBeVisible();
+    await axe();
+  });
+});
+
+test('a table of many mappings scrolls to its end', async ({ page, box }) => {
+  const idmap = Array.from({ length: 3000 }, (_, index) => ({
+    kerberos_principal: `user${String(index).padStart(5, '0')}@STORAGE.EXAMPLE`,
+    local_name: 'root',
+  }));
+  await box.call('VORN.Core.FileServ.NFS.IDMap/v1/create', { idmap });
+  await signIn(page, box, '/idmap');
+  await page.getByRole('textbox', { name: 'Filter' }).fill('user');
+  await expect(page.getByText('3,000 mappings')).toBeVisible();
+  const rows = page.getByRole('region', { name: 'ID mappings' });
+  await rows.evaluate((box) => {
+    box.scrollTop = box.scrollHeight;
+  });
+  await expect(page.getByText('user02999@STORAGE.EXAMPLE')).toBeVisible();
+  expect(await rows.getByRole('row').count()).toBeLessThan(80);
+});
+
+test.describe('a keytab', () => {
+  test.use({ foreseen: [/422 \(/] });
+
+  test('is installed, and another file is refused', async ({ page, box, axe }) => {
+    await signIn(page, box, '/kerberos');
+    await expect(page.getByText('No keytab is installed yet.')).toBeVisible();
+    const chooser = page.locator('input[type=file]');
+    await chooser.setInputFiles({ name: 'wrong', mimeType: 'text/plain', buffer: Buffer.from('no keytab') });
+    const dialog = page.getByRole('dialog');
+    await expect(dialog.getByText('Error code 2331')).toBeVisible();
+    await dialog.getByRole('button', { name: 'Cancel' }).click();
+    await chooser.setInputFiles(box.keytab);
+    await expect(dialog.getByText('nfs/box.example@STORAGE.EXAMPLE').first()).toBeVisible();
+    await axe();
+    await dialog.getByRole('button', { name: 'Install' }).click();
+    await expect(dialog).toBeHidden();
+    await expect(page.getByRole('row', { name: 'nfs/box.example@STORAGE.EXAMPLE 1 aes256' })).toBeVisible();
+    await axe();
+  });
+});
+
+test('a token is shown once, and revoked', async ({ page, box, axe }) => {
+  await signIn(page, box, '/people');
+  await expect(page.getByText('this session')).toBeVisible();
+  await page.getByRole('button', { name: 'Create a token' }).click();
+  const dialog = page.getByRole('dialog');
+  await dialog.getByRole('textbox', { name: 'Name' }).fill('backup');
+  await axe();
+  await dialog.getByRole('button', { name: 'Create', exact: true }).click();
+  await expect(dialog.getByRole('textbox', { name: 'Token' })).toHaveValue(/^vorn_[0-9a-f]{72}$/);
+  await dialog.getByRole('button', { name: 'I have copied it' }).click();
+  await expect(page.getByRole('row', { name: /^backup Reader/ })).toBeVisible();
+  await axe();
+  await page.getByRole('button', { name: 'Revoke backup' }).click();
+  await dialog.getByRole('button', { name: 'Revoke' }).click();
+  await expect(dialog).toBeHidden();
+  await expect(page.getByText('There are no tokens.')).toBeVisible();
+});

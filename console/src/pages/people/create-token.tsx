@@ -1,0 +1,106 @@
+import { useState } from 'react';
+import { i18n } from '@lingui/core';
+import { Alert, Button, ClipboardCopy, Form, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
+import { useChange } from '../../shared/change-dialog';
+import { ChoiceField, TextField } from '../../shared/fields';
+import { Problem } from '../../shared/problem';
+import { ROLES, type Role } from './role';
+
+const DAY = 86400; // seconds
+
+const LIFETIMES = [
+  { value: 30 * DAY, text: /*i18n*/ '30 days' },
+  { value: 365 * DAY, text: /*i18n*/ 'One year' },
+  { value: 0, text: /*i18n*/ 'It never expires' },
+];
+
+/** The secret of a new token. No other page shows it. */
+function Secret({ secret, onClose }: { secret: string; onClose: () => void }) {
+  return (
+    <Modal isOpen variant="medium" aria-labelledby="token-secret">
+      <ModalHeader title={i18n._('The new token')} labelId="token-secret" />
+      <ModalBody>
+        <Alert variant="warning" isInline component="h2" title={i18n._('Copy the token now')}>
+          {i18n._('It is shown only once. The box stores a digest of it, and cannot show it again.')}
+        </Alert>
+        <ClipboardCopy
+          isReadOnly
+          isCode
+          hoverTip={i18n._('Copy')}
+          clickTip={i18n._('Copied')}
+          textAriaLabel={i18n._('Token')}
+        >
+          {secret}
+        </ClipboardCopy>
+      </ModalBody>
+      <ModalFooter>
+        <Button onClick={onClose}>{i18n._('I have copied it')}</Button>
+      </ModalFooter>
+    </Modal>
+  );
+}
+
+/** Asks for the properties of a new token, and shows its secret once. */
+export function CreateToken({ onClose }: { onClose: () => void }) {
+  const [name, setName] = useState('');
+  const [role, setRole] = useState<Role>('reader');
+  const [lifetime, setLifetime] = useState(365 * DAY);
+  const [secret, setSecret] = useState<string | null>(null);
+  const create = useChange<'VORN.Server.Token/v1/create'>(i18n._('The token was created'), ({ data }) => {
+    setSecret(data.token);
+  });
+  if (secret) return <Secret secret={secret} onClose={onClose} />;
+  return (
+    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="create-token">
+      <ModalHeader title={i18n._('Create a token')} labelId="create-token" />
+      <ModalBody>
+        <Form
+          id="create-token-form"
+          onSubmit={(event) => {
+            event.preventDefault();
+            create.mutate({
+              method: 'VORN.Server.Token/v1/create',
+              parameters: { name, role, ...(lifetime > 0 && { expires_in: lifetime }) },
+              tag: null,
+            });
+          }}
+        >
+          {create.error && <Problem error={create.error} />}
+          <TextField
+            label={i18n._('Name')}
+            help={i18n._('The program or the machine that will use the token.')}
+            value={name}
+            isRequired
+            onChange={setName}
+          />
+          <ChoiceField
+            label={i18n._('Role')}
+            help={i18n._('A reader can look at everything and change nothing.')}
+            value={role}
+            choices={(Object.keys(ROLES) as Role[]).map((value) => ({ value, text: i18n._(ROLES[value]) }))}
+            onChange={setRole}
+          />
+          <ChoiceField
+            label={i18n._('Expires after')}
+            value={lifetime}
+            choices={LIFETIMES.map(({ value, text }) => ({ value, text: i18n._(text) }))}
+            onChange={setLifetime}
+          />
+        </Form>
+      </ModalBody>
+      <ModalFooter>
+        <Button
+          type="submit"
+          form="create-token-form"
+          isLoading={create.isPending}
+          isDisabled={!name || create.isPending}
+        >
+          {i18n._('Create')}
+        </Button>
+        <Button variant="link" onClick={onClose}>
+          {i18n._('Cancel')}
+        </Button>
+      </ModalFooter>
+    </Modal>
+  );
+}

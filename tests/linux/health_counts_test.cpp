@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <atomic>
 #include <future>
 #include <map>
 #include <new>
@@ -50,7 +51,9 @@ TEST(RecentHealth, ChecksAgainOnlyWhenTheResultIsOld) {
 TEST(RecentHealth, ReturnsTheLastCountsWhileACheckRuns) {
   std::promise<void> begun;
   std::promise<void> may_end;
+  std::atomic<bool> is_second = false;
   const auto check = [&] {
+    if (is_second.exchange(true)) return Report();
     begun.set_value();
     may_end.get_future().wait();
     return Report();

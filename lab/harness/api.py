@@ -79,6 +79,13 @@ def call(api, method, api_version=1, **parameters):
     return _data(answer(api, method, api_version, **parameters))
 
 
+def rehearse(api, method, **parameters):
+    """What a call would do. Raises Refused if the call would fail."""
+    body = request("POST", _path(api, method) + "?rehearse=true", json.dumps(parameters))[1]
+    _data(body)
+    return body["rehearsal"]
+
+
 def upload(api, method, field, content):
     """Like call(), with a file."""
     boundary = "a-boundary-that-no-keytab-has"

@@ -116,6 +116,9 @@ BREAKS = [
     Break("pending-rules-unseen", "a check finds what is not in force", "health",
           source=("return std::move(update->changed);", "s/return std::move(update->changed);/"
                   "return std::set<std::string>();/"), select="not_in_force"),
+    Break("any-client-id", "the end of a client's state ends no other client's", "clients",
+          source=("(*text).client_id != client_id) return left;",
+                  "s/if (ParseClientInfo([*]text).client_id != client_id) return left;//"), select="loses_its_locks"),
     Break("upgrade-restarts-nfs", "an upgrade leaves NFS alone", "package",
           _package("sed -i '$i systemctl restart nfs-server || true' postinst"), select="upgrade"),
 ]

@@ -200,6 +200,14 @@ async function health() {
   assert.equal(kinds.length, answer.total);
 }
 
+async function clients() {
+  const list = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.Client/v1/list', { body: { filter: '192.0.2.1' } }));
+  const addresses: (string | null)[] = list.clients.map((row) => row.address);
+  assert.deepEqual(addresses, []);
+  const gone = await client.POST('/api/VORN.Core.FileServ.NFS.Client/v1/disconnect', { body: { id: 7, client_id: '0x1' } });
+  assert.equal(gone.error?.error.code, 2395);
+}
+
 async function revisions() {
   const get = await client.POST('/api/VORN.Core.FileServ.NFS/v1/get', { body: {} });
   const tag = get.response.headers.get('etag') ?? '';
@@ -279,6 +287,7 @@ await shares();
 await access();
 await matrix();
 await health();
+await clients();
 await history();
 await revisions();
 await sessions();

@@ -58,7 +58,7 @@ TEST(ClientStates, CountAFileThatTheKernelDoesNotName) {
 
 // The kernel writes the name of a file as it is.
 TEST(ClientStates, AreNotForgedByTheNameOfAFile) {
-  const std::string names[] = {"a\", superblock: \"62:00:99\", filename: \"b",  // another file
+  const std::string names[] = {"a\", superblock: \"62:00:13\", filename: \"b",  // another file
                                "a\n",
                                "a\n- 0x1: { type: lock, ",
                                "a\" }\n" + Lock(1, "b"),                 // the id of a state that is there

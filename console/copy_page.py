@@ -1,6 +1,7 @@
-"""copy_page.py SOURCE TARGET: copies the files of a built page, and a compressed form X.gz of each file X beside it.
+"""copy_page.py SOURCE TARGET: copies the files of a built page, and a compressed form X.gz beside each large file X.
 
-The same files give the same bytes on every machine of one version of zlib.
+Answers up to 1 KiB are not compressed, as everywhere in the server; index.html is such an answer. The same files give the
+same bytes on every machine of one version of zlib.
 """
 
 import gzip
@@ -8,11 +9,13 @@ import pathlib
 import shutil
 import sys
 
+LARGEST_PLAIN = 1024  # bytes
+
 
 def copy(source, target):
     shutil.rmtree(target, ignore_errors=True)
     shutil.copytree(source, target)
-    for path in [path for path in target.rglob("*") if path.is_file()]:
+    for path in [path for path in target.rglob("*") if path.is_file() and path.stat().st_size > LARGEST_PLAIN]:
         packed = gzip.compress(path.read_bytes(), compresslevel=9, mtime=0)
         path.with_name(path.name + ".gz").write_bytes(packed)
 

@@ -30,7 +30,9 @@ test('a rule is added, shown as a line of exports(5), and saved', async ({ page,
   await axe();
   expect(await exportsOf(box)).not.toContain('/volume1/data');
   await page.getByRole('button', { name: 'Review and save' }).click();
-  await expect(page.getByRole('dialog').getByText('gets access')).toBeVisible();
+  const effects = page.getByRole('dialog').getByRole('listitem');
+  await expect(effects.filter({ hasText: '10.0.0.0/24' })).toContainText('gets access');
+  await expect(effects.filter({ hasText: 'work05.example.net (10.0.0.5)' })).toContainText('gets access');
   await page.getByRole('dialog').getByRole('button', { name: 'Save', exact: true }).click();
   await expect(page.getByRole('dialog')).toBeHidden();
   expect(await exportsOf(box)).toContain('/volume1/data 10.0.0.0/24(rw,');

@@ -398,7 +398,7 @@ Content History::ContentOf(const std::string& path, const StoredFile& file) cons
   return Shown(path, file.version.exists ? std::optional<std::string_view>(file.text) : std::nullopt);
 }
 
-// What was read of the journal is perhaps not applied.
+// The records that were read of the journal are perhaps not applied.
 void History::Warn(const std::string& what, const Status& status) {
   is_stale_ = true;
   Notice(what + ": " + status.reason());

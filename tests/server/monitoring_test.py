@@ -107,7 +107,7 @@ class Monitoring(unittest.TestCase):
     def setUpClass(cls):
         cls.server = cls.enterClassContext(TrialServer())
         statistics = cls.server.root / "proc/net/rpc/nfsd"
-        statistics.parent.mkdir(parents=True)
+        statistics.parent.mkdir(parents=True, exist_ok=True)
         statistics.write_text(KERNEL_STATISTICS, encoding="ascii")
         cls.server.call("/api/VORN.Core.FileServ.NFS/v1/get", {})
         status, answer = cls.server.call("/api/VORN.Server.Token/v1/create", {"name": "prometheus", "role": "reader"})

@@ -1,17 +1,8 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import {
-  Alert,
-  Button,
-  FileUpload,
-  Form,
-  FormGroup,
-  Modal,
-  ModalBody,
-  ModalFooter,
-  ModalHeader,
-} from '@patternfly/react-core';
+import { Alert, Button, FileUpload, FormGroup } from '@patternfly/react-core';
 import { ChangeDialog } from '../../shared/change-dialog';
+import { FormDialog } from '../../shared/form-dialog';
 import { Loaded } from '../../shared/page';
 import { useRead } from '../../shared/use-read';
 import { parseLines } from './lines';
@@ -68,68 +59,59 @@ export function CreateMappings({ onClose }: { onClose: () => void }) {
     );
   }
   return (
-    <Modal isOpen variant="medium" onClose={onClose} aria-labelledby="create-mappings">
-      <ModalHeader title={i18n._('Add mappings')} labelId="create-mappings" />
-      <ModalBody tabIndex={0}>
-        <Form
-          id="create-mappings-form"
-          onSubmit={(event) => {
-            event.preventDefault();
-            setReviewed(true);
+    <FormDialog
+      id="create-mappings"
+      title={i18n._('Add mappings')}
+      submit={i18n._('Review')}
+      isValid={mappings.length > 0 && faulty.length === 0}
+      isWide
+      onSubmit={() => {
+        setReviewed(true);
+      }}
+      onClose={onClose}
+    >
+      <FormGroup
+        label={i18n._('One mapping a line: the principal, a comma, the user of the box')}
+        fieldId="mappings"
+        isRequired
+      >
+        <FileUpload
+          id="mappings"
+          type="text"
+          value={text}
+          filename={name}
+          allowEditingUploadedText
+          filenamePlaceholder={i18n._('Type or paste below, or drag a CSV file here')}
+          browseButtonText={i18n._('Choose')}
+          clearButtonText={i18n._('Clear')}
+          filenameAriaLabel={i18n._('CSV file')}
+          aria-label={i18n._('Mappings')}
+          onFileInputChange={(_event, file) => {
+            setName(file.name);
+            void file.text().then(setText);
           }}
-        >
-          <FormGroup
-            label={i18n._('One mapping a line: the principal, a comma, the user of the box')}
-            fieldId="mappings"
-            isRequired
-          >
-            <FileUpload
-              id="mappings"
-              type="text"
-              value={text}
-              filename={name}
-              allowEditingUploadedText
-              filenamePlaceholder={i18n._('Type or paste below, or drag a CSV file here')}
-              browseButtonText={i18n._('Choose')}
-              clearButtonText={i18n._('Clear')}
-              filenameAriaLabel={i18n._('CSV file')}
-              aria-label={i18n._('Mappings')}
-              onFileInputChange={(_event, file) => {
-                setName(file.name);
-                void file.text().then(setText);
-              }}
-              onTextChange={(_event, value) => {
-                setText(value);
-              }}
-              onClearClick={() => {
-                setName('');
-                setText('');
-              }}
-            />
-          </FormGroup>
-          {faulty.length > 0 && (
-            <Alert
-              variant="danger"
-              isInline
-              component="h2"
-              title={i18n._('These lines are no mappings: {lines}', { lines: faulty.slice(0, 20).join(', ') })}
-            />
-          )}
-          <Suggestions
-            onChoose={(line) => {
-              setText(text === '' || text.endsWith('\n') ? text + line + '\n' : `${text}\n${line}\n`);
-            }}
-          />
-        </Form>
-      </ModalBody>
-      <ModalFooter>
-        <Button type="submit" form="create-mappings-form" isDisabled={mappings.length === 0 || faulty.length > 0}>
-          {i18n._('Review')}
-        </Button>
-        <Button variant="link" onClick={onClose}>
-          {i18n._('Cancel')}
-        </Button>
-      </ModalFooter>
-    </Modal>
+          onTextChange={(_event, value) => {
+            setText(value);
+          }}
+          onClearClick={() => {
+            setName('');
+            setText('');
+          }}
+        />
+      </FormGroup>
+      {faulty.length > 0 && (
+        <Alert
+          variant="danger"
+          isInline
+          component="h2"
+          title={i18n._('These lines are no mappings: {lines}', { lines: faulty.slice(0, 20).join(', ') })}
+        />
+      )}
+      <Suggestions
+        onChoose={(line) => {
+          setText(text === '' || text.endsWith('\n') ? text + line + '\n' : `${text}\n${line}\n`);
+        }}
+      />
+    </FormDialog>
   );
 }

@@ -1,8 +1,8 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Button, Form, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
 import { ChangeDialog } from '../../shared/change-dialog';
 import { TextField } from '../../shared/fields';
+import { FormDialog } from '../../shared/form-dialog';
 import type { Mapping } from './data';
 
 export function DeleteMapping({ mapping, onClose }: { mapping: Mapping; onClose: () => void }) {
@@ -43,28 +43,18 @@ export function ChangeMapping({ mapping, onClose }: { mapping: Mapping; onClose:
   }
   const isChanged = principal !== mapping.kerberos_principal || user !== mapping.local_name;
   return (
-    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="change-mapping">
-      <ModalHeader title={i18n._('Change the mapping')} labelId="change-mapping" />
-      <ModalBody>
-        <Form
-          id="change-mapping-form"
-          onSubmit={(event) => {
-            event.preventDefault();
-            setReviewed(true);
-          }}
-        >
-          <TextField label={i18n._('Principal')} value={principal} isRequired onChange={setPrincipal} />
-          <TextField label={i18n._('User of the box')} value={user} isRequired onChange={setUser} />
-        </Form>
-      </ModalBody>
-      <ModalFooter>
-        <Button type="submit" form="change-mapping-form" isDisabled={!principal || !user || !isChanged}>
-          {i18n._('Review and save')}
-        </Button>
-        <Button variant="link" onClick={onClose}>
-          {i18n._('Cancel')}
-        </Button>
-      </ModalFooter>
-    </Modal>
+    <FormDialog
+      id="change-mapping"
+      title={i18n._('Change the mapping')}
+      submit={i18n._('Review and save')}
+      isValid={!!principal && !!user && isChanged}
+      onSubmit={() => {
+        setReviewed(true);
+      }}
+      onClose={onClose}
+    >
+      <TextField label={i18n._('Principal')} value={principal} isRequired onChange={setPrincipal} />
+      <TextField label={i18n._('User of the box')} value={user} isRequired onChange={setUser} />
+    </FormDialog>
   );
 }

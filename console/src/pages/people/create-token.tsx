@@ -1,8 +1,9 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Button, ClipboardCopy, Form, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
+import { Alert, Button, ClipboardCopy, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
 import { useChange } from '../../shared/change-dialog';
 import { ChoiceField, TextField } from '../../shared/fields';
+import { FormDialog } from '../../shared/form-dialog';
 import { Problem } from '../../shared/problem';
 import { ROLES, type Role } from './role';
 
@@ -51,56 +52,42 @@ export function CreateToken({ onClose }: { onClose: () => void }) {
   });
   if (secret) return <Secret secret={secret} onClose={onClose} />;
   return (
-    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="create-token">
-      <ModalHeader title={i18n._('Create a token')} labelId="create-token" />
-      <ModalBody>
-        <Form
-          id="create-token-form"
-          onSubmit={(event) => {
-            event.preventDefault();
-            create.mutate({
-              method: 'VORN.Server.Token/v1/create',
-              parameters: { name, role, ...(lifetime > 0 && { expires_in: lifetime }) },
-              tag: null,
-            });
-          }}
-        >
-          {create.error && <Problem error={create.error} />}
-          <TextField
-            label={i18n._('Name')}
-            help={i18n._('The program or the machine that will use the token.')}
-            value={name}
-            isRequired
-            onChange={setName}
-          />
-          <ChoiceField
-            label={i18n._('Role')}
-            help={i18n._('A reader can look at everything and change nothing.')}
-            value={role}
-            choices={(Object.keys(ROLES) as Role[]).map((value) => ({ value, text: i18n._(ROLES[value]) }))}
-            onChange={setRole}
-          />
-          <ChoiceField
-            label={i18n._('Expires after')}
-            value={lifetime}
-            choices={LIFETIMES.map(({ value, text }) => ({ value, text: i18n._(text) }))}
-            onChange={setLifetime}
-          />
-        </Form>
-      </ModalBody>
-      <ModalFooter>
-        <Button
-          type="submit"
-          form="create-token-form"
-          isLoading={create.isPending}
-          isDisabled={!name || create.isPending}
-        >
-          {i18n._('Create')}
-        </Button>
-        <Button variant="link" onClick={onClose}>
-          {i18n._('Cancel')}
-        </Button>
-      </ModalFooter>
-    </Modal>
+    <FormDialog
+      id="create-token"
+      title={i18n._('Create a token')}
+      submit={i18n._('Create')}
+      isValid={!!name}
+      isPending={create.isPending}
+      onSubmit={() => {
+        create.mutate({
+          method: 'VORN.Server.Token/v1/create',
+          parameters: { name, role, ...(lifetime > 0 && { expires_in: lifetime }) },
+          tag: null,
+        });
+      }}
+      onClose={onClose}
+    >
+      {create.error && <Problem error={create.error} />}
+      <TextField
+        label={i18n._('Name')}
+        help={i18n._('The program or the machine that will use the token.')}
+        value={name}
+        isRequired
+        onChange={setName}
+      />
+      <ChoiceField
+        label={i18n._('Role')}
+        help={i18n._('A reader can look at everything and change nothing.')}
+        value={role}
+        choices={(Object.keys(ROLES) as Role[]).map((value) => ({ value, text: i18n._(ROLES[value]) }))}
+        onChange={setRole}
+      />
+      <ChoiceField
+        label={i18n._('Expires after')}
+        value={lifetime}
+        choices={LIFETIMES.map(({ value, text }) => ({ value, text: i18n._(text) }))}
+        onChange={setLifetime}
+      />
+    </FormDialog>
   );
 }

@@ -1,8 +1,9 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Button, Content, Form, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
+import { Content } from '@patternfly/react-core';
 import { ChangeDialog } from '../../shared/change-dialog';
 import { TextField } from '../../shared/fields';
+import { FormDialog } from '../../shared/form-dialog';
 import { go, linkTo } from '../../shared/router';
 
 /** Asks for the name and the path of a new shared folder, and then for a confirmation. */
@@ -28,42 +29,32 @@ export function CreateShare({ onClose }: { onClose: () => void }) {
     );
   }
   return (
-    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="create-share">
-      <ModalHeader title={i18n._('Share a folder')} labelId="create-share" />
-      <ModalBody>
-        <Form
-          id="create-share-form"
-          onSubmit={(event) => {
-            event.preventDefault();
-            setReviewed(true);
-          }}
-        >
-          <TextField
-            label={i18n._('Name')}
-            help={i18n._('How the folder is called here. Clients mount it by its path.')}
-            value={name}
-            isRequired
-            onChange={setName}
-          />
-          <TextField
-            label={i18n._('Folder on the box')}
-            help={i18n._('The whole path of a folder that exists, for example /volume1/photos.')}
-            value={path}
-            isRequired
-            error={path && !path.startsWith('/') ? i18n._('A path begins with /.') : undefined}
-            onChange={setPath}
-          />
-        </Form>
-      </ModalBody>
-      <ModalFooter>
-        <Button type="submit" form="create-share-form" isDisabled={!name || !path.startsWith('/')}>
-          {i18n._('Review')}
-        </Button>
-        <Button variant="link" onClick={onClose}>
-          {i18n._('Cancel')}
-        </Button>
-      </ModalFooter>
-    </Modal>
+    <FormDialog
+      id="create-share"
+      title={i18n._('Share a folder')}
+      submit={i18n._('Review')}
+      isValid={!!name && path.startsWith('/')}
+      onSubmit={() => {
+        setReviewed(true);
+      }}
+      onClose={onClose}
+    >
+      <TextField
+        label={i18n._('Name')}
+        help={i18n._('How the folder is called here. Clients mount it by its path.')}
+        value={name}
+        isRequired
+        onChange={setName}
+      />
+      <TextField
+        label={i18n._('Folder on the box')}
+        help={i18n._('The whole path of a folder that exists, for example /volume1/photos.')}
+        value={path}
+        isRequired
+        error={path && !path.startsWith('/') ? i18n._('A path begins with /.') : undefined}
+        onChange={setPath}
+      />
+    </FormDialog>
   );
 }
 

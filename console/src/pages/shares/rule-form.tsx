@@ -1,17 +1,8 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import {
-  Alert,
-  Button,
-  Checkbox,
-  Form,
-  FormGroup,
-  Modal,
-  ModalBody,
-  ModalFooter,
-  ModalHeader,
-} from '@patternfly/react-core';
+import { Alert, Checkbox, FormGroup } from '@patternfly/react-core';
 import { ChoiceField, SwitchField, TextField } from '../../shared/fields';
+import { FormDialog } from '../../shared/form-dialog';
 import { addressCount, overlaps, parseClient } from './client';
 import {
   FLAVORS,
@@ -163,55 +154,46 @@ export function RuleForm({
   };
   const isValid = isComplete(value) && !clientFault(value.client);
   return (
-    <Modal isOpen variant="medium" onClose={onClose} aria-labelledby="rule-form-title">
-      <ModalHeader title={isNew ? i18n._('New rule') : i18n._('Change the rule')} labelId="rule-form-title" />
-      <ModalBody tabIndex={0}>
-        <Form
-          id="rule-form"
-          onSubmit={(event) => {
-            event.preventDefault();
-            if (isValid) onDone(value);
-          }}
-        >
-          <TextField
-            label={i18n._('Client')}
-            value={value.client}
-            help={clientHelp(value.client)}
-            error={clientFault(value.client)}
-            isRequired
-            onChange={(client) => {
-              change({ client });
-            }}
-          />
-          <Overlaps clients={clients.with(index, value.client)} index={index} />
-          <ChoiceField
-            label={i18n._('Access')}
-            value={value.privilege ?? ''}
-            choices={choicesOf<string>(PRIVILEGES, value.privilege !== undefined)}
-            onChange={(privilege) => {
-              change({ privilege: privilege as NonNullable<StoredRule['privilege']> });
-            }}
-          />
-          <ChoiceField
-            label={i18n._('Who the users of the client are on the box')}
-            value={value.root_squash ?? ''}
-            choices={choicesOf<string>(SQUASHES, value.root_squash !== undefined)}
-            onChange={(squash) => {
-              change({ root_squash: squash as NonNullable<StoredRule['root_squash']> });
-            }}
-          />
-          <SecurityGroup rule={value} onChange={change} />
-          <OptionSwitches rule={value} onChange={change} />
-        </Form>
-      </ModalBody>
-      <ModalFooter>
-        <Button type="submit" form="rule-form" isDisabled={!isValid}>
-          {isNew ? i18n._('Add the rule') : i18n._('Take over')}
-        </Button>
-        <Button variant="link" onClick={onClose}>
-          {i18n._('Cancel')}
-        </Button>
-      </ModalFooter>
-    </Modal>
+    <FormDialog
+      id="edit-rule"
+      title={isNew ? i18n._('New rule') : i18n._('Change the rule')}
+      submit={isNew ? i18n._('Add the rule') : i18n._('Take over')}
+      isValid={isValid}
+      isWide
+      onSubmit={() => {
+        onDone(value);
+      }}
+      onClose={onClose}
+    >
+      <TextField
+        label={i18n._('Client')}
+        value={value.client}
+        help={clientHelp(value.client)}
+        error={clientFault(value.client)}
+        isRequired
+        onChange={(client) => {
+          change({ client });
+        }}
+      />
+      <Overlaps clients={clients.with(index, value.client)} index={index} />
+      <ChoiceField
+        label={i18n._('Access')}
+        value={value.privilege ?? ''}
+        choices={choicesOf<string>(PRIVILEGES, value.privilege !== undefined)}
+        onChange={(privilege) => {
+          change({ privilege: privilege as NonNullable<StoredRule['privilege']> });
+        }}
+      />
+      <ChoiceField
+        label={i18n._('Who the users of the client are on the box')}
+        value={value.root_squash ?? ''}
+        choices={choicesOf<string>(SQUASHES, value.root_squash !== undefined)}
+        onChange={(squash) => {
+          change({ root_squash: squash as NonNullable<StoredRule['root_squash']> });
+        }}
+      />
+      <SecurityGroup rule={value} onChange={change} />
+      <OptionSwitches rule={value} onChange={change} />
+    </FormDialog>
   );
 }

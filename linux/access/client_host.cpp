@@ -94,6 +94,12 @@ ClientHost FindClientHost(const std::string& client, const NameService& service,
   return host;
 }
 
+bool NeedsNames(const ExportList& exports) {
+  return std::any_of(exports.begin(), exports.end(), [](const TableExport& one) {
+    return one.kind == ExportKind::kPattern || one.kind == ExportKind::kNetgroup;
+  });
+}
+
 bool MatchesExport(ClientHost* client, const TableExport& one, const NameService& service, HostAddresses* hosts) {
   if (client->addresses.empty()) return false;
   switch (one.kind) {

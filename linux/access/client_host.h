@@ -22,8 +22,11 @@ struct ClientHost {
   std::vector<std::string> compared;
 };
 
+// Whether one of the exports is for a pattern of names or for a netgroup, which take the names of a client.
+bool NeedsNames(const ExportList& exports);
+
 // Finds the client of an address or a host name. mountd asks for the names of an address only if `needs_names`: if the
-// table has a pattern or a netgroup.
+// table has an export for which NeedsNames() is true.
 ClientHost FindClientHost(const std::string& client, const NameService& service, bool needs_names);
 
 // Whether mountd takes the client for one of this export's clients. A host name in the table stands for its addresses

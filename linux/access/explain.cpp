@@ -164,7 +164,9 @@ class Explanation {
             "rule", "Another file system is mounted on the way to " + path_ + ", and no rule opens it to this client.",
             "Add a rule for the client to this share.");
       case Outcome::kFolder:
-        return checks_.Fail("rule", Described(*decider_) + " is for another file system and has no \"crossmnt\".",
+        return checks_.Fail("rule",
+                            Described(in_force_.exports[decision_.decider.value()]) +
+                                " is for another file system and has no \"crossmnt\".",
                             "Add a rule for the client to this share.");
     }
   }
@@ -295,12 +297,6 @@ class Explanation {
   AccessChecks checks_;
   VORN::AccessAnswer answer_;
 };
-
-bool NeedsNames(const ExportList& exports) {
-  return std::any_of(exports.begin(), exports.end(), [](const TableExport& one) {
-    return one.kind == ExportKind::kPattern || one.kind == ExportKind::kNetgroup;
-  });
-}
 
 }  // namespace
 

@@ -16,7 +16,7 @@ class Decider {
       const TableExport& one = exports[index];
       if (IsBelow(one.directory, question.directory)) {
         has_inner_ = has_inner_ || question.matches(one);
-      } else if (one.directory == question.directory || IsBelow(question.directory, one.directory)) {
+      } else if (IsAtOrBelow(question.directory, one.directory)) {
         if (question.matches(one)) matching_.push_back(index);
       }
     }
@@ -56,7 +56,7 @@ class Decider {
 
   bool IsMountPointBetween(const std::string& outer) const {
     return std::any_of(question_.mount_points.begin(), question_.mount_points.end(), [&](const std::string& point) {
-      return IsBelow(point, outer) && (point == question_.directory || IsBelow(question_.directory, point));
+      return IsBelow(point, outer) && IsAtOrBelow(question_.directory, point);
     });
   }
 

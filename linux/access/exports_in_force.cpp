@@ -9,6 +9,7 @@
 #include "exports_client.h"
 #include "exports_files.h"
 #include "exports_text.h"
+#include "line_numbers.h"
 #include "path_resolver.h"
 
 namespace vorn {
@@ -25,9 +26,10 @@ using Places = std::map<std::pair<std::string, std::string>, Place>;
 
 void AddPlaces(const ExportsFile& file, const HostAddresses& hosts, PathResolver* resolver, Places* places) {
   const auto lines = file.document.Lines();
+  LineNumbers numbers(file.document.text());
   for (const ExportLine& line : *lines) {
     const std::string directory = resolver->Resolve(line.path);
-    const int number = std::stoi(file.document.Place(line.span.path));
+    const int number = numbers.At(line.span.path);
     for (const ExportEntry& entry : line.entries) {
       const Place place{file.path, number, entry.client};
       const std::string key = ExportClientKey(entry.client);

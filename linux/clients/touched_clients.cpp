@@ -9,6 +9,7 @@
 #include "client_list.h"
 #include "export_decision.h"
 #include "exports_in_force.h"
+#include "folder_path.h"
 #include "host_names.h"
 #include "mount_table.h"
 
@@ -22,12 +23,6 @@ NameService NoNames() {
   return {[](const std::string& /*host*/) { return std::nullopt; },
           [](const std::string& /*address*/) { return std::nullopt; },
           [](const std::string& /*netgroup*/, const std::string& /*host*/) { return false; }};
-}
-
-bool IsAtOrBelow(const std::string& path, const std::string& directory) {
-  return path == directory || directory == "/" ||
-         (path.size() > directory.size() && path[directory.size()] == '/' &&
-          path.compare(0, directory.size(), directory) == 0);
 }
 
 // The facts that all comparisons have in common.
@@ -61,9 +56,7 @@ class Rules {
     for (const TableExport& one : in_force.exports) {
       if (IsAtOrBelow(path, one.directory)) exports_.push_back(one);
     }
-    needs_names_ = std::any_of(exports_.begin(), exports_.end(), [](const TableExport& one) {
-      return one.kind == ExportKind::kPattern || one.kind == ExportKind::kNetgroup;
-    });
+    needs_names_ = NeedsNames(exports_);
   }
 
   std::size_t size() const { return exports_.size(); }

@@ -2,36 +2,15 @@
 
 #include <sys/stat.h>
 
-#include <algorithm>
-#include <cstddef>
 #include <utility>
 
 #include "box_paths.h"
 #include "kernel_statistics.h"
+#include "line_numbers.h"
 #include "path_resolver.h"
 
 namespace vorn {
 namespace {
-
-// Counts the lines of a text up to positions that only grow, so that numbering all lines takes one pass.
-class LineNumbers {
- public:
-  explicit LineNumbers(const std::string& text) : text_(text) {}
-
-  int At(std::size_t position) {
-    const auto begin = text_.begin();
-    number_ += static_cast<int>(std::count(begin + Offset(counted_), begin + Offset(position), '\n'));
-    counted_ = position;
-    return number_;
-  }
-
- private:
-  static std::ptrdiff_t Offset(std::size_t position) { return static_cast<std::ptrdiff_t>(position); }
-
-  const std::string& text_;
-  std::size_t counted_ = 0;
-  int number_ = 1;
-};
 
 void ReadShares(HealthInput* input) {
   Result<std::vector<SharedFolder>> shares = ListShares(input->box);

@@ -33,8 +33,6 @@ bool IsForeign(std::string_view type) {
   return type.substr(0, 5) == "fuse." || std::find(kForeign.begin(), kForeign.end(), type) != kForeign.end();
 }
 
-bool IsAtOrBelow(const std::string& path, const std::string& folder) { return path == folder || IsBelow(path, folder); }
-
 // Whether the file system lacks file handles, by which the server identifies files to its clients. Any other
 // error than EOPNOTSUPP says nothing about the file system.
 bool LacksHandles(const std::string& target) {

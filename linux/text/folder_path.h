@@ -16,6 +16,10 @@ inline bool IsBelow(std::string_view path, std::string_view folder) {
   return path.size() > folder.size() && path[folder.size()] == '/' && path.substr(0, folder.size()) == folder;
 }
 
+inline bool IsAtOrBelow(std::string_view path, std::string_view folder) {
+  return path == folder || IsBelow(path, folder);
+}
+
 // Returns the folders from "/" to `path`, which is the last one.
 inline std::vector<std::string> WayTo(const std::string& path) {
   std::vector<std::string> way = {"/"};

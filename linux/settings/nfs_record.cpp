@@ -268,7 +268,10 @@ Status Check(const NFSConfiguration& configuration, const NFSConfRecord& now, co
 Result<NFSConfRecord> ReadNFSRecord(Box& box) {
   const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
   if (!configuration.ok()) return configuration.status();
-  return RecordOf(*configuration);
+  const auto make = [&] { return Result<NFSConfRecord>(RecordOf(*configuration)); };
+  const auto record = box.Derive<NFSConfRecord>("", configuration->files().sources(), make);
+  if (!record.ok()) return record.status();
+  return **record;
 }
 
 Status WriteNFSRecord(Box& box, const NFSConfRecord& record) {

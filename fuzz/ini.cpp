@@ -22,6 +22,15 @@ void RequireSameAfterReading(const IniDocument& document) {
   }
 }
 
+// A key whose last value is in a section with an argument has no value, and no edit gives it one.
+void RequireUnchangeable(IniDocument* document, const vorn::IniKey& key, const vorn::IniValue& value) {
+  const std::string before = document->Text();
+  document->Set(*vorn::IniSection::From("Static"), key, value);
+  Require(!document->Get("Static", key.text()));
+  Require(!document->Remove("Static", key.text()));
+  Require(document->Text() == before);
+}
+
 // The first line is the key, the second the value, the rest the file.
 std::string_view TakeLine(std::string_view* text) {
   const std::string_view line = text->substr(0, text->find('\n'));
@@ -38,6 +47,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   IniDocument document = IniDocument::Parse(text);
   Require(document.Text() == text);
   if (!key || !value) return 0;
+  const auto last = document.FindLast("Static", key->text());
+  if (last && last->is_hidden) {
+    RequireUnchangeable(&document, *key, *value);
+    return 0;
+  }
 
   const std::string others = EntriesOf(document, "General");
   const std::string tail(text.substr(document.Text().find_last_of('\n') + 1));

@@ -111,9 +111,17 @@ Status Box::Confirm(const std::string& path) {
   return status.ok() ? store_->Confirm(path) : status;
 }
 
+// The mode is a part of a file's version. A context that has read the file must not take the new version for a change
+// by somebody else.
 Status Box::SetMode(const std::string& path, unsigned mode) {
-  const Status status = CheckMayWrite(path);
-  return status.ok() ? store_->SetMode(path, mode) : status;
+  if (Status status = CheckMayWrite(path); !status.ok()) return status;
+  const Result<Version> before = store_->VersionOf(path);
+  if (!before.ok()) return before.status();
+  if (Status status = FirstReads::Check(*this, path, *before); !status.ok()) return status;
+  if (Status status = store_->SetMode(path, mode); !status.ok()) return status;
+  const Result<Version> after = store_->VersionOf(path);
+  if (after.ok()) FirstReads::Renew(*this, path, *after);
+  return after.status();
 }
 
 bool Box::Exists(const std::string& path) const {

@@ -9,6 +9,7 @@
 
 #include "call.h"
 #include "core.h"
+#include "current_box.h"
 #include "keytab_maker.h"
 #include "nfsconf.h"
 #include "status.h"
@@ -93,6 +94,19 @@ TEST_F(KeytabImport, ReplacesAnOlderKeytabWhoeverMayReadIt) {
   EXPECT_EQ(Import(good_), 0);
   EXPECT_EQ(root_.Read(kInstalled), good_);
   EXPECT_EQ(InstalledMode(), 0600U);
+}
+
+// A call with If-Match reads the keytab before it replaces it.
+TEST_F(KeytabImport, ReplacesAKeytabThatTheContextHasRead) {
+  ASSERT_EQ(Import(EncodeFile({EncodeEntry("former", "LAB.TEST", 17)})), 0);
+  const VornConf configuration;
+  ASSERT_TRUE(vorn::CurrentBox().Read(kInstalled).ok());
+  EXPECT_EQ(Import(good_), 0);
+  EXPECT_EQ(root_.Read(kInstalled), good_);
+  root_.Write(kInstalled, "by hand");
+  EXPECT_LT(Import(good_), 0);
+  EXPECT_EQ(KLIBCErrGet(), vorn::kChangedBehind);
+  EXPECT_EQ(root_.Read(kInstalled), "by hand");
 }
 
 TEST_F(KeytabImport, WarnsOfAFormerKeyThatTheNewKeytabLacks) {

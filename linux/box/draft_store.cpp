@@ -18,10 +18,6 @@ class NoLock : public HeldLock {};
 std::string FolderOf(const std::string& path) { return path.substr(0, path.rfind('/')); }
 std::string NameOf(const std::string& path) { return path.substr(path.rfind('/') + 1); }
 
-std::optional<std::string> ContentOf(const StoredFile& file) {
-  return file.version.exists ? std::optional<std::string>(file.text) : std::nullopt;
-}
-
 bool ComesBefore(const std::string& a, const std::string& b) { return strverscmp(a.c_str(), b.c_str()) < 0; }
 
 void Put(const std::string& name, bool exists, std::vector<std::string>* names) {
@@ -124,8 +120,8 @@ std::vector<DraftStore::ChangedFile> DraftStore::Changes() const {
   const std::lock_guard lock(mutex_);
   std::vector<ChangedFile> changes;
   for (const auto& [location, file] : files_) {
-    if (file.written_as.empty() || ContentOf(file.snapshot) == ContentOf(file.now)) continue;
-    changes.push_back({file.written_as, ContentOf(file.snapshot), ContentOf(file.now)});
+    if (file.written_as.empty() || file.snapshot.content() == file.now.content()) continue;
+    changes.push_back({file.written_as, file.snapshot.content(), file.now.content()});
   }
   std::sort(changes.begin(), changes.end(), [](const ChangedFile& a, const ChangedFile& b) { return a.path < b.path; });
   return changes;

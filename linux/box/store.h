@@ -6,6 +6,7 @@
 #include <chrono>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -31,6 +32,9 @@ struct StoredFile {
   // Whether a later equal version guarantees an equal text. A file that was changed in the same clock
   // tick in which it was read could change once more without a new version.
   bool is_settled = false;
+
+  // Returns the text; nullopt if there is no file, which differs from an empty one.
+  std::optional<std::string> content() const { return version.exists ? std::optional(text) : std::nullopt; }
 };
 
 // The names in a folder, in the order of strverscmp(3), as they were read.

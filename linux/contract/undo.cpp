@@ -28,10 +28,6 @@ using Plan = std::map<std::string, Planned>;  // by path; only files that change
 
 Undone Refused(int result, Status reason) { return {result, {std::move(reason)}, {}}; }
 
-std::optional<std::string> ContentOf(const StoredFile& file) {
-  return file.version.exists ? std::optional<std::string>(file.text) : std::nullopt;
-}
-
 // Adds a file to the plan. The result of `undone` says if it cannot.
 void PlanFile(Box& box, const History::ChangedFile& file, Plan* plan, Undone* undone) {
   Result<StoredFile> now = box.Read(file.path);
@@ -40,7 +36,7 @@ void PlanFile(Box& box, const History::ChangedFile& file, Plan* plan, Undone* un
     undone->reasons.push_back(std::move(reason));
   };
   if (!now.ok()) return refuse(VORN::kHistoryFailed, now.status());
-  const std::optional<std::string> content = ContentOf(*now);
+  const std::optional<std::string> content = now->content();
   Result<InverseMerge> merged = MergeInverse(file.before, file.after, content);
   if (!merged.ok()) return refuse(VORN::kHistoryFailed, merged.status());
   if (merged->conflicts) {

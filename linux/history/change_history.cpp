@@ -103,6 +103,12 @@ Record CommitRecord(const std::string& change, const HistoryRepository::NewCommi
   return record;
 }
 
+// Whether these actions have no effect without changed files: a save reloads the service whatever it has changed.
+bool ChangedNothing(const std::vector<std::string>& actions) {
+  return std::all_of(actions.begin(), actions.end(),
+                     [](const std::string& action) { return action == "reload: done"; });
+}
+
 Status Malformed() { return Status::Failure(kSyntax, "the journal of the history has an unknown record"); }
 
 }  // namespace
@@ -137,7 +143,7 @@ Status History::TryIntend(const std::string& path, const Content& content) {
   }
   if (Status status = CommitEdits({path}, begins); !status.ok()) return status;
   const std::string name = begins ? NewName() : mine.name;
-  Open change = begins ? Open{DescribeCaller(), SecondsNow(), {}} : open_[name];
+  Open change = begins ? Open{DescribeCaller(), SecondsNow(), {}, false} : open_[name];
   Status status = journal_.Append(IntentRecord(name, change.time, change.message, path, content), true);
   if (!status.ok()) return status;
   mine.name = name;
@@ -153,7 +159,7 @@ void History::Settle(const std::string& path, const Status& status) {
   if (change == open_.end() || change->second.files.count(path) == 0) return;
   // A replacement can fail after its effect: when the folder cannot be synced.
   const Result<StoredFile> present = store_.Read(path);
-  if (present.ok() && ContentOf(path, *present) == change->second.files[path]) return;
+  if (present.ok() && Shown(path, present->content()) == change->second.files[path]) return;
   change->second.files.erase(path);
   const Status dropped = journal_.Append({Kind::kDropped, {change->first, path}}, false);
   if (!dropped.ok()) Warn("The history may show a change of " + path + " that failed", dropped);
@@ -200,7 +206,8 @@ Status History::TryEnd() {
   if (mine.name.empty() && mine.actions.empty()) return {};
   if (Status status = Load(); !status.ok()) return status;
   const auto found = open_.find(mine.name);
-  Open change = found == open_.end() ? Open{DescribeCaller(), SecondsNow(), {}} : found->second;
+  Open change = found == open_.end() ? Open{DescribeCaller(), SecondsNow(), {}, false} : found->second;
+  change.is_rest = found == open_.end() && !mine.name.empty();
   change.message.actions = mine.actions;
   change.message.undoes = mine.undoes;
   if (!mine.undoes.empty()) change.message.kind = kUndo;
@@ -302,7 +309,7 @@ Status History::CompleteOthers() {
     for (auto file = change.files.begin(); file != change.files.end();) {
       const Result<StoredFile> present = store_.Read(file->first);
       if (!present.ok()) return present.status();
-      file = ContentOf(file->first, *present) == file->second ? std::next(file) : change.files.erase(file);
+      file = Shown(file->first, present->content()) == file->second ? std::next(file) : change.files.erase(file);
     }
     if (Status status = Commit(name, std::move(change)); !status.ok()) return status;
   }
@@ -339,9 +346,9 @@ Status History::CommitEdit(const std::string& path) {
   if (!file.ok()) return {};  // whoever changes it fails, too
   const Result<std::string> tip = repository_->Tip();
   if (!tip.ok()) return tip.status();
-  const Content content = ContentOf(path, *file);
+  const Content content = Shown(path, file->content());
   if (!repository_->Has(*tip, path, content)) {
-    Open edit{{}, SecondsNow(), {{path, content}}};
+    Open edit{{}, SecondsNow(), {{path, content}}, false};
     edit.message.kind = repository_->Has(*tip, path, Content()) ? kFound : kByHand;
     if (missed_.erase(path) != 0) edit.message.kind = kUnrecorded;
     if (Status status = Commit("", std::move(edit)); !status.ok()) return status;
@@ -361,7 +368,8 @@ Status History::Commit(const std::string& name, Open change) {
     change.message.files.push_back(path);
     commit.files.emplace(path, std::move(content));
   }
-  const bool is_empty = commit.files.empty() && change.message.actions.empty();
+  const bool is_empty = commit.files.empty() &&
+                        (change.message.actions.empty() || (!change.is_rest && ChangedNothing(change.message.actions)));
   commit.author = change.message.caller.empty() ? change.message.kind : change.message.caller;
   commit.origin = change.message.origin;
   commit.time = change.time;
@@ -392,10 +400,6 @@ Status History::Checkpoint() {
 Content History::Shown(const std::string& path, std::optional<std::string_view> text) const {
   if (!text) return std::nullopt;
   return environment_.shown(path, std::string(*text));
-}
-
-Content History::ContentOf(const std::string& path, const StoredFile& file) const {
-  return Shown(path, file.version.exists ? std::optional<std::string_view>(file.text) : std::nullopt);
 }
 
 // The records that were read of the journal are perhaps not applied.

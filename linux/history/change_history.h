@@ -96,6 +96,7 @@ class History : public ChangeRecorder {
     ChangeMessage message;
     std::int64_t time = 0;
     Files files;
+    bool is_rest = false;  // whether another writer has committed its files, so that its actions are left
   };
 
   Status TryIntend(const std::string& path, const Content& content);
@@ -111,7 +112,6 @@ class History : public ChangeRecorder {
   Status Checkpoint();
   bool IsOpen(const std::string& path) const;
   Content Shown(const std::string& path, std::optional<std::string_view> text) const;
-  Content ContentOf(const std::string& path, const StoredFile& file) const;
   void Warn(const std::string& what, const Status& status);
 
   const Root root_;

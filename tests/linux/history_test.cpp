@@ -144,6 +144,13 @@ TEST_F(HistoryTest, HasAllStepsOfACallAsOneChange) {
   EXPECT_THAT(changes[0].message.actions, ElementsAre("reload: done"));
 }
 
+TEST_F(HistoryTest, HasNoChangeForASaveThatChangedNothing) {
+  VORN::CallContext call(CallOf("alice"));
+  EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
+  call.End();
+  EXPECT_THAT(Changes(), IsEmpty());
+}
+
 TEST_F(HistoryTest, HasAChangeBeforeThoseOfTheNextWriter) {
   VORN::CallContext call(CallOf("alice"));
   ASSERT_TRUE(Save(kFile, "a\n").ok());

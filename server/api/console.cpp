@@ -5,9 +5,9 @@
 #include <algorithm>
 #include <array>
 #include <cstddef>
+#include <cstdint>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <system_error>
 #include <utility>
 
@@ -68,9 +68,12 @@ std::optional<std::string_view> TypeOf(const std::string& path) {
 
 // Returns nullptr if the file cannot be read.
 std::shared_ptr<const std::string> ReadContent(const std::string& path) {
+  std::error_code failure;
+  const std::uintmax_t size = std::filesystem::file_size(path, failure);
+  if (failure) return nullptr;
+  auto content = std::make_shared<std::string>(size, '\0');
   std::ifstream file(path, std::ios::binary);
-  auto content = std::make_shared<std::string>(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
-  if (!file) return nullptr;
+  if (!file.read(content->data(), static_cast<std::streamsize>(size))) return nullptr;
   return content;
 }
 

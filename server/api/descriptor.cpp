@@ -103,8 +103,11 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
   if (!paths.isNull() && !paths.isObject()) return Fault(error, "paths is not an object");
   for (const std::string& path : paths.getMemberNames()) {
     const Json::Value& item = paths[path];
-    const Json::Value operation = item.isObject() ? item["post"] : Json::Value();
-    if (!operation.isObject()) return Fault(error, "paths: \"" + path + "\" needs an operation \"post\"");
+    const Json::Value* post = Find(item, {"post"});
+    if (post == nullptr || !post->isObject()) {
+      return Fault(error, "paths: \"" + path + "\" needs an operation \"post\"");
+    }
+    const Json::Value& operation = *post;
     const Json::Value& reads_only = operation["x-read-only"];
     if (!reads_only.isNull() && !reads_only.isBool()) {
       return Fault(error, "paths: \"" + path + "\": x-read-only is neither true nor false");

@@ -6,6 +6,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "json_input.h"
@@ -21,7 +22,7 @@ Json::Value Base() {
   std::string error;
   std::optional<Json::Value> base = ParseJsonObject(kOpenApiBase, &error);
   if (!base) syslog(LOG_ERR, "openapi.json: %s", error.c_str());
-  return base.value_or(Json::Value(Json::objectValue));
+  return base ? *std::move(base) : Json::Value(Json::objectValue);
 }
 
 Json::Value Reference(const std::string& name) {
@@ -34,14 +35,14 @@ Json::Value Reference(const std::string& name) {
 bool MayBeRehearsed(const Route& route) { return !route.method.reads_only && !route.own; }
 
 // The schema of a whole answer of the route. `member` is "data" or "error".
-Json::Value Envelope(const Route& route, bool success, const char* member, const Json::Value& schema) {
+Json::Value Envelope(const Route& route, bool success, const char* member, Json::Value schema) {
   Json::Value envelope;
   envelope["type"] = "object";
   envelope["required"].append("success");
   envelope["required"].append(member);
   envelope["properties"]["success"]["type"] = "boolean";
   envelope["properties"]["success"]["const"] = success;
-  envelope["properties"][member] = schema;
+  envelope["properties"][member] = std::move(schema);
   envelope["properties"]["warnings"] = Reference("schemas/Warnings");
   if (MayBeRehearsed(route)) envelope["properties"]["rehearsal"] = Reference("schemas/Rehearsal");
   return envelope;
@@ -54,13 +55,14 @@ void WrapResult(const Route& route, Json::Value* operation) {
   if (!response.isMember("description")) response["description"] = "The method succeeded.";
   if (has_tag) response["headers"]["ETag"] = Reference("headers/ETag");
   Json::Value& content = response["content"][kJson];
-  const Json::Value schema = content.get("schema", Json::objectValue);
-  content["schema"] = Envelope(route, true, "data", schema);
+  Json::Value schema(Json::objectValue);
+  if (content.isMember("schema")) schema.swap(content["schema"]);
+  content["schema"] = Envelope(route, true, "data", std::move(schema));
   for (Json::Value& example : content["examples"]) {
-    const Json::Value data = example["value"];
-    example["value"] = Json::objectValue;
-    example["value"]["success"] = true;
-    example["value"]["data"] = data;
+    Json::Value answer;
+    answer["success"] = true;
+    answer["data"].swap(example["value"]);
+    example["value"].swap(answer);
   }
   if (content["examples"].empty()) content.removeMember("examples");
 }
@@ -90,7 +92,7 @@ Json::Value FailureResponse(const Route& route, const std::vector<Code>& codes) 
   }
   Json::Value response;
   response["description"] = description;
-  response["content"][kJson]["schema"] = Envelope(route, false, "error", error);
+  response["content"][kJson]["schema"] = Envelope(route, false, "error", std::move(error));
   return response;
 }
 
@@ -117,7 +119,7 @@ class Document {
     }
   }
 
-  const Json::Value& value() const { return document_; }
+  Json::Value Take() { return std::move(document_); }
 
  private:
   // Adds all schemas of a descriptor, or none.
@@ -175,7 +177,7 @@ Json::Value OpenApiDocument(const Routes& routes) {
   Document document;
   document.Add("VORN.Server.json", ServerDescriptor(), routes);
   for (const Module& module : routes.modules()) document.Add(module.path, module.descriptor, routes);
-  return document.value();
+  return document.Take();
 }
 
 }  // namespace vorn::server

@@ -70,7 +70,7 @@ TEST_F(AuthenticatorTest, TakesABearerToken) {
   }
 }
 
-TEST_F(AuthenticatorTest, AWrongTokenIsNotMadeUpForByThePeer) {
+TEST_F(AuthenticatorTest, RefusesAWrongTokenWhoeverThePeerIs) {
   Head head = AtSocket(0, 0);
   for (const std::string& value :
        {"Bearer " + NewSecret(kTokenPrefix), std::string("Basic cm9vdDp4"), std::string(), std::string("Bearer")}) {
@@ -79,7 +79,7 @@ TEST_F(AuthenticatorTest, AWrongTokenIsNotMadeUpForByThePeer) {
   }
 }
 
-TEST_F(AuthenticatorTest, TwoTokensAreNone) {
+TEST_F(AuthenticatorTest, RefusesTwoTokens) {
   const std::string value = "Bearer " + NewToken();
   Head head;
   head.headers = {{"Authorization", value}, {"Authorization", value}};

@@ -22,7 +22,7 @@ TEST(JsonBody, IsOneObjectHoweverItComes) {
   EXPECT_EQ(std::get<Json::Value>(parameters)["enable_nfs"], true);
 }
 
-TEST(JsonBody, WithoutABytesIsAnEmptyObject) {
+TEST(JsonBody, WithoutBytesIsAnEmptyObject) {
   EXPECT_EQ(std::get<Json::Value>(Read("")), Json::Value(Json::objectValue));
 }
 

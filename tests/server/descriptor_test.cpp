@@ -21,7 +21,7 @@ TEST(Descriptor, HasAPlainTextForCodesItDoesNotKnow) {
   EXPECT_EQ(Descriptor().Describe(2399).text, "The operation failed with error code 2399.");
 }
 
-TEST(Descriptor, WithoutCodesIsStillOne) {
+TEST(Descriptor, NeedsNoCodes) {
   std::string error;
   EXPECT_TRUE(Descriptor::Parse("{}", &error)) << error;
 }

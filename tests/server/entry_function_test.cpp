@@ -159,12 +159,12 @@ TEST_F(EntryFunction, ThatReadsHasATagOfItsData) {
   EXPECT_EQ(TagOfLoaded("a"), "");
 }
 
-TEST_F(EntryFunction, ChangesWhatIsAsTheTagSays) {
+TEST_F(EntryFunction, AppliesAChangeIfTheTagIsCurrent) {
   EXPECT_EQ(SaveIfMatch(TagOfLoaded("a"), Parameters("a", 5)).status, 200);
   EXPECT_EQ(stored["a"], 5);
 }
 
-TEST_F(EntryFunction, RefusesAChangeOfWhatChangedMeanwhile) {
+TEST_F(EntryFunction, RefusesAChangeIfTheDataChangedMeanwhile) {
   const std::string tag = TagOfLoaded("a");
   stored["a"] = 3;
   const Response refused = SaveIfMatch(tag, Parameters("a", 5));
@@ -191,7 +191,7 @@ TEST_F(EntryFunction, AcceptsAnyOfSeveralTags) {
   EXPECT_EQ(stored["a"], 6);
 }
 
-TEST_F(EntryFunction, RefusesWhatIsNoTagOfThisServer) {
+TEST_F(EntryFunction, RefusesATagThatThisServerHasNotMade) {
   for (const std::string& condition : {std::string(), std::string("\"\""), std::string("\"x.%\""), std::string("a"),
                                        "W/" + TagOfLoaded("a"), std::string("\"x.e30\"")}) {
     EXPECT_EQ(SaveIfMatch(condition, Parameters("a", 5)).status, 412) << condition;

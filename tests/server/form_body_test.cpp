@@ -93,7 +93,7 @@ TEST_F(FormBodyTest, AFormIsRefusedWithAReason) {
   }
 }
 
-TEST_F(FormBodyTest, AFormIsRefusedOnItsWay) {
+TEST_F(FormBodyTest, AFormIsRefusedBeforeItsEnd) {
   const struct {
     const char* name;
     std::string begin;

@@ -65,7 +65,7 @@ TEST_F(HttpTest, TargetsMayBeAbsoluteAndHaveAQuery) {
   }
 }
 
-TEST_F(HttpTest, AServerWideTargetIsAStar) {
+TEST_F(HttpTest, AStarIsTheTargetOfOptionsForTheWholeServer) {
   Start();
   Connection client = Connect();
   client.Send("OPTIONS http://other HTTP/1.1\r\n" + kHost + "\r\n");
@@ -99,7 +99,7 @@ TEST_F(HttpTest, LaterMinorVersionsAreAnsweredAsOnePointOne) {
   EXPECT_EQ(client.Receive().status, 404);
 }
 
-TEST_F(HttpTest, WhatIsNotUnderstoodIsRefusedByName) {
+TEST_F(HttpTest, ARefusalNamesTheValueThatIsNotUnderstood) {
   Start();
   const struct {
     const char* headers;

@@ -24,7 +24,7 @@ TEST(Modules, AreLoadedWithTheirRowsAndDescriptors) {
   EXPECT_EQ(modules[0].descriptor.Describe(2351).status, 409);
 }
 
-TEST(Modules, BrokenOnesAreLeftOutAndTheOthersLoaded) {
+TEST(Modules, AreLoadedWithoutTheBrokenOnes) {
   const Sandbox sandbox;
   sandbox.Write("broken.so", "this is no library");
   sandbox.Write("readme.txt", "this is no module");
@@ -46,7 +46,7 @@ TEST(Modules, WorkWithoutADescriptorOrWithAFaultyOne) {
   EXPECT_EQ(modules[0].descriptor.Describe(2351).status, 500);
 }
 
-TEST(Modules, OfAFolderThatIsNotThereAreNone) { EXPECT_THAT(LoadModules("/nonexistent"), IsEmpty()); }
+TEST(Modules, AreNoneIfTheFolderIsMissing) { EXPECT_THAT(LoadModules("/nonexistent"), IsEmpty()); }
 
 }  // namespace
 }  // namespace vorn::server

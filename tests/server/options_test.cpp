@@ -14,7 +14,7 @@ std::variant<Options, int> Parse(std::vector<const char*> words) {
   return ParseOptions(static_cast<int>(words.size()), words.data());
 }
 
-TEST(Options, AreTheBoxItselfWithoutAny) {
+TEST(Options, ServeTheBoxItselfByDefault) {
   const auto options = std::get<Options>(Parse({}));
   EXPECT_EQ(options.root, "/");
   EXPECT_EQ(options.modules, "");
@@ -44,7 +44,7 @@ TEST(Options, HelpAndVersionEndWithSuccess) {
     EXPECT_THAT(text, HasSubstr(part));
 }
 
-TEST(Options, AMistakeEndsWithTwo) {
+TEST(Options, AMistakeEndsTheProgramWithStatus2) {
   testing::internal::CaptureStderr();
   for (const char* word : {"--rot", "extra", "--root", "--listen", "--config"})
     EXPECT_EQ(std::get<int>(Parse({word})), 2) << word;

@@ -249,12 +249,12 @@ class Races : public testing::Test {
   const TemporaryRoot root_;
 };
 
-TEST_F(Races, AllMethodsByManyThreads) {
+TEST_F(Races, ManyThreadsMayCallAllMethods) {
   InThreads(0, [&](int client) { Client(root_, client).Work(); });
   ExpectOrder();
 }
 
-TEST_F(Races, AllMethodsByManyProcesses) {
+TEST_F(Races, ManyProcessesMayCallAllMethods) {
   InProcesses([&](int client) { Client(root_, client).Work(); });
   ExpectOrder();
 }
@@ -277,12 +277,12 @@ void ChangeOneField(int client) {
   }
 }
 
-TEST_F(Races, OverOneRecordLoseNoField) {
+TEST_F(Races, ChangesOfOneRecordLoseNoField) {
   InThreads(0, ChangeOneField);
   ExpectOrder();
 }
 
-TEST_F(Races, OfProcessesOverOneRecordLoseNoField) {
+TEST_F(Races, ChangesOfOneRecordByProcessesLoseNoField) {
   std::list<ChildProcess> processes;
   for (int client = 0; client < kThreads; ++client) {
     processes.emplace_back([client] {

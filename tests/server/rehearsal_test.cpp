@@ -157,13 +157,15 @@ TEST_F(RehearsalTest, TellsWhatAChangeOfARuleMeans) {
 
 TEST_F(RehearsalTest, NamesTheClientsWhoseRightsChange) {
   root_.Write("/var/lib/nfs/rmtab", "10.0.0.1:/volume1/data:0x00000001\n10.0.0.9:/volume1/data:0x00000001\n");
-  const Json::Value clients = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.1", "ro")))["clients"];
+  const Json::Value rehearsal = RehearsalOf(Rehearsed(kSave, RuleOf("10.0.0.1", "ro")));
+  const Json::Value& clients = rehearsal["clients"];
   ASSERT_EQ(clients.size(), 1U) << clients;
   EXPECT_EQ(clients[0]["address"], "10.0.0.1");
   EXPECT_EQ(clients[0]["version"], "3");
   EXPECT_EQ(clients[0]["path"], "/volume1/data");
   EXPECT_EQ(clients[0]["changes"][0]["change"], "read_only");
   EXPECT_TRUE(clients[0]["certain"].asBool());
+  EXPECT_TRUE(rehearsal["all_clients"].asBool());
 }
 
 TEST_F(RehearsalTest, TellsTheFindingsThatAChangeAdds) {

@@ -379,7 +379,7 @@ TEST_F(People, AreToldWhenPamIsNotSetUp) {
   EXPECT_EQ(SignIn("alice", std::string(kPasswordMark) + "alice").status, 503);
 }
 
-TEST_F(People, SendWholeCredentials) {
+TEST_F(People, CannotSignInWithIncompleteCredentials) {
   for (const char* json : {"{}", R"({"account": "alice"})", R"({"account": "alice", "password": ""})",
                            R"({"account": 1, "password": "x"})", R"({"account": "a\u0000b", "password": "x"})",
                            R"({"account": "alice", "password": "x", "more": 1})", R"({"code": 1})", "{"}) {
@@ -406,7 +406,7 @@ TEST_F(People, WhoTryTooManyPasswordsAtOnceAreToldToTryLater) {
   }));
 }
 
-TEST_F(People, SendNoOtherParameters) {
+TEST_F(People, AreRefusedUnknownParameters) {
   const std::string header = SignedIn("alice");
   for (const char* method : {"get", "sign_out", "list", "end"}) {
     EXPECT_EQ(Call(Way::kTcp, std::string(kSession) + method, R"({"more": 1})", header).status, 400) << method;

@@ -61,7 +61,7 @@ TEST_F(Uploads, AreListedInTheCallContext) {
   EXPECT_EQ(uploads[0].asString().rfind(sandbox_.File("run/vorn/uploads/"), 0), 0U) << uploads[0].asString();
 }
 
-TEST_F(Uploads, ThatTheMethodRemovesAreNoTrouble) {
+TEST_F(Uploads, MayBeRemovedByTheMethod) {
   EXPECT_EQ(Send(Part(file_, "k") + Part("name=remove", "yes") + "--b--").Envelope()["data"]["size"], 1);
   EXPECT_TRUE(NothingIsLeft());
 }

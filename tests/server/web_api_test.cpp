@@ -263,7 +263,7 @@ TEST_F(WebApiTest, TheDocumentationLoadsNothingButItsStyle) {
   EXPECT_EQ(page.headers[0].second.find("default-src 'none'; style-src 'self';"), 0U) << page.headers[0].second;
 }
 
-TEST_F(WebApiTest, KnowsNothingElse) {
+TEST_F(WebApiTest, AnswersOtherTargetsWith404) {
   for (const char* target : {"/", "/api/Nfs/v1/set", "/api/Nfs/v2/get", "/api/Smb/v1/get", "/healthz/", "/API"}) {
     EXPECT_EQ(Begin(Post(target)), 404) << target;
   }

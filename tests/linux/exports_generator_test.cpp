@@ -8,7 +8,7 @@
 //    the request asks for more, and the next load returns what was saved.
 //  - Every other directory is exported as before. Files of /etc/exports.d and lines with a fault stay as they are, and
 //    no save repeats in /etc/exports a client that only one of those files had.
-//  - A refused save changes nothing.
+//  - A refused save changes nothing, and none is refused because its own lines would not read back.
 //  - FindExportFaults finds exactly the lines at which exportfs stops.
 //
 // VORN_CASES is the number of files (default 200), VORN_SEED the seed (default 1).
@@ -581,9 +581,7 @@ class GeneratedBox {
     outcome.loaded_after = Load(outcome.path);
     EXPECT_TRUE(!outcome.saved || outcome.path.size() < sizeof ExportRuleList::path) << outcome.path;
     CheckFiles(outcome, raw, after);
-    if (std::getenv("VORN_GENERATOR_LOG") != nullptr) {
-      for (const LogLine& line : TakeLog()) std::cout << outcome.name << ": " << line.text << "\n";
-    }
+    CheckLog(outcome, TakeLog());
     return outcome;
   }
 
@@ -611,6 +609,14 @@ class GeneratedBox {
     outcome->raw = raw;
     outcome->raw.file = WithoutFaults(raw.file, "", {});
     for (auto& [name, text] : outcome->raw.foreign) text = WithoutFaults(text, "", {});
+  }
+
+  // A save that finds its own lines wrong is refused, but it never has to be.
+  static void CheckLog(const Outcome& outcome, const std::vector<LogLine>& log) {
+    for (const LogLine& line : log) {
+      EXPECT_EQ(line.text.find("they do not read back"), std::string::npos) << outcome.name << "\n" << line.text;
+      if (std::getenv("VORN_GENERATOR_LOG") != nullptr) std::cout << outcome.name << ": " << line.text << "\n";
+    }
   }
 
   static void CheckFiles(const Outcome& outcome, const ExportsSet& before, const ExportsSet& after) {
@@ -733,17 +739,19 @@ bool IsWidened(const Row& before, const Row& after, const ExportRule& rule) {
   });
 }
 
-// The files in which exportfs stopped, as its messages name them: "/etc/exports:3: ..." or "/etc/exports: 3: ...".
-std::set<std::string> StoppedIn(const std::string& messages) {
-  std::set<std::string> files;
+// The messages of exportfs about the files in which it stopped, by the names of the files. A message is
+// "/etc/exports:3: ..." or "/etc/exports: 3: ...".
+std::map<std::string, std::string> StopsIn(const std::string& messages) {
+  std::map<std::string, std::string> stops;
   for (const std::string& line : Split(messages, '\n')) {
     const std::size_t begin = line.find("/etc/exports");
     const std::size_t end = line.find_first_of(": ", begin);
     const std::size_t digit = end == std::string::npos ? end : line.find_first_not_of(": ", end);
     const bool has_line = digit != std::string::npos && line[end] == ':' && std::isdigit(line[digit]) != 0;
-    if (begin != std::string::npos && has_line) files.insert(line.substr(begin, end - begin));
+    if (begin == std::string::npos || !has_line) continue;
+    stops.emplace(line.substr(begin, end - begin), line.substr(line.find_first_of(": ", digit)));
   }
-  return files;
+  return stops;
 }
 
 class Properties {
@@ -754,8 +762,8 @@ class Properties {
         spellings_(spellings),
         before_(Named(ParseTable(before.table))),
         after_(Named(ParseTable(after.table))) {
-    EXPECT_TRUE(StoppedIn(before.messages).empty()) << Where() << before.messages;
-    EXPECT_TRUE(StoppedIn(after.messages).empty()) << Where() << after.messages;
+    EXPECT_TRUE(StopsIn(before.messages).empty()) << Where() << before.messages;
+    EXPECT_TRUE(StopsIn(after.messages).empty()) << Where() << after.messages;
   }
 
   void Check() const {
@@ -859,16 +867,34 @@ class Properties {
   const Table after_;
 };
 
+std::string Print(const ExportsSet& set) {
+  std::string text = set.file;
+  for (const auto& [name, content] : set.foreign) text.append("--- ").append(name).append("\n").append(content);
+  return text;
+}
+
 constexpr int kFilesOfABox = 25;
 
+// Whether another file has the same message. After a fault in default options ("-bar") exportfs reads an uninitialised
+// buffer for a later file whose first line has no client, and finds them there again.
+bool IsRepeated(const std::map<std::string, std::string>& stops, const std::string& file) {
+  return std::any_of(stops.begin(), stops.end(), [&](const auto& other) {
+    return other.first != file && other.second == stops.at(file) && other.second.find("keyword") != std::string::npos;
+  });
+}
+
 void CheckFaults(const Outcome& outcome, const std::string& messages) {
-  std::set<std::string> stopped = StoppedIn(messages);
+  std::set<std::string> stopped;
+  const std::map<std::string, std::string> stops = StopsIn(messages);
+  for (const auto& [file, message] : stops) {
+    if (outcome.faulty_files.count(file) != 0 || !IsRepeated(stops, file)) stopped.insert(file);
+  }
   // This message names no file.
   if (messages.find("unknown flavor") != std::string::npos) {
     EXPECT_FALSE(outcome.faulty_files.empty()) << outcome.name << "\n" << messages;
     stopped.insert(outcome.faulty_files.begin(), outcome.faulty_files.end());
   }
-  EXPECT_EQ(stopped, outcome.faulty_files) << outcome.name << "\n" << outcome.raw.file << messages;
+  EXPECT_EQ(stopped, outcome.faulty_files) << outcome.name << "\n" << Print(outcome.raw) << messages;
 }
 
 // Returns the number of saves that succeeded.

@@ -62,6 +62,7 @@ struct Rehearsal {
   std::vector<Action> actions;
   std::vector<Rule> rules;
   std::vector<Client> clients;
+  bool has_all_clients = true;  // false: there were too many to compare, or they cannot be listed
 };
 
 // A draft of this process's box. Its files are those of the box, each as it is at its first read, and its service is in

@@ -16,8 +16,6 @@
 namespace vorn {
 namespace {
 
-constexpr std::size_t kMostComparisons = 1'000'000;
-
 // A name service that does not answer.
 NameService NoNames() {
   return {[](const std::string& /*host*/) { return std::nullopt; },
@@ -109,8 +107,9 @@ bool IsConcerned(const std::string& path, const std::set<std::string>& directori
 
 }  // namespace
 
-Result<std::vector<TouchedClient>> FindTouchedClients(Box& real, Box& draft, const std::set<std::string>& directories) {
-  std::vector<TouchedClient> touched;
+Result<TouchedClients> FindTouchedClients(Box& real, Box& draft, const std::set<std::string>& directories,
+                                          std::size_t most) {
+  TouchedClients touched;
   const Result<std::vector<VORN::NFSClient>> clients = ListClientsWithoutStates(real);
   if (!clients.ok()) return clients.status();
   const Result<Circumstances> circumstances = ReadCircumstances(real, draft);
@@ -122,8 +121,11 @@ Result<std::vector<TouchedClient>> FindTouchedClients(Box& real, Box& draft, con
       if (client.address.empty() || !IsConcerned(used.path, directories)) continue;
       const auto found = comparisons.try_emplace(used.path, *circumstances, used.path).first;
       compared += found->second.cost();
-      if (compared > kMostComparisons) return touched;
-      if (auto one = found->second.Compare(client)) touched.push_back(std::move(*one));
+      if (compared > most) {
+        touched.is_complete = false;
+        return touched;
+      }
+      if (auto one = found->second.Compare(client)) touched.clients.push_back(std::move(*one));
     }
   }
   return touched;

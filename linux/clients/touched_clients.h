@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_CLIENTS_TOUCHED_CLIENTS_H
 #define VORN_LINUX_CLIENTS_TOUCHED_CLIENTS_H
 
+#include <cstddef>
 #include <set>
 #include <string>
 #include <vector>
@@ -23,10 +24,17 @@ struct TouchedClient {
   bool is_certain = true;
 };
 
+struct TouchedClients {
+  std::vector<TouchedClient> clients;
+  bool is_complete = true;  // false: there was too much to compare
+};
+
 // Decides for each client of `real` in each export that it uses, at or below one of `directories`, which rule admits it
 // with the files of `real` and with those of `draft`, and returns those whose rights differ. The rules of both are
-// those that a start of the service would put into force. Compares at most a million pairs of a client and a rule.
-Result<std::vector<TouchedClient>> FindTouchedClients(Box& real, Box& draft, const std::set<std::string>& directories);
+// those that a start of the service would put into force. Compares at most `most` pairs of a client and a rule, which
+// bounds the time of a rehearsal.
+Result<TouchedClients> FindTouchedClients(Box& real, Box& draft, const std::set<std::string>& directories,
+                                          std::size_t most = 1'000'000);
 
 }  // namespace vorn
 

@@ -58,7 +58,7 @@ std::vector<RuleChange> CompareExports(Box& box, const ChangedFile& own) {
 }
 
 // Adds the changed rules, and the clients that they touch. Clients that cannot be listed are left out: what the call
-// would do does not depend on them.
+// would do does not depend on them; the report then says that it does not have all.
 void AddRules(Box& real, Box& draft, const ChangedFile& own, VORN::Rehearsal* report) {
   std::set<std::string> directories;
   for (const RuleChange& rule : CompareExports(draft, own)) {
@@ -66,9 +66,13 @@ void AddRules(Box& real, Box& draft, const ChangedFile& own, VORN::Rehearsal* re
     report->rules.push_back({ToValidUtf8(rule.directory), ToValidUtf8(rule.client), Describe(rule.rights)});
   }
   if (directories.empty()) return;
-  const Result<std::vector<TouchedClient>> touched = FindTouchedClients(real, draft, directories);
-  if (!touched.ok()) return;
-  for (const TouchedClient& one : *touched) {
+  const Result<TouchedClients> touched = FindTouchedClients(real, draft, directories);
+  if (!touched.ok()) {
+    report->has_all_clients = false;
+    return;
+  }
+  report->has_all_clients = touched->is_complete;
+  for (const TouchedClient& one : touched->clients) {
     report->clients.push_back({one.address, one.name, one.version, one.path, Describe(one.rights), one.is_certain});
   }
 }

@@ -77,6 +77,7 @@ Json::Value RehearsalJson(const VORN::Rehearsal& rehearsal) {
   object["actions"] = ListOf(rehearsal.actions);
   object["rules"] = ListOf(rehearsal.rules);
   object["clients"] = ListOf(rehearsal.clients);
+  object["all_clients"] = rehearsal.has_all_clients;
   return object;
 }
 

@@ -18,9 +18,9 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-class TouchedClients : public testing::Test {
+class TouchedClientsOf : public testing::Test {
  protected:
-  TouchedClients() {
+  TouchedClientsOf() {
     AddClient(1, "10.9.0.11");
     AddClient(2, "10.9.0.12");
     AddClient(3, "10.9.0.13");  // uses nothing
@@ -45,10 +45,11 @@ class TouchedClients : public testing::Test {
     Box& box = draft.state().box;
     const Result<StoredFile> file = box.Read("/etc/exports");
     EXPECT_TRUE(file.ok() && box.Replace("/etc/exports", after, file->version).ok());
-    const Result<std::vector<TouchedClient>> touched = FindTouchedClients(RealBox(), box, {"/srv/data"});
+    const Result<TouchedClients> touched = FindTouchedClients(RealBox(), box, {"/srv/data"}, most_);
     EXPECT_TRUE(touched.ok());
+    is_complete_ = touched->is_complete;
     std::vector<std::string> texts;
-    for (const TouchedClient& client : *touched) {
+    for (const TouchedClient& client : touched->clients) {
       std::string text = client.address + " " + client.version + " " + client.path + ":";
       for (const RightChange& right : client.rights) text += " " + right.change;
       texts.push_back(text + (client.is_certain ? "" : " ?"));
@@ -56,40 +57,52 @@ class TouchedClients : public testing::Test {
     return texts;
   }
 
+  std::size_t most_ = 1000;
+  bool is_complete_ = false;  // of the last answer
   const TemporaryRoot root_;
   const KernelCaches caches_{root_};
 };
 
-TEST_F(TouchedClients, AreThoseWhoseRuleChanges) {
+TEST_F(TouchedClientsOf, AreThoseWhoseRuleChanges) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.11(rw) 10.9.0.0/24(ro)\n", "/srv/data 10.9.0.11(ro) 10.9.0.0/24(ro)\n"),
               ElementsAre("10.9.0.11 4.2 /srv/data: read_only"));
 }
 
-TEST_F(TouchedClients, MayHaveAnotherRuleThatAdmitsThem) {
+TEST_F(TouchedClientsOf, MayHaveAnotherRuleThatAdmitsThem) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.11(rw) 10.9.0.0/24(ro)\n", "/srv/data 10.9.0.0/24(ro)\n"),
               ElementsAre("10.9.0.11 4.2 /srv/data: read_only"));
 }
 
-TEST_F(TouchedClients, LoseAnExportWithTheLastRule) {
+TEST_F(TouchedClientsOf, LoseAnExportWithTheLastRule) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.0/24(rw)\n", ""),
               ElementsAre("10.9.0.11 4.2 /srv/data: removed", "10.9.0.12 4.2 /srv/data: removed",
                           "10.9.0.14 3 /srv/data: removed"));
 }
 
-TEST_F(TouchedClients, AreTouchedByFlavorsAndSquashing) {
+TEST_F(TouchedClientsOf, AreTouchedByFlavorsAndSquashing) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.12(rw,no_root_squash,sec=sys:krb5)\n", "/srv/data 10.9.0.12(rw,sec=sys)\n"),
               ElementsAre("10.9.0.12 4.2 /srv/data: flavor_removed root_squashed"));
 }
 
-TEST_F(TouchedClients, AreNoneOfAnotherExportOrWithoutAChange) {
+TEST_F(TouchedClientsOf, AreNoneOfAnotherExportOrWithoutAChange) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.0/24(rw)\n/srv/other *(rw)\n", "/srv/data 10.9.0.0/24(rw)\n/srv/other *(ro)\n"),
               IsEmpty());
   EXPECT_THAT(Touched("/srv/data 10.9.0.0/24(rw)\n", "/srv/data 10.9.0.0/24(rw) 10.8.0.0/24(rw)\n"), IsEmpty());
 }
 
-TEST_F(TouchedClients, AreNotCertainWhereNamesDecide) {
+TEST_F(TouchedClientsOf, AreNotCertainWhereNamesDecide) {
   EXPECT_THAT(Touched("/srv/data 10.9.0.12(rw) *.lab.test(rw)\n", "/srv/data 10.9.0.12(ro) *.lab.test(rw)\n"),
               ElementsAre("10.9.0.12 4.2 /srv/data: read_only ?"));
+}
+
+TEST_F(TouchedClientsOf, AreNotCompleteIfThereIsTooMuchToCompare) {
+  most_ = 4;  // one rule before and one after, for two clients
+  EXPECT_THAT(Touched("/srv/data 10.9.0.0/24(rw)\n", "/srv/data 10.9.0.0/24(ro)\n"),
+              ElementsAre("10.9.0.11 4.2 /srv/data: read_only", "10.9.0.12 4.2 /srv/data: read_only"));
+  EXPECT_FALSE(is_complete_);
+  most_ = 6;
+  EXPECT_EQ(Touched("/srv/data 10.9.0.0/24(rw)\n", "/srv/data 10.9.0.0/24(ro)\n").size(), 3U);
+  EXPECT_TRUE(is_complete_);
 }
 
 }  // namespace

@@ -1,5 +1,7 @@
 #include "access_handler.h"
 
+#include <algorithm>
+#include <iterator>
 #include <optional>
 #include <string>
 #include <vector>
@@ -19,18 +21,31 @@ constexpr const char* kFlavors[] = {"sys", "krb5", "krb5i", "krb5p"};
 constexpr const char* kVersions[] = {"3", "4", "4.0", "4.1", "4.2"};
 constexpr char kNewestVersion[] = "4.2";
 constexpr int kLargestPort = 65535;
+constexpr int kMostClients = 1000;  // of a page
 
-// The parameters that the methods have in common.
-VORN::AccessQuestion ReadClient(ParameterReader& reader) {
+// The parameters that the methods have in common. `flavor` and `version` count if the caller names none.
+VORN::AccessQuestion ReadMount(ParameterReader& reader, const char* flavor, const char* version) {
   VORN::AccessQuestion question;
-  question.client = reader.NeededText("client");
-  question.flavor = reader.Word("flavor", "sys", kFlavors);
-  question.version = reader.Word("version", kNewestVersion, kVersions);
+  question.flavor = reader.Word("flavor", flavor, kFlavors);
+  question.version = reader.Word("version", version, kVersions);
   if (question.version == "4") question.version = kNewestVersion;
   question.port = static_cast<int>(reader.Integer("port", 0, 1, kLargestPort));
   question.user = reader.Text("user");
   question.groups = reader.Texts("groups");
   return question;
+}
+
+VORN::AccessQuestion ReadClient(ParameterReader& reader) {
+  VORN::AccessQuestion question = ReadMount(reader, "sys", kNewestVersion);
+  question.client = reader.NeededText("client");
+  return question;
+}
+
+// A user belongs to one flavour: a name is not a Kerberos principal.
+std::vector<std::string> FlavorsOf(const VORN::AccessQuestion& question) {
+  if (!question.flavor.empty()) return {question.flavor};
+  if (!question.user.empty()) return {"sys"};
+  return {std::begin(kFlavors), std::end(kFlavors)};
 }
 
 // Adds where something is written; null if no file says it.
@@ -102,6 +117,28 @@ Json::Value ToRow(const std::string& share, const VORN::AccessAnswer& answer) {
   return row;
 }
 
+Json::Value ToJson(const VORN::FlavorAccess& access) {
+  Json::Value item;
+  item["flavor"] = access.flavor;
+  item["mountable"] = access.mountable;
+  item["read"] = access.read;
+  item["write"] = access.write;
+  return item;
+}
+
+Json::Value ToJson(const VORN::ClientAccess& access) {
+  Json::Value item;
+  item["client"] = access.client;
+  item["kind"] = OrNull(access.kind);
+  item["state"] = OrNull(access.state);
+  item["address"] = OrNull(access.address);
+  item["version"] = access.version;
+  item["rule"] = access.rule ? ToJson(*access.rule) : Json::Value();
+  item["flavors"] = ArrayOf(access.flavors, ToJson);
+  item["text"] = OrNull(access.text);
+  return item;
+}
+
 int CodeOf(int result) {
   if (result == VORN::kAccessNoShare) return kNoShare;
   if (result == VORN::kAccessNoUser) return kNoUser;
@@ -135,6 +172,15 @@ bool AccessHandler::ExplainData(const Json::Value& params, Json::Value& result) 
 }
 
 bool AccessHandler::MatrixData(const Json::Value& params, Json::Value& result) {
+  result["access"] = Json::Value(Json::arrayValue);
+  result["clients"] = Json::Value(Json::arrayValue);
+  if (params["share"].isNull()) return ListShares(params, result);
+  if (params["client"].isNull()) return ListClients(params, result);
+  LOG_ERROR("variables 'client' and 'share' exclude each other.");
+  return Fail(kBadParameter);
+}
+
+bool AccessHandler::ListShares(const Json::Value& params, Json::Value& result) {
   ParameterReader reader(HERE, params);
   const VORN::AccessQuestion question = ReadClient(reader);
   const int offset = reader.Integer("offset", 0);
@@ -152,8 +198,29 @@ bool AccessHandler::MatrixData(const Json::Value& params, Json::Value& result) {
     LOG_ERROR("Failed to ExplainAccesses, vornerr=[0x%04X]", KLIBCErrGet());
     return Fail(CodeOf(explained));
   }
-  result["access"] = Json::Value(Json::arrayValue);
   for (std::size_t at = 0; at < answers.size(); ++at) result["access"].append(ToRow(shares[at], answers[at]));
   result["total"] = count;
+  return true;
+}
+
+bool AccessHandler::ListClients(const Json::Value& params, Json::Value& result) {
+  ParameterReader reader(HERE, params);
+  VORN::ClientsQuestion question;
+  question.access = ReadMount(reader, "", "");
+  question.access.share = reader.NeededText("share");
+  question.flavors = FlavorsOf(question.access);
+  question.offset = static_cast<std::size_t>(std::max(reader.Integer("offset", 0), 0));
+  const int limit = reader.Integer("limit", -1);
+  question.limit = static_cast<std::size_t>(limit == -1 ? kMostClients : std::clamp(limit, 0, kMostClients));
+  if (!reader.ok()) return Fail(kBadParameter);
+  std::vector<VORN::ClientAccess> clients;
+  int total = 0;
+  const int explained = VORN::ExplainClients(question, &clients, &total);
+  if (explained < 0) {
+    LOG_ERROR("Failed to ExplainClients, vornerr=[0x%04X]", KLIBCErrGet());
+    return Fail(CodeOf(explained));
+  }
+  result["clients"] = ArrayOf(clients, ToJson);
+  result["total"] = total;
   return true;
 }

@@ -24,9 +24,15 @@ class AccessHandler : public ServiceHandler {
   // Sets the members of VORN::AccessAnswer (access.h). Errors: 2301, 2302, 2370, 2380, 2381.
   bool ExplainData(const Json::Value& params, Json::Value& result);
 
-  // Sets "access", a page of rows: what the client may do in each shared folder, sorted by name, and "total". Errors:
-  // 2301, 2302, 2370 if a folder was removed meanwhile, 2380, 2381.
+  // With "client" sets "access", a page of rows: what the client may do in each shared folder, sorted by name. With
+  // "share" sets "clients", a page of rows: what each client may do in this folder. The other list is empty. Sets
+  // "total". Errors: 2301 (also for both, and for neither), 2302, 2370 (also if a folder was removed meanwhile), 2380,
+  // 2381.
   bool MatrixData(const Json::Value& params, Json::Value& result);
+
+ private:
+  bool ListShares(const Json::Value& params, Json::Value& result);
+  bool ListClients(const Json::Value& params, Json::Value& result);
 };
 
 #endif  // VORN_INSIGHT_ACCESS_HANDLER_H

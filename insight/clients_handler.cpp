@@ -1,6 +1,5 @@
 #include "clients_handler.h"
 
-#include <climits>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -9,14 +8,13 @@
 #include "clients.h"
 #include "core.h"
 #include "json_values.h"
+#include "listing_page.h"
 #include "log.h"
 #include "parameter_reader.h"
 
 namespace {
 
 constexpr char kSource[] = "clients_handler";
-constexpr int kMostClients = 1000;  // of a page
-constexpr int kUsualClients = 50;
 constexpr std::int64_t kLargestID = UINT32_MAX;
 
 Json::Value NumberOrNull(const std::optional<std::uint64_t>& number) {
@@ -80,12 +78,11 @@ void ClientsHandler::Disconnect() {
 bool ClientsHandler::ListData(const Json::Value& params, Json::Value& result) {
   ParameterReader reader(HERE, params);
   const std::string filter = reader.Text("filter");
-  const auto offset = static_cast<int>(reader.Integer("offset", 0, 0, INT_MAX));
-  const auto limit = static_cast<int>(reader.Integer("limit", kUsualClients, 0, kMostClients));
+  const ListingPage page = ListingPage::Read(reader);
   if (!reader.ok()) return Fail(kBadParameter);
   std::vector<VORN::NFSClient> clients;
   int total = 0;
-  if (VORN::ListClients(filter, offset, limit, &clients, &total) < 0) {
+  if (VORN::ListClients(filter, page.offset, page.limit, &clients, &total) < 0) {
     LOG_ERROR("Failed to ListClients, vornerr=[0x%04X]", KLIBCErrGet());
     return Fail(kPlatformFailure);
   }

@@ -1,13 +1,13 @@
 #include "history_handler.h"
 
 #include <algorithm>
-#include <climits>
 #include <cstdint>
 
 #include "core.h"
 #include "firewall.h"
 #include "history.h"
 #include "json_values.h"
+#include "listing_page.h"
 #include "log.h"
 #include "parameter_reader.h"
 
@@ -19,8 +19,6 @@ constexpr char kScript[] = "/usr/vorn/etc/rc.sysv/S83nfsd.sh";
 constexpr char kExportsFile[] = "/etc/exports";
 constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 constexpr char kSettingsFile[] = "/etc/nfs.conf.d/vorn.conf";
-constexpr int kMostChanges = 1000;  // of a page
-constexpr int kUsualChanges = 50;
 
 VORN::HistoryFilter ReadFilter(ParameterReader& reader) {
   VORN::HistoryFilter filter;
@@ -92,12 +90,11 @@ void HistoryHandler::Undo() {
 bool HistoryHandler::ListData(const Json::Value& params, Json::Value& result) {
   ParameterReader reader(HERE, params);
   const VORN::HistoryFilter filter = ReadFilter(reader);
-  const auto offset = static_cast<int>(reader.Integer("offset", 0, 0, INT_MAX));
-  const auto limit = static_cast<int>(reader.Integer("limit", kUsualChanges, 0, kMostChanges));
+  const ListingPage page = ListingPage::Read(reader);
   if (!reader.ok()) return Fail(kBadParameter);
   std::vector<VORN::HistoryEntry> entries;
   int total = 0;
-  if (VORN::ListHistory(filter, offset, limit, &entries, &total) < 0) {
+  if (VORN::ListHistory(filter, page.offset, page.limit, &entries, &total) < 0) {
     LOG_ERROR("Failed to ListHistory, vornerr=[0x%04X]", KLIBCErrGet());
     return Fail(kPlatformFailure);
   }

@@ -4,6 +4,7 @@
 #ifndef VORN_PLATFORM_ACCESS_H
 #define VORN_PLATFORM_ACCESS_H
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -77,6 +78,37 @@ struct AccessAnswer {
   std::vector<AccessCheck> checks;         // in the order in which the server gets to them
 };
 
+// A question about all clients of a shared folder.
+struct ClientsQuestion {
+  AccessQuestion access;  // its client and flavour are not used; an empty version stands for the client's own
+  std::vector<std::string> flavors;  // security flavours to explain
+  std::size_t offset = 0;            // of the page; one that is behind the last client counts as 0
+  std::size_t limit = 0;
+};
+
+// The rights of a client in a shared folder with a security flavour.
+struct FlavorAccess {
+  std::string flavor;
+  bool mountable = false;
+  bool read = false;
+  bool write = false;
+};
+
+// A client of a shared folder: one that a rule names, or one that is connected or has mounted something.
+struct ClientAccess {
+  std::string client;  // as the rule has it: "10.0.0.0/24"; otherwise an address or a host name
+  std::string kind;    // of the client in the rule, as AccessRule; empty if no rule names it
+  std::string state;   // "connected", "mounted" or the state of a client of NFSv4 (clients.h); empty: none of these
+
+  // The address that was explained: the client's own, or that of a host that stands for a network, a pattern, a
+  // netgroup or everybody. Empty if none is known; then there are no flavours.
+  std::string address;
+  std::string version;                // of NFS, for which it was explained
+  std::optional<AccessRule> rule;     // the rule that decides
+  std::vector<FlavorAccess> flavors;  // in the order of the question
+  std::string text;                   // a sentence about the address; empty for a client with an address of its own
+};
+
 enum : int {
   kAccessFailed = -1,   // a failure other than the following ones
   kAccessNoShare = -2,  // there is no shared folder with this name
@@ -93,6 +125,13 @@ int ExplainAccess(const AccessQuestion& question, AccessAnswer* answer);
 // share of the question is not used.
 int ExplainAccesses(const AccessQuestion& question, const std::vector<std::string>& shares,
                     std::vector<AccessAnswer>* answers);
+
+// Explains what each client of a shared folder may do: the clients of the export rules of the folder and of those
+// around it, in the order of the table of exports, then the clients that are connected or have mounted something, in
+// the order of their addresses. A client with several addresses has a row for each. Only the clients of the page are
+// explained. `total` receives the number of all. The name service is not asked any more after three questions without
+// an answer.
+int ExplainClients(const ClientsQuestion& question, std::vector<ClientAccess>* clients, int* total);
 
 }  // namespace VORN
 

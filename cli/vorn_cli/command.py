@@ -92,6 +92,8 @@ def show_rehearsal(out, answer):
         effects = ", ".join(change["text"] for change in client["changes"])
         doubt = "" if client["certain"] else " (not certain: rules for host names may decide)"
         out.text(f"- connected: {client['address']} ({client['name']}) at {client['path']}: {effects}{doubt}")
+    if not rehearsal.get("all_clients", True):
+        out.text("- more clients may be connected: there are too many to compare.")
     findings = rehearsal.get("findings", {"added": [], "removed": []})
     for finding in findings["added"]:
         out.text(f"- new {finding['severity']}: {finding['text']} {finding['remedy']}")

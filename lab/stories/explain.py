@@ -1,4 +1,4 @@
-"""The explanation of an access is what the kernel's server does: who may mount, read and write, and as whom."""
+"""The explanation of an access, and the clients of a folder with their rights, are what the kernel's server does."""
 
 import collections
 import errno
@@ -18,6 +18,7 @@ CLIENTS = ["client.lab.test", "other.lab.test", "10.9.0.11", "10.9.0.12", "10.9.
 NETGROUPS = "trusted (other.lab.test,,) (third,,)\nall (client.lab.test,,) (10.9.0.12,,) (third.elsewhere.test,,)\n"
 USERS = [users.ROOT, users.ALICE, users.BOB, users.NOBODY]
 SHARES = {"first": "/srv/first", "inner": "/srv/first/inner", "second": "/srv/second", "deep": "/srv/way/to/deep"}
+RIGHTS = ("mountable", "read", "write")
 CASES_OF_A_SET = 6
 
 
@@ -87,22 +88,33 @@ def explained(share, machine, version, port, user):
     answer = api.call("NFS.Access", "explain", share=share, client=machine.address, version=version, port=port,
                       user=str(user.uid), groups=[str(user.gid)])
     assert all(check["check"] != "reload" for check in answer["checks"]), "the rules are in force"
-    told = {name: answer[name] for name in ("mountable", "read", "write")}
+    told = {right: answer[right] for right in RIGHTS}
     if answer["write"]:
         told["identity"] = answer["identity"]["uid"], answer["identity"]["gid"]
     return told, answer
 
 
+def listed(share, machine, version, port, user):
+    """The rights of the machine in each row of the folder's clients that was explained for its address."""
+    clients = api.call("NFS.Access", "matrix", share=share, version=version, port=port, user=str(user.uid),
+                       groups=[str(user.gid)])["clients"]
+    found = [row["flavors"] for row in clients if row["address"] == machine.address]
+    assert all(len(flavors) == 1 and flavors[0]["flavor"] == "sys" for flavors in found), "a user belongs to one flavour"
+    return [{right: flavors[0][right] for right in RIGHTS} for flavors in found]
+
+
 def compare(choose, machines):
-    """One case: what was told and what was seen, and a text if the explanation is not what the kernel does."""
+    """One case: what was seen, how many rows of the matrix told it, and a text if something else was told."""
     share, machine, user = choose.choice(list(SHARES)), choose.choice(machines), choose.choice(USERS)
     version, port = choose.choice(["3", "4.0", "4.2"]), choose.choice([None, None, 40000])
     told, answer = explained(share, machine, version, port, user)
+    rows = listed(share, machine, version, port, user)
     seen = observe(machine, SHARES[share], version, port, user)
     if told["mountable"] and answer["rule"] is None:
         seen["read"] = False  # the way to other exports: the list of their names, and nothing of the share
-    case = f"{share} {machine.name} {user.name} version {version} port {port}: told {told}, seen {seen}"
-    return seen, None if told == seen else f"{case}\n{answer}"
+    case = f"{share} {machine.name} {user.name} version {version} port {port}: told {told}, {rows}, seen {seen}"
+    is_same = told == seen and all(row == {right: seen[right] for right in RIGHTS} for row in rows)
+    return seen, len(rows), None if is_same else f"{case}\n{answer}"
 
 
 @pytest.mark.timeout(7200)
@@ -120,11 +132,12 @@ def test_an_explanation_is_what_the_kernel_does(box, client, other, third, cases
         lines = set_up(choose)
         table = pathlib.Path("/var/lib/nfs/etab").read_text(encoding="ascii")
         compared = [compare(choose, [client, other, third]) for _ in range(CASES_OF_A_SET)]
-        counts.update(right for seen, _ in compared for right in ("mountable", "read", "write") if seen[right])
-        found = [text for _, text in compared if text]
+        counts.update(right for seen, _, _ in compared for right in RIGHTS if seen[right])
+        counts["rows"] += sum(rows for _, rows, _ in compared)
+        found = [text for _, _, text in compared if text]
         if found:
             differences += found + lines + [table]
     record_property(f"{cases} cases of seed {seed}", dict(counts))
     print(f"{cases} cases of seed {seed}: {dict(counts)}")
     assert not differences, f"seed {seed}:\n" + "\n".join(differences)
-    assert all(cases // 60 <= counts[right] for right in ("mountable", "read", "write")), "the cases forbid nearly all"
+    assert all(cases // 60 <= counts[what] for what in (*RIGHTS, "rows")), "the cases show nearly nothing"

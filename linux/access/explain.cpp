@@ -2,20 +2,12 @@
 
 #include <algorithm>
 #include <optional>
-#include <set>
-#include <string>
 #include <utility>
-#include <vector>
 
-#include "access_checks.h"
-#include "client_host.h"
 #include "client_identity.h"
-#include "export_decision.h"
-#include "exports_in_force.h"
 #include "folder_path.h"
 #include "folder_permissions.h"
 #include "keytab.h"
-#include "mount_table.h"
 #include "service_checks.h"
 #include "shares.h"
 #include "unicode.h"
@@ -31,25 +23,20 @@ constexpr unsigned kList = 4;  // the permission bits of a folder
 constexpr unsigned kChange = 2;
 constexpr unsigned kEnter = 1;
 
-struct KindText {
-  const char* name;
-  const char* text;
-};
-
-KindText TextOf(ExportKind kind) {
+const char* TextOf(ExportKind kind) {
   switch (kind) {
     case ExportKind::kHost:
-      return {"host", "a single host"};
+      return "a single host";
     case ExportKind::kNetwork:
-      return {"network", "a network"};
+      return "a network";
     case ExportKind::kPattern:
-      return {"pattern", "a pattern of names"};
+      return "a pattern of names";
     case ExportKind::kNetgroup:
-      return {"netgroup", "a netgroup"};
+      return "a netgroup";
     case ExportKind::kEverybody:
-      return {"everybody", "everybody"};
+      return "everybody";
   }
-  return {"", ""};
+  return "";
 }
 
 std::string Quoted(const std::string& text) { return "\"" + text + "\""; }
@@ -64,7 +51,7 @@ VORN::AccessRule RuleOf(const TableExport& one, const char* reason, const std::s
   VORN::AccessRule rule;
   rule.directory = ToValidUtf8(one.directory);
   rule.client = ToValidUtf8(one.written);
-  rule.kind = TextOf(one.kind).name;
+  rule.kind = NameOf(one.kind);
   rule.file = ToValidUtf8(one.file);
   rule.line = one.line;
   rule.reason = reason;
@@ -77,7 +64,7 @@ VORN::AccessRule OtherRule(const TableExport& one, const TableExport* decider, E
   switch (reason) {
     case ExportDecision::Other::Reason::kKind:
       return RuleOf(one, "kind",
-                    described + " is for " + TextOf(one.kind).text + "; a rule for " + TextOf(decider->kind).text +
+                    described + " is for " + TextOf(one.kind) + "; a rule for " + TextOf(decider->kind) +
                         " comes first, whatever the order in the file.");
     case ExportDecision::Other::Reason::kOrder:
       return RuleOf(one, "order", described + " is of the same kind and stands after the rule that decides.");
@@ -89,22 +76,24 @@ VORN::AccessRule OtherRule(const TableExport& one, const TableExport* decider, E
   return RuleOf(one, "directory", described + why);
 }
 
+}  // namespace
+
 // Answers one question.
 class Explanation {
  public:
-  Explanation(Box& box, const VORN::AccessQuestion& question, std::string path, const ExportsInForce& in_force,
-              const MountTable& mounts)
-      : box_(box), question_(question), path_(std::move(path)), in_force_(in_force), mounts_(mounts) {}
+  // `checks` are those of the service.
+  Explanation(Explainer& explainer, const VORN::AccessQuestion& question, const std::string& path, AccessChecks checks)
+      : explainer_(explainer),
+        question_(question),
+        path_(path),
+        exports_(explainer.ExportsAround(path)),
+        checks_(std::move(checks)) {}
 
-  Result<VORN::AccessAnswer> Answer(const NameService& names, ClientHost client) {
-    HostAddresses hosts = in_force_.hosts;
-    const auto matches = [&](const TableExport& one) { return MatchesExport(&client, one, names, &hosts); };
-    const std::vector<std::string> points = mounts_.FoldersBelow("/");
-    decision_ =
-        DecideExport(in_force_.exports, {path_, question_.version != "3", {points.begin(), points.end()}, matches});
-    if (decision_.decider) decider_ = &in_force_.exports[*decision_.decider];
+  Result<VORN::AccessAnswer> Answer(ClientHost client) {
+    const auto matches = [&](const TableExport& one) { return explainer_.Matches(&client, one); };
+    decision_ = DecideExport(exports_, {path_, question_.version != "3", explainer_.mount_points_, matches});
+    if (decision_.decider) decider_ = &exports_[*decision_.decider];
     AddRules();
-    if (Status status = CheckService(box_, question_.version, &checks_); !status.ok()) return status;
     CheckName(client);
     if (decider_ != nullptr) CheckMount();
     if (question_.version != "3" && decision_.outcome != Outcome::kNone) CheckWay();
@@ -112,6 +101,7 @@ class Explanation {
     const bool is_open = decision_.outcome == Outcome::kRule || decision_.outcome == Outcome::kPassage;
     answer_.mountable = is_open && !checks_.HasFailed();
     CheckRule();
+    if (decider_ != nullptr) AddDoubts();
     if (Status status = CheckFolder(); !status.ok()) return status;
     answer_.path = ToValidUtf8(path_);
     answer_.addresses = std::move(client.addresses);
@@ -125,12 +115,12 @@ class Explanation {
   void AddRules() {
     if (decider_ != nullptr) answer_.rule = RuleOf(*decider_, "decides", Described(*decider_) + " decides.");
     for (const ExportDecision::Other& other : decision_.others) {
-      answer_.others.push_back(OtherRule(in_force_.exports[other.index], decider_, other.reason));
+      answer_.others.push_back(OtherRule(exports_[other.index], decider_, other.reason));
     }
   }
 
   void CheckName(const ClientHost& client) {
-    if (client.is_away || in_force_.is_name_service_away) {
+    if (client.is_away || explainer_.in_force_.is_name_service_away) {
       checks_.Doubt("name",
                     "The name service did not answer. Rules for host names, patterns and netgroups may be missing.");
     } else if (client.addresses.empty()) {
@@ -142,7 +132,7 @@ class Explanation {
   }
 
   void CheckReload() {
-    if (in_force_.pending.count(path_) == 0) return;
+    if (explainer_.in_force_.pending.count(path_) == 0) return;
     checks_.Fail("reload", "The exports files have other rules for " + path_ + " than those in force.",
                  "Reload the NFS service.");
   }
@@ -164,9 +154,7 @@ class Explanation {
             "rule", "Another file system is mounted on the way to " + path_ + ", and no rule opens it to this client.",
             "Add a rule for the client to this share.");
       case Outcome::kFolder:
-        return checks_.Fail("rule",
-                            Described(in_force_.exports[decision_.decider.value()]) +
-                                " is for another file system and has no \"crossmnt\".",
+        return checks_.Fail("rule", Described(*decider_) + " is for another file system and has no \"crossmnt\".",
                             "Add a rule for the client to this share.");
     }
   }
@@ -210,7 +198,7 @@ class Explanation {
   }
 
   void CheckKeytab() {
-    if (question_.flavor == "sys" || box_.Exists(kKeytabFile)) return;
+    if (question_.flavor == "sys" || explainer_.box_->Exists(kKeytabFile)) return;
     checks_.Fail("keytab", "The box has no keytab, so no client can use Kerberos.", "Upload a keytab.");
   }
 
@@ -223,7 +211,7 @@ class Explanation {
       if (folder == path_) break;
       const bool is_in_rule = decider_ != nullptr && folder.size() >= decider_->directory.size();
       if (is_in_rule && access_) root = Squash({}, *access_, *decider_);
-      const Result<FolderPermissions> permissions = ReadFolderPermissions(box_, folder);
+      const Result<FolderPermissions> permissions = ReadFolderPermissions(*explainer_.box_, folder);
       if (!permissions.ok() || permissions->Of(root, kEnter) == kEnter) continue;
       return checks_.Fail("way",
                           "The folder " + folder + " may not be entered by the user " + std::to_string(root.user_id) +
@@ -232,16 +220,42 @@ class Explanation {
     }
   }
 
+  // Names what may decide otherwise and cannot be seen, or is not compared here.
+  void AddDoubts() {
+    if (question_.flavor != "sys") {
+      checks_.Doubt("ticket", "Only the KDC knows whether the client and its user get a ticket for this box.");
+    }
+    if (question_.version != "3") CheckRoot();
+    const std::vector<std::string> inner = explainer_.mounts_.FoldersBelow(path_);
+    if (inner.empty()) return;
+    checks_.Doubt("volume", "A file system is mounted at " + inner.front() +
+                                ": its own rules, and \"crossmnt\" of this one, decide over what is in it.");
+  }
+
+  // A client of version 4 sees nothing but what is inside of the export with "fsid=0", and names paths from there.
+  void CheckRoot() {
+    const ExportList& exports = explainer_.in_force_.exports;
+    const auto root = std::find_if(exports.begin(), exports.end(), [](const TableExport& one) {
+      const std::vector<std::string>& words = one.options.others;
+      return std::any_of(words.begin(), words.end(),
+                         [](const std::string& word) { return word == "fsid=0" || word == "fsid=root"; });
+    });
+    if (root == exports.end()) return;
+    checks_.Doubt("root", root->directory + " is the root of version 4 for " + Quoted(root->written) +
+                              " (fsid=0): such a client names paths from there, and reaches no other folder. This is "
+                              "not taken into account here.");
+  }
+
   // Checks the rights of the user in the folder itself.
   Status CheckFolder() {
     std::optional<ClientIDs> ids;
     if (!question_.user.empty()) {
-      Result<ClientIDs> found = FindClientIDs(box_, question_);
+      Result<ClientIDs> found = FindClientIDs(*explainer_.box_, question_);
       if (!found.ok()) return found.status();
       ids = std::move(*found);
     }
     if (decision_.outcome != Outcome::kRule || !access_) return {};
-    const Result<FolderPermissions> folder = ReadFolderPermissions(box_, path_);
+    const Result<FolderPermissions> folder = ReadFolderPermissions(*explainer_.box_, path_);
     if (!folder.ok()) {
       checks_.Fail("folder", folder.status().reason(), "Create the folder, or mount its file system.");
       answer_.mountable = false;
@@ -268,7 +282,7 @@ class Explanation {
   void CheckWrite(const FolderPermissions& folder) {
     if (access_->read_only) {
       checks_.Fail("write", "The rule is read-only.", "Give the rule the privilege to write.");
-    } else if (mounts_.IsReadOnly(path_)) {
+    } else if (explainer_.mounts_.IsReadOnly(path_)) {
       checks_.Fail("write", "The file system of " + path_ + " is mounted read-only.", "Mount it for writing.");
     } else {
       CheckPermission("write", kChange | kEnter, "change", folder);
@@ -286,11 +300,10 @@ class Explanation {
                  "Change the owner or the permissions of the folder, or the user as whom the server acts.");
   }
 
-  Box& box_;
+  Explainer& explainer_;
   const VORN::AccessQuestion& question_;
-  const std::string path_;
-  const ExportsInForce& in_force_;
-  const MountTable& mounts_;
+  const std::string& path_;
+  const ExportList& exports_;
   ExportDecision decision_;
   const TableExport* decider_ = nullptr;
   std::optional<ExportAccess> access_;  // of the flavour of the question
@@ -298,22 +311,74 @@ class Explanation {
   VORN::AccessAnswer answer_;
 };
 
-}  // namespace
+Explainer::Explainer(Box& box, const NameService& names, ExportsInForce in_force, MountTable mounts)
+    : box_(&box),
+      names_(names),
+      in_force_(std::move(in_force)),
+      hosts_(in_force_.hosts),
+      mounts_(std::move(mounts)),
+      needs_names_(NeedsNames(in_force_.exports)) {
+  const std::vector<std::string> points = mounts_.FoldersBelow("/");
+  mount_points_ = {points.begin(), points.end()};
+  for (std::size_t at = 0; at < in_force_.exports.size(); ++at) {
+    by_directory_[in_force_.exports[at].directory].push_back(at);
+  }
+}
+
+Result<Explainer> Explainer::Open(Box& box, const NameService& names) {
+  Result<ExportsInForce> in_force = ReadExportsInForce(box, names, IsServing(box));
+  if (!in_force.ok()) return in_force.status();
+  Result<MountTable> mounts = MountTable::Read(box);
+  if (!mounts.ok()) return mounts.status();
+  return Explainer(box, names, std::move(*in_force), std::move(*mounts));
+}
+
+const ExportList& Explainer::ExportsAround(const std::string& directory) {
+  const auto [around, is_new] = around_.try_emplace(directory);
+  if (!is_new) return around->second;
+  std::vector<std::size_t> indexes;
+  const auto add = [&indexes](const std::vector<std::size_t>& of) {
+    indexes.insert(indexes.end(), of.begin(), of.end());
+  };
+  for (const std::string& folder : WayTo(directory)) {
+    if (const auto found = by_directory_.find(folder); found != by_directory_.end()) add(found->second);
+  }
+  for (auto inner = by_directory_.upper_bound(directory == "/" ? directory : directory + "/");
+       inner != by_directory_.end() && IsBelow(inner->first, directory); ++inner) {
+    add(inner->second);
+  }
+  std::sort(indexes.begin(), indexes.end());
+  for (const std::size_t index : indexes) around->second.push_back(in_force_.exports[index]);
+  return around->second;
+}
+
+Result<AccessChecks> Explainer::ServiceChecks(const std::string& version) {
+  const auto known = service_checks_.find(version);
+  if (known != service_checks_.end()) return known->second;
+  AccessChecks checks;
+  if (Status status = CheckService(*box_, version, &checks); !status.ok()) return status;
+  service_checks_.emplace(version, checks);
+  return checks;
+}
+
+Result<VORN::AccessAnswer> Explainer::Explain(const VORN::AccessQuestion& question, const std::string& path,
+                                              ClientHost client) {
+  Result<AccessChecks> checks = ServiceChecks(question.version);
+  if (!checks.ok()) return checks.status();
+  return Explanation(*this, question, path, std::move(*checks)).Answer(std::move(client));
+}
 
 Result<std::vector<VORN::AccessAnswer>> ExplainAccesses(Box& box, const NameService& names,
                                                         const VORN::AccessQuestion& question,
                                                         const std::vector<std::string>& shares) {
-  const Result<ExportsInForce> in_force = ReadExportsInForce(box, names, IsServing(box));
-  if (!in_force.ok()) return in_force.status();
-  const Result<MountTable> mounts = MountTable::Read(box);
-  if (!mounts.ok()) return mounts.status();
-  const ClientHost client = FindClientHost(question.client, names, NeedsNames(in_force->exports));
+  Result<Explainer> explainer = Explainer::Open(box, names);
+  if (!explainer.ok()) return explainer.status();
+  const ClientHost client = explainer->FindClient(question.client);
   std::vector<VORN::AccessAnswer> answers;
   for (const std::string& share : shares) {
-    Result<std::string> path = FindSharePath(box, share);
+    const Result<std::string> path = FindSharePath(box, share);
     if (!path.ok()) return path.status();
-    Explanation explanation(box, question, std::move(*path), *in_force, *mounts);
-    Result<VORN::AccessAnswer> answer = explanation.Answer(names, client);
+    Result<VORN::AccessAnswer> answer = explainer->Explain(question, *path, client);
     if (!answer.ok()) return answer.status();
     answers.push_back(std::move(*answer));
   }

@@ -107,6 +107,22 @@ ExportKind ExportKindOf(const std::string& client) {
   return client[sign] == '/' ? ExportKind::kNetwork : ExportKind::kPattern;
 }
 
+const char* NameOf(ExportKind kind) {
+  switch (kind) {
+    case ExportKind::kHost:
+      return "host";
+    case ExportKind::kNetwork:
+      return "network";
+    case ExportKind::kPattern:
+      return "pattern";
+    case ExportKind::kNetgroup:
+      return "netgroup";
+    case ExportKind::kEverybody:
+      break;
+  }
+  return "everybody";
+}
+
 ExportDecision DecideExport(const ExportList& exports, const ExportQuestion& question) {
   return Decider(exports, question).Decide();
 }

@@ -18,6 +18,9 @@ enum class ExportKind { kHost, kNetwork, kPattern, kNetgroup, kEverybody };
 
 ExportKind ExportKindOf(const std::string& client);
 
+// The name of a kind in VORN::AccessRule.
+const char* NameOf(ExportKind kind);
+
 // One client of one directory in the table of exports.
 struct TableExport {
   std::string directory;

@@ -7,6 +7,9 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <map>
+#include <memory>
+#include <utility>
 
 namespace vorn {
 namespace {
@@ -17,6 +20,7 @@ struct Address {
   std::array<unsigned char, sizeof(in6_addr)> bytes{};
 };
 
+constexpr int kMostSilences = 3;
 constexpr std::array<unsigned char, 12> kMappedPrefix = {0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0xff, 0xff};
 
 std::optional<Address> ReadAddress(const std::string& text) {
@@ -62,9 +66,50 @@ bool IsMember(const std::string& netgroup, const std::string& host) {
   return innetgr(netgroup.c_str(), host.c_str(), nullptr, nullptr) != 0;
 }
 
+using Answer = std::optional<std::vector<std::string>>;
+
+// The answers of a name service.
+class Memory {
+ public:
+  explicit Memory(NameService service) : service_(std::move(service)) {}
+
+  Answer Resolve(const std::string& name) { return Ask(service_.resolve, name, &addresses_); }
+  Answer NamesOf(const std::string& address) { return Ask(service_.names_of, address, &names_); }
+
+  bool IsMember(const std::string& netgroup, const std::string& host) {
+    const auto [known, is_new] = members_.try_emplace({netgroup, host}, false);
+    if (is_new) known->second = service_.is_member(netgroup, host);
+    return known->second;
+  }
+
+ private:
+  template <typename Question>
+  Answer Ask(const Question& ask, const std::string& about, std::map<std::string, Answer>* answers) {
+    const auto known = answers->find(about);
+    if (known != answers->end()) return known->second;
+    if (silences_ >= kMostSilences) return std::nullopt;
+    const Answer& answer = answers->emplace(about, ask(about)).first->second;
+    if (!answer) ++silences_;
+    return answer;
+  }
+
+  NameService service_;
+  std::map<std::string, Answer> addresses_;
+  std::map<std::string, Answer> names_;
+  std::map<std::pair<std::string, std::string>, bool> members_;  // by netgroup and host
+  int silences_ = 0;
+};
+
 }  // namespace
 
 NameService NameService::OfSystem() { return {ResolveHost, NamesOf, IsMember}; }
+
+NameService NameService::Remembering(const NameService& service) {
+  const auto memory = std::make_shared<Memory>(service);
+  return {[memory](const std::string& name) { return memory->Resolve(name); },
+          [memory](const std::string& address) { return memory->NamesOf(address); },
+          [memory](const std::string& netgroup, const std::string& host) { return memory->IsMember(netgroup, host); }};
+}
 
 std::optional<std::string> HostAddress(const std::string& text) {
   const std::optional<Address> address = ReadAddress(text);

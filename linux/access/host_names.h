@@ -23,6 +23,10 @@ struct NameService {
 
   // The name service of this system.
   static NameService OfSystem();
+
+  // Returns a name service that asks `service` for each thing once, and asks nothing more after three questions without
+  // an answer, each of which may have taken a resolver's time limit. Not thread-safe; copies share the memory.
+  static NameService Remembering(const NameService& service);
 };
 
 // Returns the usual text of an address, "10.0.0.1" also for "::ffff:10.0.0.1"; nullopt for every other text.

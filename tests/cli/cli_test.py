@@ -126,6 +126,34 @@ class ExplainTest(BoxTest):
         self.refuses("explain data 10.0.0.5 --security sis", Exit.USAGE, "sis")
 
 
+class MatrixTest(BoxTest):
+    """vorn matrix."""
+
+    def test_lists_the_rights_of_a_client(self):
+        self.vorn("nfs set --service on")
+        self.vorn("exports add data 10.0.0.0/24 --access rw")
+        shown = self.vorn("matrix --client 10.0.0.5")
+        self.assertRegex(shown, r"(?m)^data +read and write +10\.0\.0\.0/24$")
+        self.assertRegex(shown, r"(?m)^backup +none +-$")
+
+    def test_lists_the_clients_of_a_folder(self):
+        self.vorn("nfs set --service on")
+        self.vorn("exports add data 10.0.0.0/24 --access ro")
+        self.vorn("exports add data '*.example.net' --access rw")
+        shown = self.vorn("matrix --share data --security sys")
+        self.assertRegex(shown, r"(?m)^10\.0\.0\.0/24 +- +10\.0\.0\.1 +4\.2 +sys read +10\.0\.0\.0/24$")
+        self.assertRegex(shown, r"(?m)^\*\.example\.net +- +- +4\.2 +- +-$")
+        self.assertIn("- 10.0.0.0/24: 10.0.0.1 stands for the hosts of this network", shown)
+        clients = self.json("matrix --share data --nfs-version 3")
+        self.assertEqual([flavor["flavor"] for flavor in clients[0]["flavors"]], ["sys", "krb5", "krb5i", "krb5p"])
+        self.assertEqual(clients[0]["version"], "3")
+
+    def test_refuses_what_is_no_question(self):
+        self.refuses("matrix", Exit.USAGE, "Give either --client or --share.")
+        self.refuses("matrix --share data --client 10.0.0.5", Exit.USAGE, "Give either --client or --share.")
+        self.refuses("matrix --share none", Exit.FAILED, "(code 2370,")
+
+
 class HealthTest(BoxTest):
     """vorn health."""
 

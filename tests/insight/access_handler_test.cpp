@@ -143,7 +143,7 @@ TEST_F(AccessTest, IsListedForAllSharesByName) {
   platform.access.path = "/volume1/any";
   platform.access.mountable = true;
   platform.access.rule = {"/volume1/any", "*", "everybody", "/etc/exports", 3, "decides", "It decides."};
-  EXPECT_EQ(Matrix(R"({"client": "c", "offset": 1, "limit": 1})").data, Parse(R"({"total": 3, "access": [
+  EXPECT_EQ(Matrix(R"({"client": "c", "offset": 1, "limit": 1})").data, Parse(R"({"total": 3, "clients": [], "access": [
       {"share": "data", "path": "/volume1/any", "mountable": true, "read": false, "write": false, "rule": "*"}]})"));
   platform.access.rule.reset();
   const Json::Value data = Matrix(R"({"client": "c", "user": "alice"})").data;
@@ -164,6 +164,61 @@ TEST_F(AccessTest, IsNotListedForFaultyParametersOrAFailingPlatform) {
   platform.Fail("VORNShareEnum");
   EXPECT_EQ(Matrix(R"({"client": "c"})").code, kPlatformFailure);
   EXPECT_THAT(platform.LogTexts(), Contains("Failed to VORNShareEnum, vornerr=[0x00AB]"));
+}
+
+TEST_F(AccessTest, IsListedForAllClientsOfAShare) {
+  platform.client_accesses = {
+      {"10.0.0.0/24",
+       "network",
+       "",
+       "10.0.0.1",
+       "4.2",
+       VORN::AccessRule{"/volume1/data", "10.0.0.0/24", "network", "/etc/exports", 3, "decides", "It decides."},
+       {{"sys", true, true, false}, {"krb5", false, false, false}},
+       "It stands for the network."},
+      {"10.0.0.7", "", "connected", "", "3", std::nullopt, {}, ""}};
+  EXPECT_EQ(Matrix(R"({"share": "data"})").data.toStyledString(), Parse(R"({"total": 2, "access": [], "clients": [
+      {"client": "10.0.0.0/24", "kind": "network", "state": null, "address": "10.0.0.1", "version": "4.2",
+       "rule": {"directory": "/volume1/data", "client": "10.0.0.0/24", "kind": "network", "file": "/etc/exports",
+                "line": 3, "reason": "decides", "text": "It decides."},
+       "flavors": [{"flavor": "sys", "mountable": true, "read": true, "write": false},
+                   {"flavor": "krb5", "mountable": false, "read": false, "write": false}],
+       "text": "It stands for the network."},
+      {"client": "10.0.0.7", "kind": null, "state": "connected", "address": null, "version": "3", "rule": null,
+       "flavors": [], "text": null}]})")
+                                                                      .toStyledString());
+}
+
+TEST_F(AccessTest, IsAskedForAllClientsOfAShare) {
+  for (const char* params :
+       {R"({"share": "data"})", R"({"share": "data", "flavor": "krb5i", "user": "a@B", "version": "4"})",
+        R"({"share": "data", "user": "alice", "groups": ["50"], "version": "3", "port": 1024})",
+        R"({"share": "data", "client": null, "offset": 5, "limit": 7})",
+        R"({"share": "data", "offset": -1, "limit": -2})", R"({"share": "data", "limit": 1001})"}) {
+    EXPECT_EQ(Matrix(params).code, 0) << params;
+  }
+  EXPECT_THAT(Questions(), ElementsAre("ExplainClients data    0 '' sys krb5 krb5i krb5p from 0 at most 1000",
+                                       "ExplainClients data  krb5i 4.2 0 'a@B' krb5i from 0 at most 1000",
+                                       "ExplainClients data   3 1024 'alice' 50 sys from 0 at most 1000",
+                                       "ExplainClients data    0 '' sys krb5 krb5i krb5p from 5 at most 7",
+                                       "ExplainClients data    0 '' sys krb5 krb5i krb5p from 0 at most 0",
+                                       "ExplainClients data    0 '' sys krb5 krb5i krb5p from 0 at most 1000"));
+}
+
+TEST_F(AccessTest, OfAllClientsIsNotListedForFaultyParametersOrAFailingPlatform) {
+  for (const char* params : {R"({"share": ""})", R"({"share": 1})", R"({"share": "data", "client": "c"})",
+                             R"({"share": "data", "flavor": "all"})", R"({"share": "data", "limit": "1"})"}) {
+    EXPECT_EQ(Matrix(params).code, kBadParameter) << params;
+  }
+  EXPECT_THAT(platform.LogTexts(), Contains("variables 'client' and 'share' exclude each other."));
+  platform.Fail("ExplainClients");
+  const std::pair<int, int> cases[] = {
+      {VORN::kAccessFailed, kPlatformFailure}, {VORN::kAccessNoShare, kNoShare}, {VORN::kAccessNoUser, kNoUser}};
+  for (const auto& [result, code] : cases) {
+    platform.FailWith("ExplainClients", result);
+    EXPECT_EQ(Matrix(R"({"share": "data"})").code, code);
+  }
+  EXPECT_THAT(platform.LogTexts(), Contains("Failed to ExplainClients, vornerr=[0x00AB]"));
 }
 
 }  // namespace

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "current_box.h"
+#include "name_table.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -22,35 +23,6 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using CheckResult = VORN::AccessCheck::Result;
-
-// A name service with the hosts of a table.
-struct Names {
-  std::multimap<std::string, std::string> hosts;  // name to address; the first name of an address is canonical
-  std::set<std::pair<std::string, std::string>> members;
-  bool is_away = false;
-
-  NameService service() const {
-    NameService service;
-    service.resolve = [this](const std::string& name) -> std::optional<std::vector<std::string>> {
-      if (is_away) return std::nullopt;
-      std::vector<std::string> addresses;
-      for (auto [at, end] = hosts.equal_range(name); at != end; ++at) addresses.push_back(at->second);
-      return addresses;
-    };
-    service.names_of = [this](const std::string& address) -> std::optional<std::vector<std::string>> {
-      if (is_away) return std::nullopt;
-      std::vector<std::string> names;
-      for (const auto& [name, of] : hosts) {
-        if (of == address) names.push_back(name);
-      }
-      return names;
-    };
-    service.is_member = [this](const std::string& netgroup, const std::string& host) {
-      return members.count({netgroup, host}) != 0;
-    };
-    return service;
-  }
-};
 
 class Explain : public testing::Test {
  protected:
@@ -125,7 +97,7 @@ class Explain : public testing::Test {
   }
 
   TemporaryRoot root_;
-  Names names_;
+  NameTable names_;
   std::vector<std::pair<std::string, std::string>> table_;
 };
 
@@ -424,6 +396,32 @@ TEST_F(Explain, ChecksTheServiceAndItsVersions) {
   EXPECT_THAT(Failed(Ask("10.0.0.5")), testing::Contains("version"));
   root_.Write("/etc/nfs.conf", "[nfsd]\nvers4 = n\nvers4.2 = y\n");
   EXPECT_THAT(Failed(Ask("10.0.0.5")), testing::Not(testing::Contains("version")));
+}
+
+TEST_F(Explain, SaysWhatItCannotTell) {
+  Export({{"10.0.0.0/24", "rw,sec=krb5:sys"}});
+  root_.Write("/etc/nfs/krb5.keytab", "");
+  EXPECT_THAT(With(CheckResult::kUnknown, Ask("10.0.0.5")), ElementsAre("firewall"));
+  VORN::AccessQuestion question;
+  question.client = "10.0.0.5";
+  question.flavor = "krb5";
+  EXPECT_THAT(With(CheckResult::kUnknown, Ask(question)), ElementsAre("firewall", "ticket"));
+  root_.Write("/proc/self/mountinfo",
+              "1 0 8:1 / / rw - ext4 /dev/sda1 rw\n2 1 8:2 / /srv/data/inner rw - ext4 /dev/b rw\n");
+  const VORN::AccessAnswer answer = Ask("10.0.0.5");
+  EXPECT_THAT(With(CheckResult::kUnknown, answer), ElementsAre("firewall", "volume"));
+  EXPECT_THAT(TextOf(answer, "volume"), HasSubstr("/srv/data/inner"));
+}
+
+TEST_F(Explain, DoesNotFollowTheRootOfVersion4) {
+  Export({{"10.0.0.0/24", "rw,fsid=0"}});
+  const VORN::AccessAnswer answer = Ask("10.0.0.5");
+  EXPECT_THAT(With(CheckResult::kUnknown, answer), ElementsAre("firewall", "root"));
+  EXPECT_THAT(TextOf(answer, "root"), HasSubstr("/srv/data is the root of version 4 for \"10.0.0.0/24\""));
+  VORN::AccessQuestion question;
+  question.client = "10.0.0.5";
+  question.version = "3";
+  EXPECT_THAT(With(CheckResult::kUnknown, Ask(question)), ElementsAre("firewall"));
 }
 
 TEST_F(Explain, UsesTheTableInForceAndSaysThatTheFilesDiffer) {

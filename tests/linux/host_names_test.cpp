@@ -5,6 +5,9 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
+
+#include "name_table.h"
 
 namespace vorn {
 namespace {
@@ -32,6 +35,30 @@ TEST(NameService, KnowsTheNameOfTheLoopbackAddress) {
   const auto names = NameService::OfSystem().names_of("127.0.0.1");
   if (!names || names->empty()) GTEST_SKIP() << "the name service of this machine does not know 127.0.0.1";
   EXPECT_NE(names->front(), "");
+}
+
+TEST(NameService, ThatRemembersAsksForEachThingOnce) {
+  NameTable table{{{"c.example", "10.0.0.5"}}, {{"all", "c.example"}}};
+  const NameService service = NameService::Remembering(table.service());
+  for (int time = 0; time < 2; ++time) {
+    EXPECT_EQ(service.resolve("c.example"), std::vector<std::string>{"10.0.0.5"});
+    EXPECT_EQ(service.resolve("none.example"), std::vector<std::string>());
+    EXPECT_EQ(service.names_of("10.0.0.5"), std::vector<std::string>{"c.example"});
+    EXPECT_TRUE(service.is_member("all", "c.example"));
+    EXPECT_FALSE(service.is_member("all", "none.example"));
+  }
+  EXPECT_EQ(table.questions, 5);
+}
+
+TEST(NameService, ThatDoesNotAnswerIsAskedNoMore) {
+  NameTable table{{{"c.example", "10.0.0.5"}}, {}};
+  const NameService service = NameService::Remembering(table.service());
+  EXPECT_TRUE(service.resolve("c.example"));
+  table.is_away = true;
+  for (int host = 0; host < 9; ++host) EXPECT_FALSE(service.names_of("10.0.0." + std::to_string(host)));
+  EXPECT_FALSE(service.resolve("d.example"));
+  EXPECT_EQ(table.questions, 4);
+  EXPECT_TRUE(service.resolve("c.example"));  // it is remembered
 }
 
 }  // namespace

@@ -35,4 +35,15 @@ int ExplainAccesses(const AccessQuestion& question, const std::vector<std::strin
   return 0;
 }
 
+int ExplainClients(const ClientsQuestion& question, std::vector<ClientAccess>* clients, int* total) {
+  FakePlatform& platform = FakePlatform::Current();
+  std::string arguments = Arguments(question.access);
+  for (const std::string& flavor : question.flavors) arguments += " " + flavor;
+  arguments += " from " + std::to_string(question.offset) + " at most " + std::to_string(question.limit);
+  if (platform.Fails("ExplainClients", arguments)) return platform.FailureResult("ExplainClients");
+  *clients = platform.client_accesses;
+  *total = static_cast<int>(clients->size());
+  return 0;
+}
+
 }  // namespace VORN

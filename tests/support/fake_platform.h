@@ -61,12 +61,13 @@ class FakePlatform {
   std::string realm = "BOX.EXAMPLE";
   std::vector<KeytabEntry> keytab;
   int keytab_import_result = 0;
-  std::vector<std::string> files;           // that KLIBCFileExist finds, besides those of the system
-  std::vector<std::string> port_conflicts;  // "nfs_statd 4000"
-  VORN::AccessAnswer access;                // what every access is explained with
-  VORN::NFSClient client;                   // the only one of the list
-  VORN::HealthReport health;                // of every check
-  VORN::HistoryEntry change;                // the only one of the history
+  std::vector<std::string> files;                   // that KLIBCFileExist finds, besides those of the system
+  std::vector<std::string> port_conflicts;          // "nfs_statd 4000"
+  VORN::AccessAnswer access;                        // what every access is explained with
+  std::vector<VORN::ClientAccess> client_accesses;  // the clients of every shared folder
+  VORN::NFSClient client;                           // the only one of the list
+  VORN::HealthReport health;                        // of every check
+  VORN::HistoryEntry change;                        // the only one of the history
   int done = 3;  // what an operation answers on success where every non-negative number says so
 
   // ---- Recorded events.

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "call.h"
+#include "certificate_findings.h"
 #include "export_findings.h"
 #include "findings.h"
 #include "health_input.h"
@@ -30,7 +31,7 @@ struct Check {
   bool depends_on_service = false;  // compares with the running service, or with what it finds
 };
 
-// In the order of a report: the service, its settings, the shares and their rules, users, Kerberos.
+// In the order of a report: the service, its settings, the shares and their rules, users, Kerberos, the web API.
 constexpr Check kChecks[] = {
     {"not_serving", FindStoppedService, false, false, true},
     {"closed_port", FindClosedPorts, false, false, true},
@@ -58,6 +59,8 @@ constexpr Check kChecks[] = {
     {"missing_host_key", FindMissingHostKey},
     {"weak_key", FindWeakKeys},
     {"unsynchronised_clock", FindUnsynchronisedClock},
+    {"foreign_domain", FindForeignDomains, true, false, true},
+    {"expiring_certificate", FindExpiringCertificate},
 };
 
 Status Run(const Check& check, const HealthInput& input, Findings* findings) {

@@ -6,13 +6,18 @@
 #include <algorithm>
 #include <cerrno>
 #include <climits>
+#include <memory>
 #include <set>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
 #include "ascii.h"
 #include "host_domain.h"
+#include "host_names.h"
+#include "idmap.h"
+#include "kernel_clients.h"
 #include "keytab.h"
 
 namespace vorn {
@@ -59,6 +64,29 @@ Result<std::string> FullName(Box& box) {
   if (name.find('.') != std::string::npos) return LowerAscii(name);
   return Status::Failure(kUnsupported,
                          "The host's full name is not in /etc/hosts, and the name service is not asked for it.");
+}
+
+// The NFSv4 domain of the box, in lower case.
+Result<std::string> OwnDomain(Box& box) {
+  const Result<std::shared_ptr<const IDMap>> map = ReadIDMap(box);
+  if (!map.ok()) return map.status();
+  if ((*map)->domain()) return LowerAscii(*(*map)->domain());
+  const Result<std::string> name = FullName(box);
+  if (!name.ok()) return name.status();
+  return name->substr(name->find('.') + 1);
+}
+
+// The DNS domain in the name by which a Linux client calls itself, in lower case: "Linux NFSv4.2 c.example.net", also
+// with "/..." behind the host name. Empty for all other names.
+std::string DomainOfClient(const std::string& name) {
+  constexpr std::string_view kLinux = "Linux NFSv4.";
+  if (name.compare(0, kLinux.size(), kLinux) != 0) return "";
+  const std::size_t begin = name.find(' ', kLinux.size());
+  if (begin == std::string::npos) return "";
+  const std::string host = name.substr(begin + 1, name.find_first_of(" /", begin + 1) - begin - 1);
+  const std::size_t dot = host.find('.');
+  if (dot == std::string::npos || HostAddress(host)) return "";
+  return LowerAscii(host.substr(dot + 1));
 }
 
 bool IsWeak(const std::string& type) {
@@ -117,17 +145,44 @@ Status FindWeakKeys(const HealthInput& input, Findings* findings) {
   return {};
 }
 
+Status FindForeignDomains(const HealthInput& input, Findings* findings) {
+  if (FindKerberosRule(input) == nullptr) return {};
+  const Result<std::string> own = OwnDomain(input.box);
+  if (!own.ok()) return own.status();
+  const Result<std::string> folder = input.box.root().Locate(kKernelClients);
+  if (!folder.ok()) return folder.status();
+  const Result<std::vector<KernelClient>> clients = KernelClients(*folder).List();
+  if (!clients.ok()) return clients.status();
+  std::set<std::string> domains = {*own};
+  for (const KernelClient& client : *clients) {
+    const std::string domain = DomainOfClient(client.info.name);
+    if (domain.empty() || !domains.insert(domain).second) continue;
+    VORN::HealthSubject subject;
+    subject.client = client.info.address;
+    findings->Notice(std::move(subject),
+                     "The client " + client.info.address + " is in the domain " + domain +
+                         ", and the NFSv4 domain of the box is " + *own +
+                         ": unless its idmapd.conf(5) names that domain, it shows the files of Kerberos users as those "
+                         "of nobody.",
+                     "Set one NFSv4 domain on the box and on its clients (VORN.Core.FileServ.NFS, set).");
+  }
+  return {};
+}
+
 Status FindUnsynchronisedClock(const HealthInput& input, Findings* findings) {
   const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
   if (keys.ok() && keys->empty()) return {};
   if (!input.box.root().is_box()) {
     return Status::Failure(kUnsupported, "The clock is not that of this root.");
   }
-  timex state{};
-  const int result = adjtimex(&state);
-  if (result < 0 && input.box.Exists(kSynchronised)) return {};
-  if (result < 0) return Status::System(errno, "The state of the clock cannot be read");
-  if (result != TIME_ERROR) return {};
+  timex unused{};
+  return JudgeClock(adjtimex(&unused), input.box.Exists(kSynchronised), findings);
+}
+
+Status JudgeClock(int state, bool is_marked, Findings* findings) {
+  if (state < 0 && is_marked) return {};
+  if (state < 0) return Status::System(errno, "The state of the clock cannot be read");
+  if (state != TIME_ERROR) return {};
   findings->Warning({},
                     "No time service keeps the clock of the box right. Kerberos refuses clients whose clock differs by "
                     "more than five minutes.",

@@ -17,8 +17,16 @@ Status FindMissingHostKey(const HealthInput& input, Findings* findings);
 // Keys of encryption types that RFC 6649 and RFC 8429 deprecate.
 Status FindWeakKeys(const HealthInput& input, Findings* findings);
 
+// Clients whose own domain differs from the box's NFSv4 domain, on a box that uses Kerberos; at most one finding for a
+// domain. The domain of a client is known if its name contains it (Linux: the host name).
+Status FindForeignDomains(const HealthInput& input, Findings* findings);
+
 // A clock that nothing keeps right, on a box that uses Kerberos; at most one finding.
 Status FindUnsynchronisedClock(const HealthInput& input, Findings* findings);
+
+// Judges the clock by the result of adjtimex(2), the state of the clock or -1 with errno, and by whether
+// systemd-timesyncd has set the clock.
+Status JudgeClock(int state, bool is_marked, Findings* findings);
 
 }  // namespace vorn
 

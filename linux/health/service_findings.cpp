@@ -121,7 +121,10 @@ Status FindVersionsNotInForce(const HealthInput& input, Findings* findings) {
 Status FindClosedPorts(const HealthInput& input, Findings* findings) {
   const Result<std::vector<ConfiguredPort>> ports = ReadConfiguredPorts(input.box);
   if (!ports.ok()) return ports.status();
-  const std::optional<std::vector<std::string>> closed = DescribeClosedPorts(input.box, *ports);
+  return JudgePorts(DescribeClosedPorts(input.box, *ports), findings);
+}
+
+Status JudgePorts(const std::optional<std::vector<std::string>>& closed, Findings* findings) {
   if (!closed) return Status::Failure(kUnsupported, "The packet filters of the box cannot be seen from here.");
   for (const std::string& sentence : *closed) {
     findings->Error({}, "Clients may not reach the service: " + sentence + ".",

@@ -2,6 +2,10 @@
 #ifndef VORN_LINUX_HEALTH_SERVICE_FINDINGS_H
 #define VORN_LINUX_HEALTH_SERVICE_FINDINGS_H
 
+#include <optional>
+#include <string>
+#include <vector>
+
 #include "findings.h"
 #include "health_input.h"
 #include "status.h"
@@ -16,6 +20,9 @@ Status FindVersionsNotInForce(const HealthInput& input, Findings* findings);
 
 // Packet filters of other programs that keep a port closed.
 Status FindClosedPorts(const HealthInput& input, Findings* findings);
+
+// Adds what DescribeClosedPorts() (firewall_table.h) tells.
+Status JudgePorts(const std::optional<std::vector<std::string>>& closed, Findings* findings);
 
 // File systems that have no room for what is written: configuration files, the history, the shares.
 Status FindFullFileSystems(const HealthInput& input, Findings* findings);

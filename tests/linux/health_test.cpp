@@ -3,17 +3,26 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <openssl/pem.h>
+#include <openssl/x509.h>
 #include <sys/stat.h>
+#include <sys/timex.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
+#include <memory>
+#include <optional>
 #include <string>
 #include <utility>
 #include <variant>
 #include <vector>
 
 #include "call.h"
+#include "findings.h"
+#include "kerberos_findings.h"
 #include "keytab_maker.h"
+#include "service_findings.h"
 #include "temporary_root.h"
 
 namespace vorn {
@@ -431,6 +440,107 @@ TEST_F(Health, DoesNotTakeTheClockForThatOfATrialRoot) {
   EXPECT_EQ(WhyNotChecked("unsynchronised_clock"), "");
   root_.Write(kKeytab, MakeKeytab({{"nfs/box.example@X", 1, "aes256-cts"}}));
   EXPECT_NE(WhyNotChecked("unsynchronised_clock"), "");
+}
+
+TEST(Clock, IsJudgedByTheKernelOrByTheTimeService) {
+  Findings findings("unsynchronised_clock");
+  EXPECT_TRUE(JudgeClock(TIME_OK, false, &findings).ok());
+  errno = EPERM;
+  EXPECT_TRUE(JudgeClock(-1, true, &findings).ok());
+  EXPECT_EQ(JudgeClock(-1, false, &findings).code(), EPERM);
+  EXPECT_THAT(findings.Take(), IsEmpty());
+  EXPECT_TRUE(JudgeClock(TIME_ERROR, true, &findings).ok());
+  const std::vector<VORN::HealthFinding> found = findings.Take();
+  ASSERT_THAT(found, SizeIs(1));
+  EXPECT_EQ(found[0].severity, Severity::kWarning);
+  EXPECT_THAT(found[0].text, HasSubstr("more than five minutes"));
+}
+
+TEST(ClosedPorts, AreFindings) {
+  Findings findings("closed_port");
+  EXPECT_TRUE(JudgePorts(std::vector<std::string>(), &findings).ok());
+  EXPECT_FALSE(JudgePorts(std::nullopt, &findings).ok());
+  EXPECT_THAT(findings.Take(), IsEmpty());
+  EXPECT_TRUE(JudgePorts(std::vector<std::string>{"table inet filter drops the port 2049"}, &findings).ok());
+  const std::vector<VORN::HealthFinding> found = findings.Take();
+  ASSERT_THAT(found, SizeIs(1));
+  EXPECT_EQ(found[0].kind, "closed_port");
+  EXPECT_EQ(found[0].severity, Severity::kError);
+  EXPECT_EQ(found[0].text, "Clients may not reach the service: table inet filter drops the port 2049.");
+}
+
+TEST_F(Health, FindsClientsOfOtherDomains) {
+  const auto add = [&](int number, const std::string& name) {
+    root_.Write("/proc/fs/nfsd/clients/" + std::to_string(number) + "/info",
+                "clientid: 0x1\naddress: \"10.0.0." + std::to_string(number) + ":871\"\nname: \"" + name + "\"\n");
+  };
+  add(1, "Linux NFSv4.2 a.Example.net");
+  add(2, "Linux NFSv4.0 b.other.example/10.0.0.9");
+  add(3, "Linux NFSv4.1 c.other.example");
+  add(4, "Linux NFSv4.2 short");
+  add(5, "Linux NFSv4.0 10.0.0.5/10.0.0.9 tcp");
+  add(6, "Linux NFSv4.2");
+  add(7, "another.system.example");
+  root_.Write("/etc/idmapd.conf", "[General]\nDomain = example.net\n");
+  EXPECT_THAT(Find("foreign_domain"), IsEmpty()) << "without Kerberos a client sends numbers";
+  Export("/srv/data 10.0.0.0/24(rw,sec=krb5)\n/srv/media 10.0.0.0/24(rw)\n");
+  const VORN::HealthFinding finding = FindOne("foreign_domain");
+  EXPECT_EQ(finding.severity, Severity::kNotice);
+  EXPECT_EQ(finding.subject.client, "10.0.0.2");
+  EXPECT_THAT(finding.text, HasSubstr("other.example, and the NFSv4 domain of the box is example.net"));
+  root_.Write("/etc/idmapd.conf", "");
+  EXPECT_THAT(WhyNotChecked("foreign_domain"), HasSubstr("full name"));
+  root_.Write("/etc/hostname", "box\n");
+  root_.Write("/etc/hosts", "10.0.0.9 box.other.example box\n");
+  EXPECT_EQ(FindOne("foreign_domain").subject.client, "10.0.0.1");
+}
+
+// A self-signed certificate that ends after this time, in seconds.
+std::string CertificateFor(long seconds) {
+  const std::unique_ptr<EVP_PKEY, decltype(&EVP_PKEY_free)> key(EVP_EC_gen("P-256"), EVP_PKEY_free);
+  const std::unique_ptr<X509, decltype(&X509_free)> certificate(X509_new(), X509_free);
+  X509_gmtime_adj(X509_getm_notBefore(certificate.get()), -86400L * 400);
+  X509_gmtime_adj(X509_getm_notAfter(certificate.get()), seconds);
+  X509_set_pubkey(certificate.get(), key.get());
+  X509_sign(certificate.get(), key.get(), EVP_sha256());
+  const std::unique_ptr<BIO, decltype(&BIO_free_all)> output(BIO_new(BIO_s_mem()), BIO_free_all);
+  PEM_write_bio_X509(output.get(), certificate.get());
+  std::string text(4096, '\0');
+  text.resize(
+      static_cast<std::size_t>(std::max(0, BIO_read(output.get(), text.data(), static_cast<int>(text.size())))));
+  return text;
+}
+
+TEST_F(Health, FindsACertificateThatExpires) {
+  constexpr long kDay = 86400;
+  constexpr char kSettings[] = "/etc/vorn/vornd.conf";
+  constexpr char kFile[] = "/etc/ssl/box.pem";
+  root_.Write(kSettings, std::string("[tls]\ncertificate = ") + kFile + "\nkey = /etc/ssl/box.key\n");
+  EXPECT_THAT(WhyNotChecked("expiring_certificate"), HasSubstr("has no certificate"));
+  root_.Write(kFile, CertificateFor(40 * kDay));
+  EXPECT_THAT(Find("expiring_certificate"), IsEmpty());
+  root_.Write(kFile, CertificateFor(20 * kDay + 100) + CertificateFor(-kDay));
+  VORN::HealthFinding finding = FindOne("expiring_certificate");
+  EXPECT_EQ(finding.severity, Severity::kWarning);
+  EXPECT_EQ(finding.subject.file, kFile);
+  EXPECT_THAT(finding.text, HasSubstr("expires in 20 days"));
+  EXPECT_THAT(finding.remedy, HasSubstr("systemctl reload vornd"));
+  root_.Write(kFile, CertificateFor(kDay + 100));
+  EXPECT_THAT(FindOne("expiring_certificate").text, HasSubstr("expires in 1 day:"));
+  root_.Write(kFile, CertificateFor(-60));
+  finding = FindOne("expiring_certificate");
+  EXPECT_EQ(finding.severity, Severity::kError);
+  EXPECT_THAT(finding.text, HasSubstr("has expired"));
+}
+
+TEST_F(Health, FindsASelfSignedCertificateThatIsNotMadeAnew) {
+  constexpr char kFile[] = "/var/lib/vorn/self-signed.pem";
+  root_.Write(kFile, CertificateFor(-60));
+  EXPECT_THAT(Find("expiring_certificate"), IsEmpty()) << "nobody listens with TLS";
+  root_.Write("/etc/vorn/vornd.conf", "[server]\nlisten = unix:/run/vorn/vornd.sock tls:0.0.0.0:443\n");
+  EXPECT_THAT(FindOne("expiring_certificate").remedy, HasSubstr("Restart vornd"));
+  root_.Write(kFile, CertificateFor(20 * 86400));
+  EXPECT_THAT(Find("expiring_certificate"), IsEmpty());
 }
 
 TEST_F(Health, TellsWhichFilesCannotBeRead) {

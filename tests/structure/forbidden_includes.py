@@ -35,7 +35,7 @@ ALLOWED = {
     "linux/clients": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/access", "linux/exports",
         "linux/host", "linux/service", "platform"},
     "linux/health": {"linux/status", "linux/system", "linux/text", "linux/box", "linux/exports", "linux/host",
-        "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "linux/access", "platform"},
+        "linux/idmap", "linux/kerberos", "linux/settings", "linux/service", "linux/access", "linux/clients", "platform"},
     "linux/history": {"linux/status", "linux/system", "linux/text", "linux/box", "platform"},
     "linux/contract": {
         "linux/status", "linux/system", "linux/text", "linux/box", "linux/settings", "linux/host", "linux/exports",

@@ -13,8 +13,26 @@ const withoutFonts = (): Plugin => ({
   },
 });
 
+/**
+ * Removes the plain texts from the compiled catalogue of the source language: their keys are the texts. Texts with
+ * values stay, which the page cannot compile.
+ */
+const withoutPlainTexts = (): Plugin => ({
+  name: 'source-catalogue-without-plain-texts',
+  transform: {
+    filter: { id: /locales[\\/]en\.po$/ },
+    handler: (code) => {
+      const literal = /JSON\.parse\((.*)\)/s.exec(code)?.[1];
+      if (!literal) throw new Error('the compiled catalogue has another form');
+      const messages = JSON.parse(JSON.parse(literal) as string) as Record<string, unknown[]>;
+      const needed = Object.entries(messages).filter(([key, text]) => text.length !== 1 || text[0] !== key);
+      return `export const messages = JSON.parse(${JSON.stringify(JSON.stringify(Object.fromEntries(needed)))});`;
+    },
+  },
+});
+
 export default defineConfig({
-  plugins: [withoutFonts(), react(), lingui({ failOnMissing: true })],
+  plugins: [withoutFonts(), react(), lingui({ failOnMissing: true }), withoutPlainTexts()],
   build: {
     target: 'es2022',
     assetsInlineLimit: 0, // a data: address would need a weaker content policy

@@ -63,7 +63,9 @@ export const test = base.extend<Fixtures>({
   foreseen: [[], { option: true }],
 
   // Any message that the test did not foresee fails it, among them a violation of the content policy.
-  page: async ({ page, foreseen }, use) => {
+  // The box begins before the page, so that it ends after it: a last request of the page would find no server.
+  // eslint-disable-next-line @typescript-eslint/no-unused-vars
+  page: async ({ page, foreseen, box: _box }, use) => {
     const said: string[] = [];
     page.on('console', (message) => {
       if (message.type() === 'error' || message.type() === 'warning') said.push(message.text());
@@ -100,6 +102,18 @@ export async function open(page: Page, address: string) {
   }, address);
 }
 
+/** Opens the console with a token that may only read, and goes to a page. */
+export async function enterAsReader(page: Page, box: Box, address: string) {
+  const { token } = (await box.call('VORN.Server.Token/v1/create', { name: 'auditor', role: 'reader' })) as {
+    token: string;
+  };
+  await page.goto(`${box.url}docs`);
+  await page.evaluate((secret) => {
+    sessionStorage.setItem('session', secret);
+  }, token);
+  await page.goto(`${box.url}#${address}`);
+}
+
 /** The input of a switch is hidden behind its picture. */
 export const flip = (control: Locator) => control.click({ force: true });
 
@@ -110,10 +124,20 @@ export async function reviewAndSave(page: Page) {
   await expect(page.getByRole('dialog')).toBeHidden();
 }
 
-/** Writes a picture of the whole page. */
+const FRAMES = 'html, [class*=page__main], [class*=modal-box]';
+
+/** Writes a picture of the page, where nothing may be cut off at the side. Regions that scroll by themselves may be. */
 export async function picture(page: Page, name: string, view: string) {
   const folder = process.env.VORN_PICTURES ?? path.join(import.meta.dirname, '../../build/console/pictures');
   await page.screenshot({ path: path.join(folder, `${name}-${view}.png`), fullPage: true, animations: 'disabled' });
+  const cut = await page.evaluate(
+    (frames) =>
+      [...document.querySelectorAll(frames)]
+        .filter((frame) => frame.scrollWidth > frame.clientWidth + 1)
+        .map((frame) => `${frame.className}: ${frame.scrollWidth} > ${frame.clientWidth}`),
+    FRAMES,
+  );
+  expect(cut, `${name} is cut off`).toEqual([]);
 }
 
 export { expect };

@@ -1,3 +1,5 @@
+import { writeFile } from 'node:fs/promises';
+import path from 'node:path';
 import { expect, signIn, test } from './base';
 
 test.describe('ID mappings', () => {
@@ -75,6 +77,17 @@ test.describe('a keytab', () => {
     await dialog.getByRole('button', { name: 'Install' }).click();
     await expect(dialog).toBeHidden();
     await expect(page.getByRole('row', { name: 'nfs/box.example@STORAGE.EXAMPLE 1 aes256' })).toBeVisible();
+    await axe();
+    // Whether its principal fits the name of the box.
+    await expect(page.getByRole('heading', { name: 'The name cannot be checked' })).toBeVisible();
+    const nameBox = async (name: string) => {
+      await writeFile(path.join(box.root, 'etc/hostname'), `${name}\n`);
+      await page.reload();
+    };
+    await nameBox('box.example');
+    await expect(page.getByText('The keytab has a key for the name of the box.')).toBeVisible();
+    await nameBox('other.example');
+    await expect(page.getByRole('heading', { name: 'The keytab has no key for the name of the box' })).toBeVisible();
     await axe();
   });
 });

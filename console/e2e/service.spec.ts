@@ -13,7 +13,7 @@ test('shows what saving does, and saves', async ({ page, box, axe }) => {
   await axe();
   expect(await readFile(path.join(box.root, 'etc/idmapd.conf'), 'utf8')).not.toContain('new.example');
   await dialog.getByRole('button', { name: 'Save', exact: true }).click();
-  await expect(page.getByText('Saved')).toBeVisible();
+  await expect(page.getByRole('heading', { name: /Saved$/ })).toBeVisible();
   expect(await readFile(path.join(box.root, 'etc/idmapd.conf'), 'utf8')).toContain('new.example');
   await expect(page.getByRole('button', { name: 'Review and save' })).toBeDisabled();
   await expect(page.getByRole('textbox', { name: 'NFSv4 domain' })).toHaveValue('new.example');

@@ -1,4 +1,4 @@
-import { expect, signIn, test } from './base';
+import { enterAsReader, expect, signIn, test } from './base';
 
 test.describe('without a session', () => {
   test.use({ foreseen: [/401 \(Unauthorized\)|503 \(Service Unavailable\)/] });
@@ -46,14 +46,7 @@ test.describe('without a session', () => {
 });
 
 test('a reader sees everything and changes nothing', async ({ page, box, axe }) => {
-  const { token } = (await box.call('VORN.Server.Token/v1/create', { name: 'auditor', role: 'reader' })) as {
-    token: string;
-  };
-  await page.goto(`${box.url}docs`);
-  await page.evaluate((secret) => {
-    sessionStorage.setItem('session', secret);
-  }, token);
-  await page.goto(`${box.url}#/service`);
+  await enterAsReader(page, box, '/service');
   await expect(page.getByText('You may look, but not change anything')).toBeVisible();
   await expect(page.getByText('Token auditor')).toBeVisible();
   await expect(page.getByRole('textbox', { name: 'NFSv4 domain' })).toBeDisabled();

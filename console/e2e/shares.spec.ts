@@ -1,6 +1,6 @@
 import { readFile } from 'node:fs/promises';
 import path from 'node:path';
-import { expect, reviewAndSave, signIn, test, type Box } from './base';
+import { expect, picture, reviewAndSave, signIn, test, type Box } from './base';
 
 const exportsOf = (box: Box) => readFile(path.join(box.root, 'etc/exports'), 'utf8');
 
@@ -110,4 +110,20 @@ test('explains why a client cannot mount a folder', async ({ page, box, axe }) =
   await expect(page.getByRole('heading', { name: 'The client cannot mount the folder' })).toBeVisible();
   await expect(page.getByRole('grid', { name: 'Conditions' }).getByText('failed').first()).toBeVisible();
   await axe();
+});
+
+test('shows the rights of all clients of a folder side by side @view', async ({ page, box, axe }, { project }) => {
+  await box.call('VORN.Core.FileServ.NFS/v1/set', { enable_nfs: true });
+  await signIn(page, box, '/shares/media');
+  await page.getByRole('link', { name: 'Who can get in, and why can a client not mount it?' }).click();
+  const row = page
+    .getByRole('grid', { name: 'Who can get into media' })
+    .getByRole('row')
+    .filter({ hasText: '10.20.0.0/16' });
+  await expect(row.getByRole('gridcell', { name: /^(sys )?read only$/ })).toBeVisible();
+  await expect(row.getByRole('gridcell', { name: /^(krb5[ip]? )?cannot mount$/ })).toHaveCount(3);
+  await picture(page, 'share-access', project.name);
+  await axe();
+  await row.getByRole('button', { name: 'Why has 10.20.0.0/16 these rights?' }).click();
+  await expect(page.getByRole('heading', { name: 'The client can mount the folder' })).toBeVisible();
 });

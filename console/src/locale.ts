@@ -1,5 +1,8 @@
 import { i18n } from '@lingui/core';
 
+// The catalogue of the source language has only the texts with values: all others are their own keys.
+i18n.setMessagesCompiler((text) => [text]);
+
 export const languages = { en: 'English', de: 'Deutsch' } as const;
 export type Language = keyof typeof languages;
 

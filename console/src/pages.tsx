@@ -14,6 +14,7 @@ export const pages: Page[] = [
   { name: '', title: /*i18n*/ 'Overview', Component: lazy(() => import('./pages/overview')) },
   { name: 'service', title: /*i18n*/ 'Service', Component: lazy(() => import('./pages/service')) },
   { name: 'shares', title: /*i18n*/ 'Shared folders', Component: lazy(() => import('./pages/shares')) },
+  { name: 'clients', title: /*i18n*/ 'Clients', Component: lazy(() => import('./pages/clients')) },
   { name: 'access', title: /*i18n*/ 'Access check', Component: lazy(() => import('./pages/access')) },
   { name: 'idmap', title: /*i18n*/ 'ID mapping', Component: lazy(() => import('./pages/idmap')) },
   { name: 'kerberos', title: /*i18n*/ 'Kerberos', Component: lazy(() => import('./pages/kerberos')) },

@@ -31,6 +31,7 @@ import { choose, languages, type Language } from './locale';
 import { pages } from './pages';
 import { signOut, useSession, WHO } from './session/session';
 import { linkTo, partsOf, usePath } from './shared/router';
+import { useSampling } from './traffic/sampling';
 
 const DARK = 'pf-v6-theme-dark';
 
@@ -164,6 +165,7 @@ function Navigation() {
 
 /** Head, navigation and main part of every page. */
 export function Shell({ children }: { children: ReactNode }) {
+  useSampling();
   const skip = (event: React.MouseEvent) => {
     event.preventDefault();
     document.getElementById('main')?.focus();

@@ -1,6 +1,6 @@
 import { act, renderHook } from '@testing-library/react';
 import { beforeEach, expect, test, vi } from 'vitest';
-import { linkTo, partsOf, useGuard, usePath } from '../src/shared/router';
+import { linkTo, partsOf, queryOf, useGuard, usePath } from '../src/shared/router';
 
 const follow = (address: string) => {
   act(() => {
@@ -16,6 +16,12 @@ beforeEach(() => {
 test('links keep every name', () => {
   const name = 'a/b c#d%ü';
   expect(partsOf(linkTo('shares', name).slice(1))).toEqual(['shares', name]);
+});
+
+test('a link hands values to a page', () => {
+  expect(partsOf('/access/data?client=a%2Fb')).toEqual(['access', 'data']);
+  expect(queryOf('/access/data?client=a%2Fb').get('client')).toBe('a/b');
+  expect(queryOf('/access').get('client')).toBeNull();
 });
 
 test('an address that is no page is the first page', () => {

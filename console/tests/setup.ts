@@ -1,5 +1,6 @@
 import { vi } from 'vitest';
 import { i18n } from '@lingui/core';
+import '../src/locale';
 import { messages } from '../src/locales/en.po';
 
 // jsdom has neither.

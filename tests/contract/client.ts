@@ -180,6 +180,10 @@ async function matrix() {
   const shares: string[] = answer.access.map((row) => row.share);
   assert.equal(shares.length, answer.total);
   assert.ok(shares.includes('data'));
+  const clients = dataOf(await client.POST('/api/VORN.Core.FileServ.NFS.Access/v1/matrix', { body: { share: 'data' } }));
+  assert.equal(clients.access.length, 0);
+  assert.equal(clients.clients.length, clients.total);
+  assert.ok(clients.clients.every((row) => row.flavors.length === 0 || row.address !== null));
 }
 
 async function history() {

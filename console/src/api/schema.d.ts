@@ -54,8 +54,8 @@ export interface paths {
         get?: never;
         put?: never;
         /**
-         * Lists what a client may do in each shared folder.
-         * @description The folders are sorted by name. "explain" tells the reasons.
+         * Lists what a client may do in each shared folder, or what each client may do in one.
+         * @description With "client": the shared folders, sorted by name. With "share": the clients of the export rules of the folder and of those around it, in the order of the table of exports, then the clients that are connected or have mounted something, in the order of their addresses, each with its rights for each security flavour. A host stands for a network and for everybody: one that no narrower rule names. For a pattern and a netgroup a client that the box knows stands, if there is one. "explain" tells the reasons.
          */
         post: operations["VORN.Core.FileServ.NFS.Access/v1/matrix"];
         delete?: never;
@@ -871,7 +871,7 @@ export interface components {
         };
         /** @description A condition of the access. */
         AccessCheck: {
-            /** @description What was checked: "service", "version", "firewall", the client's "name", the export "rule", the security "flavor", the "port", the "keytab", the "way" to the folder over NFSv4, the "folder" itself, "read" and "write" (rule and UNIX permissions), and "reload": whether the exports files say the same as the rules in force. */
+            /** @description What was checked: "service", "version", "firewall", the client's "name", the export "rule", the security "flavor", the "port", the "keytab", the "way" to the folder over NFSv4, the "folder" itself, "read" and "write" (rule and UNIX permissions); where the box cannot tell, "ticket" (Kerberos), "root" (an export with fsid=0) and "volume" (file systems inside of the folder); and "reload": whether the exports files say the same as the rules in force. */
             check: string;
             /** @description What would have to change; null unless the condition failed. */
             remedy: string | null;
@@ -903,40 +903,44 @@ export interface components {
             /** @description User id. */
             uid: number;
         } | null;
-        /** @description A page of rights. */
+        /** @description A page of rights of a client, or of rights in a shared folder. */
         AccessMatrix: {
-            /** @description The shared folders of the page. */
+            /** @description With "client": the shared folders of the page; otherwise empty. */
             access: components["schemas"]["AccessRow"][];
-            /** @description Number of shared folders, on all pages. */
+            /** @description With "share": the clients of the page; otherwise empty. */
+            clients: components["schemas"]["ClientAccess"][];
+            /** @description Number of shared folders or of clients, on all pages. */
             total: number;
         };
-        /** @description A client that wants to mount shared folders, and a page of these. */
+        /** @description A client that wants to mount shared folders, or a shared folder that clients want to mount; and a page of the folders or clients. Names either "client" or "share". */
         AccessMatrixQuestion: {
             /** @description An IPv4 or IPv6 address, or a host name, which the name service must know. */
-            client: string;
+            client?: string | null;
             /**
-             * @description The security flavour of the mount. Absent or null: "sys".
+             * @description The security flavour of the mount. Absent or null: "sys" with "client" or a user, otherwise all flavours.
              * @enum {string|null}
              */
             flavor?: "sys" | "krb5" | "krb5i" | "krb5p" | null;
             /** @description With the flavour "sys": the groups that the client sends, by name or id, the user's own group first. Absent, null or empty: those that the box knows. */
             groups?: string[] | null;
             /**
-             * @description Number of folders in the page. -1 stands for all folders from the offset on; 0 and any other negative number give an empty page.
+             * @description Number of folders or clients in the page. -1 stands for all folders or clients from the offset on; 0 and any other negative number give an empty page. A page has at most 1000 clients.
              * @default -1
              */
             limit?: number | null;
             /**
-             * @description Index of the first folder of the page. An offset that is negative or behind the last folder counts as 0.
+             * @description Index of the first folder or client of the page. An offset that is negative or behind the last one counts as 0.
              * @default 0
              */
             offset?: number | null;
             /** @description The port of the client. Absent or null: a reserved port, below 1024. */
             port?: number | null;
+            /** @description Name of a shared folder. */
+            share?: string | null;
             /** @description The user of the client: with the flavour "sys" an account of the box or a user id, otherwise a Kerberos principal. Absent, null or empty: no user is considered, so that neither the identity nor the permissions of the folder are. */
             user?: string | null;
             /**
-             * @description The version of NFS. "4", absent or null: "4.2".
+             * @description The version of NFS. "4": "4.2". Absent or null: with "share" the version that the client uses, otherwise "4.2".
              * @enum {string|null}
              */
             version?: "3" | "4" | "4.0" | "4.1" | "4.2" | null;
@@ -1096,6 +1100,30 @@ export interface components {
             /** @description Number of changes that match. */
             total: number;
         };
+        /** @description What a client may do in the shared folder. */
+        ClientAccess: {
+            /** @description The address that was explained: that of the client, or of a host that stands for the clients of the rule. Null if none is known; then there are no rights. */
+            address: string | null;
+            /** @description The client as the export rule has it: "10.0.0.0/24". For a client that no rule names, its address or host name. */
+            client: string;
+            /** @description The rights for each security flavour that was asked for. */
+            flavors: components["schemas"]["FlavorAccess"][];
+            /**
+             * @description The kind of the client in the rule; null if no rule names it. A host that has several addresses has a row for each.
+             * @enum {string|null}
+             */
+            kind: "host" | "network" | "pattern" | "netgroup" | "everybody" | null;
+            rule: components["schemas"]["AccessRuleOrNone"];
+            /** @description The state of the client in the list of the API VORN.Core.FileServ.NFS.Client: "connected", "mounted", "confirmed" and so on; null if it is neither connected nor has a recorded mount. */
+            state: string | null;
+            /** @description A sentence that says whom the address stands for, or why there is none; null for a client with an address of its own. */
+            text: string | null;
+            /**
+             * @description The version of NFS that was explained.
+             * @enum {string}
+             */
+            version: "3" | "4.0" | "4.1" | "4.2";
+        };
         /** @description An export that a client uses. */
         ClientExport: {
             /** @description Bytes that all clients of the rule have read from the export; null if the kernel does not count them, which Linux does from 5.13 on. */
@@ -1177,6 +1205,20 @@ export interface components {
             /** @description Its path. */
             path: string;
         };
+        /** @description What a client may do with a security flavour. */
+        FlavorAccess: {
+            /**
+             * @description The security flavour.
+             * @enum {string}
+             */
+            flavor: "sys" | "krb5" | "krb5i" | "krb5p";
+            /** @description Whether the client can mount the folder. */
+            mountable: boolean;
+            /** @description Whether it can read. */
+            read: boolean;
+            /** @description Whether it can write. */
+            write: boolean;
+        };
         /** @description What is wrong. */
         HealthAnswer: {
             counts: components["schemas"]["HealthCounts"];
@@ -1209,7 +1251,7 @@ export interface components {
                 /** @description Its version. */
                 version: number;
             } | null;
-            /** @description The kind, which stays the same: "not_serving" (the service is switched on and does not serve), "closed_port" (a packet filter of another program keeps a port closed), "full_file_system" (no free space where the configuration or clients write), "exports_not_in_force" (the running service has other export rules than the files), "exports_fault" (a faulty line of exports(5)), "settings_fault" (nfs.conf(5) or idmapd.conf(5) cannot be read), "ignored_setting" (a value that its daemon ignores), "overridden_setting" (another file overrides a setting), "version_not_in_force" (a version of NFS that a restart switches on or off), "unknown_host" (no address of a host in a rule is known), "moved_host" (/etc/hosts has another address for a host in a rule), "missing_folder" (the folder of a share does not exist), "left_share" (a folder is exported although it is no share any more), "foreign_export" (a file in /etc/exports.d exports a share), "linked_export" (a share is exported by a symbolic link), "hidden_rule" (an earlier rule decides for all clients of a rule), "crossed_volume" (the option crossmnt opens a volume to clients that its rules do not name), "nested_share" (the rules of an outer directory decide over a share), "shared_file_system" (shares of one file system have different clients), "mapping_to_nobody" (a mapping to a user who does not exist), "mapping_to_root" (a mapping to the superuser), "mapping_without_effect" (no daemon reads the static mappings, or another method comes first), "missing_keytab" (a rule demands Kerberos, and there is no key), "missing_host_key" (the keytab has no key for the name of the host), "weak_key" (a key of a deprecated encryption type), "unsynchronised_clock" (no time service keeps the clock right). */
+            /** @description The kind, which stays the same: "not_serving" (the service is switched on and does not serve), "closed_port" (a packet filter of another program keeps a port closed), "full_file_system" (no free space where the configuration or clients write), "exports_not_in_force" (the running service has other export rules than the files), "exports_fault" (a faulty line of exports(5)), "settings_fault" (nfs.conf(5) or idmapd.conf(5) cannot be read), "ignored_setting" (a value that its daemon ignores), "overridden_setting" (another file overrides a setting), "version_not_in_force" (a version of NFS that a restart switches on or off), "unknown_host" (no address of a host in a rule is known), "moved_host" (/etc/hosts has another address for a host in a rule), "missing_folder" (the folder of a share does not exist), "left_share" (a folder is exported although it is no share any more), "foreign_export" (a file in /etc/exports.d exports a share), "linked_export" (a share is exported by a symbolic link), "hidden_rule" (an earlier rule decides for all clients of a rule), "crossed_volume" (the option crossmnt opens a volume to clients that its rules do not name), "nested_share" (the rules of an outer directory decide over a share), "shared_file_system" (shares of one file system have different clients), "mapping_to_nobody" (a mapping to a user who does not exist), "mapping_to_root" (a mapping to the superuser), "mapping_without_effect" (no daemon reads the static mappings, or another method comes first), "missing_keytab" (a rule demands Kerberos, and there is no key), "missing_host_key" (the keytab has no key for the name of the host), "weak_key" (a key of a deprecated encryption type), "unsynchronised_clock" (no time service keeps the clock right), "foreign_domain" (a client is in another domain than the NFSv4 domain of the box), "expiring_certificate" (the certificate of the web API expires soon, or has expired). */
             kind: string;
             /** @description A sentence: what to do. */
             remedy: string;
@@ -1490,6 +1532,8 @@ export interface components {
                 /** @description Only of a restart: for how many seconds clients can open no further files over NFSv4 and get no new locks. */
                 grace_seconds?: number;
             }[];
+            /** @description Whether all clients whose rights would change are in "clients". False if there are too many clients and rules to compare, or if the clients cannot be listed. */
+            all_clients: boolean;
             /** @description The clients that use an export in which their rights would change, by NFSv4 or a recorded mount of NFSv3. The kernel keeps exports in use by rule, so a client may be named for an export that another client of its rule uses. Empty if no export rule would change. */
             clients: {
                 /** @description The address of the client. */
@@ -2225,7 +2269,7 @@ export interface operations {
                     };
                 };
             };
-            /** @description 2301: A parameter does not match the schema. 400: The request is malformed. */
+            /** @description 2301: A parameter does not match the schema, or the call names both a client and a shared folder, or neither. 400: The request is malformed. */
             400: {
                 headers: {
                     [name: string]: unknown;
@@ -2246,7 +2290,7 @@ export interface operations {
             };
             401: components["responses"]["Status401"];
             403: components["responses"]["Status403"];
-            /** @description 2370: A shared folder was removed during the call. */
+            /** @description 2370: There is no shared folder with this name, or one was removed during the call. */
             404: {
                 headers: {
                     [name: string]: unknown;

@@ -2,28 +2,23 @@ import { useState } from 'react';
 import { i18n } from '@lingui/core';
 import { Button, Content, Form, FormGroup, Title } from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
-import type { Data, Parameters } from '../api/call';
+import type { Parameters } from '../api/call';
 import { Choices, Text } from '../shared/fields';
 import { Loaded, PageFrame } from '../shared/page';
-import { go, linkTo } from '../shared/router';
+import { go, linkTo, queryOf, usePath } from '../shared/router';
 import { useRead } from '../shared/use-read';
 import { Explanation } from './access/explanation';
+import { rightsOf } from './access/rights';
+import { ShareMatrix } from './access/share-matrix';
 
-type Question = Omit<Parameters<'VORN.Core.FileServ.NFS.Access/v1/matrix'>, 'offset' | 'limit'>;
-type Access = Data<'VORN.Core.FileServ.NFS.Access/v1/matrix'>['access'][number];
+type Question = Omit<Parameters<'VORN.Core.FileServ.NFS.Access/v1/explain'>, 'share'>;
 
 const FLAVORS = (['sys', 'krb5', 'krb5i', 'krb5p'] as const).map((value) => ({ value, text: value }));
 const VERSIONS = (['4.2', '4.1', '4.0', '3'] as const).map((value) => ({ value, text: `NFSv${value}` }));
 
-const rightsOf = ({ mountable, read, write }: Access) => {
-  if (!mountable) return i18n._('cannot mount');
-  if (write) return i18n._('read and write');
-  return read ? i18n._('read only') : i18n._('can mount, but not read');
-};
-
 /** Asks for a client, and for how it mounts. */
 function QuestionForm({ onAsk }: { onAsk: (question: Question) => void }) {
-  const [client, setClient] = useState('');
+  const [client, setClient] = useState(queryOf(usePath()).get('client') ?? '');
   const [user, setUser] = useState('');
   const [flavor, setFlavor] = useState<(typeof FLAVORS)[number]['value']>('sys');
   const [version, setVersion] = useState<(typeof VERSIONS)[number]['value']>('4.2');
@@ -109,7 +104,10 @@ function Matrix({ question, chosen }: { question: Question; chosen: string | und
   );
 }
 
-/** Who can get in, and why: #/access, or #/access/SHARE with the explanation for one folder. */
+/**
+ * Who can get in, and why: #/access, or #/access/SHARE for one folder. A link may name the client:
+ * #/access?client=ADDRESS.
+ */
 export default function AccessPage({ rest }: { rest: string[] }) {
   const [share] = rest;
   const [question, setQuestion] = useState<Question | null>(null);
@@ -119,6 +117,14 @@ export default function AccessPage({ rest }: { rest: string[] }) {
       purpose={i18n._('What a client may do in the shared folders, and why it can or cannot mount one of them.')}
     >
       <div className="stack">
+        {share && !question && (
+          <ShareMatrix
+            share={share}
+            onAsk={({ address, version }) => {
+              if (address !== null) setQuestion({ client: address, flavor: 'sys', version });
+            }}
+          />
+        )}
         <QuestionForm onAsk={setQuestion} />
         {question && (
           <section aria-live="polite">

@@ -1,10 +1,11 @@
 // The findings of the health check, each with its remedy.
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Button, Content, ExpandableSection, List, ListItem } from '@patternfly/react-core';
+import { Button, Content, ExpandableSection, List, ListItem } from '@patternfly/react-core';
 import type { Data, Method } from '../api/call';
 import { useMayWrite } from '../session/session';
 import { ChangeDialog, type Change } from '../shared/change-dialog';
+import { FindingAlert } from '../shared/finding';
 import { Loaded } from '../shared/page';
 import { useRead } from '../shared/use-read';
 
@@ -12,49 +13,29 @@ type Answer = Data<'VORN.Core.FileServ.NFS.Health/v1/check'>;
 type Finding = Answer['findings'][number];
 type Call = NonNullable<Finding['call']>;
 
-const VARIANTS = { error: 'danger', warning: 'warning', notice: 'info' } as const;
-
-const SEVERITIES: Record<Finding['severity'], string> = {
-  error: /*i18n*/ 'Error',
-  warning: /*i18n*/ 'Warning',
-  notice: /*i18n*/ 'Notice',
-};
-
-/** The call of a remedy. The server names the method, so its parameters have no type here. */
+/**
+ * The call of a remedy. The server names the method, so its parameters have no type here, and no answer with an entity
+ * tag was read for it: the dialog rehearses the call on the data of that moment.
+ */
 const changeOf = ({ api, version, method, parameters }: Call): Change<Method> => ({
   method: `${api}/v${version}/${method}` as Method,
   parameters,
   tag: null,
 });
 
-function FindingAlert({ finding, onRemedy }: { finding: Finding; onRemedy: (finding: Finding) => void }) {
-  const mayWrite = useMayWrite();
+/** Leads to the call that carries out the remedy, with its rehearsal first. */
+function RemedyButton({ finding, onRemedy }: { finding: Finding; onRemedy: (finding: Finding) => void }) {
+  if (!useMayWrite() || !finding.call) return null;
   return (
-    <Alert
-      variant={VARIANTS[finding.severity]}
+    <Button
+      variant="link"
       isInline
-      component="h3"
-      title={finding.text}
-      variantLabel={i18n._(SEVERITIES[finding.severity])}
-      lang="en"
-      actionLinks={
-        finding.call &&
-        mayWrite && (
-          <Button
-            variant="link"
-            isInline
-            lang={i18n.locale}
-            onClick={() => {
-              onRemedy(finding);
-            }}
-          >
-            {i18n._('Look at the remedy')}
-          </Button>
-        )
-      }
+      onClick={() => {
+        onRemedy(finding);
+      }}
     >
-      {finding.remedy}
-    </Alert>
+      {i18n._('Look at the remedy')}
+    </Button>
   );
 }
 
@@ -92,7 +73,7 @@ export function Health() {
               <FindingAlert
                 key={`${finding.kind} ${JSON.stringify(finding.subject)} ${finding.text}`}
                 finding={finding}
-                onRemedy={setRemedied}
+                actions={finding.call && <RemedyButton finding={finding} onRemedy={setRemedied} />}
               />
             ))}
             <Gaps gaps={data.not_checked} />

@@ -1,18 +1,12 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import {
-  Button,
-  Content,
-  EmptyState,
-  Modal,
-  ModalBody,
-  ModalFooter,
-  ModalHeader,
-  Pagination,
-} from '@patternfly/react-core';
+import { Button, Content, EmptyState, Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-core';
+import type { Answer, Data } from '../api/call';
 import { useMayWrite } from '../session/session';
 import { ChangeDialog } from '../shared/change-dialog';
+import type { Fact } from '../shared/conflict';
 import { Difference } from '../shared/difference';
+import { Pager } from '../shared/list';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
 import { time } from '../shared/words';
@@ -48,13 +42,32 @@ function ShowChange({ change, onClose }: { change: HistoryChange; onClose: () =>
   );
 }
 
-function UndoChange({ change, onClose }: { change: HistoryChange; onClose: () => void }) {
+type Page = Data<'VORN.Core.FileServ.NFS.History/v1/list'>;
+
+/** The changes that were made since the newest one of those that were seen. */
+function newerThan(seen: HistoryChange[], stored: HistoryChange[]): Fact[] {
+  const ids = new Set(seen.map(({ id }) => id));
+  const end = stored.findIndex(({ id }) => ids.has(id));
+  return stored.slice(0, end < 0 ? stored.length : end).map((change) => ({
+    label: `${time(change.time)} ${subjectOf(change)}`,
+    text: [change.caller ?? i18n._('unknown'), ...change.files].join(', '),
+  }));
+}
+
+function UndoChange({ change, shown, onClose }: { change: HistoryChange; shown: Answer<Page>; onClose: () => void }) {
+  const [seen] = useState(shown); // another answer may come while the dialog is open
   return (
     <ChangeDialog
       title={i18n._('What undoing this change does')}
       confirm={i18n._('Undo the change')}
       done={i18n._('The change was undone')}
-      change={{ method: 'VORN.Core.FileServ.NFS.History/v1/undo', parameters: { id: change.id }, tag: null }}
+      change={{ method: 'VORN.Core.FileServ.NFS.History/v1/undo', parameters: { id: change.id }, tag: seen.tag }}
+      decision={{
+        kind: 'joins',
+        mine: [],
+        describe: (stored) => newerThan(seen.data.changes, (stored as Page).changes),
+        onTakeTheirs: onClose,
+      }}
       onDone={onClose}
       onClose={onClose}
     />
@@ -101,10 +114,11 @@ function Actions({ change, onChoose }: { change: HistoryChange; onChoose: (chose
 export default function HistoryPage() {
   const [page, setPage] = useState(1);
   const [chosen, setChosen] = useState<Chosen | null>(null);
-  const history = useRead('VORN.Core.FileServ.NFS.History/v1/list', {
-    offset: (page - 1) * PAGE_SIZE,
-    limit: PAGE_SIZE,
-  });
+  const history = useRead(
+    'VORN.Core.FileServ.NFS.History/v1/list',
+    { offset: (page - 1) * PAGE_SIZE, limit: PAGE_SIZE },
+    { keepsPrevious: true },
+  );
   const close = () => {
     setChosen(null);
   };
@@ -125,32 +139,21 @@ export default function HistoryPage() {
                 label={i18n._('Changes')}
                 actions={(change) => <Actions change={change} onChoose={setChosen} />}
               />
-              {data.total > PAGE_SIZE && (
-                <Pagination
-                  itemCount={data.total}
-                  perPage={PAGE_SIZE}
-                  perPageOptions={[]}
-                  page={page}
-                  titles={{
-                    paginationAriaLabel: i18n._('Pages of the history'),
-                    toNextPageAriaLabel: i18n._('Older changes'),
-                    toPreviousPageAriaLabel: i18n._('Newer changes'),
-                    toFirstPageAriaLabel: i18n._('Newest changes'),
-                    toLastPageAriaLabel: i18n._('Oldest changes'),
-                    currPageAriaLabel: i18n._('Page'),
-                    ofWord: i18n._('of'),
-                  }}
-                  onSetPage={(_event, next) => {
-                    setPage(next);
-                  }}
-                />
-              )}
+              <Pager
+                label={i18n._('Pages of the history')}
+                total={data.total}
+                size={PAGE_SIZE}
+                page={page}
+                onTurn={setPage}
+              />
             </>
           )
         }
       </Loaded>
       {chosen?.wish === 'show' && <ShowChange change={chosen.change} onClose={close} />}
-      {chosen?.wish === 'undo' && <UndoChange change={chosen.change} onClose={close} />}
+      {chosen?.wish === 'undo' && history.data && (
+        <UndoChange change={chosen.change} shown={history.data} onClose={close} />
+      )}
     </PageFrame>
   );
 }

@@ -1,7 +1,8 @@
-import { useDeferredValue, useState } from 'react';
+import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Button, SearchInput, Toolbar, ToolbarContent, ToolbarItem } from '@patternfly/react-core';
+import { Button } from '@patternfly/react-core';
 import { useMayWrite } from '../session/session';
+import { ListToolbar, useFilter } from '../shared/list';
 import { PageFrame, ReadOnlyNotice } from '../shared/page';
 import { CreateMappings } from './idmap/create';
 import type { Mapping } from './idmap/data';
@@ -14,10 +15,9 @@ interface Chosen {
 }
 
 export default function IdMapPage() {
-  const [text, setText] = useState('');
   const [chosen, setChosen] = useState<Chosen | null>(null);
   const [creating, setCreating] = useState(false);
-  const filter = useDeferredValue(text);
+  const filter = useFilter();
   const mayWrite = useMayWrite();
   const close = () => {
     setChosen(null);
@@ -31,35 +31,18 @@ export default function IdMapPage() {
       )}
     >
       <ReadOnlyNotice />
-      <Toolbar>
-        <ToolbarContent>
-          <ToolbarItem>
-            <SearchInput
-              aria-label={i18n._('Filter by principal or user')}
-              placeholder={i18n._('Filter by principal or user')}
-              value={text}
-              onChange={(_event, value) => {
-                setText(value);
-              }}
-              onClear={() => {
-                setText('');
-              }}
-            />
-          </ToolbarItem>
-          {mayWrite && (
-            <ToolbarItem>
-              <Button
-                onClick={() => {
-                  setCreating(true);
-                }}
-              >
-                {i18n._('Add mappings')}
-              </Button>
-            </ToolbarItem>
-          )}
-        </ToolbarContent>
-      </Toolbar>
-      <MappingTable filter={filter} onChoose={mayWrite ? setChosen : null} />
+      <ListToolbar label={i18n._('Filter by principal or user')} filter={filter}>
+        {mayWrite && (
+          <Button
+            onClick={() => {
+              setCreating(true);
+            }}
+          >
+            {i18n._('Add mappings')}
+          </Button>
+        )}
+      </ListToolbar>
+      <MappingTable filter={filter.value} onChoose={mayWrite ? setChosen : null} />
       {creating && <CreateMappings onClose={close} />}
       {chosen?.wish === 'change' && <ChangeMapping mapping={chosen.mapping} onClose={close} />}
       {chosen?.wish === 'delete' && <DeleteMapping mapping={chosen.mapping} onClose={close} />}

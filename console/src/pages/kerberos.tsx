@@ -5,10 +5,12 @@ import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import type { Data } from '../api/call';
 import { useMayWrite } from '../session/session';
 import { ChangeDialog } from '../shared/change-dialog';
+import { FindingAlert } from '../shared/finding';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
 
-type Entry = Data<'VORN.Core.FileServ.NFS.Kerberos/v1/list'>['keytab'][number];
+type Keytab = Data<'VORN.Core.FileServ.NFS.Kerberos/v1/list'>;
+type Entry = Keytab['keytab'][number];
 
 /** Whether an encryption type is no longer safe: DES, triple DES and RC4 (RFC 6649, RFC 8429). */
 export const isWeak = (type: string) => /^(deprecated:)?(des|arcfour|rc4)/i.test(type);
@@ -37,6 +39,38 @@ function Entries({ entries }: { entries: Entry[] }) {
       </Tbody>
     </Table>
   );
+}
+
+/** Whether clients, which ask for nfs/NAME, find a key for the name of the box. */
+function HostFit() {
+  const check = useRead('VORN.Core.FileServ.NFS.Health/v1/check', { kind: 'missing_host_key' });
+  return (
+    <Loaded query={check}>
+      {({ data: { findings, not_checked: gaps } }) => (
+        <>
+          {findings.map((finding) => (
+            <FindingAlert key={finding.text} finding={finding} />
+          ))}
+          {gaps.map((gap) => (
+            <Alert key={gap.reason} variant="info" isInline component="h3" title={i18n._('The name cannot be checked')}>
+              <Content component="p" lang="en">
+                {gap.reason}
+              </Content>
+            </Alert>
+          ))}
+          {findings.length + gaps.length === 0 && (
+            <Content component="p">{i18n._('The keytab has a key for the name of the box.')}</Content>
+          )}
+        </>
+      )}
+    </Loaded>
+  );
+}
+
+/** The principals of a keytab, each with its key versions. */
+function describe({ keytab }: Keytab): string {
+  const names = keytab.map((entry) => `${entry.kerberos_principal} (${entry.version})`);
+  return [...new Set(names)].join(', ') || i18n._('none');
 }
 
 /** The form with the file, as the method takes it. */
@@ -79,6 +113,11 @@ function Upload({ tag }: { tag: string | null }) {
             tag,
             form: formOf(file),
           }}
+          decision={{
+            mine: [{ label: i18n._('Keytab'), text: file.name }],
+            describe: (stored) => [{ label: i18n._('Keytab'), text: describe(stored as Keytab) }],
+            onTakeTheirs: forget,
+          }}
           onDone={forget}
           onClose={forget}
         />
@@ -118,6 +157,7 @@ export default function KerberosPage() {
                       <Title headingLevel="h2">{i18n._('Installed keys')}</Title>
                       <Entries entries={answer.data.keytab} />
                     </section>
+                    {answer.data.keytab.length > 0 && <HostFit />}
                     {mayWrite && <Upload tag={answer.tag} />}
                   </>
                 )}

@@ -1,30 +1,11 @@
 import { i18n } from '@lingui/core';
-import {
-  Card,
-  CardBody,
-  CardTitle,
-  Content,
-  DescriptionList,
-  DescriptionListDescription,
-  DescriptionListGroup,
-  DescriptionListTerm,
-  Gallery,
-  Label,
-} from '@patternfly/react-core';
-import type { ReactNode } from 'react';
+import { Card, CardBody, CardTitle, Content, DescriptionList, Gallery, Label } from '@patternfly/react-core';
+import { DescriptionItem } from '../shared/description-item';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
 import { ChangeTable } from './changes';
 import { Health } from './health';
-
-function Fact({ term, children }: { term: string; children: ReactNode }) {
-  return (
-    <DescriptionListGroup>
-      <DescriptionListTerm>{term}</DescriptionListTerm>
-      <DescriptionListDescription>{children}</DescriptionListDescription>
-    </DescriptionListGroup>
-  );
-}
+import { ThroughputCard } from './overview/throughput';
 
 function OnOff({ on }: { on: boolean }) {
   return <Label color={on ? 'green' : 'grey'}>{on ? i18n._('On') : i18n._('Off')}</Label>;
@@ -40,16 +21,16 @@ function ServiceCard() {
         <Loaded query={service}>
           {({ data }) => (
             <DescriptionList isCompact isHorizontal>
-              <Fact term={i18n._('NFS service')}>
+              <DescriptionItem term={i18n._('NFS service')}>
                 <OnOff on={data.enable_nfs} /> {!data.enable_nfs && <a href="#/service">{i18n._('Switch it on')}</a>}
-              </Fact>
-              <Fact term={i18n._('NFSv4')}>
+              </DescriptionItem>
+              <DescriptionItem term={i18n._('NFSv4')}>
                 <OnOff on={data.enable_nfs_v4} />
-              </Fact>
-              <Fact term={i18n._('NFSv4 domain')}>{data.nfs_v4_domain || i18n._('none')}</Fact>
-              <Fact term={i18n._('Kerberos principal')}>
+              </DescriptionItem>
+              <DescriptionItem term={i18n._('NFSv4 domain')}>{data.nfs_v4_domain || i18n._('none')}</DescriptionItem>
+              <DescriptionItem term={i18n._('Kerberos principal')}>
                 <Loaded query={kerberos}>{(answer) => answer.data.kerberos_principal || i18n._('none')}</Loaded>
-              </Fact>
+              </DescriptionItem>
             </DescriptionList>
           )}
         </Loaded>
@@ -123,7 +104,7 @@ export default function OverviewPage() {
   return (
     <PageFrame
       title={i18n._('Overview')}
-      purpose={i18n._('Whether NFS serves its clients, and what was changed last.')}
+      purpose={i18n._('Whether NFS serves its clients, what is wrong, and what was changed last.')}
     >
       <div className="stack">
         <ReadOnlyNotice />
@@ -132,6 +113,7 @@ export default function OverviewPage() {
           <SharesCard />
         </Gallery>
         <HealthCard />
+        <ThroughputCard />
         <ChangesCard />
       </div>
     </PageFrame>

@@ -20,6 +20,8 @@ export interface Change<M extends Method> {
 
 /** How to decide between this change and one that somebody else made meanwhile. */
 interface Decision {
+  /** Whether this change takes the place of what is stored, or is made besides what others changed. */
+  kind?: 'replaces' | 'joins';
   /** The values of this change, in words. */
   mine: Fact[];
   /** The values of the data that is stored now. */
@@ -75,6 +77,7 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
   const save = useChange<M>(done, onDone);
   const error = save.error ?? rehearsal.error;
   const conflict = conflictOf(error);
+  const kind = decision?.kind ?? 'replaces';
   const client = useQueryClient();
   const takeTheirs = () => {
     decision?.onTakeTheirs();
@@ -90,7 +93,9 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
       <ModalBody tabIndex={0}>
         {children}
         {rehearsal.isPending && <Spinner size="lg" aria-label={i18n._('Finding out what would change')} />}
-        {conflict && decision && <Conflict mine={decision.mine} theirs={decision.describe(conflict.details)} />}
+        {conflict && decision && (
+          <Conflict kind={kind} mine={decision.mine} theirs={decision.describe(conflict.details)} />
+        )}
         {error && !(conflict && decision) && <Problem error={error} />}
         {!error && rehearsal.data?.rehearsal && (
           <>
@@ -102,9 +107,9 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
       <ModalFooter>
         {conflict && decision ? (
           <>
-            <Button onClick={keepMine}>{i18n._('Keep mine')}</Button>
+            <Button onClick={keepMine}>{kind === 'joins' ? i18n._('Go on with mine') : i18n._('Keep mine')}</Button>
             <Button variant="secondary" onClick={takeTheirs}>
-              {i18n._('Take what is stored')}
+              {kind === 'joins' ? i18n._('Give mine up') : i18n._('Take what is stored')}
             </Button>
           </>
         ) : (

@@ -24,18 +24,20 @@ export function contrasts(mine: Fact[], theirs: Fact[]): Contrast[] {
 }
 
 /** Shows how the edited version and the one that was stored meanwhile differ. */
-export function Conflict({ mine, theirs }: { mine: Fact[]; theirs: Fact[] }) {
+export function Conflict({ kind, mine, theirs }: { kind: 'replaces' | 'joins'; mine: Fact[]; theirs: Fact[] }) {
   const rows = contrasts(mine, theirs);
   return (
     <>
       <Content component="p">
-        {i18n._('Somebody else has saved other values since you opened this page. Decide which ones are to stay.')}
+        {kind === 'joins'
+          ? i18n._('Somebody else has changed this since the page read it. Decide whether your change still fits.')
+          : i18n._('Somebody else has saved other values since you opened this page. Decide which ones are to stay.')}
       </Content>
       <Table aria-label={i18n._('Differences')} variant="compact" gridBreakPoint="">
         <Thead>
           <Tr>
             <Th>{i18n._('Setting')}</Th>
-            <Th>{i18n._('Yours')}</Th>
+            <Th>{kind === 'joins' ? i18n._('What you saw, with your change') : i18n._('Yours')}</Th>
             <Th>{i18n._('Stored meanwhile')}</Th>
           </Tr>
         </Thead>

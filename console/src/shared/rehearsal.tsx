@@ -3,6 +3,7 @@ import { i18n } from '@lingui/core';
 import { Alert, Content, Label, List, ListItem, Title } from '@patternfly/react-core';
 import type { Rehearsal } from '../api/call';
 import { Difference } from './difference';
+import { FindingAlert } from './finding';
 
 type Action = Rehearsal['actions'][number];
 type RuleChange = Rehearsal['rules'][number]['changes'][number];
@@ -95,8 +96,20 @@ function RightsItem({ who, change }: { who: ReactNode; change: RuleChange }) {
   );
 }
 
+/** The directory of a rule, if the change concerns several. */
+function Directory({ of: directory, among }: { of: string; among: string[] }) {
+  if (among.every((each) => each === directory)) return null;
+  return (
+    <>
+      {' '}
+      <code>{directory}</code>
+    </>
+  );
+}
+
 function Rules({ rules }: { rules: Rehearsal['rules'] }) {
   if (rules.length === 0) return null;
+  const directories = rules.map((rule) => rule.directory);
   return (
     <section>
       <Title headingLevel="h2" size="md">
@@ -107,7 +120,12 @@ function Rules({ rules }: { rules: Rehearsal['rules'] }) {
           rule.changes.map((change) => (
             <RightsItem
               key={[rule.directory, rule.client, change.change, change.flavor].join(' ')}
-              who={<code>{rule.client}</code>}
+              who={
+                <>
+                  <code>{rule.client}</code>
+                  <Directory of={rule.directory} among={directories} />
+                </>
+              }
               change={change}
             />
           )),
@@ -125,6 +143,7 @@ function nameOf({ address, name, certain }: Rehearsal['clients'][number]): strin
 /** The clients that use the folder at this moment. */
 function Connected({ clients }: { clients: Rehearsal['clients'] }) {
   if (clients.length === 0) return null;
+  const paths = clients.map((client) => client.path);
   return (
     <section>
       <Title headingLevel="h2" size="md">
@@ -135,11 +154,51 @@ function Connected({ clients }: { clients: Rehearsal['clients'] }) {
           client.changes.map((change) => (
             <RightsItem
               key={[client.path, client.address, change.change, change.flavor].join(' ')}
-              who={<strong>{nameOf(client)}</strong>}
+              who={
+                <>
+                  <strong>{nameOf(client)}</strong>
+                  <Directory of={client.path} among={paths} />
+                </>
+              }
               change={change}
             />
           )),
         )}
+      </List>
+      {clients.some((client) => !client.certain) && (
+        <Content component="small">
+          {i18n._('A rule for names of hosts may decide otherwise for some. No name service is asked beforehand.')}
+        </Content>
+      )}
+    </section>
+  );
+}
+
+/** What the health check will find, and will no longer find. */
+function Findings({ findings }: { findings: NonNullable<Rehearsal['findings']> }) {
+  const { added, removed } = findings;
+  if (added.length + removed.length === 0) return null;
+  return (
+    <section>
+      {added.length > 0 && (
+        <Title headingLevel="h2" size="md">
+          {i18n._('What the change leads to')}
+        </Title>
+      )}
+      {added.map((finding) => (
+        <FindingAlert key={`${finding.kind} ${finding.text}`} finding={finding} />
+      ))}
+      {removed.length > 0 && (
+        <Title headingLevel="h2" size="md">
+          {i18n._('What the change settles')}
+        </Title>
+      )}
+      <List>
+        {removed.map((finding) => (
+          <ListItem key={`${finding.kind} ${finding.text}`} lang="en">
+            {finding.text}
+          </ListItem>
+        ))}
       </List>
     </section>
   );
@@ -161,12 +220,13 @@ function Files({ files }: { files: Rehearsal['files'] }) {
 
 /** What a change would do, in words: to the service and its clients, and to the files of the box. */
 export function RehearsalView({ rehearsal }: { rehearsal: Rehearsal }) {
-  const { actions, rules, clients, files } = rehearsal;
+  const { actions, rules, clients, files, findings } = rehearsal;
   if (actions.length + rules.length + files.length === 0) {
     return <Alert variant="info" isInline component="h2" title={i18n._('This changes nothing on the box.')} />;
   }
   return (
     <div className="rehearsal">
+      {findings && <Findings findings={findings} />}
       <Actions actions={actions} />
       <Rules rules={rules} />
       <Connected clients={clients} />

@@ -44,7 +44,10 @@ export function go(path: string) {
 export const linkTo = (...parts: string[]) => `#/${parts.map(encodeURIComponent).join('/')}`;
 
 /** The parts of a path, as linkTo() got them. */
-export const partsOf = (path: string) => path.split('/').filter(Boolean).map(decodeURIComponent);
+export const partsOf = (path: string) => (path.split('?')[0] ?? '').split('/').filter(Boolean).map(decodeURIComponent);
+
+/** What a link hands to a page behind the "?" of a path. */
+export const queryOf = (path: string) => new URLSearchParams(path.split('?')[1]);
 
 /** While `active`, calls `onLeave` with the path of a link instead of following it, and has the browser ask. */
 export function useGuard(active: boolean, onLeave: (target: string) => void) {

@@ -10,6 +10,19 @@ export function bytes(count: number): string {
   return i18n._('{count} bytes', { count: i18n.number(count) });
 }
 
+const UNITS = ['KiB', 'MiB', 'GiB', 'TiB', 'PiB', 'EiB'];
+
+/** A rounded amount of data: "1.5 GiB". */
+export function volume(count: number): string {
+  if (count < 1024) return bytes(Math.round(count));
+  const unit = Math.min(Math.floor(Math.log2(count) / 10), UNITS.length);
+  const value = i18n.number(count / 1024 ** unit, { maximumSignificantDigits: 3 });
+  return `${value} ${UNITS[unit - 1] ?? ''}`;
+}
+
+/** A rate of transfer: "1.5 MiB/s". */
+export const perSecond = (rate: number) => i18n._('{volume}/s', { volume: volume(rate) });
+
 /** The largest size of a transfer. */
 export const transferSize = (size: number) => (size === 0 ? i18n._('The system chooses') : bytes(size));
 

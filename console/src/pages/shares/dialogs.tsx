@@ -1,13 +1,30 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
 import { Content } from '@patternfly/react-core';
+import type { Answer, Data } from '../../api/call';
 import { ChangeDialog } from '../../shared/change-dialog';
+import type { Fact } from '../../shared/conflict';
 import { TextField } from '../../shared/fields';
 import { FormDialog } from '../../shared/form-dialog';
 import { go, linkTo } from '../../shared/router';
+import { ruleCount } from './rule';
+
+type Shares = Data<'VORN.Core.Share/v1/list'>;
+
+const describe = ({ shares }: Shares): Fact[] =>
+  shares.map(({ name, path, rules }) => ({ label: name, text: `${path}, ${ruleCount(rules)}` }));
+
+/** The decision between a change of the list that was seen and the changes of others. */
+const decisionOf = (mine: Fact[], onTakeTheirs: () => void) => ({
+  kind: 'joins' as const,
+  mine,
+  describe: (stored: unknown) => describe(stored as Shares),
+  onTakeTheirs,
+});
 
 /** Asks for the name and the path of a new shared folder, and then for a confirmation. */
-export function CreateShare({ onClose }: { onClose: () => void }) {
+export function CreateShare({ shown, onClose }: { shown: Answer<Shares>; onClose: () => void }) {
+  const [seen] = useState(shown); // another answer may come while the dialog is open
   const [name, setName] = useState('');
   const [path, setPath] = useState('');
   const [reviewed, setReviewed] = useState(false);
@@ -17,7 +34,8 @@ export function CreateShare({ onClose }: { onClose: () => void }) {
         title={i18n._('What sharing the folder does')}
         confirm={i18n._('Share the folder')}
         done={i18n._('The folder is shared. Now add rules for its clients.')}
-        change={{ method: 'VORN.Core.Share/v1/create', parameters: { name, path }, tag: null }}
+        change={{ method: 'VORN.Core.Share/v1/create', parameters: { name, path }, tag: seen.tag }}
+        decision={decisionOf([...describe(seen.data), { label: name, text: path }], onClose)}
         onDone={() => {
           onClose();
           go(linkTo('shares', name).slice(1));
@@ -58,14 +76,17 @@ export function CreateShare({ onClose }: { onClose: () => void }) {
   );
 }
 
-export function DeleteShare({ name, onClose }: { name: string; onClose: () => void }) {
+export function DeleteShare({ name, shown, onClose }: { name: string; shown: Answer<Shares>; onClose: () => void }) {
+  const [seen] = useState(shown);
+  const mine = describe(seen.data).filter(({ label }) => label !== name);
   return (
     <ChangeDialog
       title={i18n._('Stop sharing {name}?', { name })}
       confirm={i18n._('Stop sharing')}
       done={i18n._('The folder is no longer shared')}
       isDanger
-      change={{ method: 'VORN.Core.Share/v1/delete', parameters: { name }, tag: null }}
+      change={{ method: 'VORN.Core.Share/v1/delete', parameters: { name }, tag: seen.tag }}
+      decision={decisionOf(mine, onClose)}
       onDone={onClose}
       onClose={onClose}
     >

@@ -1,18 +1,17 @@
-import { useDeferredValue, useState } from 'react';
+import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Button, EmptyState, SearchInput, Toolbar, ToolbarContent, ToolbarItem } from '@patternfly/react-core';
+import { Button, EmptyState } from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import type { Data } from '../../api/call';
 import { useMayWrite } from '../../session/session';
+import { ListToolbar, useFilter } from '../../shared/list';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../../shared/page';
 import { linkTo } from '../../shared/router';
 import { useRead } from '../../shared/use-read';
 import { CreateShare, DeleteShare } from './dialogs';
+import { ruleCount } from './rule';
 
 export type Share = Data<'VORN.Core.Share/v1/list'>['shares'][number];
-
-const ruleCount = (count: number) =>
-  i18n._('{n, plural, =0 {no rules, nobody may mount it} one {# rule} other {# rules}}', { n: count });
 
 function ShareTable({ shares, onDelete }: { shares: Share[]; onDelete: (share: Share) => void }) {
   const mayWrite = useMayWrite();
@@ -58,14 +57,14 @@ function ShareTable({ shares, onDelete }: { shares: Share[]; onDelete: (share: S
 }
 
 export function ShareList() {
-  const [text, setText] = useState('');
+  const filter = useFilter();
   const [creating, setCreating] = useState(false);
   const [deleted, setDeleted] = useState<Share | null>(null);
-  const filter = useDeferredValue(text).toLowerCase();
+  const wanted = filter.value.toLowerCase();
   const shares = useRead('VORN.Core.Share/v1/list', {});
   const mayWrite = useMayWrite();
   const matches = (share: Share) =>
-    share.name.toLowerCase().includes(filter) || share.path.toLowerCase().includes(filter);
+    share.name.toLowerCase().includes(wanted) || share.path.toLowerCase().includes(wanted);
   return (
     <PageFrame
       title={i18n._('Shared folders')}
@@ -77,57 +76,41 @@ export function ShareList() {
           const found = data.shares.filter(matches);
           return (
             <>
-              <Toolbar>
-                <ToolbarContent>
-                  <ToolbarItem>
-                    <SearchInput
-                      aria-label={i18n._('Search by name or folder')}
-                      placeholder={i18n._('Search by name or folder')}
-                      value={text}
-                      {...(text && { resultsCount: found.length })}
-                      onChange={(_event, value) => {
-                        setText(value);
-                      }}
-                      onClear={() => {
-                        setText('');
-                      }}
-                    />
-                  </ToolbarItem>
-                  {mayWrite && (
-                    <ToolbarItem>
-                      <Button
-                        onClick={() => {
-                          setCreating(true);
-                        }}
-                      >
-                        {i18n._('Share a folder')}
-                      </Button>
-                    </ToolbarItem>
-                  )}
-                </ToolbarContent>
-              </Toolbar>
+              <ListToolbar label={i18n._('Search by name or folder')} filter={filter} count={found.length}>
+                {mayWrite && (
+                  <Button
+                    onClick={() => {
+                      setCreating(true);
+                    }}
+                  >
+                    {i18n._('Share a folder')}
+                  </Button>
+                )}
+              </ListToolbar>
               {found.length > 0 ? (
                 <ShareTable shares={found} onDelete={setDeleted} />
               ) : (
                 <EmptyState
                   headingLevel="h2"
-                  titleText={text ? i18n._('No shared folder matches') : i18n._('No folder is shared yet')}
+                  titleText={filter.text ? i18n._('No shared folder matches') : i18n._('No folder is shared yet')}
                 />
               )}
             </>
           );
         }}
       </Loaded>
-      {creating && (
+      {creating && shares.data && (
         <CreateShare
+          shown={shares.data}
           onClose={() => {
             setCreating(false);
           }}
         />
       )}
-      {deleted && (
+      {deleted && shares.data && (
         <DeleteShare
           name={deleted.name}
+          shown={shares.data}
           onClose={() => {
             setDeleted(null);
           }}

@@ -62,6 +62,10 @@ export function toParameters(rules: StoredRule[]): Rule[] | null {
   return rules.map((rule) => ({ ...rule, security_flavor: rule.security_flavor ?? { sys: true } })) as Rule[];
 }
 
+/** How many rules a folder has, in words. */
+export const ruleCount = (count: number) =>
+  i18n._('{n, plural, =0 {no rules, nobody may mount it} one {# rule} other {# rules}}', { n: count });
+
 export const privilegeText = ({ privilege }: StoredRule) =>
   privilege ? i18n._(PRIVILEGES[privilege]) : i18n._('not set');
 

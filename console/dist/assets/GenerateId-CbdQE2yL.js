@@ -1,1 +1,0 @@
-import{dt as e}from"./problem-Cz9wPbIU.js";var t=({prefix:t=`pf-random-id-`,children:n})=>n(e(t));t.displayName=`GenerateId`;export{t};

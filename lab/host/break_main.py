@@ -17,8 +17,8 @@ from host.process import build, output_of
 _WORK = PROJECT / "build/break"
 
 
-def broken_package(item):
-    """Builds the package from sources with the break's edit. Raises LabError where the edit changes nothing."""
+def broken_packages(item):
+    """Builds the packages from sources with the break's edit. Raises LabError where the edit changes nothing."""
     text, expression = item.source
     tree = _WORK / item.name
     shutil.rmtree(tree, ignore_errors=True)
@@ -34,16 +34,16 @@ def broken_package(item):
     if not changed:
         raise LabError(f"{item.name}: no source has the text that is to be edited")
     build([str(tree / "packaging/build")], _WORK / f"{item.name}.log")
-    return next((tree / "build/package").glob("vorn-nfs_[0-9]*.deb"))
+    return guest.packages_of(tree)
 
 
 def run_break(item, make_guest):
     """The stories that failed with the break, or None if the guest ended without a verdict."""
-    package = broken_package(item) if item.source else None
+    packages = broken_packages(item) if item.source else None
     (story,) = stories.find([item.story])
 
     def make(name):
-        made = make_guest(name, package=package)
+        made = make_guest(name, packages=packages)
         shutil.copytree(PROJECT / "lab/breaks", made.share / "breaks")
         shutil.copy(_WORK / "preload.so", made.share / "breaks")
         (made.share / "break").write_text(f"{item.script}\n", encoding="utf-8")

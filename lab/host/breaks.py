@@ -13,10 +13,10 @@ def _preload(what):
             f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}")
 
 
-def _package(edit):
-    """The package with an edited control file; `edit` runs in its DEBIAN folder."""
-    return (f"dpkg-deb -R /lab/package.deb /tmp/broken; (cd /tmp/broken/DEBIAN; {edit}); "
-            "dpkg-deb -Znone -b /tmp/broken /lab/package.deb; dpkg --install /lab/package.deb")
+def _package(edit, name="vorn-platform-linux"):
+    """A package with edited control files; `edit` runs in its DEBIAN folder."""
+    return (f"package=$(ls /lab/packages/{name}_*); dpkg-deb -R $package /tmp/broken; "
+            f"(cd /tmp/broken/DEBIAN; {edit}); dpkg-deb -Znone -b /tmp/broken $package; dpkg --install $package")
 
 
 # A save has exportfs(8) apply all files anew, instead of the difference.
@@ -65,6 +65,16 @@ BREAKS = [
                   "(static_cast<void>(environment), Status())/"), select="without_a_rule"),
     Break("read-only-stays", "a withdrawn right ends immediately", "withdrawn_rights",
           f"sed -i 's/^\tforget_rights$/\texit 0/' {_SCRIPT}", select="read_only"),
+    Break("unit-decides-over-threads", "a withdrawn right ends immediately", "withdrawn_rights",
+          source=("bool HasThreads() const {", "s/bool HasThreads() const {/bool HasThreads() const {\\n"
+                  "    if (std::system(\"systemctl is-active --quiet nfs-server\") != 0) return false;/"),
+          select="threads_run_without"),
+    Break("left-shares-not-named", "an exported path that is no share is named", "withdrawn_rights",
+          source=("is exported although it is no share any more", "s/^  LogDone(LOG_WARNING, directory + \" is exported "
+                  "although/  if (directory.empty()) LogDone(LOG_WARNING, directory + \" is exported although/"),
+          select="no_share"),
+    Break("lock-ports-stay", "fixed ports that are switched off are free", "advanced",
+          f"sed -i 's/^\tlock_ports$/\t:/' {_SCRIPT}", select="switched_off_are_free"),
     Break("firewall-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vorn-firewall"),
     Break("server-not-at-boot", "a reboot restores the service", "reboot", "systemctl disable vornd"),
     Break("clients-not-notified", "after a reboot clients may reclaim their locks", "reboot_locks",
@@ -110,6 +120,13 @@ BREAKS = [
     Break("lock-lost-at-restart", "the configuration lock of another program outlives a restart", "package",
           "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nRuntimeDirectoryPreserve=no\\n' "
           f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="lock_of_another"),
+    Break("tokens-lost-at-upgrade", "an upgrade keeps settings and tokens", "package",
+          _package("sed -i '2i rm -f /var/lib/vorn/tokens.json' postinst", "vorn-server"), select="single_package"),
+    Break("modules-not-followed", "an installed module is served", "package",
+          _package("sed -i /interest/d triggers", "vorn-server"), select="follows_its_modules"),
+    Break("rules-not-dumped", "a dump restores the box", "command_line",
+          """sed -i 's/"rules": rules.data."rule"./"rules": []/' /usr/share/vorn/cli/vorn_cli/commands/state.py""",
+          select="dump"),
     Break("kinds-in-reverse", "an explanation is what the kernel does", "explain",
           source=("exports[a].kind < exports[b].kind", "s/exports\\[a\\].kind < exports\\[b\\].kind/"
                   "exports[a].kind > exports[b].kind/")),
@@ -125,7 +142,6 @@ BREAKS = [
 
 # The stories that no break guards, with the reason.
 WITHOUT_BREAK = {
-    "advanced": "the settings are those of \"service\" and \"ports\", which have breaks, through another method",
     "export_clients": "who is meant by a client is decided by mountd(8), and the lab does not break that; a client that is "
                       "written wrongly fails tests/linux/exports_client_test",
     "export_options": "what an option does is decided by the kernel, and the lab does not break that; an option that is "

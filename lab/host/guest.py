@@ -30,16 +30,24 @@ def end_all():
             child.terminate()
 
 
+def packages_of(tree):
+    """The packages that packaging/build has made of the sources in a folder."""
+    found = [path for path in (tree / "build/package").glob("vorn-*_*.deb") if "-dbgsym_" not in path.name]
+    if not found:
+        raise LabError(f"{tree / 'build/package'} has no packages")
+    return found
+
+
 class Guest:
     """A guest with a folder of its own below build/lab, which becomes /lab in it."""
 
-    def __init__(self, name, machine, kernel, image, package=None):
+    def __init__(self, name, machine, kernel, image, packages=None):
         self.folder = WORK / name
         self.share = self.folder / "share"
         self._boot = PROJECT / "lab" / machine / "boot"
         self._inputs = [str(kernel), str(image), str(self.share), str(self.folder / "disk")]
         self._claim()
-        self._fill(package or next((PROJECT / "build/package").glob("vorn-nfs_[0-9]*.deb")))
+        self._fill(packages or packages_of(PROJECT))
 
     def _claim(self):
         """Locks the guest's folder, because another run of this checkout may use the same name."""
@@ -50,12 +58,14 @@ class Guest:
         except BlockingIOError:
             raise LabError(f"another run of this checkout has a guest \"{self.folder.name}\"") from None
 
-    def _fill(self, package):
+    def _fill(self, packages):
         shutil.rmtree(self.folder, ignore_errors=True)
         self.share.mkdir(parents=True)
         for name in ("harness", "stories"):
             shutil.copytree(PROJECT / "lab" / name, self.share / name, ignore=shutil.ignore_patterns("__pycache__"))
-        shutil.copy(package, self.share / "package.deb")
+        (self.share / "packages").mkdir()
+        for package in packages:
+            shutil.copy(package, self.share / "packages")
 
     def boot(self, job, environment=None, output=None, boots_again=False):
         """Boots once; the lines of `job` say what the guest is to do. Returns the exit status of its kernel. A guest

@@ -1,4 +1,4 @@
-"""Boots virtual boxes, installs the package of this checkout in them, and runs the stories of lab/stories/ there."""
+"""Boots virtual boxes, installs the packages of this checkout in them, and runs the stories of lab/stories/ there."""
 
 import argparse
 import concurrent.futures

@@ -1,4 +1,4 @@
-"""The package: upgraded over a running service, removed, purged, and installed again."""
+"""The packages: upgraded over a running service, removed, purged, and installed again."""
 
 import fcntl
 import os
@@ -9,10 +9,12 @@ import pytest
 from harness import api, kerberos
 from harness.programs import run, succeeds, wait_for
 
-PACKAGE = "/lab/package.deb"
+PACKAGES = sorted(map(str, pathlib.Path("/lab/packages").glob("*.deb")))
+NAMES = ("vorn-cli", "vorn-nfs", "vorn-server", "vorn-platform-linux")
 WRITTEN_BY_THE_PACKAGE = [pathlib.Path(path) for path in (
     "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/nfs/krb5.keytab",
     "/var/lib/vorn")]
+CONFIGURATION = (pathlib.Path("/etc/pam.d/vornd"), pathlib.Path("/etc/vorn/vornd.conf"))
 OF_THE_ADMINISTRATOR = {pathlib.Path(path): text for path, text in {
     "/etc/vorn/platform.conf": "[platform]\n# as the rack needs it\nkerberos = auto\n",
     "/etc/nfs/krb5.conf": "[libdefaults]\n default_realm = LAB.TEST\n",
@@ -20,8 +22,8 @@ OF_THE_ADMINISTRATOR = {pathlib.Path(path): text for path, text in {
     "/etc/systemd/system/nfs-server.service.d/limits.conf": "[Service]\nLimitNOFILE=4096\n"}.items()}
 
 
-def install(package):
-    run("dpkg", "--install", package)
+def install(packages):
+    run("dpkg", "--install", *packages)
     wait_for(api.answers, "vornd does not listen")
 
 
@@ -33,14 +35,29 @@ def settings(box, client):
     box.nfs(read_size=32768, write_size=32768, nfs_v4_domain="kept.example")
     box.restart()
     yield api.call("NFS", "get")
-    install(PACKAGE)
+    install(PACKAGES)
 
 
 def next_version():
-    """The same package with a higher version, as the next release would come."""
-    run("sh", "-ec", f"""rm -rf /tmp/next && dpkg-deb --raw-extract {PACKAGE} /tmp/next &&
-        sed -i 's/^Version: .*/&+1/' /tmp/next/DEBIAN/control && dpkg-deb -Znone --build /tmp/next /tmp/next.deb""")
-    return "/tmp/next.deb"
+    """The same packages with a higher version, as the next release would come."""
+    run("sh", "-ec", f"""rm -rf /tmp/next && mkdir /tmp/next
+        for package in {" ".join(PACKAGES)}; do
+          rm -rf /tmp/tree && dpkg-deb --raw-extract $package /tmp/tree
+          sed -i -E 's/^Version: .*/&+1/; s/\\(= ([0-9.]+)\\)/(= \\1+1)/g' /tmp/tree/DEBIAN/control
+          dpkg-deb -Znone --build /tmp/tree /tmp/next/
+        done""")
+    return sorted(map(str, pathlib.Path("/tmp/next").glob("*.deb")))
+
+
+def single_package():
+    """The package of before version 1.1.0, which had everything."""
+    run("sh", "-ec", f"""rm -rf /tmp/single && mkdir -p /tmp/single/DEBIAN
+        for package in {" ".join(PACKAGES)}; do dpkg-deb --extract $package /tmp/single; done
+        printf '%s\\n' /etc/pam.d/vornd /etc/vorn/vornd.conf >/tmp/single/DEBIAN/conffiles
+        printf '%s\\n' 'Package: vorn-nfs' 'Version: 1.0.0' 'Architecture: all' 'Description: all in one' \\
+          'Maintainer: The VORN NFS developers <nfs@vorn.example>' >/tmp/single/DEBIAN/control
+        dpkg-deb -Znone --build /tmp/single /tmp/single.deb""")
+    return "/tmp/single.deb"
 
 
 def process():
@@ -57,6 +74,36 @@ def test_an_upgrade_restarts_the_server_and_leaves_nfs_alone(box, client, settin
         (mounted / "after").touch()
     assert api.call("NFS", "get") == settings
     assert len(box.rules("data")) == 1
+
+
+def test_the_single_package_of_before_is_replaced(box, client, settings):
+    """Settings, tokens and edited configuration files are kept, and clients are served on."""
+    box.foresees("^vornd: ")
+    run("dpkg", "--remove", *NAMES)
+    run("dpkg", "--install", single_package())
+    run("systemctl", "daemon-reload")
+    run("systemctl", "enable", "--now", "vornd")
+    wait_for(api.answers, "vornd does not listen")
+    status, made = api.request("POST", "/api/VORN.Server.Token/v1/create", '{"name": "kept", "role": "reader"}')
+    assert status == 200
+    for file in CONFIGURATION:
+        file.write_text(file.read_text(encoding="ascii") + "# of the site\n", encoding="ascii")
+    with client.mounted("/srv/data") as mounted:
+        service = run("systemctl", "show", "--property=ActiveEnterTimestampMonotonic", "nfs-server")
+        run("apt-get", "install", "--yes", *PACKAGES)
+        wait_for(api.answers, "vornd does not listen")
+        assert run("systemctl", "show", "--property=ActiveEnterTimestampMonotonic", "nfs-server") == service
+        (mounted / "after").touch()
+    assert api.call("NFS", "get") == settings
+    assert len(box.rules("data")) == 1
+    assert "kept" in run("vorn", "token", "list")
+    assert made["data"]["token"]
+    for file in CONFIGURATION:
+        assert file.read_text(encoding="ascii").endswith("# of the site\n")
+        file.write_text(file.read_text(encoding="ascii").replace("# of the site\n", ""), encoding="ascii")
+        assert run("dpkg", "--search", str(file)) == f"vorn-server: {file}\n"
+    assert succeeds("systemctl", "is-enabled", "vornd")
+    run("vorn", "token", "revoke", made["data"]["id"])
 
 
 def accounts():
@@ -82,11 +129,11 @@ def test_the_package_creates_the_accounts_of_the_squash_modes(box, client, witho
     with pytest.raises(api.Refused):
         box.allow("data", rule)
     assert 'no account "admin"' in box.journal.text()
-    assert "created the system account admin" in run("dpkg", "--install", PACKAGE)
+    assert "created the system account admin" in run("dpkg", "--install", *PACKAGES)
     wait_for(api.answers, "vornd does not listen")
     assert accounts().count("admin") == 1
     box.allow("data", rule)
-    assert "created" not in run("dpkg", "--install", PACKAGE)
+    assert "created" not in run("dpkg", "--install", *PACKAGES)
     wait_for(api.answers, "vornd does not listen")
 
 
@@ -104,13 +151,13 @@ def test_a_lock_of_another_program_survives_a_restart(box):
 
 
 def test_a_removed_package_leaves_its_settings_and_a_service_that_serves(box, client, settings):
-    run("dpkg", "--remove", "vorn-nfs")
+    run("dpkg", "--remove", *NAMES)
     assert not succeeds("systemctl", "-q", "is-active", "vornd")
     assert not pathlib.Path("/run/vorn").exists()
     assert client.mounts("/srv/data")
     run("systemctl", "restart", "nfs-server")  # as at the next boot
     assert client.mounts("/srv/data")
-    install(PACKAGE)
+    install(PACKAGES)
     assert api.call("NFS", "get") == settings
     assert len(box.rules("data")) == 1
 
@@ -127,8 +174,17 @@ def foreign_files(box):
         path.unlink(missing_ok=True)
 
 
+def test_the_server_follows_its_modules(box, settings):
+    del box
+    run("dpkg", "--remove", "vorn-nfs")
+    assert not succeeds("systemctl", "-q", "is-active", "vornd")
+    assert not succeeds("systemctl", "-q", "is-failed", "vornd")
+    install([package for package in PACKAGES if "vorn-nfs" in package])
+    assert api.call("NFS", "get") == settings
+
+
 def purge():
-    run("dpkg", "--purge", "vorn-nfs")
+    run("dpkg", "--purge", *NAMES)
 
 
 def test_a_purged_package_takes_what_it_wrote_and_nothing_else(box, client, settings, foreign_files, realm):
@@ -163,7 +219,7 @@ def test_who_may_use_the_server_outlasts_an_upgrade_and_a_purge(box, settings):
     purge()
     assert not pam.exists()
     assert "alice" in members("vorn-admin")
-    install(PACKAGE)
+    install(PACKAGES)
     assert pam.exists() and members("vorn-readonly") == [""]
     run("gpasswd", "--delete", "alice", "vorn-admin")
 
@@ -190,7 +246,7 @@ def test_installing_using_and_purging_leaves_no_new_file(box, client):
     places = ("/etc", "/usr", "/var/lib", "/lib/systemd", "/run/vorn")
     purge()
     before = files_below(*places) - files_below("/var/lib/nfs", "/var/lib/dpkg", "/var/lib/krb5kdc")
-    install(PACKAGE)
+    install(PACKAGES)
     box.share("data")
     box.allow("data", {"client": client.address})
     box.nfs(read_size=32768)
@@ -199,7 +255,7 @@ def test_installing_using_and_purging_leaves_no_new_file(box, client):
     box.nfs(enable_nfs=False)
     purge()
     new = files_below(*places) - files_below("/var/lib/nfs", "/var/lib/dpkg", "/var/lib/krb5kdc") - before
-    install(PACKAGE)
+    install(PACKAGES)
     administrators = {pathlib.Path(path) for path in ("/etc/vorn", "/etc/vorn/shares.conf", "/etc/exports",
                                                       "/etc/idmapd.conf")}
     assert new - administrators == set()

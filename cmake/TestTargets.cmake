@@ -9,3 +9,17 @@ function(vorn_add_test name)
   add_test(NAME ${folder}.${name} COMMAND ${target})
   set_tests_properties(${folder}.${name} PROPERTIES TIMEOUT 900)
 endfunction()
+
+# vorn_check_answers(PART DESCRIPTOR TEST...): adds the test contract.PART_answers, which compares the answers that these
+# tests record with the descriptor of the methods. The answers are in the folder answers/PART of the build.
+function(vorn_check_answers part descriptor)
+  set(answers ${PROJECT_BINARY_DIR}/answers/${part})
+  file(MAKE_DIRECTORY ${answers})
+  set_tests_properties(${ARGN} PROPERTIES
+    ENVIRONMENT VORN_RECORD_ANSWERS=${answers} FIXTURES_SETUP ${part}_answers)
+  list(TRANSFORM ARGN REPLACE "[.]" "_" OUTPUT_VARIABLE programs)
+  add_test(NAME contract.${part}_answers
+    COMMAND /usr/bin/python3 ${PROJECT_SOURCE_DIR}/tests/contract/contract_answers.py  # Debian's, which has Debian's jsonschema
+      ${descriptor} ${answers} ${programs})
+  set_tests_properties(contract.${part}_answers PROPERTIES FIXTURES_REQUIRED ${part}_answers SKIP_RETURN_CODE 77)
+endfunction()

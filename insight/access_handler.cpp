@@ -10,6 +10,7 @@
 #include "core.h"
 #include "folder_listing.h"
 #include "json_values.h"
+#include "listing_page.h"
 #include "log.h"
 #include "page.h"
 #include "parameter_reader.h"
@@ -21,7 +22,6 @@ constexpr const char* kFlavors[] = {"sys", "krb5", "krb5i", "krb5p"};
 constexpr const char* kVersions[] = {"3", "4", "4.0", "4.1", "4.2"};
 constexpr char kNewestVersion[] = "4.2";
 constexpr int kLargestPort = 65535;
-constexpr int kMostClients = 1000;  // of a page
 
 // The parameters that the methods have in common. `flavor` and `version` count if the caller names none.
 VORN::AccessQuestion ReadMount(ParameterReader& reader, const char* flavor, const char* version) {
@@ -211,7 +211,8 @@ bool AccessHandler::ListClients(const Json::Value& params, Json::Value& result) 
   question.flavors = FlavorsOf(question.access);
   question.offset = static_cast<std::size_t>(std::max(reader.Integer("offset", 0), 0));
   const int limit = reader.Integer("limit", -1);
-  question.limit = static_cast<std::size_t>(limit == -1 ? kMostClients : std::clamp(limit, 0, kMostClients));
+  question.limit =
+      static_cast<std::size_t>(limit == -1 ? ListingPage::kMost : std::clamp(limit, 0, ListingPage::kMost));
   if (!reader.ok()) return Fail(kBadParameter);
   std::vector<VORN::ClientAccess> clients;
   int total = 0;

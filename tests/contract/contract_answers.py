@@ -22,6 +22,7 @@ except ImportError:
     sys.exit(1 if os.environ.get("CI") == "true" else 77)
 
 BAD_PARAMETER = 2301
+NULL_CHARACTER = r"\u0000"
 SERVER = pathlib.Path(__file__).resolve().parents[2] / "server/api/openapi.json"
 
 
@@ -109,6 +110,8 @@ class Contract:
         if answer["code"] == 0 and not answer["kerberos"] and isinstance(request, dict):
             for rule in request.get("rule", []):  # the flavours are ignored without Kerberos
                 rule["security_flavor"] = {"sys": True}
+        if NULL_CHARACTER in json.dumps(request):
+            return  # the server refuses such a text before a method gets it
         fault = self.fault(request, content["schema"], False)
         if answer["code"] == 0 and fault:
             self.complain(method, f"the schema refuses a request that was accepted: {fault}", answer)

@@ -16,17 +16,10 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using CheckResult = VORN::AccessCheck::Result;
 
-template <void (AccessHandler::*kDriver)()>
-Answer CallMethod(const std::string& params) {
-  const auto entry = [](VORN::APIRequest* request, VORN::APIResponse* response) {
-    AccessHandler handler(request, response);
-    (handler.*kDriver)();
-  };
-  return Call(entry, params);
-}
+constexpr char kAPI[] = "VORN.Core.FileServ.NFS.Access";
 
-constexpr auto Explain = CallMethod<&AccessHandler::Explain>;
-constexpr auto Matrix = CallMethod<&AccessHandler::Matrix>;
+Answer Explain(const std::string& params) { return Call(EntryOf(kAPI, "explain"), params); }
+Answer Matrix(const std::string& params) { return Call(EntryOf(kAPI, "matrix"), params); }
 
 constexpr char kQuestion[] = R"({"share": "data", "client": "10.0.0.5"})";
 
@@ -212,8 +205,10 @@ TEST_F(AccessTest, OfAllClientsIsNotListedForFaultyParametersOrAFailingPlatform)
   }
   EXPECT_THAT(platform.LogTexts(), Contains("variables 'client' and 'share' exclude each other."));
   platform.Fail("ExplainClients");
-  const std::pair<int, int> cases[] = {
-      {VORN::kAccessFailed, kPlatformFailure}, {VORN::kAccessNoShare, kNoShare}, {VORN::kAccessNoUser, kNoUser}};
+  const std::pair<int, int> cases[] = {{VORN::kAccessFailed, kPlatformFailure},
+                                       {VORN::kAccessNoShare, kNoShare},
+                                       {VORN::kAccessNoUser, kNoUser},
+                                       {VORN::kAccessNoGroup, kNoGroup}};
   for (const auto& [result, code] : cases) {
     platform.FailWith("ExplainClients", result);
     EXPECT_EQ(Matrix(R"({"share": "data"})").code, code);

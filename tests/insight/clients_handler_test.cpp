@@ -12,14 +12,10 @@ namespace {
 using testing::Contains;
 using testing::Not;
 
-template <void (ClientsHandler::*kDriver)()>
-void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
-  ClientsHandler handler(request, response);
-  (handler.*kDriver)();
-}
+constexpr char kAPI[] = "VORN.Core.FileServ.NFS.Client";
 
-Answer List(const std::string& params) { return Call(Serve<&ClientsHandler::List>, params); }
-Answer Disconnect(const std::string& params) { return Call(Serve<&ClientsHandler::Disconnect>, params); }
+Answer List(const std::string& params) { return Call(EntryOf(kAPI, "list"), params); }
+Answer Disconnect(const std::string& params) { return Call(EntryOf(kAPI, "disconnect"), params); }
 
 TEST(ClientsHandler, ListsAPageOfTheClientsThatMatch) {
   FakePlatform platform;

@@ -16,13 +16,7 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using Severity = VORN::HealthFinding::Severity;
 
-Answer Check(const std::string& params) {
-  const auto entry = [](VORN::APIRequest* request, VORN::APIResponse* response) {
-    HealthHandler handler(request, response);
-    handler.Check();
-  };
-  return Call(entry, params);
-}
+Answer Check(const std::string& params) { return Call(EntryOf("VORN.Core.FileServ.NFS.Health", "check"), params); }
 
 std::vector<std::string> KindsOf(const Json::Value& data) {
   std::vector<std::string> kinds;

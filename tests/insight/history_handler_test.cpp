@@ -16,15 +16,11 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-template <void (HistoryHandler::*kDriver)()>
-void Serve(VORN::APIRequest* request, VORN::APIResponse* response) {
-  HistoryHandler handler(request, response);
-  (handler.*kDriver)();
-}
+constexpr char kAPI[] = "VORN.Core.FileServ.NFS.History";
 
-Answer List(const std::string& params) { return Call(Serve<&HistoryHandler::List>, params); }
-Answer Show(const std::string& params) { return Call(Serve<&HistoryHandler::Show>, params); }
-Answer Undo(const std::string& params) { return Call(Serve<&HistoryHandler::Undo>, params); }
+Answer List(const std::string& params) { return Call(EntryOf(kAPI, "list"), params); }
+Answer Show(const std::string& params) { return Call(EntryOf(kAPI, "show"), params); }
+Answer Undo(const std::string& params) { return Call(EntryOf(kAPI, "undo"), params); }
 
 class HistoryHandlerTest : public testing::Test {
  protected:
@@ -152,6 +148,8 @@ TEST_F(HistoryHandlerTest, SaysWhyAChangeIsNotTakenBack) {
   platform.Fail("ShowHistory");
   platform.FailWith("ShowHistory", VORN::kHistoryNoChange);
   EXPECT_EQ(Show(R"({"id": "c0ffee"})").code, kNoChange);
+  platform.FailWith("ShowHistory", VORN::kHistoryFailed);
+  EXPECT_EQ(Show(R"({"id": "c0ffee"})").code, kPlatformFailure);
   platform.Fail("ListHistory");
   EXPECT_EQ(List("{}").code, kPlatformFailure);
 }

@@ -9,19 +9,7 @@
 
 #include "fake_platform.h"
 
-// The table of the module, if the test program is linked with the module.
-extern "C" __attribute__((weak)) const void* GetAPITable();
-
 namespace {
-
-// Returns the row of an entry function, or nullptr for any other function.
-const APIRow* RowOf(EntryFunction entry) {
-  if (GetAPITable == nullptr) return nullptr;
-  for (const auto* row = static_cast<const APIRow*>(GetAPITable()); row->api != nullptr; ++row) {
-    if (row->handler == entry) return row;
-  }
-  return nullptr;
-}
 
 // Opens the file of this program, which is empty at the program's first line.
 std::ofstream* OpenFile() {

@@ -4,10 +4,9 @@
 
 #include <json/value.h>
 
-#include "webapi.h"
+#include "module_table.h"
 
 struct Answer;
-using EntryFunction = decltype(APIRow::handler);
 
 // Appends a line of JSON to PROGRAM.jsonl in the folder that the environment variable VORN_RECORD_ANSWERS names:
 //     {"method": "API/v1/name", "request": {...}, "code": 0, "data": ..., "kerberos": true}

@@ -1720,7 +1720,7 @@ export interface components {
         };
         /** @description The token to create. Other parameters are refused. */
         ServerNewToken: {
-            /** @description The only APIs that the token may call: a list of 1 to 100 names of GET /api. Without it, the token may call all APIs. */
+            /** @description The only APIs that the token may call: a list of 1 to 100 names of GET /api, but not those of the server itself (VORN.Server). Without it, the token may call all APIs. */
             apis?: string[] | null;
             /** @description Seconds until the token expires. Without it, the token does not expire. */
             expires_in?: number | null;

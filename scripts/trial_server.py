@@ -108,30 +108,44 @@ class TrialServer:
         """The code that vornd has printed, which signs in once."""
         return re.search("#code=(vornc_[0-9a-f]+)", self.log()).group(1)
 
-    def request(self, method, path, body=None, content_type="application/json"):
-        """The status, the content type and the body of the answer."""
+    def _send(self, method, path, body, headers):
+        """The answer, with its body."""
         connection = UnixConnection(self.socket)
-        connection.request(method, path, body, {"Content-Type": content_type} if body is not None else {})
+        connection.request(method, path, body, headers)
         response = connection.getresponse()
         answer = response.read()
         connection.close()
+        return response, answer
+
+    def request(self, method, path, body=None, content_type="application/json", if_match=None):
+        """The status, the content type and the body of the answer."""
+        headers = {"Content-Type": content_type} if body is not None else {}
+        if if_match is not None:
+            headers["If-Match"] = if_match
+        response, answer = self._send(method, path, body, headers)
         return response.status, response.getheader("Content-Type"), answer
 
-    def call(self, path, parameters):
+    def revision(self, path, parameters):
+        """The ETag of the answer of a method that reads."""
+        response, _ = self._send("POST", path, json.dumps(parameters), {"Content-Type": "application/json"})
+        return response.getheader("ETag")
+
+    def call(self, path, parameters, if_match=None):
         """The status and the answer of a method."""
-        status, _, answer = self.request("POST", path, json.dumps(parameters))
+        status, _, answer = self.request("POST", path, json.dumps(parameters), if_match=if_match)
         return status, json.loads(answer)
 
-    def upload(self, path, name, content):
+    def upload(self, path, name, content, if_match=None):
         """The status and the answer of a method that takes a file in the part `name` of a form."""
         head = f'--{BOUNDARY}\r\nContent-Disposition: form-data; name="{name}"; filename="upload"\r\n\r\n'
         body = head.encode() + content + f"\r\n--{BOUNDARY}--\r\n".encode()
-        status, _, answer = self.request("POST", path, body, f"multipart/form-data; boundary={BOUNDARY}")
+        status, _, answer = self.request("POST", path, body, f"multipart/form-data; boundary={BOUNDARY}", if_match)
         return status, json.loads(answer)
 
     def keytab(self):
         """The content of a keytab with one key, made by ktutil(1)."""
         file = self.folder / "nfs.keytab"
+        file.unlink(missing_ok=True)  # ktutil appends to a file that is there
         commands = ["addent -password -p nfs/box.example@STORAGE.EXAMPLE -k 1 -e aes256-cts", "secret", f"wkt {file}"]
         subprocess.run(["ktutil"], input="\n".join(commands) + "\n", text=True, check=True, capture_output=True)
         content = file.read_bytes()
@@ -145,7 +159,7 @@ def newest_change(server):
     return changes["data"]["changes"][0]["id"]
 
 
-def try_example(server, path, operation, name):
+def try_example(server, path, operation, name, if_match=None):
     """The status and the answer of the example request `name` of an operation of the OpenAPI document.
 
     An example that names a change of the history is tried with the newest change of /etc/exports.
@@ -155,5 +169,5 @@ def try_example(server, path, operation, name):
     if content_type == "application/json":
         if CHANGE_ID.fullmatch(str(value.get("id"))):
             value = {**value, "id": newest_change(server)}
-        return server.call(path, value)
-    return server.upload(path, next(iter(value)), server.keytab())
+        return server.call(path, value, if_match)
+    return server.upload(path, next(iter(value)), server.keytab(), if_match)

@@ -104,7 +104,8 @@ def _candidate(package):
 def kernel(cache, machine):
     """The folder with the kernel for this kind of machine ("uml" or "vm")."""
     program = PROJECT / "lab" / machine / "kernel"
-    return cache.get(f"kernel-{machine}", digest(_candidate("user-mode-linux"), [program]), program)
+    files = [program, *program.parent.glob("*.c")]
+    return cache.get(f"kernel-{machine}", digest(_candidate("user-mode-linux"), files), program)
 
 
 def disk(cache):

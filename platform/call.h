@@ -33,6 +33,9 @@ struct CallDescription {
   // The draft on which a rehearsed call works; null for a call that works on the box. It must outlive the call.
   // Warnings of a rehearsal are collected as usual; remarks about what was done are not logged.
   const Draft* draft = nullptr;
+
+  // Whether the answer may tell the caller the reasons and warnings, which name files and settings of the box.
+  bool sees_remarks = true;
 };
 
 // The context of the calling thread, from construction to destruction. Contexts of one thread nest:

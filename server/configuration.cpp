@@ -66,7 +66,8 @@ Configuration LoadConfiguration(const Options& options) {
   }
   if (!loaded.faults.empty()) return loaded;
   for (const Contradiction& found : FindContradictions(loaded.settings)) {
-    const auto place = file.places.find(found.setting);
+    auto place = file.places.find(found.setting);
+    if (place == file.places.end()) place = file.places.find(found.other);  // the file has this one of the two
     loaded.faults.push_back((place == file.places.end() ? path + ": " : At(path, place->second)) +
                             std::string(found.setting->key) + " " + found.text);
   }

@@ -68,6 +68,11 @@ bool OwnNames::HasGivenName(std::string_view host) const {
   return std::any_of(names_.begin(), names_.end(), [host](const std::string& name) { return HasName(host, name); });
 }
 
+bool OwnNames::HaveGiven() const {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  return !names_.empty();
+}
+
 bool OwnNames::Include(std::string_view host, bool tls) const {
   const std::string lower = LowerAscii(host);
   if (IsLoopback(lower) || HasGivenName(lower)) return true;

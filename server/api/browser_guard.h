@@ -28,6 +28,9 @@ class OwnNames {
   // resolves to an address of this server has another name ("DNS rebinding"), and its name is no address.
   bool Include(std::string_view host, bool tls) const;
 
+  // Returns whether there are given names: then a proxy may send requests to a Unix socket.
+  bool HaveGiven() const;
+
   // Returns whether the client has sent its request over TLS, to this server or to a proxy: cookies are safe.
   bool AreSecure(std::string_view host, bool tls) const { return tls || HasGivenName(LowerAscii(host)); }
 

@@ -128,7 +128,6 @@ bool Descriptor::ReadPaths(const Json::Value& paths, std::string* error) {
       return Fault(error, "paths: \"" + path + "\": x-share-parameter is no name of a parameter");
     }
     method.share_parameter = share.asString();
-    method.may_have_secrets = HasSecrets(path);
     methods_[path] = std::move(method);
   }
   return true;
@@ -184,21 +183,16 @@ const Json::Value* Descriptor::ParameterSchema(const std::string& path) const {
   return schema;
 }
 
-bool Descriptor::HasSecrets(const std::string& path) const {
+std::vector<std::string> Descriptor::Unlogged(const std::string& path, const Json::Value& parameters) const {
   const Json::Value* schema = ParameterSchema(path);
   const Json::Value* properties = schema == nullptr ? nullptr : Find(*schema, {"properties"});
-  if (properties == nullptr) return false;
-  return std::any_of(properties->begin(), properties->end(), IsSecret);
-}
-
-Json::Value Descriptor::WithoutSecrets(const std::string& path, Json::Value parameters) const {
-  const Json::Value* schema = ParameterSchema(path);
-  const Json::Value* properties = schema == nullptr ? nullptr : Find(*schema, {"properties"});
-  if (properties == nullptr || !parameters.isObject()) return parameters;
-  for (const std::string& name : properties->getMemberNames()) {
-    if (IsSecret((*properties)[name]) && parameters.isMember(name)) parameters[name] = "(left out)";
+  std::vector<std::string> names;
+  if (properties == nullptr || !parameters.isObject()) return names;
+  for (auto member = parameters.begin(); member != parameters.end(); ++member) {
+    const Json::Value* property = Find(*properties, {member.name()});
+    if (property == nullptr || IsSecret(*property)) names.push_back(member.name());
   }
-  return parameters;
+  return names;
 }
 
 std::vector<std::string> Descriptor::ParameterFaults(const std::string& path, const Json::Value& parameters) const {

@@ -45,7 +45,6 @@ class Descriptor {
   struct Method {
     bool reads_only = false;
     bool takes_file = false;
-    bool may_have_secrets = true;   // whether a parameter is or may be "writeOnly"
     std::string shown_by;           // "Api/v1/method"; empty if no method shows what this one changes
     std::vector<std::string> same;  // names of parameters
     std::string share_parameter{};  // empty: it is not about one shared folder
@@ -69,9 +68,9 @@ class Descriptor {
   // if there is no such schema.
   std::vector<std::string> ParameterFaults(const std::string& path, const Json::Value& parameters) const;
 
-  // Returns the parameters with "(left out)" in place of each member that the schema of the method declares as
-  // "writeOnly": a password or a key, which no log may have.
-  Json::Value WithoutSecrets(const std::string& path, Json::Value parameters) const;
+  // Returns the names of the parameters whose values no log may have: those that the schema of the method declares as
+  // "writeOnly", such as a password, and those that it does not know, which can be anything.
+  std::vector<std::string> Unlogged(const std::string& path, const Json::Value& parameters) const;
 
   // The whole document; null for an empty descriptor.
   const Json::Value& document() const { return document_; }
@@ -79,8 +78,6 @@ class Descriptor {
  private:
   // The schema of the parameters as JSON, not a reference to it; nullptr if there is none.
   const Json::Value* ParameterSchema(const std::string& path) const;
-
-  bool HasSecrets(const std::string& path) const;
 
   bool ReadErrorCodes(const Json::Value& codes, std::string* error);
   bool ReadPaths(const Json::Value& paths, std::string* error);

@@ -88,9 +88,9 @@ bool IsUnchanged(std::string_view if_match, PresentData* present) {
 
 // Returns the reasons of a failed call: those of the platform. If it has none, and the code is about the parameters,
 // the description of the method says which ones are faulty.
-std::vector<std::string> ReasonsOf(const Route& route, int code, const VORN::CallContext& context,
+std::vector<std::string> ReasonsOf(const Route& route, int code, const std::vector<std::string>& of_platform,
                                    const VORN::APIRequest& request) {
-  if (!context.reasons().empty() || !route.descriptor->Describe(code).about_parameters) return context.reasons();
+  if (!of_platform.empty() || !route.descriptor->Describe(code).about_parameters) return of_platform;
   return route.descriptor->ParameterFaults("/api/" + route.Id(), request.GetParam("", Json::Value()));
 }
 
@@ -110,8 +110,10 @@ Outcome RunEntryFunction(const Route& route, Json::Value parameters, VORN::CallD
   route.row.handler(&request, response.get());
   context.End();
   if (!response->answered()) throw std::runtime_error("the method ended without one");
-  Remarks remarks{{}, context.warnings()};
-  if (const int code = response->error(); code != 0) remarks.reasons = ReasonsOf(route, code, context, request);
+  Remarks remarks;
+  if (context.description().sees_remarks) remarks = {context.reasons(), context.warnings(), ""};
+  const int code = response->error();
+  remarks.reasons = code == 0 ? std::vector<std::string>() : ReasonsOf(route, code, remarks.reasons, request);
   return {std::move(response), std::move(remarks)};
 }
 

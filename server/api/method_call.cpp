@@ -2,14 +2,17 @@
 
 #include <syslog.h>
 
+#include <algorithm>
 #include <exception>
 #include <string>
 #include <utility>
 #include <variant>
+#include <vector>
 
 #include "answer.h"
 #include "entry_function.h"
 #include "log_quote.h"
+#include "secret.h"
 
 namespace vorn::server {
 namespace {
@@ -18,6 +21,9 @@ namespace {
 // CPU time, so that even a full lane of small calls delays the next one by less than a quarter of a second.
 constexpr std::size_t kSmallBody = 1024;
 
+constexpr const char* kSecretInParameters =
+    "A parameter contains a token, a session or a sign-in code, which would be logged. Send a token in the header "
+    "Authorization; a list of tokens names each by its id.";
 constexpr const char* kTooMany = "Too many calls of this method are waiting. Try again soon.";
 
 JobSize SizeOf(const Body& body) { return body.size() > kSmallBody ? JobSize::kLarge : JobSize::kSmall; }
@@ -45,8 +51,17 @@ Response AnswerOf(const Route& route, Function function) noexcept {
 
 // Large parameters are copied only if something must be left out.
 std::string TextForAudit(const Route& route, const Json::Value& parameters) {
-  if (!route.method.may_have_secrets) return AuditedParameters(parameters);
-  return AuditedParameters(route.descriptor->WithoutSecrets("/api/" + route.Id(), parameters));
+  const std::vector<std::string> unlogged = route.descriptor->Unlogged("/api/" + route.Id(), parameters);
+  if (unlogged.empty()) return AuditedParameters(parameters);
+  Json::Value logged = parameters;
+  for (const std::string& name : unlogged) logged[name] = "(left out)";
+  return AuditedParameters(logged);
+}
+
+// Whether any text inside of the value contains a token, a session or a code: parameters are logged and kept.
+bool HasSecret(const Json::Value& value) {
+  if (value.isString()) return ContainsSecret(value.asString());
+  return (value.isArray() || value.isObject()) && std::any_of(value.begin(), value.end(), HasSecret);
 }
 
 // Compares the whole string: a module may take another spelling for the same folder, which is refused here.
@@ -74,6 +89,7 @@ Call::Call(Request request, std::unique_ptr<Body> body, Environment environment)
   // A rehearsal writes to a draft, which a reader may do.
   const bool may_change = caller_->role == Role::kAdministrator || rehearses_;
   description_.may_write = may_change && !route_.method.reads_only;
+  description_.sees_remarks = caller_->role == Role::kAdministrator;
 }
 
 std::optional<Response> Call::Receive(std::string_view piece) { return body_->Receive(piece); }
@@ -123,12 +139,16 @@ Response Call::Execute() {
   if (auto* refusal = std::get_if<Response>(&parameters)) return std::move(*refusal);
   Json::Value& object = std::get<Json::Value>(parameters);
   if (!MayNameShare(*caller_, route_, object)) return Refusal(403, "This token is not for this shared folder.");
+  if (HasSecret(object)) return Refusal(400, kSecretInParameters);
   description_.uploads = body_->Uploads();
   if (!route_.method.reads_only) {
     audited_parameters_ = TextForAudit(route_, object);
     description_.parameters = audited_parameters_;
   }
-  if (rehearses_) return Rehearse(route_, std::move(object), description_, if_match_, caller_->shares.empty());
+  if (rehearses_) {
+    const bool sees_all = caller_->shares.empty() && caller_->apis.empty();
+    return Rehearse(route_, std::move(object), description_, if_match_, sees_all);
+  }
   if (route_.own) return route_.own(object, *caller_);
   if (!if_match_) return RunAndAnswer(route_, std::move(object), description_);
   return RunIfUnchanged(route_, std::move(object), description_, *if_match_);

@@ -29,7 +29,10 @@ bool FollowsLink(const Head& head) {
 
 std::optional<Response> KeepOtherSitesOut(const Head& head, const OwnNames& names) {
   const std::string_view host = head.host.value_or("");
-  if (!head.peer.credentials && !names.Include(host, head.secure)) {
+  // At a Unix socket, any name stands for this server, unless there may be a proxy: the rights of the proxy's account
+  // depend on the name, so that none may be spelt in another way ("nas.example.").
+  const bool any_name = head.peer.credentials && !names.HaveGiven();
+  if (!any_name && !names.Include(host, head.secure)) {
     return Refusal(421, "The Host header names another server. Names of this one can be set with --host-name.");
   }
   const std::optional<std::string_view> origin = head.Header("Origin");
@@ -228,7 +231,7 @@ WebApi::Begun WebApi::BeginCall(const Route& route, const CallerPtr& caller, con
                         head.recent_requests,
                         head.query == kRehearse};
   if (request.if_match && route.shown_by == nullptr) {
-    return Refusal(400, "If-Match is for methods that change something which another method shows.");
+    return Refusal(400, "This method accepts no If-Match: no ETag stands for what it changes.");
   }
   // A rehearsal takes no lock, so it must not wait for changing calls that wait for one.
   const bool only_reads = route.method.reads_only || request.rehearses;

@@ -67,6 +67,17 @@ bool IsSecret(std::string_view text, std::string_view prefix) {
   return text.substr(secret.size()) == ChecksumOf(secret);
 }
 
+bool ContainsSecret(std::string_view text) {
+  constexpr std::size_t kDigits = 2 * kSecretBytes + kChecksumDigits;
+  for (const std::string_view prefix : {kTokenPrefix, kSessionPrefix, kCodePrefix}) {
+    for (std::size_t at = text.find(prefix); at != std::string_view::npos; at = text.find(prefix, at + 1)) {
+      const std::string_view digits = text.substr(at + prefix.size(), kDigits);
+      if (digits.size() == kDigits && IsHexadecimal(digits)) return true;
+    }
+  }
+  return false;
+}
+
 std::string DigestOf(std::string_view secret) { return Hexadecimal(Sha256(secret)); }
 
 std::string NewId() { return Hexadecimal(RandomBytes<kIdBytes>()); }

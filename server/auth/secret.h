@@ -21,6 +21,9 @@ std::string NewSecret(std::string_view prefix);
 // Returns whether the string has the form and the checksum of a secret with this prefix.
 bool IsSecret(std::string_view text, std::string_view prefix);
 
+// Returns whether a part of the text has the form of a secret with any of the prefixes, whatever its checksum.
+bool ContainsSecret(std::string_view text);
+
 // The SHA-256 digest in hexadecimal, which is stored instead of a secret. 256 random bits need no slower digest. A
 // lookup by digest may take a time that depends on it: the digest does not lead to the secret.
 std::string DigestOf(std::string_view secret);

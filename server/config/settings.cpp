@@ -64,24 +64,27 @@ const Setting* FindSetting(std::string_view section, std::string_view key) {
 
 std::vector<Contradiction> FindContradictions(const Settings& settings) {
   std::vector<Contradiction> found;
-  const auto require = [&found](bool sound, std::string_view section, std::string_view key, std::string text) {
-    if (!sound) found.push_back({FindSetting(section, key), std::move(text)});
+  const auto require = [&found](bool sound, std::string_view section, std::string_view key, std::string_view other,
+                                std::string text) {
+    if (!sound) found.push_back({FindSetting(section, key), FindSetting(section, other), std::move(text)});
   };
-  require(settings.certificate.path.empty() || !settings.key.path.empty(), "tls", "certificate", "needs a key");
-  require(settings.key.path.empty() || !settings.certificate.path.empty(), "tls", "key", "needs a certificate");
+  require(settings.certificate.path.empty() || !settings.key.path.empty(), "tls", "certificate", "key", "needs a key");
+  require(settings.key.path.empty() || !settings.certificate.path.empty(), "tls", "key", "certificate",
+          "needs a certificate");
   // With this header browsers let nobody accept a certificate that they do not trust.
   require(settings.strict_transport.time.count() == 0 || !settings.certificate.path.empty(), "tls", "strict-transport",
-          "needs a certificate of an authority");
-  require(settings.session_idle.time <= settings.session_lifetime.time, "sessions", "idle",
+          "certificate", "needs a certificate of an authority");
+  require(settings.session_idle.time <= settings.session_lifetime.time, "sessions", "idle", "lifetime",
           "is longer than the lifetime of a session");
-  require(settings.sessions_per_account.number <= settings.sessions.number, "sessions", "per-account",
+  require(settings.sessions_per_account.number <= settings.sessions.number, "sessions", "per-account", "total",
           "is larger than the total");
   require(settings.tcp_connections_per_address.number <= settings.tcp_connections.number, "limits",
-          "tcp-connections-per-address", "is larger than tcp-connections");
+          "tcp-connections-per-address", "tcp-connections", "is larger than tcp-connections");
   require(settings.body_memory_per_address.bytes <= settings.body_memory.bytes, "limits", "body-memory-per-address",
-          "is larger than body-memory");
-  require(settings.password_time.time <= std::chrono::minutes(1), "access", "password-time", "is longer than a minute");
-  require(settings.administrators.name != settings.readers.name, "access", "readers",
+          "body-memory", "is larger than body-memory");
+  require(settings.password_time.time <= std::chrono::minutes(1), "access", "password-time", "",
+          "is longer than a minute");
+  require(settings.administrators.name != settings.readers.name, "access", "readers", "administrators",
           "is the administrators' group, too");
   return found;
 }

@@ -77,6 +77,7 @@ const Setting* FindSetting(std::string_view section, std::string_view key);
 // Two settings that contradict each other.
 struct Contradiction {
   const Setting* setting;  // the one to change
+  const Setting* other;    // nullptr: the setting contradicts a fixed limit
   std::string text;
 };
 std::vector<Contradiction> FindContradictions(const Settings& settings);

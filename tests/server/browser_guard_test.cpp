@@ -81,6 +81,8 @@ TEST(OwnNames, WithTlsIncludeTheMachineAndEveryAddress) {
     EXPECT_FALSE(names.AreSecure(host, false)) << host;
   }
   EXPECT_FALSE(OwnNames().Include("", true));
+  EXPECT_TRUE(names.HaveGiven());
+  EXPECT_FALSE(OwnNames({}, "box").HaveGiven());
 }
 
 TEST(OwnNames, WithTlsAreAnOriginOfHttpsOnly) {

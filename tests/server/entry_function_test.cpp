@@ -123,6 +123,17 @@ TEST_F(EntryFunction, IsAnsweredWithTheRemarksOfItsContext) {
   EXPECT_EQ(VORN::CallContext::Current(), nullptr);
 }
 
+TEST_F(EntryFunction, TellsRemarksOnlyToThoseWhoMaySeeThem) {
+  VORN::CallDescription description;
+  description.sees_remarks = false;
+  const Route& route = RouteOf("remark");
+  Json::Value parameters(Json::objectValue);
+  EXPECT_EQ(RunAndAnswer(route, parameters, description).body, R"({"success":true,"data":null})");
+  parameters["fail"] = true;
+  EXPECT_EQ(RunAndAnswer(route, parameters, description).body,
+            R"({"success":false,"error":{"code":2351,"text":"There."}})");
+}
+
 void RefuseParameters(VORN::APIRequest* request, VORN::APIResponse* response) {
   if (request->GetParam("explain", false).asBool()) VORN::CallContext::Current()->AddReason("Too large.");
   response->SetError(request->GetParam("code", 0).asInt(), {});

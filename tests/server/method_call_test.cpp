@@ -15,6 +15,7 @@
 #include <utility>
 
 #include "sandbox.h"
+#include "secret.h"
 
 namespace vorn::server {
 namespace {
@@ -221,19 +222,33 @@ TEST_F(CallTest, ThatOnlyReadsIsNotRecorded) {
 TEST_F(CallTest, IsRecordedWithoutItsSecrets) {
   std::string error;
   const auto descriptor = Descriptor::Parse(R"({"paths": {"/api/Api/v1/echo": {"post": {"requestBody": {"content": {
-      "application/json": {"schema": {"properties": {"password": {"writeOnly": true}}}}}}}}}})",
+      "application/json": {"schema": {"properties": {"name": {}, "password": {"writeOnly": true}}}}}}}}}})",
                                             &error);
   ASSERT_TRUE(descriptor) << error;
   const Route& route = routes_.emplace_back(Route{{"Api", 1, "echo", Echo}, &*descriptor, {}});
   auto body = std::make_unique<FixedBody>();
   body->parameters["password"] = "secret";
   body->parameters["name"] = "alice";
+  body->parameters["pasword"] = "secret";
   const auto call =
       std::make_shared<Call>(Call::Request{route, std::make_shared<Caller>(), "unix", {}}, std::move(body),
                              Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)});
   EXPECT_NE(Run(call).get().body.find("secret"), std::string::npos) << "the method has the secret";
   ASSERT_EQ(audited_.size(), 1U);
-  EXPECT_EQ(audited_[0].parameters, R"json({"name":"alice","password":"(left out)"})json");
+  EXPECT_EQ(audited_[0].parameters, R"json({"name":"alice","password":"(left out)","pasword":"(left out)"})json");
+}
+
+TEST_F(CallTest, IsRefusedWithASecretInItsParameters) {
+  auto body = std::make_unique<FixedBody>();
+  body->parameters["rule"][0]["client"] = "a " + NewSecret(kTokenPrefix);
+  const auto call =
+      std::make_shared<Call>(Call::Request{echo_, std::make_shared<Caller>(), "unix", {}}, std::move(body),
+                             Call::Environment{pool_, audit_, metrics_, std::chrono::hours(1)});
+  const Response refused = Run(call).get();
+  EXPECT_EQ(refused.status, 400);
+  EXPECT_EQ(refused.body.find(kTokenPrefix), std::string::npos) << refused.body;
+  ASSERT_EQ(audited_.size(), 1U);
+  EXPECT_EQ(audited_[0].parameters, "");
 }
 
 TEST_F(CallTest, IsAnsweredWhenItsMethodDoesNotAnswer) {

@@ -32,6 +32,17 @@ TEST(Secret, WithAnyOtherCharacterHasAWrongChecksum) {
   EXPECT_FALSE(IsSecret("", kTokenPrefix));
 }
 
+TEST(Secret, IsFoundInsideOfAText) {
+  for (const std::string_view prefix : {kTokenPrefix, kSessionPrefix, kCodePrefix}) {
+    const std::string secret = NewSecret(prefix);
+    EXPECT_TRUE(ContainsSecret(secret));
+    EXPECT_TRUE(ContainsSecret("Bearer vorn_" + secret + "."));
+    EXPECT_FALSE(ContainsSecret(secret.substr(0, secret.size() - 1)));
+  }
+  EXPECT_FALSE(ContainsSecret(""));
+  EXPECT_FALSE(ContainsSecret("vorn_" + NewId()));
+}
+
 TEST(Secret, IsStoredAsItsSha256Digest) {
   EXPECT_EQ(DigestOf("abc"), "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");  // FIPS 180-4
 }

@@ -72,6 +72,9 @@ TEST_F(Configured, CheckReportsFaultsWithoutTouchingARunningServer) {
   Configure("[sessions]\nlifetime = 1min\nidle = 2min\n");
   EXPECT_EQ(Check(&text), 1);
   EXPECT_THAT(text, HasSubstr("vornd.conf:3:8: idle is longer than the lifetime of a session"));
+  Configure("[sessions]\nlifetime = 10min\n");
+  EXPECT_EQ(Check(&text), 1);
+  EXPECT_THAT(text, HasSubstr("vornd.conf:2:12: idle is longer than the lifetime of a session"));
   EXPECT_EQ(Check(&text, {"--config", sandbox_.File("none")}), 1);
   EXPECT_THAT(text, HasSubstr("none: No such file or directory"));
   EXPECT_EQ(Check(&text, {"--modules", "m", "--readers", "a b"}), 1);

@@ -39,6 +39,8 @@ interface Fixtures {
   box: Box;
   /** What the page may write to the console of the browser in this test. */
   foreseen: RegExp[];
+  /** What the page has written there, as errors and warnings. */
+  said: string[];
   axe: () => Promise<void>;
 }
 
@@ -62,11 +64,15 @@ export const test = base.extend<Fixtures>({
 
   foreseen: [[], { option: true }],
 
+  // eslint-disable-next-line no-empty-pattern
+  said: async ({}, use) => {
+    await use([]);
+  },
+
   // Any message that the test did not foresee fails it, among them a violation of the content policy.
   // The box begins before the page, so that it ends after it: a last request of the page would find no server.
   // eslint-disable-next-line @typescript-eslint/no-unused-vars
-  page: async ({ page, foreseen, box: _box }, use) => {
-    const said: string[] = [];
+  page: async ({ page, foreseen, said, box: _box }, use) => {
     page.on('console', (message) => {
       if (message.type() === 'error' || message.type() === 'warning') said.push(message.text());
     });

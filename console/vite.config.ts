@@ -1,4 +1,5 @@
 import { defineConfig, type Plugin } from 'vitest/config';
+import type { CSSOptions } from 'vite';
 import react from '@vitejs/plugin-react';
 import { lingui } from '@lingui/vite-plugin';
 
@@ -12,6 +13,21 @@ const withoutFonts = (): Plugin => ({
       code.replace(/@font-face\s*\{[^}]*\}/g, '').replace(/url\((['"]?)[^)'"]*\.(?:svg|jpg|png)\1\)/g, 'none'),
   },
 });
+
+const OTHER_THEME = /\.pf-v6-theme-(?!dark\b)/;
+
+/** Removes the rules of PatternFly's themes other than the light and the dark one, which theme.js chooses from. */
+const withoutOtherThemes: CSSOptions['postcss'] = {
+  plugins: [
+    {
+      postcssPlugin: 'patternfly-without-other-themes',
+      Rule: (rule) => {
+        rule.selectors = rule.selectors.filter((text) => !OTHER_THEME.test(text.replace(/:not\([^()]*\)/g, '')));
+        if (!rule.selector) rule.remove();
+      },
+    },
+  ],
+};
 
 /**
  * Removes the plain texts from the compiled catalogue of the source language: their keys are the texts. Texts with
@@ -33,6 +49,7 @@ const withoutPlainTexts = (): Plugin => ({
 
 export default defineConfig({
   plugins: [withoutFonts(), react(), lingui({ failOnMissing: true }), withoutPlainTexts()],
+  css: { postcss: withoutOtherThemes },
   build: {
     target: 'es2022',
     assetsInlineLimit: 0, // a data: address would need a weaker content policy

@@ -60,6 +60,36 @@ test('a table of many mappings scrolls to its end', async ({ page, box }) => {
   expect(await rows.getByRole('row').count()).toBeLessThan(80);
 });
 
+test('a CSV file is dragged or chosen, and cleared', async ({ page, box }) => {
+  await signIn(page, box, '/idmap');
+  await page.getByRole('button', { name: 'Add mappings' }).click();
+  const dialog = page.getByRole('dialog');
+  const lines = dialog.getByRole('textbox', { name: 'Mappings' });
+  const name = dialog.getByRole('textbox', { name: 'CSV file' });
+  const field = page.locator('[class*=file-upload]').first();
+  const dataTransfer = await page.evaluateHandle(() => {
+    const transfer = new DataTransfer();
+    transfer.items.add(new File(['one@STORAGE.EXAMPLE, root\n'], 'dragged.csv'));
+    return transfer;
+  });
+  await field.dispatchEvent('dragenter', { dataTransfer });
+  await expect(field).toHaveClass(/drag-hover/);
+  await field.dispatchEvent('drop', { dataTransfer });
+  await expect(field).not.toHaveClass(/drag-hover/);
+  await expect(name).toHaveValue('dragged.csv');
+  await expect(lines).toHaveValue('one@STORAGE.EXAMPLE, root\n');
+  for (const attempt of ['first', 'again']) {
+    await dialog.getByRole('button', { name: 'Clear' }).click();
+    await expect(lines, attempt).toHaveValue('');
+    const chooser = page.waitForEvent('filechooser');
+    await dialog.getByRole('button', { name: 'Choose' }).click();
+    const csv = { name: 'chosen.csv', mimeType: 'text/csv', buffer: Buffer.from('two@STORAGE.EXAMPLE, root\n') };
+    await (await chooser).setFiles(csv);
+    await expect(name).toHaveValue('chosen.csv');
+    await expect(lines, attempt).toHaveValue('two@STORAGE.EXAMPLE, root\n');
+  }
+});
+
 test.describe('a keytab', () => {
   test.use({ foreseen: [/422 \(/] });
 

@@ -1,10 +1,11 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Content, FileUpload, FormGroup, Label, Title } from '@patternfly/react-core';
+import { Alert, Content, FormGroup, Label, Title } from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import type { Data } from '../api/call';
 import { useMayWrite } from '../session/session';
 import { ChangeDialog } from '../shared/change-dialog';
+import { FileField } from '../shared/file-field';
 import { FindingAlert } from '../shared/finding';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
@@ -88,18 +89,15 @@ function Upload({ tag }: { tag: string | null }) {
   return (
     <>
       <FormGroup label={i18n._('Install a keytab')} fieldId="keytab-filename">
-        <FileUpload
+        <FileField
           id="keytab"
           hideDefaultPreview
           filename={file?.name ?? ''}
           filenamePlaceholder={i18n._('Drag a keytab here, or choose it')}
-          browseButtonText={i18n._('Choose')}
           clearButtonText={i18n._('Remove')}
           filenameAriaLabel={i18n._('Keytab file')}
-          onFileInputChange={(_event, chosen) => {
-            setFile(chosen);
-          }}
-          onClearClick={forget}
+          onChoose={setFile}
+          onClear={forget}
         />
       </FormGroup>
       {file && (

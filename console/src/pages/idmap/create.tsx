@@ -1,7 +1,8 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Button, FileUpload, FormGroup } from '@patternfly/react-core';
+import { Alert, Button, FormGroup } from '@patternfly/react-core';
 import { ChangeDialog } from '../../shared/change-dialog';
+import { FileField } from '../../shared/file-field';
 import { FormDialog } from '../../shared/form-dialog';
 import { Loaded } from '../../shared/page';
 import { useRead } from '../../shared/use-read';
@@ -75,25 +76,24 @@ export function CreateMappings({ onClose }: { onClose: () => void }) {
         fieldId="mappings"
         isRequired
       >
-        <FileUpload
+        <FileField
           id="mappings"
           type="text"
           value={text}
           filename={name}
           allowEditingUploadedText
           filenamePlaceholder={i18n._('Type or paste below, or drag a CSV file here')}
-          browseButtonText={i18n._('Choose')}
           clearButtonText={i18n._('Clear')}
           filenameAriaLabel={i18n._('CSV file')}
           aria-label={i18n._('Mappings')}
-          onFileInputChange={(_event, file) => {
+          onChoose={(file) => {
             setName(file.name);
             void file.text().then(setText);
           }}
           onTextChange={(_event, value) => {
             setText(value);
           }}
-          onClearClick={() => {
+          onClear={() => {
             setName('');
             setText('');
           }}

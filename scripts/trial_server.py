@@ -57,18 +57,36 @@ class UnixConnection(http.client.HTTPConnection):
         self.sock.connect(str(self._path))
 
 
+PAM_MODULE = PROJECT / "build/release/tests/server/pam_test.so"
+
+
+def add_accounts(root):
+    """Adds the administrator alice and the reader bob; tests/server/modules/pam_test.cpp has their passwords."""
+    (root / "etc/pam.d").mkdir(exist_ok=True)
+    (root / "etc/pam.d/vornd").write_text(f"auth required {PAM_MODULE}\naccount required {PAM_MODULE}\n")
+    with open(root / "etc/passwd", "a", encoding="ascii") as passwd:
+        passwd.write("alice:x:1001:100::/:/bin/sh\nbob:x:1002:100::/:/bin/sh\n")
+    with open(root / "etc/group", "a", encoding="ascii") as group:
+        group.write("vorn-admin:x:3001:alice\nvorn-readonly:x:3002:bob\n")
+
+
 class TrialServer:
-    """Serves until the end of the "with" statement."""
+    """Serves until the end of the "with" statement; over TLS, too, for accounts with passwords, if that is wanted."""
+
+    def __init__(self, tls=False):
+        self._tls = tls
 
     def __enter__(self):
         self._keys = []
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))  # a short path: a socket has 107 bytes at most
         self.root = make_trial_root(self.folder)
         self.socket = self.folder / "socket"
+        if self._tls:
+            add_accounts(self.root)
         with open(self.folder / "log", "wb") as log:
             self._process = subprocess.Popen(  # pylint: disable=consider-using-with
                 [VORND, "--root", self.root, "--listen", f"unix:{self.socket}", "--listen", "127.0.0.1:0",
-                 "--sign-in-link"],
+                 "--sign-in-link", *(["--listen", "tls:127.0.0.1:0"] if self._tls else [])],
                 stdout=log, stderr=log)
         try:
             self._await()
@@ -97,6 +115,10 @@ class TrialServer:
     def address(self):
         """Address and port of the TCP listener."""
         return re.search(r"Listening at (127\.0\.0\.1:\d+)", self.log()).group(1)
+
+    def tls_address(self):
+        """Address and port of the listener with TLS, whose certificate vornd has made itself."""
+        return re.search(r"Listening at tls:(127\.0\.0\.1:\d+)", self.log()).group(1)
 
     def log(self):
         return (self.folder / "log").read_text("utf-8", "replace")

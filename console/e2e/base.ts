@@ -36,6 +36,8 @@ function callAt(socketPath: string, method: string, parameters: object): Promise
 }
 
 interface Fixtures {
+  /** Whether the box has TLS, and accounts with passwords. */
+  tls: boolean;
   box: Box;
   /** What the page may write to the console of the browser in this test. */
   foreseen: RegExp[];
@@ -45,16 +47,16 @@ interface Fixtures {
 }
 
 export const test = base.extend<Fixtures>({
-  // eslint-disable-next-line no-empty-pattern
-  box: async ({}, use) => {
-    const server = spawn('/usr/bin/python3', [path.join(import.meta.dirname, 'server.py')], {
+  tls: [false, { option: true }],
+
+  box: async ({ tls }, use) => {
+    const server = spawn('/usr/bin/python3', [path.join(import.meta.dirname, 'server.py'), ...(tls ? ['tls'] : [])], {
       stdio: ['pipe', 'pipe', 'inherit'],
     });
     const [line] = (await once(createInterface(server.stdout), 'line')) as [string];
-    const { address, socket, ...rest } = JSON.parse(line) as Box & { address: string; socket: string };
+    const { socket, ...rest } = JSON.parse(line) as Box & { socket: string };
     await use({
       ...rest,
-      url: `http://${address}/`,
       call: (method, parameters) => callAt(socket, method, parameters),
     });
     const ended = once(server, 'exit');

@@ -1,4 +1,5 @@
-import { enterAsReader, expect, signIn, test } from './base';
+import type { Locator, Page } from '@playwright/test';
+import { enterAsReader, expect, reviewAndSave, signIn, test } from './base';
 
 test.describe('without a session', () => {
   test.use({ foreseen: [/401 \(Unauthorized\)|503 \(Service Unavailable\)/] });
@@ -42,6 +43,60 @@ test.describe('without a session', () => {
     await page.getByRole('button', { name: 'Review and save' }).click();
     await expect(page.getByRole('dialog', { name: 'Your session has ended' })).toBeVisible();
     await axe();
+  });
+});
+
+test.describe('over TLS, with an account and its password', () => {
+  test.use({ tls: true, ignoreHTTPSErrors: true, foreseen: [/401 \(Unauthorized\)/] });
+
+  const fill = async (form: Page | Locator, account: string, password: string) => {
+    await form.getByLabel('Account').fill(account);
+    await form.getByLabel('Password').fill(password);
+    await form.getByRole('button', { name: 'Sign in' }).click();
+  };
+
+  test('the session is a cookie that scripts cannot read, until the sign-out', async ({ page, box, context }) => {
+    await page.goto(box.url);
+    await fill(page, 'alice', 'Passphrase-of-bob');
+    await expect(page.getByText('Error code 401')).toBeVisible();
+    await fill(page, 'alice', 'Passphrase-of-alice');
+    await expect(page.getByRole('heading', { name: 'Overview' })).toBeVisible();
+    await expect(page.getByText('alice')).toBeVisible();
+    const [cookie] = await context.cookies();
+    expect(cookie).toMatchObject({ name: '__Host-vorn-session', secure: true, httpOnly: true, sameSite: 'Strict' });
+    expect(await page.evaluate(() => document.cookie)).toBe('');
+    expect(await page.evaluate(() => sessionStorage.length)).toBe(0);
+    await page.reload();
+    await expect(page.getByRole('heading', { name: 'Overview' })).toBeVisible();
+
+    await page.getByRole('button', { name: 'Sign out' }).click();
+    await expect(page.getByRole('heading', { name: 'Sign in to the storage console' })).toBeVisible();
+    expect(await context.cookies()).toEqual([]);
+    await context.addCookies([cookie as NonNullable<typeof cookie>]);
+    await page.reload();
+    await expect(page.getByRole('heading', { name: 'Sign in to the storage console' })).toBeVisible();
+  });
+
+  test('a reader may look only', async ({ page, box }) => {
+    await page.goto(`${box.url}#/service`);
+    await fill(page, 'bob', 'Passphrase-of-bob');
+    await expect(page.getByText('You may look, but not change anything')).toBeVisible();
+  });
+
+  test('when the session has ended, the password lets the work go on', async ({ page, box }) => {
+    await page.goto(`${box.url}#/service`);
+    await fill(page, 'alice', 'Passphrase-of-alice');
+    const domain = page.getByRole('textbox', { name: 'NFSv4 domain' });
+    await domain.fill('typed.example');
+    const [session] = (await box.call('VORN.Server.Session/v1/list', {})) as [{ id: string }];
+    await box.call('VORN.Server.Session/v1/end', { id: session.id });
+    await page.getByRole('button', { name: 'Review and save' }).click();
+    const dialog = page.getByRole('dialog', { name: 'Your session has ended' });
+    await fill(dialog, 'alice', 'Passphrase-of-alice');
+    await expect(dialog).toBeHidden();
+    await page.keyboard.press('Escape');
+    await expect(domain).toHaveValue('typed.example');
+    await reviewAndSave(page);
   });
 });
 

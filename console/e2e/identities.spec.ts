@@ -139,3 +139,31 @@ test('a token is shown once, and revoked', async ({ page, box, axe }) => {
   await expect(dialog).toBeHidden();
   await expect(page.getByText('There are no tokens.')).toBeVisible();
 });
+
+test('the upload of a keytab shows its progress, and can be given up', async ({ page, box, axe }) => {
+  await signIn(page, box, '/kerberos');
+  const network = await page.context().newCDPSession(page);
+  const limit = (uploadThroughput: number) =>
+    network.send('Network.emulateNetworkConditions', {
+      offline: false,
+      latency: 0,
+      downloadThroughput: -1,
+      uploadThroughput,
+    });
+  await limit(2000); // bytes a second: the upload does not end by itself
+  const chooser = page.locator('input[type=file]');
+  await chooser.setInputFiles({ name: 'large', mimeType: 'text/plain', buffer: Buffer.alloc(900_000) });
+  const dialog = page.getByRole('dialog');
+  const progress = dialog.getByRole('progressbar', { name: 'Sending the file' });
+  await expect(progress).toHaveAttribute('aria-valuenow', /^[1-9]\d?$/);
+  await expect(dialog.getByText(/^[1-9]\d?%$/)).toBeVisible();
+  await axe();
+  const ended = page.waitForEvent('requestfailed');
+  await dialog.getByRole('button', { name: 'Cancel' }).click();
+  await expect(dialog).toBeHidden();
+  expect((await ended).url()).toContain('/upload_key');
+  await limit(-1);
+  await chooser.setInputFiles(box.keytab);
+  await expect(dialog.getByText('nfs/box.example@STORAGE.EXAMPLE').first()).toBeVisible();
+  await expect(progress).toHaveCount(0);
+});

@@ -1,5 +1,6 @@
 // Calls of the methods of the web API, typed by the OpenAPI document.
 import type { components, operations } from './schema';
+import { sendForm } from './send-form';
 import { bearer } from '../session/credential';
 
 export type Schemas = components['schemas'];
@@ -35,6 +36,8 @@ export interface Options {
   rehearse?: boolean;
   /** A form with a file, which is sent instead of the parameters. */
   form?: FormData;
+  /** How much of the form is sent, from 0 to 1. */
+  onProgress?: (share: number) => void;
   signal?: AbortSignal;
 }
 
@@ -83,9 +86,12 @@ function headersOf(options: Options): Headers {
   return headers;
 }
 
-async function send(path: string, init: RequestInit): Promise<Response> {
+async function send(path: string, parameters: unknown, options: Options): Promise<Response> {
+  const headers = headersOf(options);
+  const { form, signal = null, onProgress = () => undefined } = options;
   try {
-    return await fetch(path, init);
+    if (form) return await sendForm(path, { headers, form, signal }, onProgress);
+    return await fetch(path, { method: 'POST', headers, body: JSON.stringify(parameters), signal });
   } catch (error) {
     if (error instanceof DOMException && error.name === 'AbortError') throw error;
     throw new Unreachable(String(error));
@@ -108,12 +114,8 @@ export async function call<M extends Method>(
   parameters: Parameters<M>,
   options: Options = {},
 ): Promise<Answer<Data<M>>> {
-  const response = await send(`/api/${method}${options.rehearse ? '?rehearse=true' : ''}`, {
-    method: 'POST',
-    headers: headersOf(options),
-    body: options.form ?? JSON.stringify(parameters),
-    signal: options.signal ?? null,
-  });
+  const query = options.rehearse ? '?rehearse=true' : '';
+  const response = await send(`/api/${method}${query}`, parameters, options);
   const envelope = await envelopeOf(response);
   if (!envelope.success) {
     const error = envelope.error ?? { code: response.status, text: response.statusText };

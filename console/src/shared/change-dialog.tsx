@@ -1,8 +1,8 @@
 import { useState, type ReactNode } from 'react';
 import { useMutation, useQuery, useQueryClient } from '@tanstack/react-query';
 import { i18n } from '@lingui/core';
-import { Button, Modal, ModalBody, ModalFooter, ModalHeader, Spinner } from '@patternfly/react-core';
-import { call, Failure, type Answer, type Data, type Method, type Parameters } from '../api/call';
+import { Button, Modal, ModalBody, ModalFooter, ModalHeader, Progress, Spinner } from '@patternfly/react-core';
+import { call, Failure, type Answer, type Data, type Method, type Options, type Parameters } from '../api/call';
 import { Conflict, type Fact } from './conflict';
 import { readAgain, REHEARSAL } from './read-again';
 import { Problem, Warnings } from './problem';
@@ -42,12 +42,19 @@ interface Props<M extends Method> {
   children?: ReactNode;
 }
 
+/** How far the file of a change is sent; null while none is being sent. */
+type Sent = number | null;
+
 /** Makes a change, and has everything that is shown read again. */
-export function useChange<M extends Method>(done: string, onDone: (answer: Answer<Data<M>>) => void) {
+export function useChange<M extends Method>(
+  done: string,
+  onDone: (answer: Answer<Data<M>>) => void,
+  sending: Pick<Options, 'onProgress' | 'signal'> = {},
+) {
   const client = useQueryClient();
   return useMutation({
     mutationFn: ({ method, parameters, tag, form }: Change<M>) =>
-      call(method, parameters, { ifMatch: tag, ...(form && { form }) }),
+      call(method, parameters, { ifMatch: tag, ...(form && { form, ...sending }) }),
     onSuccess: async (answer) => {
       await readAgain(client);
       toast(done, answer.warnings);
@@ -56,14 +63,24 @@ export function useChange<M extends Method>(done: string, onDone: (answer: Answe
   });
 }
 
-function useRehearsal<M extends Method>({ method, parameters, tag, form }: Change<M>) {
+function useRehearsal<M extends Method>(
+  { method, parameters, tag, form }: Change<M>,
+  onProgress: (share: number) => void,
+) {
   const [attempt] = useState(() => crypto.randomUUID());
   return useQuery({
     queryKey: [REHEARSAL, method, tag, attempt],
-    queryFn: ({ signal }) => call(method, parameters, { ifMatch: tag, rehearse: true, signal, ...(form && { form }) }),
+    queryFn: ({ signal }) =>
+      call(method, parameters, { ifMatch: tag, rehearse: true, signal, ...(form && { form, onProgress }) }),
     staleTime: Infinity,
     gcTime: 0,
   });
+}
+
+/** What is waited for: a file to be sent, or an answer. */
+function Waiting({ sent }: { sent: Sent }) {
+  if (sent === null || sent === 1) return <Spinner size="lg" aria-label={i18n._('Finding out what would change')} />;
+  return <Progress id="sent" title={i18n._('Sending the file')} value={Math.floor(sent * 100)} />;
 }
 
 const conflictOf = (error: unknown) => (error instanceof Failure && error.isConflict ? error : null);
@@ -73,8 +90,15 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
   const { title, confirm, done, decision, isDanger = false, onDone, onClose, children } = props;
   const [tag, setTag] = useState(props.change.tag);
   const change = { ...props.change, tag };
-  const rehearsal = useRehearsal(change);
-  const save = useChange<M>(done, onDone);
+  const [sent, setSent] = useState<Sent>(null);
+  const [saving] = useState(() => new AbortController());
+  const rehearsal = useRehearsal(change, setSent);
+  const save = useChange<M>(done, onDone, { onProgress: setSent, signal: saving.signal });
+  const isSending = sent !== null && sent < 1;
+  const close = () => {
+    if (isSending) saving.abort(); // a rehearsal ends with the dialog
+    onClose();
+  };
   const error = save.error ?? rehearsal.error;
   const conflict = conflictOf(error);
   const kind = decision?.kind ?? 'replaces';
@@ -88,11 +112,11 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
     setTag(conflict?.tag ?? null);
   };
   return (
-    <Modal isOpen variant="medium" onClose={onClose} aria-labelledby="change-title">
+    <Modal isOpen variant="medium" onClose={close} aria-labelledby="change-title">
       <ModalHeader title={title} labelId="change-title" />
       <ModalBody tabIndex={0}>
         {children}
-        {rehearsal.isPending && <Spinner size="lg" aria-label={i18n._('Finding out what would change')} />}
+        {(rehearsal.isPending || (save.isPending && isSending)) && <Waiting sent={sent} />}
         {conflict && decision && (
           <Conflict kind={kind} mine={decision.mine} theirs={decision.describe(conflict.details)} />
         )}
@@ -124,7 +148,7 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
             {confirm}
           </Button>
         )}
-        <Button variant="link" onClick={onClose}>
+        <Button variant="link" onClick={close}>
           {i18n._('Cancel')}
         </Button>
       </ModalFooter>

@@ -1,1 +1,0 @@
-import{ft as e}from"./problem-2YV-fTo7.js";var t=({prefix:t=`pf-random-id-`,children:n})=>n(e(t));t.displayName=`GenerateId`;export{t};

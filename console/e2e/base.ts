@@ -134,10 +134,21 @@ export async function reviewAndSave(page: Page) {
 
 const FRAMES = 'html, [class*=page__main], [class*=modal-box]';
 
-/** Writes a picture of the page, where nothing may be cut off at the side. Regions that scroll by themselves may be. */
+/** The height of what is out of sight in the part of the page that scrolls. */
+const hiddenHeight = (page: Page) =>
+  page.evaluate(
+    (frames) =>
+      Math.max(...[...document.querySelectorAll(frames)].map((frame) => frame.scrollHeight - frame.clientHeight)),
+    FRAMES,
+  );
+
+/** Writes a picture of the whole page, where nothing may be cut off at the side. Regions that scroll by themselves may be. */
 export async function picture(page: Page, name: string, view: string) {
   const folder = process.env.VORN_PICTURES ?? path.join(import.meta.dirname, '../../build/console/pictures');
+  const size = page.viewportSize();
+  if (size) await page.setViewportSize({ ...size, height: size.height + (await hiddenHeight(page)) });
   await page.screenshot({ path: path.join(folder, `${name}-${view}.png`), fullPage: true, animations: 'disabled' });
+  if (size) await page.setViewportSize(size);
   const cut = await page.evaluate(
     (frames) =>
       [...document.querySelectorAll(frames)]

@@ -60,6 +60,7 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
   const faults = fixed
     ? [portFault(value.statd_port, value.nlm_port), portFault(value.nlm_port, value.statd_port)]
     : [undefined, undefined];
+  const unused = i18n._('Not used: the system chooses a port.');
   const isValid = faults.every((fault) => !fault);
   // A call without "enable_nfs" would switch the service off.
   const parameters = { ...value, custom_port_enable: fixed, enable_nfs: enabled };
@@ -89,6 +90,7 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
         value={value.statd_port}
         error={faults[0]}
         isDisabled={!fixed}
+        help={fixed ? undefined : unused}
         onChange={(port) => {
           change({ statd_port: port });
         }}
@@ -98,6 +100,7 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
         value={value.nlm_port}
         error={faults[1]}
         isDisabled={!fixed}
+        help={fixed ? undefined : unused}
         onChange={(port) => {
           change({ nlm_port: port });
         }}

@@ -94,7 +94,7 @@ export function MappingTable({ filter, onChoose }: { filter: string; onChoose: C
           </Content>
           {/* A region that scrolls must be reachable by keyboard. */}
           {/* eslint-disable-next-line jsx-a11y/no-noninteractive-tabindex */}
-          <div ref={box} className="rows" tabIndex={0} role="region" aria-label={label}>
+          <div ref={box} className="rows" hidden={total === 0} tabIndex={0} role="region" aria-label={label}>
             <Table aria-label={label} aria-rowcount={total + 1} variant="compact" isStickyHeader gridBreakPoint="">
               <Thead>
                 <Tr>

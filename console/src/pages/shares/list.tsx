@@ -34,12 +34,11 @@ function ShareTable({ shares, onDelete }: { shares: Share[]; onDelete: (share: S
             <Td dataLabel={i18n._('Folder on the box')}>{share.path}</Td>
             <Td dataLabel={i18n._('Rules')}>{ruleCount(share.rules)}</Td>
             {mayWrite && (
-              <Td isActionCell>
+              <Td isActionCell modifier="nowrap">
                 <Button
                   variant="link"
                   isInline
                   isAriaDisabled={share.rules > 0}
-                  title={share.rules > 0 ? i18n._('Delete its rules first') : undefined}
                   aria-label={i18n._('Stop sharing {name}', { name: share.name })}
                   onClick={() => {
                     if (share.rules === 0) onDelete(share);
@@ -47,6 +46,11 @@ function ShareTable({ shares, onDelete }: { shares: Share[]; onDelete: (share: S
                 >
                   {i18n._('Stop sharing')}
                 </Button>
+                {share.rules > 0 && (
+                  <div>
+                    <small>{i18n._('Delete its rules first')}</small>
+                  </div>
+                )}
               </Td>
             )}
           </Tr>

@@ -149,7 +149,11 @@ export function SharePage({ name }: { name: string }) {
   return (
     <PageFrame
       title={name}
-      purpose={i18n._('The rules of this shared folder: who may mount it, and how.')}
+      purpose={
+        share.data
+          ? i18n._('Who may mount {path}, and how.', { path: share.data.data.path })
+          : i18n._('Who may mount the folder, and how.')
+      }
       above={
         <Breadcrumb aria-label={i18n._('Path to this page')}>
           <BreadcrumbItem to="#/shares">{i18n._('Shared folders')}</BreadcrumbItem>

@@ -11,6 +11,7 @@
 #include "ascii.h"
 #include "configuration_lock.h"
 #include "notice.h"
+#include "section_arguments.h"
 
 namespace vorn {
 namespace {
@@ -171,7 +172,8 @@ Status IniFiles::AddIncludes(Box& box, const Opened& opened, const std::optional
 }
 
 bool IniFiles::Inherits(const Source& source, std::string_view section) {
-  return source.inherited && source.inherited->name == LowerAscii(section);
+  if (!source.inherited || (source.inherited->has_argument && !kArgumentsHideValues)) return false;
+  return source.inherited->name == LowerAscii(section);
 }
 
 std::optional<IniFound> IniFiles::FindStored(std::string_view section, std::string_view key) const {

@@ -96,7 +96,8 @@ class IniFiles {
     bool Has(const Source& other) const;
   };
 
-  // Whether the lines of a file before its first section header are in [section], or in one with an argument.
+  // Whether the lines of a file before its first section header are in [section], or in one with an argument that can
+  // hide its values.
   static bool Inherits(const Source& source, std::string_view section);
 
   // Returns the value with its references replaced; nullopt if it refers to nothing, or to itself.

@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "ascii.h"
+#include "section_arguments.h"
 
 namespace vorn {
 namespace {
@@ -84,7 +85,8 @@ void IniDocument::Index(Place place) {
   if (!line.has_argument) sections_[line.section].last = place;
   if (line.value.empty()) return;
   if (line.kind == IniLine::Kind::kInclude) includes_.push_back(place);
-  if (line.kind != IniLine::Kind::kAssignment) return;
+  const bool counts = !line.has_argument || kArgumentsHideValues;
+  if (line.kind != IniLine::Kind::kAssignment || !counts) return;
   has_reference_ = has_reference_ || line.value.front() == '$';
   Decide(place);
 }

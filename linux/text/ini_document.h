@@ -43,8 +43,9 @@ struct IniReference {
 };
 
 // If several lines give a key a value, the last one counts, over all blocks of a section. Lines without a value are
-// ignored, as by the reader. A line in a section with an argument, [name "argument"], hides what an earlier line gives
-// the same key in [name], because the reader keeps one value for both; such values cannot be asked for here.
+// ignored, as by the reader. Values in a section with an argument, [name "argument"], cannot be asked for here. For
+// readers that keep one value for both sections (kArgumentsHideValues) they hide what an earlier line gives the same
+// key in [name].
 //
 // The reader ignores a last line without line feed, and everything from a NUL byte on. An edit leaves that tail at
 // the end of the file, without effect.

@@ -37,6 +37,8 @@ IniContent ReadByNfsconf(std::string_view text) {
   return content;
 }
 
+bool ArgumentsHideValues() { return ReadByNfsconf("[a]\nk=v\n[a \"x\"]\nk=w\n")["a"].empty(); }
+
 std::optional<std::string> DumpByNfsconf(const std::string& path) {
   ProgramResult result = RunProgram({"nfsconf", "--file", path, "--dump"});
   return result.status == 0 ? std::optional<std::string>(std::move(result.output)) : std::nullopt;

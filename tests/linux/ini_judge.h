@@ -14,6 +14,10 @@ using IniContent = std::map<std::string, std::map<std::string, std::string>>;
 // Returns the content of a file with this text.
 IniContent ReadByNfsconf(std::string_view text);
 
+// Whether a value in [name "argument"] hides an earlier value of the same key in [name] from nfsconf(8). It does so
+// before nfs-utils 2.8.3.
+bool ArgumentsHideValues();
+
 // Returns what nfsconf(8) prints of the file at `path` and the folder `path`.d; nullopt if it crashes, as it does if a
 // file includes itself.
 std::optional<std::string> DumpByNfsconf(const std::string& path);

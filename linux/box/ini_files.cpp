@@ -10,8 +10,8 @@
 
 #include "ascii.h"
 #include "configuration_lock.h"
+#include "nfs_utils.h"
 #include "notice.h"
-#include "section_arguments.h"
 
 namespace vorn {
 namespace {

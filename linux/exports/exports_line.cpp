@@ -85,7 +85,7 @@ class LineReader {
     ExportsReader(text_, inherited).ReadWord(kLongestExportClient, &word);
     word.resize(std::min(word.find('('), word.size()));
     if (!Apply(&defaults_, std::string_view{word}.substr(1))) return false;
-    line_.fault = {line_.span.path, "no client; exportfs applies \"" + word + "\" of the line before", false};
+    line_.fault = {line_.span.path, "no client; exportfs may apply \"" + word + "\" of the line before", false};
     return true;
   }
 

@@ -17,9 +17,9 @@ struct ExportSpan {
   std::size_t begin = 0;
   std::size_t path = 0;  // where its path begins, after blanks
   std::size_t end = 0;
-  // Where the word of the line before is that exportfs(8) applies to this one; npos if there is none. exportfs does
-  // not clear its buffer: where a line has no client, the last client of the line before, if that begins with "-",
-  // is read as default options once more.
+  // Where the word of the line before is that exportfs(8) may apply to this one; npos if there is none. exportfs does
+  // not clear its buffer, which is on the stack: where a line has no client, the last client of the line before, if
+  // that begins with "-", is read as default options once more. On some machines the word is no longer there then.
   std::size_t inherited = std::string_view::npos;
 };
 

@@ -4,7 +4,7 @@
 #include <utility>
 
 #include "ascii.h"
-#include "section_arguments.h"
+#include "nfs_utils.h"
 
 namespace vorn {
 namespace {

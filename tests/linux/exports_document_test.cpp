@@ -65,14 +65,9 @@ const std::vector<std::string> kFiles = {
     "/a -" + kLast,
     "/a -sec=krb5,rw alpha(ro) gamma(sec=sys) beta.example -all_squash 10.0.0.4(async)" + kLast,
     "/a alpha(ro) -rw" + kLast,
-    "/a -ro -async\n/b\n/c" + kLast,
-    "/a -ro -rw,async(insecure)\n\n# c\n\"/b\" # x" + kLast,
-    "/a -ro \"-rw\" \n/b " + kLast,
-    "/a -ro \\055async\n/b" + kLast,
     "/a -ro -async alpha\n/b" + kLast,
     "/a alpha -ro -async\n/b alpha\n/c" + kLast,
     "/a alpha -ro -async\n/b -rw\n/c" + kLast,
-    "/a -ro -foo\n/b" + kLast,
     "/a alpha(sec=krb5,rw,sec=sys,ro,no_root_squash,sec=krb5i)" + kLast,
     "/a (ro)" + kLast,
     "/a alpha (rw)" + kLast,
@@ -154,6 +149,33 @@ TEST(ExportsDocument, ReadsEveryFileAsExportfsDoes) {
   const auto verdicts = judge.Judge(kFiles, kHosts);
   for (std::size_t i = 0; i < kFiles.size(); ++i) {
     EXPECT_EQ(TableOf(kFiles[i]), TableOf(verdicts[i].table)) << kFiles[i] << verdicts[i].messages;
+  }
+}
+
+// A file with a word that exportfs(8) may apply to the next line, and one that means the same if it does not.
+struct LeftOverCase {
+  std::string text;
+  std::string cleared;
+};
+
+const std::vector<LeftOverCase> kLeftOverCases = {
+    {"/a -ro -async\n/b\n/c" + kLast, "/a -ro -async\n/b *\n/c" + kLast},
+    {"/a -ro -rw,async(insecure)\n\n# c\n\"/b\" # x" + kLast,
+     "/a -ro -rw,async(insecure)\n\n# c\n\"/b\" * # x" + kLast},
+    {"/a -ro \"-rw\" \n/b " + kLast, "/a -ro \"-rw\" \n/b *" + kLast},
+    {"/a -ro \\055async\n/b" + kLast, "/a -ro \\055async\n/b *" + kLast},
+    {"/a -ro -foo\n/b" + kLast, "/a -ro -foo\n/b *" + kLast},
+};
+
+TEST(ExportsDocument, ReadsAWordThatIsLeftOverAsExportfsMay) {
+  const ExportfsJudge judge;
+  if (!judge.Unavailable().empty()) GTEST_SKIP() << judge.Unavailable();
+  std::vector<std::string> files;
+  for (const LeftOverCase& c : kLeftOverCases) files.push_back(c.text);
+  const auto verdicts = judge.Judge(files, kHosts);
+  for (std::size_t i = 0; i < files.size(); ++i) {
+    EXPECT_THAT(TableOf(verdicts[i].table), testing::AnyOf(TableOf(files[i]), TableOf(kLeftOverCases[i].cleared)))
+        << files[i] << verdicts[i].messages;
   }
 }
 

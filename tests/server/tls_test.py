@@ -55,7 +55,8 @@ class Authority:
         self.folder = folder
         self.certificate = folder / "ca.pem"
         openssl("req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes", "-days", "300",
-                "-subj", "/CN=Test authority", "-keyout", folder / "ca.key", "-out", self.certificate)
+                "-subj", "/CN=Test authority", "-addext", "keyUsage=critical,keyCertSign",
+                "-keyout", folder / "ca.key", "-out", self.certificate)
 
     def issue(self, name, kind=("ec", "-pkeyopt", "ec_paramgen_curve:P-256")):
         """Makes NAME.pem and NAME.key, for localhost and 127.0.0.1."""

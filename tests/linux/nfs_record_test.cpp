@@ -9,10 +9,13 @@
 #include <string>
 #include <utility>
 
+#include "call.h"
 #include "captured_log.h"
 #include "core.h"
+#include "current_box.h"
 #include "ini_judge.h"
 #include "nfsconf.h"
+#include "processes.h"
 #include "status.h"
 #include "temporary_root.h"
 #include "webapi.h"
@@ -380,6 +383,19 @@ TEST(NFSConf, RefusesToChangeWhatIncludesItself) {
     EXPECT_EQ(KLIBCErrGet(), vorn::kSyntax);
     EXPECT_THAT(LastText(TakeLog()), testing::HasSubstr(c.reason)) << c.reason;
     EXPECT_FALSE(root.Read(kFile).has_value());
+  }
+}
+
+// A record is made once for a version of the files.
+TEST(NFSConf, WarnsEachCallOfAValueThatIsIgnored) {
+  const TemporaryRoot root;
+  root.Write("/etc/nfs.conf", "[mountd]\nmanage-gids = perhaps\n");
+  ASSERT_TRUE(Eventually([] { return vorn::CurrentBox().Read("/etc/nfs.conf")->is_settled; }));
+  for (int reading = 0; reading < 3; ++reading) {
+    const VORN::CallContext call({});
+    NFSConfRecord record{};
+    ASSERT_EQ(VORNNFSConfGet(&record), 0);
+    EXPECT_THAT(call.warnings(), testing::ElementsAre(testing::HasSubstr("manage-gids"))) << reading;
   }
 }
 

@@ -57,7 +57,7 @@ class UnixConnection(http.client.HTTPConnection):
         self.sock.connect(str(self._path))
 
 
-PAM_MODULE = PROJECT / "build/release/tests/server/pam_test.so"
+PAM_MODULE = os.environ.get("PAM_MODULE", PROJECT / "build/release/tests/server/pam_test.so")
 
 
 def add_accounts(root):

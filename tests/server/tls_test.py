@@ -23,10 +23,9 @@ import unittest
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
 sys.path.insert(0, str(PROJECT / "scripts"))
 from trial_server import (  # noqa: E402 pylint: disable=wrong-import-position
-    UnixConnection, expect_no_secret, make_trial_root)
+    UnixConnection, add_accounts, expect_no_secret, make_trial_root)
 
 VORND = os.environ["VORND"]
-PAM_MODULE = os.environ["PAM_MODULE"]
 PATIENCE = 120  # seconds; reaching it is a failure
 API = "/api/VORN.Core.FileServ."
 SESSION = "/api/VORN.Server.Session/v1/"
@@ -79,19 +78,10 @@ class Server:
         self.folder = pathlib.Path(tempfile.mkdtemp(prefix="vorn"))
         self.root = make_trial_root(self.folder)
         self.socket = self.folder / "socket"
-        self._add_accounts()
+        add_accounts(self.root)
         self.configure(configuration)
         self._options = options
         self._process = None
-
-    def _add_accounts(self):
-        etc = self.root / "etc"
-        (etc / "pam.d").mkdir(exist_ok=True)
-        (etc / "pam.d/vornd").write_text(f"auth required {PAM_MODULE}\naccount required {PAM_MODULE}\n")
-        with open(etc / "passwd", "a", encoding="ascii") as passwd:
-            passwd.write("alice:x:1001:100::/:/bin/sh\nbob:x:1002:100::/:/bin/sh\n")
-        with open(etc / "group", "a", encoding="ascii") as group:
-            group.write("vorn-admin:x:3001:alice\nvorn-readonly:x:3002:bob\n")
 
     def configure(self, text):
         """Writes the configuration file; the addresses are added."""

@@ -60,7 +60,9 @@ std::string TextForAudit(const Route& route, const Json::Value& parameters) {
 
 // Whether any text inside of the value contains a token, a session or a code: parameters are logged and kept.
 bool HasSecret(const Json::Value& value) {
-  if (value.isString()) return ContainsSecret(value.asString());
+  const char* begin = nullptr;
+  const char* end = nullptr;
+  if (value.getString(&begin, &end)) return ContainsSecret({begin, static_cast<std::size_t>(end - begin)});
   return (value.isArray() || value.isObject()) && std::any_of(value.begin(), value.end(), HasSecret);
 }
 

@@ -72,6 +72,12 @@ Box::Document Box::FindDerived(const Key& key, const std::vector<std::shared_ptr
   return found != derived_.end() && found->second.sources == sources ? found->second.document : nullptr;
 }
 
+Box::Document Box::LastDerived(const Key& key) {
+  const std::lock_guard lock(mutex_);
+  const auto found = derived_.find(key);
+  return found != derived_.end() ? found->second.document : nullptr;
+}
+
 void Box::KeepDerived(const Key& key, Derived derived) {
   const std::lock_guard lock(mutex_);
   derived_[key] = std::move(derived);

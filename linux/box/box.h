@@ -101,6 +101,21 @@ class Box {
     return document;
   }
 
+  // Like Derive, for a document that knows what it was made of: the one made last is shared while `is_current` says so.
+  template <typename T>
+  Result<std::shared_ptr<const T>> DeriveWhile(const std::string& name,
+                                               const std::function<bool(const T& previous)>& is_current,
+                                               const std::function<Result<T>()>& make) {
+    const Key key{typeid(T), name};
+    const auto previous = std::static_pointer_cast<const T>(LastDerived(key));
+    if (previous != nullptr && is_current(*previous)) return previous;
+    Result<T> made = make();
+    if (!made.ok()) return made.status();
+    auto document = std::make_shared<const T>(std::move(*made));
+    KeepDerived(key, {{}, document});
+    return document;
+  }
+
   // These change a file as Store says. The calling thread owns the configuration lock.
   Status Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode = 0644);
   Status Remove(const std::string& path, const Version& expected);
@@ -136,6 +151,7 @@ class Box {
   Cached Find(const Key& key);
   void Keep(const Key& key, Cached document);
   Document FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources);
+  Document LastDerived(const Key& key);
   void KeepDerived(const Key& key, Derived derived);
 
   const Root root_;

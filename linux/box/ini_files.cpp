@@ -90,13 +90,37 @@ std::vector<int> PositionOf(const std::vector<int>& source, int line) {
 
 std::string IniFound::Where() const { return file->location() + ":" + std::to_string(line); }
 
-Result<IniFiles> IniFiles::Open(Box& box, const std::string& path, const std::optional<Draft>& draft) {
+Result<SharedIniFiles> IniFiles::Open(Box& box, const std::string& path, const std::optional<Draft>& draft) {
+  if (draft) {
+    Result<IniFiles> read = Read(box, path, draft);
+    return read.ok() ? Result<SharedIniFiles>(std::make_shared<const IniFiles>(std::move(*read))) : read.status();
+  }
+  const auto is_current = [&box](const IniFiles& previous) { return previous.IsCurrent(box); };
+  Result<SharedIniFiles> files =
+      box.DeriveWhile<IniFiles>(path, is_current, [&] { return Read(box, path, std::nullopt); });
+  if (!files.ok()) return files;
+  const Status& readable = (*files)->CheckReadable();
+  if (!readable.ok()) NoticeOnce(path, (*files)->sources_.front().file->version(), readable.reason());
+  return files;
+}
+
+Result<IniFiles> IniFiles::Read(Box& box, const std::string& path, const std::optional<Draft>& draft) {
   IniFiles files;
   if (Status status = files.AddAll(box, path, draft); !status.ok()) return status;
   if (files.readable_.ok()) files.CheckReferences();
-  const Status& readable = files.CheckReadable();
-  if (!readable.ok() && !draft) NoticeOnce(path, files.sources_.front().file->version(), readable.reason());
   return files;
+}
+
+// Unchanged files have unchanged includes, so that no other files are read than before.
+bool IniFiles::IsCurrent(Box& box) const {
+  if (!has_all_) return false;
+  const Result<std::shared_ptr<const ReadNames>> names = NamesIn(box, folder_);
+  if (!names.ok() || (*names)->version != names_) return false;
+  FirstReads::Note(box, ListPath(folder_), names_);
+  return std::all_of(sources_.begin(), sources_.end(), [&box](const Source& source) {
+    const Result<SharedIniFile> file = IniFile::Open(box, source.path);
+    return file.ok() && *file == source.file;
+  });
 }
 
 Status IniFiles::AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft) {
@@ -135,7 +159,10 @@ Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft,
   } else {
     Result<SharedIniFile> file = IniFile::Open(box, source.path);
     const bool is_main = sources_.empty();
-    if (!file.ok()) return is_main || !IsSkipped(file.status().code()) ? file.status() : Status();
+    if (!file.ok()) {
+      has_all_ = false;
+      return is_main || !IsSkipped(file.status().code()) ? file.status() : Status();
+    }
     source.file = std::move(*file);
   }
   if (including != nullptr && including->Has(source)) {
@@ -151,6 +178,7 @@ Status IniFiles::Add(Box& box, Source source, const std::optional<Draft>& draft,
 }
 
 void IniFiles::Reject(const Source& source, const Opened* including, const std::string& why) {
+  has_all_ = false;
   if (!readable_.ok()) return;
   const std::string where = including == nullptr
                                 ? source.file->location()

@@ -26,6 +26,9 @@ struct IniFound {
   std::string Where() const;  // "/etc/nfs.conf:3"
 };
 
+class IniFiles;
+using SharedIniFiles = std::shared_ptr<const IniFiles>;
+
 // One reading of "/etc/NAME.conf" and of "/etc/NAME.conf.d/*.conf" in the order of versionsort(3), each with the
 // files that it includes: nfs.conf(5), and idmapd.conf(5), which libnfsidmap reads in the same way. The last value
 // of a key counts. A file that is missing or not a regular file is skipped, as the readers do.
@@ -43,7 +46,9 @@ class IniFiles {
     std::string text;
   };
 
-  static Result<IniFiles> Open(Box& box, const std::string& path, const std::optional<Draft>& draft = std::nullopt);
+  // The same object is returned while no file and not the list of files has changed; a draft is read each time.
+  static Result<SharedIniFiles> Open(Box& box, const std::string& path,
+                                     const std::optional<Draft>& draft = std::nullopt);
 
   // The setting in force; nullopt if the key has no value, or one that refers to nothing.
   std::optional<IniFound> Find(std::string_view section, std::string_view key) const;
@@ -106,6 +111,8 @@ class IniFiles {
     bool is_circular = false;
   };
 
+  static Result<IniFiles> Read(Box& box, const std::string& path, const std::optional<Draft>& draft);
+  bool IsCurrent(Box& box) const;
   Status AddAll(Box& box, const std::string& path, const std::optional<Draft>& draft);
   Status Add(Box& box, Source source, const std::optional<Draft>& draft, const Opened* including = nullptr);
   Status AddIncludes(Box& box, const Opened& opened, const std::optional<Draft>& draft);
@@ -116,6 +123,7 @@ class IniFiles {
   std::string folder_;
   Version names_;               // stands for the list of files in the folder
   std::deque<Source> sources_;  // a file that is being read stays where it is while others are added
+  bool has_all_ = true;         // no file was skipped that may be read next time
   Status readable_;
 };
 

@@ -73,12 +73,12 @@ class IDMap::Search {
   std::shared_ptr<const TextPairs> last_result_;
 };
 
-IDMap::IDMap(IniFiles files)
+IDMap::IDMap(SharedIniFiles files)
     : files_(std::move(files)),
-      stored_(files_.Settings("Static")),
+      stored_(files_->Settings("Static")),
       mappings_(Shown(stored_)),
       search_(std::make_shared<Search>()) {
-  const std::optional<IniFound> domain = files_.Find("General", "Domain");
+  const std::optional<IniFound> domain = files_->Find("General", "Domain");
   if (domain) domain_ = ToValidUtf8(domain->value);
 }
 
@@ -87,12 +87,11 @@ std::shared_ptr<const TextPairs> IDMap::Matching(std::string_view filter) const 
 }
 
 Result<std::shared_ptr<const IDMap>> ReadIDMap(Box& box, const std::string& path) {
-  Result<IniFiles> files = IniFiles::Open(box, path);
+  const Result<SharedIniFiles> files = IniFiles::Open(box, path);
   if (!files.ok()) return files.status();
-  const std::vector<std::shared_ptr<const void>> sources = files->sources();
-  return box.Derive<IDMap>(path, sources, [&]() -> Result<IDMap> {
-    for (const std::string& sentence : MissingPlugins(box, *files)) Notice(sentence);
-    return IDMap(std::move(*files));
+  return box.Derive<IDMap>(path, (*files)->sources(), [&]() -> Result<IDMap> {
+    for (const std::string& sentence : MissingPlugins(box, **files)) Notice(sentence);
+    return IDMap(*files);
   });
 }
 

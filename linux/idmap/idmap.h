@@ -23,7 +23,7 @@ inline constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 // that would look the same are distinguished by further U+FFFD at the end of the later one.
 class IDMap {
  public:
-  explicit IDMap(IniFiles files);
+  explicit IDMap(SharedIniFiles files);
 
   // The domain that is configured; nullopt if there is none.
   const std::optional<std::string>& domain() const { return domain_; }
@@ -39,12 +39,12 @@ class IDMap {
   // remembered.
   std::shared_ptr<const TextPairs> Matching(std::string_view filter) const;
 
-  const IniFiles& files() const { return files_; }
+  const IniFiles& files() const { return *files_; }
 
  private:
   class Search;
 
-  IniFiles files_;
+  SharedIniFiles files_;
   std::optional<std::string> domain_;
   std::vector<IniFound> stored_;
   std::shared_ptr<const TextPairs> mappings_;

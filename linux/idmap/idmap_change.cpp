@@ -156,14 +156,14 @@ Status Verify(const IniFiles& files, const IDMap& now, const IDMapChange& change
 // Warns if what is in force is not what was planned. The plan was in force in the draft, so another writer has changed
 // a file since; the change itself is stored and counts as a success.
 void ReadBack(Box& box, const std::string& path, const IDMap& now, const IDMapChange& change, const Plan& plan) {
-  const Result<IniFiles> files = IniFiles::Open(box, path);
+  const Result<SharedIniFiles> files = IniFiles::Open(box, path);
   if (!files.ok()) {
     Notice("the ID map is stored, but cannot be read back: " + files.status().reason());
     return;
   }
-  const Status status = Verify(*files, now, change, plan);
+  const Status status = Verify(**files, now, change, plan);
   if (!status.ok()) Notice("the ID map is stored, but another writer changed a file meanwhile: " + status.reason());
-  for (const std::string& sentence : MissingPlugins(box, *files)) Notice(sentence);
+  for (const std::string& sentence : MissingPlugins(box, **files)) Notice(sentence);
 }
 
 // The mappings that the change of the methods switched on, besides those that were asked for.
@@ -207,9 +207,9 @@ Status WriteIDMap(Box& box, const std::string& path, const IDMapChange& change) 
   Result<IniEditor> file = IniEditor::Open(box, path);
   if (!file.ok()) return file.status();
   if (Status status = PutChange(box, now, change, plan, &file->document()); !status.ok()) return status;
-  const Result<IniFiles> draft = IniFiles::Open(box, path, IniFiles::Draft{path, file->document().Text()});
+  const Result<SharedIniFiles> draft = IniFiles::Open(box, path, IniFiles::Draft{path, file->document().Text()});
   if (!draft.ok()) return draft.status();
-  if (Status status = Verify(*draft, now, change, plan); !status.ok()) return status;
+  if (Status status = Verify(**draft, now, change, plan); !status.ok()) return status;
   if (Status status = file->Save(); !status.ok()) return status;
   NoticeRevived(now, plan);
   ReadBack(box, path, now, change, plan);

@@ -33,15 +33,15 @@ std::optional<int> LeadingNumber(const std::string& text, int base, int largest,
 }  // namespace
 
 Result<NFSConfiguration> NFSConfiguration::Open(Box& box, const std::optional<IniFiles::Draft>& draft) {
-  Result<IniFiles> files = IniFiles::Open(box, kNFSConfigurationFile, draft);
+  Result<SharedIniFiles> files = IniFiles::Open(box, kNFSConfigurationFile, draft);
   if (!files.ok()) return files.status();
   return NFSConfiguration(std::move(*files), draft.has_value());
 }
 
 std::optional<IniFound> NFSConfiguration::Find(const char* section, const char* key) const {
-  std::optional<IniFound> found = files_.Find(section, key);
-  if (found || !files_.CheckReadable().ok()) return found;
-  const std::optional<IniFound> unresolved = files_.FindStored(section, key);
+  std::optional<IniFound> found = files_->Find(section, key);
+  if (found || !files_->CheckReadable().ok()) return found;
+  const std::optional<IniFound> unresolved = files_->FindStored(section, key);
   if (unresolved) {
     Remark(*unresolved, "refers to " + std::string(unresolved->stored.substr(1)) +
                             ", which [environment] does not define, and is ignored");

@@ -33,17 +33,17 @@ class NFSConfiguration {
   // A string of the platform's own; "" if it is not set or has `size` bytes or more.
   std::string Text(const char* section, const char* key, std::size_t size) const;
 
-  const IniFiles& files() const { return files_; }
+  const IniFiles& files() const { return *files_; }
 
  private:
-  NFSConfiguration(IniFiles files, bool is_draft) : files_(std::move(files)), is_draft_(is_draft) {}
+  NFSConfiguration(SharedIniFiles files, bool is_draft) : files_(std::move(files)), is_draft_(is_draft) {}
 
   // The setting in force. A reference to nothing becomes a remark.
   std::optional<IniFound> Find(const char* section, const char* key) const;
 
   void Remark(const IniFound& setting, const std::string& why) const;
 
-  IniFiles files_;
+  SharedIniFiles files_;
   bool is_draft_;
 };
 

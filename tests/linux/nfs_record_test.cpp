@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 #include <memory>
 #include <string>
 #include <utility>
@@ -397,6 +398,30 @@ TEST(NFSConf, WarnsEachCallOfAValueThatIsIgnored) {
     ASSERT_EQ(VORNNFSConfGet(&record), 0);
     EXPECT_THAT(call.warnings(), testing::ElementsAre(testing::HasSubstr("manage-gids"))) << reading;
   }
+}
+
+// Files that did not change are not read again.
+TEST(NFSConf, FollowsFilesThatAppearAndDisappear) {
+  const TemporaryRoot root;
+  const auto settle = [](const char* path) {
+    return Eventually([path] { return vorn::CurrentBox().Read(path)->is_settled; });
+  };
+  root.Write("/etc/nfs.conf", "[statd]\ninclude = part\ninclude = folder\n");
+  std::filesystem::create_directory(root.At("/etc/folder"));  // skipped
+  ASSERT_TRUE(settle("/etc/nfs.conf"));
+  EXPECT_EQ(Get().statd_port, 0);
+  std::filesystem::remove(root.At("/etc/folder"));
+  root.Write("/etc/folder", "port = 4001\n");
+  EXPECT_EQ(Get().statd_port, 4001);
+  root.Write("/etc/part", "port = 4000\n");
+  root.Write("/etc/nfs.conf.d/z.conf", "[statd]\nport = 4002\n");
+  ASSERT_TRUE(settle("/etc/part"));
+  ASSERT_TRUE(settle("/etc/nfs.conf.d/z.conf"));
+  EXPECT_EQ(Get().statd_port, 4002);
+  std::filesystem::remove(root.At("/etc/nfs.conf.d/z.conf"));
+  EXPECT_EQ(Get().statd_port, 4001);
+  std::filesystem::remove(root.At("/etc/folder"));
+  EXPECT_EQ(Get().statd_port, 4000);
 }
 
 TEST(NFSConf, HasNoValueThatAnIncludedFileHides) {

@@ -32,7 +32,8 @@ def _add_fish(parser, words, lines):
         for option in action.option_strings:
             kind = "-l" if option.startswith("--") else "-s"
             argument = "" if action.nargs == 0 else " -r"
-            lines.append(f"complete -c vorn {condition} {kind} {option.lstrip('-')}{argument} -d {_quoted(action.help)}")
+            described = "" if action.help == argparse.SUPPRESS else f" -d {_quoted(action.help)}"
+            lines.append(f"complete -c vorn {condition} {kind} {option.lstrip('-')}{argument}{described}")
 
 
 def _quoted(text):

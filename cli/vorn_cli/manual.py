@@ -4,7 +4,7 @@ import textwrap
 
 from .commands import COMMANDS, GROUPS
 from .failure import Exit
-from .parser import GLOBAL_OPTIONS, describe, rehearse_option
+from .parser import GLOBAL_OPTIONS, VERSION_OPTION, describe, rehearse_option
 
 _STATUS = {
     Exit.SUCCESS: "The command succeeded.",
@@ -27,6 +27,7 @@ vorn \\- administer the NFS service of a storage box
 .SH DESCRIPTION
 Each command is a call of the box's web API: over the Unix socket of vornd(8), which root and the members of the
 administrators' group may use, or over the network with a token.
+The options may also follow the command.
 Commands print tables; with \\fB\\-\\-json\\fR they print JSON.
 Warnings and errors go to standard error.
 """
@@ -58,7 +59,7 @@ The tokens and fingerprints that \\fBvorn login\\fR keeps; only its owner may re
 
 def page():
     """The whole page."""
-    return _HEAD + ".SH OPTIONS\n" + "".join(map(_global_option, GLOBAL_OPTIONS)) + _commands() + _statuses() + _TAIL
+    return _HEAD + ".SH OPTIONS\n" + "".join(map(_global_option, (*GLOBAL_OPTIONS, VERSION_OPTION))) + _commands() + _statuses() + _TAIL
 
 
 def _global_option(option):
@@ -104,7 +105,7 @@ def _option_synopsis(names, settings):
     if not names[0].startswith("-"):
         return f"\\fI{_escaped(_value(names[0], settings))}\\fR"
     names = ", ".join(f"\\fB{_escaped(name)}\\fR" for name in names)
-    return names if settings.get("action") == "store_true" else f"{names} \\fI{_escaped(_value('', settings))}\\fR"
+    return names if settings.get("action") in ("store_true", "version") else f"{names} \\fI{_escaped(_value('', settings))}\\fR"
 
 
 def _value(name, settings):

@@ -29,6 +29,9 @@ class Output:
         if self.as_json:
             self.data(data)
             return
+        if not data:
+            self.text("There are no entries.")
+            return
         lines = [list(columns)] + [[_text(value(row)) for value in columns.values()] for row in data]
         widths = [max(_width(line[at]) for line in lines) for at in range(len(columns))]
         for number, line in enumerate(lines):
@@ -108,6 +111,11 @@ class _Progress:
         if shown:
             self._stream.write("\r\x1b[K")
             self._stream.flush()
+
+
+def count(number, noun):
+    """The number with the noun, which has an "s" in the plural."""
+    return f"{number} {noun}" if number == 1 else f"{number} {noun}s"
 
 
 def yes_no(value):

@@ -2,6 +2,7 @@
 
 import argparse
 
+from . import VERSION
 from .commands import COMMANDS, GROUPS
 from .connection import DEFAULT_SOCKET
 from .failure import Exit
@@ -13,7 +14,17 @@ GLOBAL_OPTIONS = (
                                               + DEFAULT_SOCKET}),
     (("--json",), {"action": "store_true", "help": "print JSON, for programs"}),
 )
+VERSION_OPTION = (("--version",), {"action": "version", "version": f"vorn {VERSION}", "help": "print the version and end"})
 _REHEARSE = (("--rehearse",), {"action": "store_true", "help": "change nothing; show what the command would do"})
+
+
+class _Help(argparse.RawDescriptionHelpFormatter):
+    """Fills the description to the width of the terminal, and leaves the lines of the examples as they are."""
+
+    def _fill_text(self, text, width, indent):
+        if "\n" in text:
+            return super()._fill_text(text, width, indent)
+        return argparse.HelpFormatter._fill_text(self, text, width, indent)
 
 
 class Parser(argparse.ArgumentParser):
@@ -26,9 +37,10 @@ class Parser(argparse.ArgumentParser):
 def build():
     """The parser of all commands."""
     parser = Parser(prog="vorn", description="Administers the NFS service of a storage box.",
-                    epilog="\"vorn COMMAND --help\" describes a command and has examples.",
-                    formatter_class=argparse.RawDescriptionHelpFormatter)
-    for names, settings in GLOBAL_OPTIONS:
+                    epilog="\"vorn COMMAND --help\" describes a command and has examples. The options --url, --socket and "
+                           "--json may also follow the command.",
+                    formatter_class=_Help)
+    for names, settings in (*GLOBAL_OPTIONS, VERSION_OPTION):
         parser.add_argument(*names, **settings)
     subparsers = parser.add_subparsers(metavar="COMMAND", required=True)
     groups = {}
@@ -47,10 +59,18 @@ def _add_group(subparsers, name):
 
 def _add_command(subparsers, name, command):
     parser = subparsers.add_parser(name, help=command.help, description=describe(command), epilog=_examples(command),
-                                   formatter_class=argparse.RawDescriptionHelpFormatter)
+                                   formatter_class=_Help)
     for one in command.arguments + rehearse_option(command):
         parser.add_argument(*one.names, **one.settings)
+    if command.needs_box:
+        _accept_global_options(parser)
     parser.set_defaults(command=command)
+
+
+def _accept_global_options(parser):
+    """Accepts the options of all commands behind the command, too. Its help does not repeat them."""
+    for names, settings in GLOBAL_OPTIONS:
+        parser.add_argument(*names, **{**settings, "help": argparse.SUPPRESS, "default": argparse.SUPPRESS})
 
 
 def rehearse_option(command):

@@ -94,6 +94,7 @@ class ServiceTest(BoxTest):
         shown = self.vorn("nfs show")
         self.assertRegex(shown, r"(?m)^NFS service: +disabled$")
         self.assertRegex(shown, r"(?m)^Read size: +chosen by the system$")
+        self.assertRegex(self.vorn("advanced show"), r"(?m)^Port of statd: +not set$")
 
 
 class ExplainTest(BoxTest):
@@ -363,6 +364,16 @@ class IDMapTest(BoxTest):
         self.assertEqual(list(csv.reader(io.StringIO(self.vorn("idmap export")))), list(csv.reader(io.StringIO(text))))
         self.refuses("idmap import -", Exit.USAGE, "mapping 2", "3 columns", stdin="a@E,alice\nb@E,alice,x\n")
 
+    def test_imports_what_the_box_does_not_have(self):
+        text = "a@EXAMPLE,alice\nr@EXAMPLE,root\n"
+        self.assertEqual(self.vorn("idmap import -", stdin="a@EXAMPLE,alice\n"), "1 mapping added.\n")
+        self.assertEqual(self.vorn("idmap import -", stdin=text),
+                         "The box has 1 mapping of the file already.\n1 mapping added.\n")
+        self.assertEqual(self.vorn("idmap import -", stdin=text), "The box has all mappings of the file already.\n")
+        self.assertEqual(json.loads(self.vorn("--json idmap import -", stdin=text)), {"id": []})
+        self.refuses("idmap import -", Exit.FAILED, "(code 2351,", stdin="a@EXAMPLE,root\n")
+        self.assertEqual(self.vorn("idmap remove a@EXAMPLE r@EXAMPLE"), "2 mappings removed.\n")
+
     def test_pages_and_suggests(self):
         self.assertIn("root@", self.vorn("idmap suggest"))
         self.assertIn("1 of", self.vorn("idmap suggest --limit 1"))
@@ -496,6 +507,9 @@ class CallTest(BoxTest):
     def test_calls_any_method(self):
         self.assertEqual(json.loads(self.vorn(f"call {NFS} get")), self.json("nfs show"))
         self.assertEqual(json.loads(self.vorn(f"call {NFS} v2/get")), self.json("nfs show"))
+        self.assertEqual(json.loads(self.vorn(f"call {NFS}/v2/get")), self.json("nfs show"))
+        self.vorn(f"call {NFS}/v1/set '{{\"enable_nfs\": true}}'")
+        self.assertEqual(self.json("nfs show")["enable_nfs"], True)
         self.assertEqual(json.loads(self.vorn(f"call {NFS}.SharePrivilege load -", stdin="{\"share_name\": \"data\"}")),
                          {"rule": []})
 
@@ -503,6 +517,8 @@ class CallTest(BoxTest):
         self.refuses(f"call {NFS} get '['", Exit.USAGE, "no JSON")
         self.refuses(f"call {NFS} get 1", Exit.USAGE, "one JSON object")
         self.refuses(f"call {NFS} none", Exit.FAILED, "(code 404,")
+        self.refuses(f"call {NFS}", Exit.USAGE, "vorn methods")
+        self.refuses(f"call {NFS}/v1/get get {{}}", Exit.USAGE, "the parameters only")
 
     def test_lists_the_methods(self):
         listed = {row["method"]: row["reads"] for row in self.json("methods")}
@@ -544,6 +560,27 @@ class TerminalTest(BoxTest):
         done = subprocess.run(f"{shlex.quote(str(VORN))} methods | true", shell=True, env=self.environment,
                               capture_output=True, text=True, check=False)
         self.assertEqual(done.stderr, "")
+
+
+class UsageTest(BoxTest):
+    """What all commands have in common."""
+
+    def test_the_global_options_may_follow_the_command(self):
+        self.assertEqual(json.loads(self.vorn("exports list --json")), self.json("exports list"))
+        self.assertEqual(json.loads(self.vorn(f"nfs show --json --socket {self.server.socket}", VORN_SOCKET="/nowhere")),
+                         self.json("nfs show"))
+        self.refuses("nfs show --url nonsense", Exit.USAGE, "no URL of a box")
+
+    def test_prints_its_version(self):
+        self.assertRegex(self.vorn("--version"), r"^vorn [0-9.]+\n$")
+
+    def test_an_empty_list_is_a_sentence_for_people(self):
+        self.assertEqual(self.vorn("exports show data"), "There are no entries.\n")
+        self.assertEqual(self.json("exports show data"), [])
+
+    def test_the_help_breaks_no_word(self):
+        for line in self.vorn("apply --help", COLUMNS="60").splitlines():
+            self.assertLessEqual(len(line), 60)
 
 
 class OutputTest(unittest.TestCase):

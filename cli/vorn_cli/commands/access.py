@@ -43,7 +43,8 @@ def _agreed_fingerprint(url, expected):
     if not sys.stdin.isatty():
         raise Failure("No authority vouches for the certificate: give --fingerprint.", Exit.NO_CONNECTION,
                       (f"presented: {presented}",))
-    print(f"The certificate of {url} has the fingerprint\n  {presented}\nvornd logs its own when it starts.")
+    print(f"The certificate of {url} has the fingerprint\n  {presented}")
+    print("\"vornd --check\" on the box prints the one that it must have.")
     if input("Is it the same? [y/N] ").strip().lower() not in ("y", "yes"):
         raise Failure("Nothing was kept.", Exit.NO_CONNECTION)
     return presented

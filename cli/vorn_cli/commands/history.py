@@ -74,8 +74,8 @@ def audit(context, arguments):
     """Prints who changed the box, from where, and with which call."""
     context.out.table(context.read(f"{_API}/list", _filter(arguments)).data["changes"], {
         "TIME": lambda change: time_of(change["time"]), "BY": _who, "FROM": lambda change: change["origin"],
-        "METHOD": lambda change: change["method"], "PARAMETERS": lambda change: change["parameters"],
-        "ID": lambda change: change["id"][:_SHORT]})
+        "ID": lambda change: change["id"][:_SHORT], "METHOD": lambda change: change["method"],
+        "PARAMETERS": lambda change: change["parameters"]})
 
 
 _FILTERS = (

@@ -6,6 +6,7 @@ import io
 from ..command import Command, argument
 from ..failure import Exit, Failure
 from ..files import read_text
+from ..output import count
 
 _API = "VORN.Core.FileServ.NFS.IDMap/v1"
 _COLUMNS = {"PRINCIPAL": lambda row: row["kerberos_principal"], "LOCAL USER": lambda row: row["local_name"]}
@@ -48,7 +49,7 @@ def add(context, arguments):
 
 
 def _create(context, rows):
-    context.change(f"{_API}/create", {"idmap": rows}, f"{len(rows)} mappings were added.")
+    context.change(f"{_API}/create", {"idmap": rows}, f"{count(len(rows), 'mapping')} added.")
 
 
 def change(context, arguments):
@@ -71,13 +72,22 @@ def remove(context, arguments):
     unknown = [principal for principal in arguments.principal if principal not in known]
     if unknown:
         raise Failure(f"There is no mapping of {', '.join(unknown)}.")
-    context.change(f"{_API}/delete", {"id": arguments.principal}, f"{len(arguments.principal)} mappings were removed.",
+    context.change(f"{_API}/delete", {"id": arguments.principal}, f"{count(len(arguments.principal), 'mapping')} removed.",
                    revision=present.revision)
 
 
 def import_csv(context, arguments):
-    """Adds all mappings of a file, or none."""
-    _create(context, read_csv(arguments.file))
+    """Adds all mappings of a file that the box does not have, or none."""
+    present = {(row["kerberos_principal"], row["local_name"]) for row in mappings(context).data["idmap"]}
+    rows = read_csv(arguments.file)
+    new = [row for row in rows if (row["kerberos_principal"], row["local_name"]) not in present]
+    if rows and not new:
+        context.out.text("The box has all mappings of the file already.")
+        context.out.data({"id": []})
+        return
+    if len(new) < len(rows):
+        context.out.text(f"The box has {count(len(rows) - len(new), 'mapping')} of the file already.")
+    _create(context, new)
 
 
 def read_csv(path):
@@ -122,7 +132,7 @@ COMMANDS = (
     Command("idmap suggest", "suggest a mapping for each local user", suggest, arguments=_PAGE,
             examples=(("Suggestions to edit and import", "vorn idmap suggest"),)),
     Command("idmap import", "add the mappings of a CSV file", import_csv, changes=True, arguments=(_FILE,),
-            description="All mappings of the file are added, or none.",
+            description="All mappings of the file are added, or none. Those that the box has already are left out.",
             examples=(("Many mappings", "vorn idmap import people.csv"),)),
     Command("idmap export", "print all mappings as CSV", export_csv,
             examples=(("A copy", "vorn idmap export > people.csv"),)),

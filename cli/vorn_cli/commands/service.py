@@ -49,8 +49,8 @@ def show_advanced(context, _arguments):
         "Write size": _size("write_size"),
         "UNIX permissions": lambda data: yes_no(data["unix_pri_enable"]),
         "Fixed ports": lambda data: yes_no(data["custom_port_enable"]),
-        "Port of statd": lambda data: data["statd_port"],
-        "Port of lockd": lambda data: data["nlm_port"],
+        "Port of statd": lambda data: data["statd_port"] or "not set",
+        "Port of lockd": lambda data: data["nlm_port"] or "not set",
     })
 
 

@@ -72,7 +72,7 @@ class Command:
     needs_box: bool = True  # is run with a connection
 
 
-def show_rehearsal(out, answer):
+def show_rehearsal(out, answer, heading="Nothing was changed. The command would do this:"):
     """Prints what a change would do."""
     rehearsal = answer.rehearsal
     if rehearsal is None:
@@ -80,7 +80,7 @@ def show_rehearsal(out, answer):
     if out.as_json:
         out.data(rehearsal)
         return
-    out.text("Nothing was changed. The command would do this:")
+    out.text(heading)
     for file in rehearsal.get("files", []):
         out.difference(file["difference"])
     for action in rehearsal.get("actions", []):

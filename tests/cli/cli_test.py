@@ -398,7 +398,8 @@ class StateTest(BoxTest):
         wanted["shares"]["photos"] = {"path": "/volume1/photos", "rules": [{"client": "*", "privilege": "rw"}]}
         wanted["idmap"] = {"moved@EXAMPLE": "root", "new@EXAMPLE": "alice"}
         text = yaml.safe_dump(wanted)
-        self.refuses("apply - --check", Exit.DIFFERS, "differs", stdin=text)
+        checked = self.refuses("apply - --check", Exit.DIFFERS, "differs from -: 9 steps", stdin=text)
+        self.assertIn("Step 1 would do this:", checked.stdout)
         self.assertNotIn("photos", self.vorn("share list"))
         self.vorn("apply - --yes", stdin=text)
         self.assertEqual(self.vorn("apply - --check", stdin=text), "The box is in the wanted state.\n")
@@ -551,7 +552,9 @@ class TerminalTest(BoxTest):
     def test_apply_asks(self):
         path = self.server.folder / "wanted.yaml"
         path.write_text("nfs: {enable_nfs: true}\n", "ascii")
-        self.assertEqual(self.on_terminal(f"apply {path}", "n\n")[1], Exit.FAILED)
+        asked, status = self.on_terminal(f"apply {path}", "n\n")
+        self.assertEqual(status, Exit.FAILED)
+        self.assertRegex(asked, r"(?s)1\. enable_nfs.*Step 1 would do this:.*- start: .*Carry this out\?")
         self.assertFalse(self.json("nfs show")["enable_nfs"])
         self.assertEqual(self.on_terminal(f"apply {path}", "y\n")[1], Exit.SUCCESS)
         self.assertTrue(self.json("nfs show")["enable_nfs"])

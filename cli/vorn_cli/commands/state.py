@@ -8,7 +8,7 @@ import yaml
 from ..command import Command, argument, show_rehearsal
 from ..failure import Exit, Failure
 from ..files import read_text
-from ..output import Output
+from ..output import Output, count
 from . import exports, idmap
 
 _NFS = "VORN.Core.FileServ.NFS/v1"
@@ -177,20 +177,21 @@ def apply(context, arguments):
     if arguments.check or context.rehearse:
         _rehearse(context, steps)
         if arguments.check:
-            raise Failure(f"The box differs from {arguments.file} in {len(steps)} steps.", Exit.DIFFERS)
+            raise Failure(f"The box differs from {arguments.file}: {count(len(steps), 'step')}.", Exit.DIFFERS)
+        context.out.text("Nothing was changed.")
         return
-    if not arguments.yes and not _confirm():
+    if not arguments.yes and not _agrees(context, steps):
         raise Failure("Nothing was changed.", Exit.FAILED)
     for number, step in enumerate(steps, 1):
         _carry_out(context, step, number, len(steps))
 
 
-def _carry_out(context, step, number, count):
+def _carry_out(context, step, number, total):
     try:
         with context.out.progress(step.text):
             context.report(context.api.call(step.method, step.parameters, revision=step.revision))
     except Failure as failure:
-        failure.details += (f"This was step {number} of {count}: {step.text}. The steps before it are in force.",)
+        failure.details += (f"This was step {number} of {total}: {step.text}. The steps before it are in force.",)
         raise
     context.out.text(f"done: {step.text}")
 
@@ -198,19 +199,22 @@ def _carry_out(context, step, number, count):
 def _rehearse(context, steps):
     """Shows what the box says of each step, as if it were the first one."""
     out = Output(stdout=sys.stderr) if context.out.as_json else context.out
-    for step in steps:
+    for number, step in enumerate(steps, 1):
         try:
-            answer = context.api.call(step.method, step.parameters, revision=step.revision, rehearse=True)
+            with context.out.progress(f"rehearsing step {number}"):
+                answer = context.api.call(step.method, step.parameters, revision=step.revision, rehearse=True)
         except Failure as failure:
             # A step that needs an earlier one, for example the rules of a new shared folder, fails without it.
-            out.text(f"\"{step.text}\" fails as things are now: {failure}")
+            out.text(f"Step {number} fails as things are now: {failure}")
             continue
-        show_rehearsal(out, answer)
+        show_rehearsal(out, answer, f"Step {number} would do this:")
 
 
-def _confirm():
+def _agrees(context, steps):
+    """Shows the rehearsal to the person at the terminal, and asks."""
     if not sys.stdin.isatty():
         raise Failure("There is nobody to ask: give --yes or --check.", Exit.USAGE)
+    _rehearse(context, steps)
     return input("Carry this out? [y/N] ").strip().lower() in ("y", "yes")
 
 
@@ -222,7 +226,7 @@ COMMANDS = (
         argument("file", metavar="FILE", help="YAML, as \"vorn dump\" prints it; - is standard input"),
         argument("--check", action="store_true", help="change nothing; the exit status is 2 if the box differs"),
         argument("--yes", action="store_true", help="do not ask")),
-            description="Shows the steps, asks, and carries them out. A section that the file does not have is left "
+            description="Shows the steps and what they would do, asks, and carries them out. A section that the file does not have is left "
                         "alone; a shared folder or a mapping that a section does not have is removed. If somebody else "
                         "changes the box in between, the command ends with status 5.",
             examples=(("Restore a copy", "vorn apply box.yaml"), ("In a script", "vorn apply --check box.yaml"))),

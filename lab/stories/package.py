@@ -1,12 +1,16 @@
 """The packages: upgraded over a running service, removed, purged, and installed again."""
 
 import fcntl
+import hashlib
+import json
 import os
 import pathlib
+import ssl
 
 import pytest
 
 from harness import api, kerberos
+from harness.network import BOX_ADDRESS
 from harness.programs import run, succeeds, wait_for
 
 PACKAGES = sorted(map(str, pathlib.Path("/lab/packages").glob("*.deb")))
@@ -14,7 +18,9 @@ NAMES = ("vorn-cli", "vorn-nfs", "vorn-server", "vorn-platform-linux")
 WRITTEN_BY_THE_PACKAGE = [pathlib.Path(path) for path in (
     "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/nfs/krb5.keytab",
     "/var/lib/vorn")]
-CONFIGURATION = (pathlib.Path("/etc/pam.d/vornd"), pathlib.Path("/etc/vorn/vornd.conf"))
+PAM, SETTINGS = pathlib.Path("/etc/pam.d/vornd"), pathlib.Path("/etc/vorn/vornd.conf")
+SOCKET_ONLY = "# The configuration of a box that is managed at its socket\n[server]\n#listen =\n"
+TLS_PORT = 8443
 OF_THE_ADMINISTRATOR = {pathlib.Path(path): text for path, text in {
     "/etc/vorn/platform.conf": "[platform]\n# as the rack needs it\nkerberos = auto\n",
     "/etc/nfs/krb5.conf": "[libdefaults]\n default_realm = LAB.TEST\n",
@@ -51,8 +57,9 @@ def next_version():
 
 def single_package():
     """The package of before version 1.1.0, which had everything."""
-    run("sh", "-ec", f"""rm -rf /tmp/single && mkdir -p /tmp/single/DEBIAN
+    run("sh", "-ec", f"""rm -rf /tmp/single && mkdir -p /tmp/single/DEBIAN /tmp/single/etc/vorn
         for package in {" ".join(PACKAGES)}; do dpkg-deb --extract $package /tmp/single; done
+        printf '%s' '{SOCKET_ONLY}' >/tmp/single{SETTINGS}
         printf '%s\\n' /etc/pam.d/vornd /etc/vorn/vornd.conf >/tmp/single/DEBIAN/conffiles
         printf '%s\\n' 'Package: vorn-nfs' 'Version: 1.0.0' 'Architecture: all' 'Description: all in one' \\
           'Maintainer: The VORN NFS developers <nfs@vorn.example>' >/tmp/single/DEBIAN/control
@@ -76,17 +83,44 @@ def test_an_upgrade_restarts_the_server_and_leaves_nfs_alone(box, client, settin
     assert len(box.rules("data")) == 1
 
 
+def listens():
+    """Whether a program listens at the port that a first installation opens."""
+    return bool(run("ss", "--no-header", "--listening", "--tcp", f"sport = :{TLS_PORT}").strip())
+
+
+def test_a_first_installation_serves_over_tls_and_at_the_socket(box, client):
+    """Another machine logs in with a token and the fingerprint that the box prints."""
+    del box
+    purge()
+    assert "over TLS" in run("dpkg", "--install", *PACKAGES)
+    wait_for(api.answers, "vornd does not listen")
+    presented = ssl.PEM_cert_to_DER_cert(ssl.get_server_certificate(("127.0.0.1", TLS_PORT)))
+    digest = hashlib.sha256(presented).hexdigest().upper()
+    fingerprint = ":".join(digest[i:i + 2] for i in range(0, len(digest), 2))
+    assert fingerprint in run("vornd", "--check")
+    token = run("vorn", "--json", "token", "create", "tool", "--role", "reader")
+    url = f"https://{BOX_ADDRESS}:{TLS_PORT}"
+    pathlib.Path("/tmp/token").write_text(json.loads(token)["token"] + "\n", encoding="ascii")
+    assert "reader" in client.run("sh", "-c", f"vorn login {url} --fingerprint {fingerprint} </tmp/token")
+    assert "NFSv4" in client.run("vorn", "--url", url, "nfs", "show")
+    for path in ("/", "/api/VORN.Core.FileServ.NFS/v1/get"):
+        assert not client.succeeds("curl", "--silent", "--fail", "--max-time", "60", url.replace("https", "http") + path)
+    run("vorn", "logout", url)
+
+
 def test_the_single_package_of_before_is_replaced(box, client, settings):
     """Settings, tokens and edited configuration files are kept, and clients are served on."""
     box.foresees("^vornd: ")
     run("dpkg", "--remove", *NAMES)
+    before = SETTINGS.read_bytes()
+    SETTINGS.unlink()
     run("dpkg", "--install", single_package())
     run("systemctl", "daemon-reload")
     run("systemctl", "enable", "--now", "vornd")
     wait_for(api.answers, "vornd does not listen")
     status, made = api.request("POST", "/api/VORN.Server.Token/v1/create", '{"name": "kept", "role": "reader"}')
     assert status == 200
-    for file in CONFIGURATION:
+    for file in (PAM, SETTINGS):
         file.write_text(file.read_text(encoding="ascii") + "# of the site\n", encoding="ascii")
     with client.mounted("/srv/data") as mounted:
         service = run("systemctl", "show", "--property=ActiveEnterTimestampMonotonic", "nfs-server")
@@ -98,10 +132,12 @@ def test_the_single_package_of_before_is_replaced(box, client, settings):
     assert len(box.rules("data")) == 1
     assert "kept" in run("vorn", "token", "list")
     assert made["data"]["token"]
-    for file in CONFIGURATION:
-        assert file.read_text(encoding="ascii").endswith("# of the site\n")
-        file.write_text(file.read_text(encoding="ascii").replace("# of the site\n", ""), encoding="ascii")
-        assert run("dpkg", "--search", str(file)) == f"vorn-server: {file}\n"
+    assert SETTINGS.read_text(encoding="ascii") == SOCKET_ONLY + "# of the site\n"
+    assert not listens()
+    SETTINGS.write_bytes(before)
+    assert PAM.read_text(encoding="ascii").endswith("# of the site\n")
+    PAM.write_text(PAM.read_text(encoding="ascii").replace("# of the site\n", ""), encoding="ascii")
+    assert run("dpkg", "--search", str(PAM)) == f"vorn-server: {PAM}\n"
     assert succeeds("systemctl", "is-enabled", "vornd")
     run("vorn", "token", "revoke", made["data"]["id"])
 

@@ -34,7 +34,7 @@ def broken_packages(item):
     if not changed:
         raise LabError(f"{item.name}: no source has the text that is to be edited")
     build([str(tree / "packaging/build")], _WORK / f"{item.name}.log")
-    return guest.packages_of(tree)
+    return guest.packages_of(tree / "build")
 
 
 def run_break(item, make_guest):

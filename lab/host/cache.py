@@ -14,6 +14,7 @@ from host.log import LabError, say
 from host.process import output_of
 
 PROJECT = pathlib.Path(__file__).resolve().parents[2]
+RELEASES = ("bookworm", "trixie")  # of Debian, by their code names
 
 
 def _folder():
@@ -47,16 +48,16 @@ class Cache:
         self._folder.mkdir(parents=True, exist_ok=True)
         self._logs = logs
 
-    def get(self, name, key, program):
-        """The folder that `program` fills for this key. Only the newest folder of each name is kept. Of a build that
-        fails nothing is kept.
+    def get(self, name, key, fill):
+        """The folder that `fill(folder, log)` fills for this key. Only the newest folder of each name is kept. Of a build
+        that fails nothing is kept.
 
         >>> with tempfile.TemporaryDirectory() as folder:
         ...     os.environ["VORN_LAB_CACHE"] = folder
         ...     kept = Cache(pathlib.Path(folder))
-        ...     made = kept.get("disk", "1" * 16, "/bin/true").name
+        ...     made = kept.get("disk", "1" * 16, lambda *_: process.output_of("true")).name
         ...     with contextlib.suppress(LabError):
-        ...         kept.get("disk", "2" * 16, "/bin/false")
+        ...         kept.get("disk", "2" * 16, lambda *_: process.output_of("false"))
         ...     made, sorted(path.name for path in pathlib.Path(folder).iterdir() if path.is_dir())
         ('disk-1111111111111111', ['disk-1111111111111111'])
         """
@@ -64,16 +65,16 @@ class Cache:
             folder = self._folder / f"{name}-{key}"
             if not folder.is_dir():
                 self._remove_old(name)
-                self._build(name, folder, program)
+                self._build(name, folder, fill)
             self._use(folder)
         return folder
 
-    def _build(self, name, folder, program):
+    def _build(self, name, folder, fill):
         say(f"building the {name}")
         fresh = pathlib.Path(tempfile.mkdtemp(prefix="new.", dir=self._folder))
         try:
             fresh.chmod(0o755)
-            process.build([str(program), str(fresh)], self._logs / f"{name}.log")
+            fill(fresh, self._logs / f"{name}.log")
             fresh.rename(folder)
         finally:
             shutil.rmtree(fresh, ignore_errors=True)
@@ -101,14 +102,24 @@ def _candidate(package):
     return "none"
 
 
-def kernel(cache, machine):
-    """The folder with the kernel for this kind of machine ("uml" or "vm")."""
+def _this_month():
+    return time.strftime("%Y-%m")
+
+
+def kernel(cache, machine, release):
+    """The folder with a release's kernel for this kind of machine ("uml" or "vm"). One that is made in a minimal system is
+    made again each month, as the system is."""
     program = PROJECT / "lab" / machine / "kernel"
     files = [program, *program.parent.glob("*.c")]
-    return cache.get(f"kernel-{machine}", digest(_candidate("user-mode-linux"), files), program)
+    newest = _candidate("user-mode-linux") if release.is_here else _this_month()
+    return cache.get(f"kernel-{machine}-{release.name}", digest(newest, files),
+                     lambda folder, log: release.fill(folder, f"lab/{machine}/kernel", ["lab", f"lab_{machine}"], log))
 
 
-def disk(cache):
+def disk(cache, release):
     """The folder with the guest's disk image, which is made again each month."""
-    files = sorted((PROJECT / "lab/guest").iterdir())
-    return cache.get("disk", digest(time.strftime("%Y-%m"), files), PROJECT / "lab/guest/disk") / "disk.img"
+    others = {f"libraries.{name}" for name in RELEASES if name != release.name}
+    files = [path for path in sorted((PROJECT / "lab/guest").iterdir()) if path.name not in others]
+    folder = cache.get(f"disk-{release.name}", digest(_this_month(), files),
+                       lambda folder, log: release.fill(folder, "lab/guest/disk", ["lab"], log))
+    return folder / "disk.img"

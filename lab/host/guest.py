@@ -30,24 +30,24 @@ def end_all():
             child.terminate()
 
 
-def packages_of(tree):
-    """The packages that packaging/build has made of the sources in a folder."""
-    found = [path for path in (tree / "build/package").glob("vorn-*_*.deb") if "-dbgsym_" not in path.name]
+def packages_of(build):
+    """The packages that packaging/build has made in a build folder."""
+    found = [path for path in (build / "package").glob("vorn-*_*.deb") if "-dbgsym_" not in path.name]
     if not found:
-        raise LabError(f"{tree / 'build/package'} has no packages")
+        raise LabError(f"{build / 'package'} has no packages")
     return found
 
 
 class Guest:
     """A guest with a folder of its own below build/lab, which becomes /lab in it."""
 
-    def __init__(self, name, machine, kernel, image, packages=None):
+    def __init__(self, name, machine, kernel, image, packages):
         self.folder = WORK / name
         self.share = self.folder / "share"
         self._boot = PROJECT / "lab" / machine / "boot"
         self._inputs = [str(kernel), str(image), str(self.share), str(self.folder / "disk")]
         self._claim()
-        self._fill(packages or packages_of(PROJECT))
+        self._fill(packages)
 
     def _claim(self):
         """Locks the guest's folder, because another run of this checkout may use the same name."""

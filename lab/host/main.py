@@ -7,10 +7,12 @@ import sys
 import time
 
 from host import cache, guest, report, stories
-from host.cache import PROJECT
+from host.cache import PROJECT, RELEASES
 from host.log import LabError, say, show
 from host.process import build, output_of
+from host.release import Release
 
+DEFAULT_RELEASE = RELEASES[0]
 _DAY = "86400"
 _EPILOG = """Installs the packages that are missing, and builds what is missing of the kernel, the guest's disk and
 the product. Results and journals are then in build/lab/GUEST/. Kernels and disks are kept in $VORN_LAB_CACHE
@@ -22,6 +24,9 @@ def parse(arguments):
     split = arguments.index("--") if "--" in arguments else len(arguments)
     parser = argparse.ArgumentParser(prog="lab/run", description=__doc__, epilog=_EPILOG)
     parser.add_argument("stories", nargs="*", metavar="STORY", help="names of files in lab/stories; default: all")
+    parser.add_argument("--on", metavar="RELEASE", choices=RELEASES, default=DEFAULT_RELEASE,
+                        help="the guest's release of Debian: %(choices)s; default: %(default)s. One that is not this "
+                        "machine's needs root")
     parser.add_argument("--vm", action="store_true", help="stock kernel in QEMU: slower, but nothing is compiled")
     parser.add_argument("--shell", action="store_true", help="a signed-in console on a running box")
     parser.add_argument("--open", action="store_true", help="the box's web API at 127.0.0.1, port $PORT (8080)")
@@ -49,14 +54,15 @@ def select(options):
     return chosen
 
 
-def prepare(machine):
+def prepare(machine, release=DEFAULT_RELEASE):
     """Builds what is missing. Returns a function that creates a guest with a given name."""
+    made_for = Release(release)
     build([str(PROJECT / "scripts/setup"), "lab", f"lab_{machine}"], guest.WORK / "setup.log")
     say("packing the product")
-    build([str(PROJECT / "packaging/build")], guest.WORK / "package.log")
+    built = made_for.packages()
     kept = cache.Cache(guest.WORK)
-    kernel, disk = cache.kernel(kept, machine), cache.disk(kept)
-    return lambda name, **options: guest.Guest(name, machine, kernel, disk, **options)
+    kernel, disk = cache.kernel(kept, machine, made_for), cache.disk(kept, made_for)
+    return lambda name, packages=None: guest.Guest(name, machine, kernel, disk, packages or built)
 
 
 def run_stories(chosen, options, make_guest):
@@ -96,7 +102,7 @@ def main():
         guest.end_on_signals()
         chosen = select(options)  # a misspelt name is reported before anything is built
         guest.WORK.mkdir(parents=True, exist_ok=True)
-        make_guest = prepare(options.machine)
+        make_guest = prepare(options.machine, options.on)
         if options.open and not options.vm:
             build([str(PROJECT / "scripts/setup"), "lab_open"], guest.WORK / "setup.log")
         if options.shell or options.open:

@@ -8,10 +8,10 @@ from harness.programs import run
 _WARNING = 4  # syslog(3)
 
 # The log lines that count as complaints, by program. Our own programs and the daemons use priorities; exportfs(8) and
-# nfsdctl write to standard error, which the journal has at priority 6.
+# rpc.nfsd(8) write to standard error, which the journal has at priority 6. The unit of Debian 13 runs the latter with sh(1).
 _WARNINGS_OF = {"vornd", "S83nfsd", "S83nfsd.sh", "rpc.mountd", "rpc.statd", "rpc.idmapd", "rpc.svcgssd", "sm-notify",
                 "nfsdcld", "rpcbind"}
-_EVERY_LINE_OF = {"exportfs", "rpc.nfsd", "nft"}
+_EVERY_LINE_OF = {"exportfs", "rpc.nfsd", "nft", "sh"}
 _KERNEL_TROUBLE = re.compile(r"BUG:|Oops|WARNING:|RPC fragment too large|hung task|lockd: |nfsd: |"
                              r"NFSD: .*(fail|unable)|svc: failed")
 _UNIT_TROUBLE = re.compile(r"^(nfs-|rpc|vorn|auth-rpcgss)\S*\.(service|socket|mount): "
@@ -23,7 +23,8 @@ _NORMAL = re.compile(r"refused (un)?mount request|"  # a client that no rule adm
                      r"Failed to read /var/lib/nfs/state: Success|"  # the first start of all
                      r"Setting nobody's (user|group)|"
                      r"NFSD: (Using|starting|end of|all clients done|no clients)|"
-                     r"nfsd: last server has exited")
+                     r"nfsd: last server has exited|"
+                     r"nfsdctl: lockd configuration failure")  # of nfs-utils 2.8.3; its unit then runs rpc.nfsd
 
 
 class Journal:

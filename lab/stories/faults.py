@@ -44,6 +44,29 @@ def test_a_service_that_does_not_start_is_an_error_that_the_log_explains(box, cl
 
 
 @pytest.fixture
+def no_number_of_threads(box):
+    """A fault in the settings of the kernel's server, with which its unit becomes active without a thread."""
+    box.nfs(enable_nfs=False)
+    settings = pathlib.Path("/etc/nfs.conf.d/zz-fault.conf")
+    settings.write_text("[nfsd]\nthreads = many\n", encoding="ascii")
+    yield settings.unlink
+    settings.unlink(missing_ok=True)
+
+
+def test_a_start_without_threads_is_an_error(box, client, no_number_of_threads):
+    box.foresees(r"failed to (re)?start service nfs|no threads|^vornd: \S+ Request: ")
+    box.share("data")
+    box.allow("data", {"client": client.address})
+    with pytest.raises(api.Refused) as refusal:
+        box.nfs(enable_nfs=True)
+    assert refusal.value.code == 2302
+    assert box.threads() == 0
+    no_number_of_threads()
+    box.nfs(enable_nfs=True)
+    assert client.mounts("/srv/data")
+
+
+@pytest.fixture
 def full_etc(box):
     """/etc is on a file system of its own without room for another file, until the returned function is called."""
     box.share("data")

@@ -194,9 +194,11 @@ class SystemdEngine : public Engine {
 
   // The unit is enabled last: a service that does not start must not count as enabled, because switching it on
   // would then do nothing.
+  //
+  // StartUnit does nothing with an active unit, which may have no threads.
   Status Start() override {
     return With([this](Manager& manager) {
-      const Status started = BringUp(manager, "StartUnit");
+      const Status started = BringUp(manager, HasThreads() ? "StartUnit" : "RestartUnit");
       return started.ok() ? manager.Enable(kUnit) : started;
     });
   }
@@ -268,7 +270,10 @@ class SystemdEngine : public Engine {
     }
     if (Status status = RestartStatusDaemon(manager); !status.ok()) return WithPorts(status);
     if (Status status = manager.RunJob(method, kUnit); !status.ok()) return WithPorts(status);
-    if (!HasThreads()) return WithPorts(Failed(kUnit, "it started, but the kernel's server has no threads"));
+    if (!HasThreads()) {
+      static_cast<void>(manager.RunJob("StopUnit", kUnit));  // a unit that is active would claim to serve
+      return WithPorts(Failed(kUnit, "it started, but the kernel's server has no threads"));
+    }
     // exportfs(8), which the unit runs, ignores what follows a faulty line, and hosts that it cannot resolve.
     return ApplyExports(box_, options_.exports);
   }

@@ -159,6 +159,14 @@ TEST_F(SystemdEngine, FailsWhenTheUnitStartsButTheKernelServerIsOff) {
   const Status status = Engine()->Start();
   EXPECT_EQ(status.code(), vorn::kServiceFailed);
   EXPECT_THAT(status.reason(), HasSubstr("no threads"));
+  EXPECT_THAT(manager_.TakeCalls(), testing::Not(testing::Contains("EnableUnitFiles nfs-server.service")));
+}
+
+TEST_F(SystemdEngine, RestartsAUnitThatMayBeActiveWithoutThreadsAndLeavesNoneActive) {
+  SetThreads("0\n");
+  EXPECT_FALSE(Engine()->Start().ok());
+  EXPECT_THAT(manager_.TakeCalls(), ElementsAreArray(Joined(kBringUp, {"RestartUnit nfs-server.service replace",
+                                                                       "StopUnit nfs-server.service replace"})));
 }
 
 TEST_F(SystemdEngine, FailsWithTheNameOfTheJobAndItsOutcome) {

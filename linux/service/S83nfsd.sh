@@ -1,6 +1,7 @@
 #!/bin/sh
 # S83nfsd.sh reloadidmap: makes the running NFS service use the ID mappings and the keytab that are stored now.
 # S83nfsd.sh idmapstart UNIT: prepares the settings that the daemon UNIT reads when it starts; the unit calls it.
+# S83nfsd.sh machinekeytab: has rpc.mountd show Kerberos clients the folders above an export; the unit of svcgssd calls it.
 # S83nfsd.sh transfersizes: gives the kernel the largest transfer that is configured.
 # S83nfsd.sh groups: delays the start until pending group upcalls of the kernel have expired.
 # S83nfsd.sh lockports: has the lock manager forget fixed ports that are no longer configured.
@@ -76,6 +77,19 @@ reload_idmap() {
 # The unit mounts the copy over /etc/idmapd.conf for its daemon. A failure leaves the copy of the start before.
 start_idmap() {
 	run idmap-compile && run cp "$idmap/settings" "$idmap/$1.new" && run mv -f "$idmap/$1.new" "$idmap/$1.settings"
+}
+
+# rpc.mountd(8) of nfs-utils 2.6.3 and later shows the folders above an export to clients with Kerberos only if the machine
+# has a keytab, although the one of the service is another file. A keytab without keys is enough. The kernel then asks
+# mountd again.
+provide_machine_keytab() {
+	machine=/etc/krb5.keytab
+	if [ -e "$root$machine" ] || ! grep -qs "$machine" "$(command -v rpc.mountd)"; then return 0; fi
+	if [ -n "$root" ]; then
+		say "would write a keytab without keys to $machine"
+		return 0
+	fi
+	(umask 077 && printf '\005\002' >"$machine") && tell /proc/net/rpc/nfsd.export/flush 1
 }
 
 # The kernel has one limit for both directions, which it takes only while its server has no threads.
@@ -159,6 +173,9 @@ reloadidmap)
 idmapstart)
 	start_idmap "${2:?UNIT}"
 	;;
+machinekeytab)
+	provide_machine_keytab
+	;;
 transfersizes)
 	transfer_sizes
 	;;
@@ -175,7 +192,7 @@ forgetrights)
 	forget_rights
 	;;
 *)
-	echo "usage: $0 reloadidmap | idmapstart UNIT | transfersizes | groups | lockports | firewall |" \
+	echo "usage: $0 reloadidmap | idmapstart UNIT | machinekeytab | transfersizes | groups | lockports | firewall |" \
 		"forgetrights" >&2
 	exit 2
 	;;

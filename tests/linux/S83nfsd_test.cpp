@@ -12,8 +12,11 @@ namespace {
 [[maybe_unused]] const bool kRequired = RequirePrivateNamespaces();
 
 using testing::HasSubstr;
+using std::string_literals::operator""s;
 
 constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
+constexpr char kExportsFlush[] = "/net/rpc/nfsd.export/flush";
+constexpr char kKeytabWithoutKeys[] = "\005\002";
 constexpr char kLimit[] = "/fs/nfsd/max_block_size";
 constexpr char kLockPort[] = "/sys/fs/nfs/nlm_tcpport";
 constexpr char kLockUDPPort[] = "/sys/fs/nfs/nlm_udpport";
@@ -39,6 +42,7 @@ class Box {
     folder_.Write("/etc/nfs.conf", "");
     folder_.Write("/lib/vorn/idmap/settings", "stored\n");
     folder_.Write("/proc" + std::string(kFlush), "");
+    folder_.Write("/proc" + std::string(kExportsFlush), "");
     folder_.Write("/proc" + std::string(kLimit), "");
     for (const char* port : {kLockPort, kLockUDPPort}) folder_.Write("/proc" + std::string(port), "32803\n");
   }
@@ -58,6 +62,11 @@ class Box {
     RunProgram({"touch", "-r", folder_.At("/lib/vorn/idmap/rpc-svcgssd.settings"), "-d", age,
                 folder_.At("/etc/nfs/krb5.keytab")});
   }
+  void HasAMountDaemon(const std::string& content) const {
+    folder_.Write("/bin/rpc.mountd", content);
+    chmod(folder_.At("/bin/rpc.mountd").c_str(), 0755);
+  }
+  void HasAMachineKeytab(const std::string& content) const { folder_.Write("/etc/krb5.keytab", content); }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
   void HasOpenedPorts() const { folder_.Write("/lib/vorn/firewall.nft", ""); }
   void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
@@ -83,6 +92,7 @@ class Box {
     return RunProgram(command);
   }
 
+  std::optional<std::string> MachineKeytab() const { return folder_.Read("/etc/krb5.keytab"); }
   std::string Calls() const { return folder_.Read("/calls").value_or(""); }
   std::string SettingsOf(const std::string& unit) const {
     return folder_.Read("/lib/vorn/idmap/" + unit + ".settings").value_or("");
@@ -92,6 +102,32 @@ class Box {
  private:
   TemporaryRoot folder_;
 };
+
+TEST(MachineKeytab, IsWrittenWithoutKeysForADaemonThatLooksForIt) {
+  const Box box;
+  box.HasAMountDaemon("\0krb5\0/etc/krb5.keytab\0"s);
+  const ProgramResult result = box.Run("machinekeytab");
+  EXPECT_EQ(result.status, 0) << result.errors;
+  EXPECT_EQ(box.MachineKeytab(), kKeytabWithoutKeys);
+  EXPECT_EQ(box.Kernel(kExportsFlush), "1\n");
+}
+
+TEST(MachineKeytab, IsNotWrittenForOtherDaemons) {
+  const Box box;
+  box.HasAMountDaemon("\0krb5\0"s);
+  EXPECT_EQ(box.Run("machinekeytab").status, 0);
+  EXPECT_EQ(box.MachineKeytab(), std::nullopt);
+  EXPECT_EQ(box.Kernel(kExportsFlush), "");
+}
+
+TEST(MachineKeytab, StaysAsItIs) {
+  const Box box;
+  box.HasAMountDaemon("/etc/krb5.keytab");
+  box.HasAMachineKeytab("keys of the machine");
+  EXPECT_EQ(box.Run("machinekeytab").status, 0);
+  EXPECT_EQ(box.MachineKeytab(), "keys of the machine");
+  EXPECT_EQ(box.Kernel(kExportsFlush), "");
+}
 
 TEST(ReloadIDMap, RestartsBothDaemonsAndThenHasTheKernelForgetItsAnswers) {
   const Box box;

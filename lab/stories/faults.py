@@ -54,7 +54,7 @@ def no_number_of_threads(box):
 
 
 def test_a_start_without_threads_is_an_error(box, client, no_number_of_threads):
-    box.foresees(r"failed to (re)?start service nfs|no threads|^vornd: \S+ Request: ")
+    box.foresees(r"failed to (re)?start service nfs|no threads|^vornd: \S+ Request: |^nfsdcld: cld_pipe_read_msg: ")
     box.share("data")
     box.allow("data", {"client": client.address})
     with pytest.raises(api.Refused) as refusal:

@@ -17,7 +17,7 @@ PACKAGES = sorted(map(str, pathlib.Path("/lab/packages").glob("*.deb")))
 NAMES = ("vorn-cli", "vorn-nfs", "vorn-server", "vorn-platform-linux")
 WRITTEN_BY_THE_PACKAGE = [pathlib.Path(path) for path in (
     "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/nfs/krb5.keytab",
-    "/var/lib/vorn")]
+    "/etc/krb5.keytab", "/var/lib/vorn")]
 PAM, SETTINGS = pathlib.Path("/etc/pam.d/vornd"), pathlib.Path("/etc/vorn/vornd.conf")
 SOCKET_ONLY = "# The configuration of a box that is managed at its socket\n[server]\n#listen =\n"
 TLS_PORT = 8443

@@ -140,6 +140,8 @@ BREAKS = [
     Break("kinds-in-reverse", "an explanation is what the kernel does", "explain",
           source=("exports[a].kind < exports[b].kind", "s/exports\\[a\\].kind < exports\\[b\\].kind/"
                   "exports[a].kind > exports[b].kind/")),
+    Break("half-of-an-address", "an explanation is what the kernel does", "explain",
+          source=("int bit = *length; bit", "s/int bit = [*]length;/int bit = std::min(*length, 64);/")),
     Break("pending-rules-unseen", "a check finds what is not in force", "health",
           source=("return std::move(update->changed);", "s/return std::move(update->changed);/"
                   "return std::set<std::string>();/"), select="not_in_force"),

@@ -1,7 +1,9 @@
 """The explanation of an access, and the clients of a folder with their rights, are what the kernel's server does."""
 
 import collections
+import dataclasses
 import errno
+import ipaddress
 import os
 import pathlib
 import random
@@ -9,17 +11,62 @@ import random
 import pytest
 
 from harness import api, users
-from harness.network import MountFailed
+from harness.network import BOX_ADDRESS, BOX_ADDRESS6, Client, MountFailed
 from harness.programs import ProgramFailed, as_user, run
 
 CLIENTS = ["client.lab.test", "other.lab.test", "10.9.0.11", "10.9.0.12", "10.9.7.13", "10.9.0.0/24", "10.9.0.8/30",
-           "10.9.0.0/255.255.0.0", "*.lab.test", "?lient.lab.test", "*.elsewhere.test", "10.9.0.1*", "@trusted", "@all",
-           "*"]
+           "10.9.0.0/255.255.0.0", "fd00:9::b", "fd00:9:0::70d", "FD00:9::/64", "fd00:9::8/125", "fd00:9::/ffff:ffff::",
+           "::ffff:10.9.0.11", "::ffff:10.9.0.0/112", "*.lab.test", "?lient.lab.test", "*.elsewhere.test", "10.9.0.1*",
+           "fd00:9::?", "@trusted", "@all", "*"]
 NETGROUPS = "trusted (other.lab.test,,) (third,,)\nall (client.lab.test,,) (10.9.0.12,,) (third.elsewhere.test,,)\n"
 USERS = [users.ROOT, users.ALICE, users.BOB, users.NOBODY]
 SHARES = {"first": "/srv/first", "inner": "/srv/first/inner", "second": "/srv/second", "deep": "/srv/way/to/deep"}
 RIGHTS = ("mountable", "read", "write")
 CASES_OF_A_SET = 6
+
+
+@dataclasses.dataclass(frozen=True)
+class Access:
+    """Who asks the box for what, and how."""
+
+    share: str
+    machine: Client
+    is_ipv6: bool
+    version: str
+    port: int | None
+    user: users.User
+
+    @property
+    def address(self):
+        return self.machine.address6 if self.is_ipv6 else self.machine.address
+
+    @property
+    def question(self):
+        """The parameters of a question about this access, except for the share and the client."""
+        return {"version": self.version, "port": self.port, "user": str(self.user.uid), "groups": [str(self.user.gid)]}
+
+    def __str__(self):
+        return f"{self.share} {self.address} {self.user.name} version {self.version} port {self.port}"
+
+
+def network(choose, address):
+    """A network of any size, with the address in it or missed by one bit."""
+    host = ipaddress.ip_address(address)
+    length = choose.randint(0, host.max_prefixlen)
+    number = int(host)
+    bit = choose.choice([None, length, length + 1, choose.randint(1, host.max_prefixlen)])
+    if bit and bit <= host.max_prefixlen:
+        number ^= 1 << (host.max_prefixlen - bit)
+    return f"{type(host)(number)}/{length}"
+
+
+def clients_of_a_folder(choose, machines):
+    """Up to six clients in a random order: of the list, and networks around the machines' addresses."""
+    near = [network(choose, choose.choice([machine.address, machine.address6, machine.address6]))
+            for machine in choose.sample(machines, choose.randint(0, 2))]
+    clients = list(dict.fromkeys(near + choose.sample(CLIENTS, choose.randint(1, 4))))
+    choose.shuffle(clients)
+    return clients
 
 
 def options(choose):
@@ -30,7 +77,13 @@ def options(choose):
     return ",".join(words)
 
 
-def set_up(choose):
+def write_names(choose, machines, names):
+    """Enters the machines with their IPv6 addresses, besides what /etc/hosts has, or without."""
+    lines = [f"{machine.address6} {machine.name}\n" for machine in machines if choose.random() < 0.7]
+    pathlib.Path("/etc/hosts").write_text(names + "".join(lines), encoding="ascii")
+
+
+def set_up(choose, machines):
     """Folders with owners and permissions, and rules for some of them."""
     lines = []
     for folder in ("/srv/way", "/srv/way/to"):
@@ -39,7 +92,7 @@ def set_up(choose):
         os.chmod(path, choose.choice([0o777, 0o777, 0o755, 0o750, 0o700]))
         os.chown(path, choose.choice([0, 2001, 65534]), choose.choice([0, 2002, 2003]))
         for _ in range(choose.choice([0, 1, 1, 2])):
-            clients = choose.sample(CLIENTS, choose.randint(1, 4))
+            clients = clients_of_a_folder(choose, machines)
             lines.append(" ".join([path] + [f"{client}({options(choose)})" for client in clients]))
     choose.shuffle(lines)
     pathlib.Path("/etc/exports").write_text("\n".join(lines) + "\n", encoding="ascii")
@@ -64,16 +117,18 @@ def attempt(user, action):
     return True
 
 
-def observe(machine, path, version, port, user):
+def observe(access):
     """What the kernel's server lets the user do."""
+    path, machine = SHARES[access.share], access.machine
     try:
-        target = machine.mount(path, version=version, options="sec=sys,noresvport" if port else "sec=sys")
+        target = machine.mount(path, version=access.version, options="sec=sys,noresvport" if access.port else "sec=sys",
+                               server=BOX_ADDRESS6 if access.is_ipv6 else BOX_ADDRESS)
     except MountFailed:
         return {"mountable": False, "read": False, "write": False}
     try:
         probe = pathlib.Path(path) / "probe"
-        seen = {"mountable": True, "read": attempt(user, lambda: os.listdir(target)),
-                "write": attempt(user, (target / "probe").touch)}
+        seen = {"mountable": True, "read": attempt(access.user, lambda: os.listdir(target)),
+                "write": attempt(access.user, (target / "probe").touch)}
         if seen["write"]:
             status = os.stat(probe)
             seen["identity"] = status.st_uid, status.st_gid
@@ -83,10 +138,9 @@ def observe(machine, path, version, port, user):
         machine.unmount(target)
 
 
-def explained(share, machine, version, port, user):
+def explained(access):
     """The same as observe() from the explanation, and the explanation."""
-    answer = api.call("NFS.Access", "explain", share=share, client=machine.address, version=version, port=port,
-                      user=str(user.uid), groups=[str(user.gid)])
+    answer = api.call("NFS.Access", "explain", share=access.share, client=access.address, **access.question)
     assert all(check["check"] != "reload" for check in answer["checks"]), "the rules are in force"
     told = {right: answer[right] for right in RIGHTS}
     if answer["write"]:
@@ -94,50 +148,63 @@ def explained(share, machine, version, port, user):
     return told, answer
 
 
-def listed(share, machine, version, port, user):
-    """The rights of the machine in each row of the folder's clients that was explained for its address."""
-    clients = api.call("NFS.Access", "matrix", share=share, version=version, port=port, user=str(user.uid),
-                       groups=[str(user.gid)])["clients"]
-    found = [row["flavors"] for row in clients if row["address"] == machine.address]
+def listed(access):
+    """The rights of the client in each row of the folder's clients that was explained for its address."""
+    clients = api.call("NFS.Access", "matrix", share=access.share, **access.question)["clients"]
+    found = [row["flavors"] for row in clients if row["address"] == access.address]
     assert all(len(flavors) == 1 and flavors[0]["flavor"] == "sys" for flavors in found), "a user belongs to one flavour"
     return [{right: flavors[0][right] for right in RIGHTS} for flavors in found]
 
 
-def compare(choose, machines):
+def choose_access(choose, machines):
+    return Access(choose.choice(list(SHARES)), choose.choice(machines), choose.random() < 0.6,
+                  choose.choice(["3", "4.0", "4.2"]), choose.choice([None, None, 40000]), choose.choice(USERS))
+
+
+def compare(access):
     """One case: what was seen, how many rows of the matrix told it, and a text if something else was told."""
-    share, machine, user = choose.choice(list(SHARES)), choose.choice(machines), choose.choice(USERS)
-    version, port = choose.choice(["3", "4.0", "4.2"]), choose.choice([None, None, 40000])
-    told, answer = explained(share, machine, version, port, user)
-    rows = listed(share, machine, version, port, user)
-    seen = observe(machine, SHARES[share], version, port, user)
+    told, answer = explained(access)
+    rows = listed(access)
+    seen = observe(access)
     if told["mountable"] and answer["rule"] is None:
         seen["read"] = False  # the way to other exports: the list of their names, and nothing of the share
-    case = f"{share} {machine.name} {user.name} version {version} port {port}: told {told}, {rows}, seen {seen}"
     is_same = told == seen and all(row == {right: seen[right] for right in RIGHTS} for row in rows)
-    return seen, len(rows), None if is_same else f"{case}\n{answer}"
+    return seen, len(rows), None if is_same else f"{access}: told {told}, {rows}, seen {seen}\n{answer}"
+
+
+@pytest.fixture
+def names():
+    """The box's host names, which the story may add to."""
+    hosts = pathlib.Path("/etc/hosts")
+    before = hosts.read_text(encoding="ascii")
+    yield before
+    hosts.write_text(before, encoding="ascii")
 
 
 @pytest.mark.timeout(7200)
 @pytest.mark.parametrize("cases", [60, pytest.param(2000, marks=pytest.mark.long)])
-def test_an_explanation_is_what_the_kernel_does(box, client, other, third, cases, pytestconfig, record_property):
+def test_an_explanation_is_what_the_kernel_does(box, client, other, third, names, cases, pytestconfig, record_property):
     box.foresees("rpc.mountd|exportfs|Request: |explain")
     seed, cases = pytestconfig.getoption("--seed"), pytestconfig.getoption("--cases") or cases
-    choose = random.Random(seed)
+    choose, machines = random.Random(seed), [client, other, third]
     pathlib.Path("/etc/netgroup").write_text(NETGROUPS, encoding="ascii")
     for name, path in SHARES.items():
         pathlib.Path(path).mkdir(parents=True, exist_ok=True)
         box.share_at(name, pathlib.Path(path))
     differences, counts = [], collections.Counter()
     for _ in range(0, cases, CASES_OF_A_SET):
-        lines = set_up(choose)
+        write_names(choose, machines, names)
+        lines = set_up(choose, machines)
         table = pathlib.Path("/var/lib/nfs/etab").read_text(encoding="ascii")
-        compared = [compare(choose, [client, other, third]) for _ in range(CASES_OF_A_SET)]
+        accesses = [choose_access(choose, machines) for _ in range(CASES_OF_A_SET)]
+        compared = [compare(access) for access in accesses]
         counts.update(right for seen, _, _ in compared for right in RIGHTS if seen[right])
         counts["rows"] += sum(rows for _, rows, _ in compared)
+        counts["IPv6"] += sum(access.is_ipv6 and seen["mountable"] for access, (seen, _, _) in zip(accesses, compared))
         found = [text for _, _, text in compared if text]
         if found:
-            differences += found + lines + [table]
+            differences += found + lines + [table, pathlib.Path("/etc/hosts").read_text(encoding="ascii")]
     record_property(f"{cases} cases of seed {seed}", dict(counts))
     print(f"{cases} cases of seed {seed}: {dict(counts)}")
     assert not differences, f"seed {seed}:\n" + "\n".join(differences)
-    assert all(cases // 60 <= counts[what] for what in (*RIGHTS, "rows")), "the cases show nearly nothing"
+    assert all(cases // 60 <= counts[what] for what in (*RIGHTS, "rows", "IPv6")), "the cases show nearly nothing"

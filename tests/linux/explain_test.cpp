@@ -1,10 +1,12 @@
 #include "explain.h"
 
+#include <arpa/inet.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 #include <map>
 #include <set>
@@ -150,6 +152,47 @@ TEST_F(Explain, FindsAClientByEachFormThatRulesHave) {
     Export({{client, "rw"}});
     EXPECT_EQ(Ask("10.0.0.5").mountable, is_admitted) << client;
     EXPECT_EQ(Ask("::ffff:10.0.0.5").mountable, is_admitted) << client;
+  }
+}
+
+TEST_F(Explain, FindsAClientByEachFormOfIPv6) {
+  names_.hosts = {{"c.example", "fd00:9::b"}, {"c.example", "10.0.0.5"}};
+  const std::pair<const char*, bool> cases[] = {{"fd00:9::b", true},
+                                                {"FD00:9:0::B", true},
+                                                {"fd00:9::c", false},
+                                                {"fd00:9::8/125", true},
+                                                {"fd00:9::c/126", false},
+                                                {"fd00:9::/ffff:ffff::", true},
+                                                {"::/0", true},
+                                                {"0.0.0.0/0", true},  // by the host's other address
+                                                {"10.0.0.5", true},
+                                                {"10.0.0.6", false},
+                                                {"c.example", true},
+                                                {"*.example", true},
+                                                {"fd00:9::*", false},  // the client has a name
+                                                {"*", true}};
+  for (const auto& [client, is_admitted] : cases) {
+    Export({{client, "rw"}, {"@none", "ro"}});  // the box asks for names because of the netgroup
+    EXPECT_EQ(Ask("fd00:9::b").mountable, is_admitted) << client;
+  }
+}
+
+// Returns the address fd00:9::b with one bit (from 1) changed.
+std::string WithOtherBit(std::size_t bit) {
+  std::array<unsigned char, 16> bytes{0xfd, 0, 0, 9, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0xb};
+  bytes.at((bit - 1) / 8) = static_cast<unsigned char>(bytes.at((bit - 1) / 8) ^ (0x80U >> ((bit - 1) % 8)));
+  std::array<char, INET6_ADDRSTRLEN> text{};
+  return inet_ntop(AF_INET6, bytes.data(), text.data(), text.size());
+}
+
+TEST_F(Explain, ComparesEveryBitOfAnIPv6NetworkAndNoneAfterIt) {
+  for (std::size_t length = 0; length <= 128; ++length) {
+    for (const std::size_t bit : {length, length + 1}) {
+      if (bit == 0 || bit > 128) continue;
+      const std::string network = WithOtherBit(bit) + "/" + std::to_string(length);
+      Export({{network, "rw"}});
+      EXPECT_EQ(Ask("fd00:9::b").mountable, bit > length) << network;
+    }
   }
 }
 

@@ -46,6 +46,31 @@ def test_an_imported_keytab_opens_kerberos_mounts_at_once(box, kerberos_client, 
     assert {entry["kerberos_principal"] for entry in entries} == {settings["kerberos_principal"]}
 
 
+def keys_that_the_kdc_has_replaced():
+    """The findings of a check. The KDC is asked in the background."""
+    found = {}
+
+    def is_answered():
+        found.update(api.call("NFS.Health", "check", kind="outdated_key"))
+        return not found["not_checked"]
+
+    wait_for(is_answered, "the KDC has not answered")
+    return found["findings"]
+
+
+def test_a_keytab_whose_key_the_kdc_has_replaced_is_found(box, kerberos_client, keytab):
+    box.foresees("rpc.svcgssd")
+    box.share("data")
+    box.allow("data", rule(kerberos_client, "krb5"))
+    present = kerberos.keytab(f"nfs/{kerberos.SERVER}")
+    import_keytab(keytab)
+    assert [finding["severity"] for finding in keys_that_the_kdc_has_replaced()] == ["error"]
+    assert not mounts(kerberos_client, "krb5")
+    import_keytab(present)
+    assert keys_that_the_kdc_has_replaced() == []
+    assert mounts(kerberos_client, "krb5")
+
+
 def test_a_rule_opens_the_flavours_that_it_names_and_no_others(box, kerberos_client, keytab):
     box.share("data")
     import_keytab(keytab)

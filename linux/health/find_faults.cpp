@@ -58,7 +58,9 @@ constexpr Check kChecks[] = {
     {"missing_keytab", FindMissingKeytab, true, false},
     {"missing_host_key", FindMissingHostKey},
     {"weak_key", FindWeakKeys},
+    {"outdated_key", FindOutdatedKeys, false, false, true},
     {"unsynchronised_clock", FindUnsynchronisedClock},
+    {"clock_skew", FindClockSkew, false, false, true},
     {"foreign_domain", FindForeignDomains, true, false, true},
     {"expiring_certificate", FindExpiringCertificate},
 };

@@ -6,7 +6,9 @@
 #include <algorithm>
 #include <cerrno>
 #include <climits>
+#include <cstdlib>
 #include <memory>
+#include <optional>
 #include <set>
 #include <string>
 #include <string_view>
@@ -17,6 +19,7 @@
 #include "host_domain.h"
 #include "host_names.h"
 #include "idmap.h"
+#include "kdc_question.h"
 #include "kernel_clients.h"
 #include "keytab.h"
 
@@ -24,6 +27,7 @@ namespace vorn {
 namespace {
 
 constexpr char kHostName[] = "/etc/hostname";
+constexpr long kMostSkew = 300;  // seconds; the default of "clockskew" in krb5.conf(5)
 constexpr char kSynchronised[] = "/run/systemd/timesync/synchronized";  // systemd-timesyncd.service(8)
 constexpr char kHosts[] = "/etc/hosts";
 
@@ -94,6 +98,33 @@ bool IsWeak(const std::string& type) {
   return begins("des-") || begins("des3-") || begins("arcfour-");
 }
 
+// Returns what the KDC says about the keytab. The list is empty if there is nothing to ask about.
+Result<std::vector<KdcAnswer>> AnswersOfKdc(Box& box) {
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(box, kKeytabFile);
+  if (!keys.ok()) return keys.status();
+  if (keys->empty()) return std::vector<KdcAnswer>();
+  std::optional<KdcQuestion::Answers> answers = AskedKdc(box);
+  if (answers) return std::move(*answers);
+  return Status::Failure(kUnsupported, "The KDC is being asked; a later check has its answer.");
+}
+
+void JudgeKey(const KdcAnswer& answer, Findings* findings) {
+  std::string text;
+  if (answer.state == KdcAnswer::State::kOutdated) {
+    text = "The KDC has another key of " + answer.principal + " than the keytab";
+    if (!answer.detail.empty()) text += " (" + answer.detail + ")";
+    text += ": clients cannot mount with Kerberos, or only until their tickets expire.";
+    findings->Error(OfKeytab(), std::move(text),
+                    "Export the present keys of " + answer.principal +
+                        " from the KDC, and upload the new keytab (VORN.Core.FileServ.NFS.Kerberos, upload_key).");
+  } else if (answer.state == KdcAnswer::State::kUnknown) {
+    text =
+        "The KDC does not know " + answer.principal + ", of which the keytab has a key: clients get no ticket for it.";
+    findings->Warning(OfKeytab(), std::move(text),
+                      "Make the principal at the KDC and upload a new keytab, or remove its keys from the keytab.");
+  }
+}
+
 }  // namespace
 
 Status FindMissingKeytab(const HealthInput& input, Findings* findings) {
@@ -142,6 +173,36 @@ Status FindWeakKeys(const HealthInput& input, Findings* findings) {
     findings->Warning(OfKeytab(), std::move(text),
                       "Make keys of an AES type for the principal, and upload the new keytab.");
   }
+  return {};
+}
+
+Status FindOutdatedKeys(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KdcAnswer>> answers = AnswersOfKdc(input.box);
+  if (!answers.ok()) return answers.status();
+  Status status;
+  for (const KdcAnswer& answer : *answers) {
+    JudgeKey(answer, findings);
+    if (answer.state != KdcAnswer::State::kNone) continue;
+    status = Status::Failure(kUnsupported, "The KDC was not asked about " + answer.principal + ": " + answer.detail);
+  }
+  return status;
+}
+
+Status FindClockSkew(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KdcAnswer>> answers = AnswersOfKdc(input.box);
+  if (!answers.ok()) return answers.status();
+  const auto knows = [](const KdcAnswer& answer) { return answer.clock_lead.has_value(); };
+  const auto answer = std::find_if(answers->begin(), answers->end(), knows);
+  if (answer == answers->end()) {
+    return answers->empty() ? Status() : Status::Failure(kUnsupported, "The KDC has not told its time.");
+  }
+  const long lead = *answer->clock_lead;
+  if (std::abs(lead) <= kMostSkew) return {};
+  findings->Error({},
+                  "The clock of the box is " + std::to_string(std::abs(lead)) + " seconds " +
+                      (lead > 0 ? "behind" : "ahead of") +
+                      " that of the KDC: clients with the KDC's time cannot mount with Kerberos.",
+                  "Set the clock, and run a time service on the box, for example systemd-timesyncd or chrony.");
   return {};
 }
 

@@ -17,6 +17,12 @@ Status FindMissingHostKey(const HealthInput& input, Findings* findings);
 // Keys of encryption types that RFC 6649 and RFC 8429 deprecate.
 Status FindWeakKeys(const HealthInput& input, Findings* findings);
 
+// Keys of the NFS service that are not those of the KDC. Asks the KDC (kdc_question.h).
+Status FindOutdatedKeys(const HealthInput& input, Findings* findings);
+
+// A clock that differs from that of the KDC by more than Kerberos accepts; at most one finding. Asks the KDC.
+Status FindClockSkew(const HealthInput& input, Findings* findings);
+
 // Clients whose own domain differs from the box's NFSv4 domain, on a box that uses Kerberos; at most one finding for a
 // domain. The domain of a client is known if its name contains it (Linux: the host name).
 Status FindForeignDomains(const HealthInput& input, Findings* findings);

@@ -1,28 +1,26 @@
 #include "keytab_file.h"
 
-#include <krb5/krb5.h>
 #include <profile.h>
 
 #include <cerrno>
 #include <utility>
 
 #include "keytab_frame.h"
+#include "krb5_library.h"
 #include "memory_file.h"
 #include "owned.h"
 
 namespace vorn {
 namespace {
 
-using Context = Owned<std::remove_pointer_t<krb5_context>, krb5_free_context>;
-
 // The context ignores krb5.conf(5), which has no influence on the format of a keytab.
-Result<Context> NewContext() {
+Result<Krb5Context> NewContext() {
   profile_t profile = nullptr;
   if (profile_init_path("/dev/null", &profile) != 0) return Status::Failure(ENOMEM, "libkrb5 has no profile");
   const Owned<std::remove_pointer_t<profile_t>, profile_abandon> owned(profile);
   krb5_context context = nullptr;
   if (krb5_init_context_profile(profile, 0, &context) != 0) return Status::Failure(ENOMEM, "libkrb5 has no context");
-  return Context(context);
+  return Krb5Context(context);
 }
 
 // An open keytab that is being read.
@@ -57,27 +55,6 @@ class Reading {
   bool begun_ = false;
 };
 
-std::string NameOf(krb5_context context, krb5_const_principal principal) {
-  char* text = nullptr;
-  if (krb5_unparse_name(context, principal, &text) != 0) return "";
-  std::string name = text;
-  krb5_free_unparsed_name(context, text);
-  return name;
-}
-
-std::string EncTypeName(krb5_enctype type) {
-  char name[64];
-  if (krb5_enctype_to_name(type, 0, name, sizeof name) == 0) return name;
-  return "etype " + std::to_string(type);
-}
-
-std::string ErrorText(krb5_context context, krb5_error_code error) {
-  const char* text = krb5_get_error_message(context, error);
-  std::string copy = text;
-  krb5_free_error_message(context, text);
-  return copy;
-}
-
 }  // namespace
 
 Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content) {
@@ -85,7 +62,7 @@ Result<std::vector<KeytabKey>> ReadKeytab(std::string_view content) {
   if (!count.ok()) return count.status();
   const Result<FileDescriptor> file = MakeMemoryFile("keytab", content);
   if (!file.ok()) return file.status();
-  const Result<Context> context = NewContext();
+  const Result<Krb5Context> context = NewContext();
   if (!context.ok()) return context.status();
 
   Reading reading(context->get(), "FILE:" + PathOf(*file));

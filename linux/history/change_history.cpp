@@ -117,7 +117,8 @@ History::History(Root root, const Store& store, Environment environment)
     : root_(std::move(root)),
       store_(store),
       environment_(std::move(environment)),
-      journal_(Located(root_, kHistoryJournal)) {}
+      journal_(Located(root_, kHistoryJournal)),
+      missed_(Located(root_, kMissedChanges)) {}
 
 void History::Intend(const std::string& path, std::optional<std::string_view> text) {
   if (!IsRecorded(path) || !IsOn()) return;
@@ -125,7 +126,7 @@ void History::Intend(const std::string& path, std::optional<std::string_view> te
   try {
     const Status status = TryIntend(path, Shown(path, text));
     if (status.ok()) return;
-    missed_.insert(path);
+    missed_.Add(path);
     Warn("The history has no record of a change of " + path, status);
   } catch (const std::bad_alloc&) {
     is_stale_ = true;
@@ -350,9 +351,10 @@ Status History::CommitEdit(const std::string& path) {
   if (!repository_->Has(*tip, path, content)) {
     Open edit{{}, SecondsNow(), {{path, content}}, false};
     edit.message.kind = repository_->Has(*tip, path, Content()) ? kFound : kByHand;
-    if (missed_.erase(path) != 0) edit.message.kind = kUnrecorded;
+    if (missed_.Has(path)) edit.message.kind = kUnrecorded;
     if (Status status = Commit("", std::move(edit)); !status.ok()) return status;
   }
+  missed_.Remove(path);
   // A file that is missing has the same version as before it was created.
   if (file->is_settled && file->version.exists) recorded_[path] = file->version;
   return {};

@@ -8,7 +8,6 @@
 #include <memory>
 #include <mutex>
 #include <optional>
-#include <set>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -17,6 +16,7 @@
 #include "change_recorder.h"
 #include "history_journal.h"
 #include "history_repository.h"
+#include "missed_changes.h"
 #include "root.h"
 #include "store.h"
 
@@ -123,9 +123,9 @@ class History : public ChangeRecorder {
   std::map<std::string, Open> open_;             // by the name of the change
   std::map<std::string, Version> recorded_;      // versions whose content is in the history
   bool is_stale_ = false;                        // whether the state must be read again from the begin of the journal
-  std::set<std::string> missed_;                 // files that were changed while the history could not be written
-  std::string checkpoint_;                       // the newest commit at the begin of the journal
-  std::size_t commits_ = 0;                      // since then
+  MissedChanges missed_;
+  std::string checkpoint_;   // the newest commit at the begin of the journal
+  std::size_t commits_ = 0;  // since then
 };
 
 }  // namespace vorn

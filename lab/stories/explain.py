@@ -78,9 +78,12 @@ def options(choose):
 
 
 def write_names(choose, machines, names):
-    """Enters the machines with their IPv6 addresses, besides what /etc/hosts has, or without."""
-    lines = [f"{machine.address6} {machine.name}\n" for machine in machines if choose.random() < 0.7]
+    """Gives some machines names of their IPv6 addresses, besides the names in /etc/hosts, or none. Returns whether a
+    machine has two addresses now."""
+    named = choose.choice([[], machines[:2], machines])
+    lines = [f"{machine.address6} {machine.name}\n" for machine in named]
     pathlib.Path("/etc/hosts").write_text(names + "".join(lines), encoding="ascii")
+    return bool(named)
 
 
 def set_up(choose, machines):
@@ -138,10 +141,11 @@ def observe(access):
         machine.unmount(target)
 
 
-def explained(access):
+def explained(access, must_be_in_force):
     """The same as observe() from the explanation, and the explanation."""
     answer = api.call("NFS.Access", "explain", share=access.share, client=access.address, **access.question)
-    assert all(check["check"] != "reload" for check in answer["checks"]), "the rules are in force"
+    if must_be_in_force:
+        assert all(check["check"] != "reload" for check in answer["checks"]), "the rules are in force"
     told = {right: answer[right] for right in RIGHTS}
     if answer["write"]:
         told["identity"] = answer["identity"]["uid"], answer["identity"]["gid"]
@@ -161,9 +165,9 @@ def choose_access(choose, machines):
                   choose.choice(["3", "4.0", "4.2"]), choose.choice([None, None, 40000]), choose.choice(USERS))
 
 
-def compare(access):
+def compare(access, must_be_in_force):
     """One case: what was seen, how many rows of the matrix told it, and a text if something else was told."""
-    told, answer = explained(access)
+    told, answer = explained(access, must_be_in_force)
     rows = listed(access)
     seen = observe(access)
     if told["mountable"] and answer["rule"] is None:
@@ -193,11 +197,13 @@ def test_an_explanation_is_what_the_kernel_does(box, client, other, third, names
         box.share_at(name, pathlib.Path(path))
     differences, counts = [], collections.Counter()
     for _ in range(0, cases, CASES_OF_A_SET):
-        write_names(choose, machines, names)
+        # If rules name a host and one of its addresses, exportfs(8) may put only one of the two into its table. Then
+        # the host's other addresses have other rights than the files give them.
+        must_be_in_force = not write_names(choose, machines, names)
         lines = set_up(choose, machines)
         table = pathlib.Path("/var/lib/nfs/etab").read_text(encoding="ascii")
         accesses = [choose_access(choose, machines) for _ in range(CASES_OF_A_SET)]
-        compared = [compare(access) for access in accesses]
+        compared = [compare(access, must_be_in_force) for access in accesses]
         counts.update(right for seen, _, _ in compared for right in RIGHTS if seen[right])
         counts["rows"] += sum(rows for _, rows, _ in compared)
         counts["IPv6"] += sum(access.is_ipv6 and seen["mountable"] for access, (seen, _, _) in zip(accesses, compared))

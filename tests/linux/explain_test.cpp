@@ -492,6 +492,22 @@ TEST_F(Explain, SaysThatTheFilesDifferOnlyIfTheHostsAddressHasOtherRules) {
   EXPECT_THAT(Failed(Ask("10.0.0.5")), ElementsAre("reload"));
 }
 
+// The tables are those that exportfs(8) makes of rules for the name and for an address of a host with two addresses.
+TEST_F(Explain, SaysThatTheFilesDifferOnlyIfAnAddressOfTheHostHasOtherRules) {
+  names_.hosts = {{"c.example", "10.0.0.5"}, {"c.example", "fd00:9::5"}};
+  table_ = {{"c.example", "rw"}, {"fd00:9::5", "ro"}};
+  Serve("/srv/data c.example(rw) fd00:9::5(ro)\n");
+  EXPECT_THAT(Failed(Ask("fd00:9::5")), IsEmpty()) << "the first rule of the address counts";
+  table_ = {{"c.example", "rw"}};
+  Serve("/srv/data 10.0.0.5(rw)\n/srv/data/inner c.example(ro)\n");
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), IsEmpty()) << "the table has the name of the host for its address";
+  Serve("/srv/data 10.0.0.5(ro)\n/srv/data/inner c.example(ro)\n");
+  EXPECT_THAT(Failed(Ask("10.0.0.5")), ElementsAre("reload"));
+  table_ = {{"10.0.0.5", "rw"}};
+  Serve("/srv/data c.example(rw)\n");
+  EXPECT_THAT(Failed(Ask("fd00:9::5")), ElementsAre("rule", "reload")) << "the other address got lost";
+}
+
 TEST_F(Explain, FindsTheLineOfAHostThatTheTableHasByItsAddress) {
   names_.hosts = {{"c.example", "10.0.0.5"}};
   root_.Write("/etc/exports", "\n\n/srv/data c.example(rw)\n");

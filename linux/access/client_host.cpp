@@ -21,16 +21,15 @@ void FindNames(const NameService& service, ClientHost* client) {
   const std::optional<std::vector<std::string>> names = service.names_of(address);
   client->is_away = !names.has_value();
   if (!names || names->empty()) return;
-  std::optional<std::vector<std::string>> addresses = service.resolve(names->front());
+  const std::optional<std::vector<std::string>> addresses = service.resolve(names->front());
   client->is_away = !addresses.has_value();
   if (!addresses || !Contains(*addresses, address)) return;
   client->names = *names;
-  client->compared = std::move(*addresses);
 }
 
 bool IsHost(ClientHost* client, const std::string& host, const NameService& service, HostAddresses* hosts) {
   const std::string key = ExportClientKey(host);
-  if (!IsExportHostName(key)) return Contains(client->compared, key);
+  if (!IsExportHostName(key)) return key == client->addresses.front();
   auto known = hosts->find(key);
   if (known == hosts->end()) {
     if (client->is_away) return false;
@@ -39,16 +38,14 @@ bool IsHost(ClientHost* client, const std::string& host, const NameService& serv
     if (!addresses) return false;
     known = hosts->emplace(key, std::move(*addresses)).first;
   }
-  return std::any_of(client->compared.begin(), client->compared.end(),
-                     [&](const std::string& address) { return Contains(known->second, address); });
+  return Contains(known->second, client->addresses.front());
 }
 
 bool IsInNetwork(const ClientHost& client, const std::string& network) {
   const std::string key = ExportNetworkKey(network);
   const std::size_t slash = key.find('/');
   if (slash == std::string::npos) return false;
-  return std::any_of(client.compared.begin(), client.compared.end(),
-                     [&](const std::string& address) { return ExportNetworkKey(address + key.substr(slash)) == key; });
+  return ExportNetworkKey(client.addresses.front() + key.substr(slash)) == key;
 }
 
 // Without a name, mountd compares the address itself with a pattern.
@@ -89,7 +86,6 @@ ClientHost FindClientHost(const std::string& client, const NameService& service,
                           [](const std::string& text) { return text.find(':') == std::string::npos; });
   }
   if (host.addresses.empty()) return host;
-  host.compared = {host.addresses.front()};
   if (needs_names) FindNames(service, &host);
   return host;
 }

@@ -15,11 +15,9 @@ struct ClientHost {
   std::vector<std::string> addresses;  // of the question; the first one is the client's; empty if it has none
   bool is_away = false;                // whether the name service did not answer
 
-  // The client's names, the canonical one first. They count only if the first one leads back to the address.
+  // The client's names, the canonical one first. They count only if the first one leads back to the address. mountd
+  // compares only the client's own address with those of rules, not the other addresses of its name.
   std::vector<std::string> names;
-
-  // The addresses that mountd compares: the client's, and with names all addresses of the canonical one.
-  std::vector<std::string> compared;
 };
 
 // Whether one of the exports is for a pattern of names or for a netgroup, which take the names of a client.

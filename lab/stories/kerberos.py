@@ -66,6 +66,7 @@ def test_a_keytab_whose_key_the_kdc_has_replaced_is_found(box, kerberos_client, 
     import_keytab(keytab)
     assert [finding["severity"] for finding in keys_that_the_kdc_has_replaced()] == ["error"]
     assert not mounts(kerberos_client, "krb5")
+    assert api.call("NFS.Health", "check", kind="refused_ticket")["total"] > 0
     import_keytab(present)
     assert keys_that_the_kdc_has_replaced() == []
     assert mounts(kerberos_client, "krb5")

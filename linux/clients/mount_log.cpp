@@ -1,11 +1,16 @@
 #include "mount_log.h"
 
 #include <algorithm>
+#include <chrono>
 
 #include "host_names.h"
+#include "journal.h"
 
 namespace vorn {
 namespace {
+
+constexpr char kIdentifier[] = "rpc.mountd";
+constexpr std::chrono::hours kAge{24};
 
 // The end of a message, and the reason that it stands for.
 struct Reason {
@@ -86,6 +91,14 @@ void MountLog::Add(const MountRequest& request, std::int64_t time) {
   Refused& refusals = of_client[key];
   ++refusals.count;
   refusals.last = std::max(refusals.last, time);
+}
+
+MountLog ReadMountLog() {
+  MountLog log;
+  VisitJournal(kIdentifier, kAge, [&](std::string_view message, std::int64_t time) {
+    if (const std::optional<MountRequest> request = ParseMountMessage(message)) log.Add(*request, time);
+  });
+  return log;
 }
 
 }  // namespace vorn

@@ -59,6 +59,7 @@ constexpr Check kChecks[] = {
     {"missing_host_key", FindMissingHostKey},
     {"weak_key", FindWeakKeys},
     {"outdated_key", FindOutdatedKeys, false, false, true},
+    {"refused_ticket", FindRefusedTickets, false, false, true},
     {"unsynchronised_clock", FindUnsynchronisedClock},
     {"clock_skew", FindClockSkew, false, false, true},
     {"foreign_domain", FindForeignDomains, true, false, true},

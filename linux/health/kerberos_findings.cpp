@@ -188,6 +188,29 @@ Status FindOutdatedKeys(const HealthInput& input, Findings* findings) {
   return status;
 }
 
+Status FindRefusedTickets(const HealthInput& input, Findings* findings) {
+  const Result<std::vector<KeytabKey>> keys = ListKeytab(input.box, kKeytabFile);
+  if (keys.ok() && keys->empty()) return {};
+  if (!input.box.root().is_box()) {
+    return Status::Failure(kUnsupported, "The journal is not that of this root.");
+  }
+  JudgeTickets(ReadTicketLog(), findings);
+  return {};
+}
+
+void JudgeTickets(const TicketLog& log, Findings* findings) {
+  for (const auto& [reason, refused] : log.refused()) {
+    const std::string tickets = refused.count == 1 ? "a ticket was" : std::to_string(refused.count) + " tickets were";
+    std::string text = "In the last hour, ";
+    text.append(tickets).append(" refused: ").append(reason);
+    text +=
+        ". The clients or users with these tickets have no access with Kerberos; the log does not tell who they are.";
+    findings->Warning(OfKeytab(), std::move(text),
+                      "Compare the keytab and the clock with those of the KDC; let the users sign in anew if the keys "
+                      "were replaced.");
+  }
+}
+
 Status FindClockSkew(const HealthInput& input, Findings* findings) {
   const Result<std::vector<KdcAnswer>> answers = AnswersOfKdc(input.box);
   if (!answers.ok()) return answers.status();

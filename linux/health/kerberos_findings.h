@@ -5,6 +5,7 @@
 #include "findings.h"
 #include "health_input.h"
 #include "status.h"
+#include "ticket_log.h"
 
 namespace vorn {
 
@@ -19,6 +20,12 @@ Status FindWeakKeys(const HealthInput& input, Findings* findings);
 
 // Keys of the NFS service that are not those of the KDC. Asks the KDC (kdc_question.h).
 Status FindOutdatedKeys(const HealthInput& input, Findings* findings);
+
+// Tickets of clients that rpc.svcgssd(8) has refused in the last hour; at most one finding for a reason.
+Status FindRefusedTickets(const HealthInput& input, Findings* findings);
+
+// Makes the findings of these refusals.
+void JudgeTickets(const TicketLog& log, Findings* findings);
 
 // A clock that differs from that of the KDC by more than Kerberos accepts; at most one finding. Asks the KDC.
 Status FindClockSkew(const HealthInput& input, Findings* findings);

@@ -469,6 +469,27 @@ TEST(ClosedPorts, AreFindings) {
   EXPECT_EQ(found[0].text, "Clients may not reach the service: table inet filter drops the port 2049.");
 }
 
+TEST_F(Health, DoesNotTakeTheJournalForThatOfATrialRoot) {
+  EXPECT_EQ(WhyNotChecked("refused_ticket"), "");
+  root_.Write(kKeytab, MakeKeytab({{"nfs/box.example@X", 1, "aes256-cts"}}));
+  EXPECT_THAT(WhyNotChecked("refused_ticket"), HasSubstr("not that of this root"));
+}
+
+TEST(RefusedTickets, AreFindingsByReason) {
+  const std::string begin = "ERROR: GSS-API: error in handle_nullreq: gss_accept_sec_context(): GSS_S_FAILURE (x) - ";
+  TicketLog log;
+  for (const char* reason : {"Clock skew too great", "Wrong principal in request", "Wrong principal in request"}) {
+    log.Add(begin + reason, 1);
+  }
+  Findings findings("refused_ticket");
+  JudgeTickets(log, &findings);
+  const std::vector<VORN::HealthFinding> found = findings.Take();
+  ASSERT_THAT(found, SizeIs(2));
+  EXPECT_EQ(found[0].severity, Severity::kWarning);
+  EXPECT_THAT(found[0].text, HasSubstr("a ticket was refused: Clock skew too great."));
+  EXPECT_THAT(found[1].text, HasSubstr("2 tickets were refused: Wrong principal in request."));
+}
+
 TEST_F(Health, FindsClientsOfOtherDomains) {
   const auto add = [&](int number, const std::string& name) {
     root_.Write("/proc/fs/nfsd/clients/" + std::to_string(number) + "/info",

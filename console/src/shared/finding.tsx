@@ -45,6 +45,7 @@ const TITLES: Record<string, string> = {
   missing_host_key: /*i18n*/ 'The keytab has no key for the name of the box',
   weak_key: /*i18n*/ 'The keytab has a weak key',
   outdated_key: /*i18n*/ 'The keytab has other keys than the KDC',
+  refused_ticket: /*i18n*/ 'Kerberos tickets of clients were refused',
   unsynchronised_clock: /*i18n*/ 'The clock may be wrong',
   clock_skew: /*i18n*/ 'The clock differs from the one of the KDC',
   foreign_domain: /*i18n*/ 'A client is in another domain than the box',

@@ -1,5 +1,6 @@
+import { useCallback } from 'react';
 import { keepPreviousData, useQueries, useQuery } from '@tanstack/react-query';
-import { call, type Data } from '../../api/call';
+import { call, type Answer, type Data } from '../../api/call';
 
 export type Mapping = Data<'VORN.Core.FileServ.NFS.IDMap/v1/list'>['idmap'][number];
 
@@ -13,16 +14,29 @@ const pageQuery = (filter: string, page: number) => ({
     call(LIST, { offset: page * PAGE, limit: PAGE, filter }, { signal }),
 });
 
-/** The number of mappings that match, and those in the rows from `first` to `last`, which are read page by page. */
-export function useMappings(filter: string, first: number, last: number) {
+const listsOf = (results: { data: Answer<Data<typeof LIST>> | undefined }[]) =>
+  results.map(({ data }) => data?.data.idmap);
+
+/** The first and the last of some pages, from 0. */
+export interface Pages {
+  first: number;
+  last: number;
+}
+
+/** The pages with the rows from `first` to `last`. */
+export const pagesOf = (first: number, last: number): Pages => ({
+  first: Math.floor(first / PAGE),
+  last: Math.floor(last / PAGE),
+});
+
+/** The number of mappings that match, and the mappings of these pages. */
+export function useMappings(filter: string, { first, last }: Pages) {
   const head = useQuery({ ...pageQuery(filter, 0), placeholderData: keepPreviousData });
-  const from = Math.floor(first / PAGE);
-  const pages = Array.from({ length: Math.floor(last / PAGE) - from + 1 }, (_, index) => from + index);
-  const results = useQueries({ queries: pages.map((page) => pageQuery(filter, page)) });
-  return {
-    head,
-    total: head.data?.data.total ?? 0,
-    row: (index: number): Mapping | undefined =>
-      results[Math.floor(index / PAGE) - from]?.data?.data.idmap[index % PAGE],
-  };
+  const queries = Array.from({ length: last - first + 1 }, (_, index) => pageQuery(filter, first + index));
+  const lists = useQueries({ queries, combine: listsOf });
+  const row = useCallback(
+    (index: number): Mapping | undefined => lists[Math.floor(index / PAGE) - first]?.[index % PAGE],
+    [lists, first],
+  );
+  return { head, total: head.data?.data.total ?? 0, row };
 }

@@ -1,39 +1,50 @@
-import { memo, useRef, useState } from 'react';
+import { memo, useCallback, useEffect, useRef, useState } from 'react';
 import { useVirtualizer } from '@tanstack/react-virtual';
 import { i18n } from '@lingui/core';
-import { Button, Content, Skeleton } from '@patternfly/react-core';
-import { Table, Tbody, Th, Thead, Tr } from '@patternfly/react-table';
+import { Content, EmptyState, Skeleton } from '@patternfly/react-core';
 import { Loaded } from '../../shared/page';
-import { useMappings, type Mapping } from './data';
+import { pagesOf, useMappings, type Mapping, type Pages } from './data';
 
 type Choose = (chosen: { mapping: Mapping; wish: 'change' | 'delete' }) => void;
+type RowOf = ReturnType<typeof useMappings>['row'];
 
-const ROW_HEIGHT = 45; // pixels, as an estimate
+const ROW_HEIGHT = 45; // pixels; console.css has the same
 const CELL = 'pf-v6-c-table__td';
+const HEAD = 'pf-v6-c-table__th';
+
+// Plain elements with PatternFly's classes: its components cost frames while scrolling.
+
+function Action({ text, label, onClick }: { text: string; label: string; onClick: () => void }) {
+  return (
+    <button type="button" className="pf-v6-c-button pf-m-link pf-m-inline" aria-label={label} onClick={onClick}>
+      {text}
+    </button>
+  );
+}
 
 function RowActions({ mapping, onChoose }: { mapping: Mapping; onChoose: Choose }) {
-  const button = (wish: 'change' | 'delete', text: string, label: string) => (
-    <Button
-      variant="link"
-      isInline
-      aria-label={label}
-      onClick={() => {
-        onChoose({ mapping, wish });
-      }}
-    >
-      {text}
-    </Button>
-  );
   const { id } = mapping;
   return (
     <>
-      {button('change', i18n._('Change'), i18n._('Change the mapping of {id}', { id }))}{' '}
-      {button('delete', i18n._('Delete'), i18n._('Delete the mapping of {id}', { id }))}
+      <Action
+        text={i18n._('Change')}
+        label={i18n._('Change the mapping of {id}', { id })}
+        onClick={() => {
+          onChoose({ mapping, wish: 'change' });
+        }}
+      />{' '}
+      <Action
+        text={i18n._('Delete')}
+        label={i18n._('Delete the mapping of {id}', { id })}
+        onClick={() => {
+          onChoose({ mapping, wish: 'delete' });
+        }}
+      />
     </>
   );
 }
 
-// Plain cells, rendered once: PatternFly's components and repeated rendering cost frames while scrolling.
+/** A row, which is rendered once. */
 const Row = memo(function Row({
   index,
   mapping,
@@ -64,56 +75,97 @@ function Spacer({ height }: { height: number }) {
   );
 }
 
-/** The mappings that match. Only the rows in sight are rendered, and only their pages are read. */
-export function MappingTable({ filter, onChoose }: { filter: string; onChoose: Choose | null }) {
+const Head = memo(function Head({ hasActions }: { hasActions: boolean }) {
+  return (
+    <thead className="pf-v6-c-table__thead">
+      <tr className="pf-v6-c-table__tr" aria-rowindex={1}>
+        <th className={HEAD} scope="col">
+          {i18n._('Principal')}
+        </th>
+        <th className={HEAD} scope="col">
+          {i18n._('User of the box')}
+        </th>
+        {hasActions && (
+          <th className={HEAD} scope="col">
+            <span className="pf-v6-screen-reader">{i18n._('Actions')}</span>
+          </th>
+        )}
+      </tr>
+    </thead>
+  );
+});
+
+/** Renders only the rows in sight, and tells which pages they are of. */
+const Rows = memo(function Rows({
+  total,
+  row,
+  onPages,
+  onChoose,
+}: {
+  total: number;
+  row: RowOf;
+  onPages: (pages: Pages) => void;
+  onChoose: Choose | null;
+}) {
   const box = useRef<HTMLDivElement>(null);
-  const [range, setRange] = useState({ first: 0, last: 40 });
-  const { head, total, row } = useMappings(filter, range.first, range.last);
   const rows = useVirtualizer({
     count: total,
     getScrollElement: () => box.current,
     estimateSize: () => ROW_HEIGHT,
     overscan: 10,
-    onChange: ({ range: seen }) => {
-      if (!seen) return;
-      setRange((old) =>
-        old.first === seen.startIndex && old.last === seen.endIndex
-          ? old
-          : { first: seen.startIndex, last: seen.endIndex },
-      );
-    },
   });
   const items = rows.getVirtualItems();
+  const { first, last } = pagesOf(items[0]?.index ?? 0, items.at(-1)?.index ?? 0);
+  useEffect(() => {
+    onPages({ first, last });
+  }, [onPages, first, last]);
   const label = i18n._('ID mappings');
   return (
+    // A region that scrolls must be reachable by keyboard.
+    // eslint-disable-next-line jsx-a11y/no-noninteractive-tabindex
+    <div ref={box} className="rows" hidden={total === 0} tabIndex={0} role="region" aria-label={label}>
+      <table
+        className="pf-v6-c-table pf-m-compact pf-m-sticky-header"
+        role="grid"
+        aria-label={label}
+        aria-rowcount={total + 1}
+      >
+        <Head hasActions={onChoose !== null} />
+        <tbody className="pf-v6-c-table__tbody">
+          <Spacer height={items[0]?.start ?? 0} />
+          {items.map(({ index, key }) => (
+            <Row key={key} index={index} mapping={row(index)} onChoose={onChoose} />
+          ))}
+          <Spacer height={rows.getTotalSize() - (items.at(-1)?.end ?? 0)} />
+        </tbody>
+      </table>
+    </div>
+  );
+});
+
+/** The mappings that match. Only the pages of the rows in sight are read. */
+export function MappingTable({ filter, onChoose }: { filter: string; onChoose: Choose | null }) {
+  const [pages, setPages] = useState<Pages>({ first: 0, last: 0 });
+  const { head, total, row } = useMappings(filter, pages);
+  const showPages = useCallback((next: Pages) => {
+    setPages((old) => (old.first === next.first && old.last === next.last ? old : next));
+  }, []);
+  return (
     <Loaded query={head}>
-      {() => (
-        <>
-          <Content component="p">
-            {i18n._('{n, plural, =0 {No mapping} one {# mapping} other {# mappings}}', { n: total })}
-          </Content>
-          {/* A region that scrolls must be reachable by keyboard. */}
-          {/* eslint-disable-next-line jsx-a11y/no-noninteractive-tabindex */}
-          <div ref={box} className="rows" hidden={total === 0} tabIndex={0} role="region" aria-label={label}>
-            <Table aria-label={label} aria-rowcount={total + 1} variant="compact" isStickyHeader gridBreakPoint="">
-              <Thead>
-                <Tr>
-                  <Th>{i18n._('Principal')}</Th>
-                  <Th>{i18n._('User of the box')}</Th>
-                  {onChoose && <Th screenReaderText={i18n._('Actions')} />}
-                </Tr>
-              </Thead>
-              <Tbody>
-                <Spacer height={items[0]?.start ?? 0} />
-                {items.map(({ index, key }) => (
-                  <Row key={key} index={index} mapping={row(index)} onChoose={onChoose} />
-                ))}
-                <Spacer height={rows.getTotalSize() - (items.at(-1)?.end ?? 0)} />
-              </Tbody>
-            </Table>
-          </div>
-        </>
-      )}
+      {() =>
+        total === 0 && filter === '' ? (
+          <EmptyState headingLevel="h2" titleText={i18n._('No principal is mapped yet')}>
+            {i18n._('Clients that use Kerberos get the user of the box with the name of their principal.')}
+          </EmptyState>
+        ) : (
+          <>
+            <Content component="p">
+              {i18n._('{n, plural, =0 {No mapping} one {# mapping} other {# mappings}}', { n: total })}
+            </Content>
+            <Rows total={total} row={row} onPages={showPages} onChoose={onChoose} />
+          </>
+        )
+      }
     </Loaded>
   );
 }

@@ -13,10 +13,10 @@ export default defineConfig({
   fullyParallel: true,
   workers: 2,
   retries: 0,
-  timeout: 120_000,
+  timeout: 400_000,
   forbidOnly: Boolean(process.env.CI),
   reporter: [['list']],
-  expect: { timeout: 30_000 },
+  expect: { timeout: 60_000 },
   use: {
     locale: 'en-GB',
     timezoneId: 'UTC',

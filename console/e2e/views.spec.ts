@@ -1,4 +1,4 @@
-import { expect, open, picture, signIn, test } from './base';
+import { expect, open, picture, signIn, test, type Box } from './base';
 
 const PAGES = [
   ['overview', '/', 'Overview'],
@@ -14,8 +14,20 @@ const PAGES = [
   ['history', '/history', 'History'],
 ] as const;
 
+/** Fills the pages that a fresh box leaves empty. */
+async function fill(box: Box) {
+  await box.call('VORN.Core.FileServ.NFS.IDMap/v1/create', {
+    idmap: ['alice', 'render-farm.building-seven'].map((name) => ({
+      kerberos_principal: `${name}@STORAGE.EXAMPLE`,
+      local_name: 'root',
+    })),
+  });
+  await box.call('VORN.Server.Token/v1/create', { name: 'backup', role: 'reader', shares: ['media'] });
+}
+
 // One test a view: signing in takes longer than a picture.
 test('all pages @view', async ({ page, box, axe }, { project }) => {
+  await fill(box);
   await signIn(page, box);
   for (const [name, address, heading] of PAGES) {
     await open(page, address);

@@ -1,6 +1,7 @@
-import { writeFile } from 'node:fs/promises';
+import { readFile, writeFile } from 'node:fs/promises';
 import path from 'node:path';
-import { expect, signIn, test } from './base';
+import type { Page } from '@playwright/test';
+import { expect, signIn, test, type Box } from './base';
 
 test.describe('ID mappings', () => {
   test.use({ foreseen: [/409 \(Conflict\)/] });
@@ -18,9 +19,13 @@ test.describe('ID mappings', () => {
     await expect(dialog.getByText('+one@STORAGE.EXAMPLE = root')).toBeVisible();
     await dialog.getByRole('button', { name: 'Add', exact: true }).click();
     await expect(dialog).toBeHidden();
+    await expect(page.getByRole('link', { name: 'Undo it in the history' })).toHaveAttribute('href', '#/history');
 
     await page.getByRole('button', { name: 'Add mappings' }).click();
-    await lines.fill('one@STORAGE.EXAMPLE, root');
+    await lines.fill('new@STORAGE.EXAMPLE, root\none@STORAGE.EXAMPLE, root');
+    await expect(dialog.getByText('Some principals are mapped already')).toBeVisible();
+    await expect(dialog.getByRole('listitem').getByText('Line 2: one@STORAGE.EXAMPLE')).toBeVisible();
+    await axe();
     await dialog.getByRole('button', { name: 'Review' }).click();
     await expect(dialog.getByText('Error code 2351')).toBeVisible();
     await expect(dialog.getByRole('listitem').getByText('one@STORAGE.EXAMPLE')).toBeVisible();
@@ -128,11 +133,15 @@ test('a token is shown once, and revoked', async ({ page, box, axe }) => {
   await page.getByRole('button', { name: 'Create a token' }).click();
   const dialog = page.getByRole('dialog');
   await dialog.getByRole('textbox', { name: 'Name' }).fill('backup');
+  await dialog.getByRole('textbox', { name: 'Only these APIs' }).fill('VORN.Core.FileServ.NFS.SharePrivilege');
+  await dialog.getByRole('textbox', { name: 'Only these shared folders' }).fill('media, data');
   await axe();
   await dialog.getByRole('button', { name: 'Create', exact: true }).click();
   await expect(dialog.getByRole('textbox', { name: 'Token' })).toHaveValue(/^vorn_[0-9a-f]{72}$/);
   await dialog.getByRole('button', { name: 'I have copied it' }).click();
-  await expect(page.getByRole('row', { name: /^backup Reader/ })).toBeVisible();
+  await expect(page.getByRole('row', { name: /^backup Reader/ })).toContainText(
+    'VORN.Core.FileServ.NFS.SharePrivilege, media, data',
+  );
   await axe();
   await page.getByRole('button', { name: 'Revoke backup' }).click();
   await dialog.getByRole('button', { name: 'Revoke' }).click();
@@ -140,17 +149,19 @@ test('a token is shown once, and revoked', async ({ page, box, axe }) => {
   await expect(page.getByText('There are no tokens.')).toBeVisible();
 });
 
+/** Bytes a second: a file of 900 kB is on its way for 50 seconds, and the server does not refuse the rate. */
+const SLOW = 18_000;
+
+/** Lets the page send this number of bytes a second; -1 is as many as it can. */
+async function limitUpload(page: Page, uploadThroughput: number) {
+  const network = await page.context().newCDPSession(page);
+  const latency = { offline: false, latency: 0, downloadThroughput: -1 };
+  await network.send('Network.emulateNetworkConditions', { ...latency, uploadThroughput });
+}
+
 test('the upload of a keytab shows its progress, and can be given up', async ({ page, box, axe }) => {
   await signIn(page, box, '/kerberos');
-  const network = await page.context().newCDPSession(page);
-  const limit = (uploadThroughput: number) =>
-    network.send('Network.emulateNetworkConditions', {
-      offline: false,
-      latency: 0,
-      downloadThroughput: -1,
-      uploadThroughput,
-    });
-  await limit(2000); // bytes a second: the upload does not end by itself
+  await limitUpload(page, SLOW);
   const chooser = page.locator('input[type=file]');
   await chooser.setInputFiles({ name: 'large', mimeType: 'text/plain', buffer: Buffer.alloc(900_000) });
   const dialog = page.getByRole('dialog');
@@ -162,8 +173,52 @@ test('the upload of a keytab shows its progress, and can be given up', async ({ 
   await dialog.getByRole('button', { name: 'Cancel' }).click();
   await expect(dialog).toBeHidden();
   expect((await ended).url()).toContain('/upload_key');
-  await limit(-1);
+  await limitUpload(page, -1);
   await chooser.setInputFiles(box.keytab);
   await expect(dialog.getByText('nfs/box.example@STORAGE.EXAMPLE').first()).toBeVisible();
   await expect(progress).toHaveCount(0);
+});
+
+const keysOf = async (box: Box) => {
+  const { keytab } = (await box.call('VORN.Core.FileServ.NFS.Kerberos/v1/list', {})) as { keytab: unknown[] };
+  return keytab.length;
+};
+
+test('the installation of a keytab can be given up while it is being sent', async ({ page, box }) => {
+  const hole = Buffer.alloc(900_000);
+  hole.writeInt32BE(4 - hole.length); // a negative length: the place of a deleted entry
+  const large = Buffer.concat([await readFile(box.keytab), hole]);
+  await signIn(page, box, '/kerberos');
+  const chooser = page.locator('input[type=file]');
+  await chooser.setInputFiles({ name: 'large', mimeType: 'text/plain', buffer: large });
+  const dialog = page.getByRole('dialog');
+  const install = dialog.getByRole('button', { name: 'Install' });
+  await expect(install).toBeEnabled();
+  await limitUpload(page, SLOW);
+  await install.click();
+  const progress = dialog.getByRole('progressbar', { name: 'Sending the file' });
+  await expect(progress).toHaveAttribute('aria-valuenow', /^[1-9]\d?$/);
+  const ended = page.waitForEvent('requestfailed');
+  await dialog.getByRole('button', { name: 'Cancel' }).click();
+  await expect(dialog).toBeHidden();
+  expect((await ended).url()).toMatch(/\/upload_key$/);
+  expect(await keysOf(box)).toBe(0);
+  await expect(page.getByText('No keytab is installed yet.')).toBeVisible();
+});
+
+test('the installation of a keytab cannot be given up once it is sent', async ({ page, box }) => {
+  await signIn(page, box, '/kerberos');
+  await page.locator('input[type=file]').setInputFiles(box.keytab);
+  const dialog = page.getByRole('dialog');
+  const install = dialog.getByRole('button', { name: 'Install' });
+  await expect(install).toBeEnabled();
+  process.kill(box.process, 'SIGSTOP'); // the call is sent, and not answered
+  await install.click();
+  await expect(dialog.getByRole('button', { name: 'Cancel' })).toBeDisabled();
+  await page.keyboard.press('Escape');
+  await expect(dialog).toBeVisible();
+  process.kill(box.process, 'SIGCONT');
+  await expect(dialog).toBeHidden();
+  expect(await keysOf(box)).toBe(1);
+  await expect(page.getByText('The keytab is installed')).toBeVisible();
 });

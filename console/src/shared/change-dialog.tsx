@@ -45,6 +45,9 @@ interface Props<M extends Method> {
 /** How far the file of a change is sent; null while none is being sent. */
 type Sent = number | null;
 
+/** Whether the history records the calls of a method, so that they can be undone there. */
+const isRecorded = (method: Method) => !method.startsWith('VORN.Server.') && !method.includes('.NFS.Client/');
+
 /** Makes a change, and has everything that is shown read again. */
 export function useChange<M extends Method>(
   done: string,
@@ -55,9 +58,9 @@ export function useChange<M extends Method>(
   return useMutation({
     mutationFn: ({ method, parameters, tag, form }: Change<M>) =>
       call(method, parameters, { ifMatch: tag, ...(form && { form, ...sending }) }),
-    onSuccess: async (answer) => {
+    onSuccess: async (answer, { method }) => {
       await readAgain(client);
-      toast(done, answer.warnings);
+      toast(done, { warnings: answer.warnings, isRecorded: isRecorded(method) });
       onDone(answer);
     },
   });
@@ -95,9 +98,16 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
   const rehearsal = useRehearsal(change, setSent);
   const save = useChange<M>(done, onDone, { onProgress: setSent, signal: saving.signal });
   const isSending = sent !== null && sent < 1;
+  // A change whose call is sent cannot be given up: the dialog waits for its outcome.
+  const isDecided = save.isPending && !isSending;
   const close = () => {
-    if (isSending) saving.abort(); // a rehearsal ends with the dialog
+    if (isDecided) return;
+    if (save.isPending) saving.abort(); // a rehearsal ends with the dialog
     onClose();
+  };
+  const start = () => {
+    if (change.form) setSent(0);
+    save.mutate(change);
   };
   const error = save.error ?? rehearsal.error;
   const conflict = conflictOf(error);
@@ -141,14 +151,12 @@ export function ChangeDialog<M extends Method>(props: Props<M>) {
             variant={isDanger ? 'danger' : 'primary'}
             isLoading={save.isPending}
             isDisabled={!rehearsal.isSuccess || save.isPending}
-            onClick={() => {
-              save.mutate(change);
-            }}
+            onClick={start}
           >
             {confirm}
           </Button>
         )}
-        <Button variant="link" onClick={close}>
+        <Button variant="link" isDisabled={isDecided} onClick={close}>
           {i18n._('Cancel')}
         </Button>
       </ModalFooter>
@@ -173,8 +181,11 @@ export function ConfirmDialog<M extends Method>({
   children: ReactNode;
 }) {
   const save = useChange<M>(done, onClose);
+  const close = () => {
+    if (!save.isPending) onClose();
+  };
   return (
-    <Modal isOpen variant="small" onClose={onClose} aria-labelledby="confirm-title">
+    <Modal isOpen variant="small" onClose={close} aria-labelledby="confirm-title">
       <ModalHeader title={title} labelId="confirm-title" />
       <ModalBody>
         {save.error && <Problem error={save.error} />}
@@ -191,7 +202,7 @@ export function ConfirmDialog<M extends Method>({
         >
           {confirm}
         </Button>
-        <Button variant="link" onClick={onClose}>
+        <Button variant="link" isDisabled={save.isPending} onClick={close}>
           {i18n._('Cancel')}
         </Button>
       </ModalFooter>

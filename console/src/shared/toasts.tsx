@@ -2,10 +2,15 @@ import { useSyncExternalStore } from 'react';
 import { i18n } from '@lingui/core';
 import { Alert, AlertActionCloseButton, AlertGroup } from '@patternfly/react-core';
 
-interface Toast {
+interface Remarks {
+  warnings: string[];
+  /** Whether the history can undo what was done. */
+  isRecorded: boolean;
+}
+
+interface Toast extends Remarks {
   id: number;
   title: string;
-  warnings: string[];
 }
 
 let toasts: Toast[] = [];
@@ -18,9 +23,9 @@ function change(next: Toast[]) {
 }
 
 /** Tells that something was done. A message with warnings stays until it is closed. */
-export function toast(title: string, warnings: string[] = []) {
+export function toast(title: string, remarks: Remarks) {
   last += 1;
-  change([...toasts, { id: last, title, warnings }]);
+  change([...toasts, { id: last, title, ...remarks }]);
 }
 
 const close = (id: number) => {
@@ -36,7 +41,7 @@ export function Toasts() {
   const shown = useSyncExternalStore(subscribe, () => toasts);
   return (
     <AlertGroup isToast isLiveRegion hasAnimations={false} aria-label={i18n._('Messages')}>
-      {shown.map(({ id, title, warnings }) => (
+      {shown.map(({ id, title, warnings, isRecorded }) => (
         <Alert
           key={id}
           title={title}
@@ -46,6 +51,7 @@ export function Toasts() {
           onTimeout={() => {
             close(id);
           }}
+          actionLinks={isRecorded && <a href="#/history">{i18n._('Undo it in the history')}</a>}
           actionClose={
             <AlertActionCloseButton
               title={i18n._('Close')}

@@ -1,14 +1,11 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
 import { Button, Content, EmptyState, ExpandableSection, List, ListItem } from '@patternfly/react-core';
-import { ListToolbar, Pager, useFilter } from '../shared/list';
+import { ListToolbar, Pager, useFilter, usePages } from '../shared/list';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
-import { useRead } from '../shared/use-read';
 import { ClientDetails } from './clients/details';
 import { Disconnect } from './clients/disconnect';
 import { ClientTable, type Chosen } from './clients/table';
-
-const PAGE_SIZE = 20;
 
 /** What nobody can read from the list, so that nobody reads it into the list. */
 function Unseen() {
@@ -33,16 +30,12 @@ function Unseen() {
 
 export default function ClientsPage() {
   const filter = useFilter();
-  const [page, setPage] = useState(1);
   const [chosen, setChosen] = useState<Chosen | null>(null);
-  const clients = useRead(
-    'VORN.Core.FileServ.NFS.Client/v1/list',
-    { filter: filter.value, offset: (page - 1) * PAGE_SIZE, limit: PAGE_SIZE },
-    { keepsPrevious: true },
-  );
+  const pages = usePages('VORN.Core.FileServ.NFS.Client/v1/list', { filter: filter.value });
+  const clients = pages.list;
   const search = (text: string) => {
     filter.set(text);
-    setPage(1);
+    pages.turn(1);
   };
   const close = () => {
     setChosen(null);
@@ -76,13 +69,7 @@ export default function ClientsPage() {
                 {i18n._('{n, plural, one {# client} other {# clients}}', { n: data.total })}
               </Content>
               <ClientTable clients={data.clients} onChoose={setChosen} />
-              <Pager
-                label={i18n._('Pages of the clients')}
-                total={data.total}
-                size={PAGE_SIZE}
-                page={page}
-                onTurn={setPage}
-              />
+              <Pager label={i18n._('Pages of the clients')} total={data.total} pages={pages} />
             </>
           )
         }

@@ -6,13 +6,11 @@ import { useMayWrite } from '../session/session';
 import { ChangeDialog } from '../shared/change-dialog';
 import type { Fact } from '../shared/conflict';
 import { Difference } from '../shared/difference';
-import { Pager } from '../shared/list';
+import { Pager, usePages } from '../shared/list';
 import { Loaded, PageFrame, ReadOnlyNotice } from '../shared/page';
 import { useRead } from '../shared/use-read';
 import { time } from '../shared/words';
-import { ChangeTable, subjectOf, type HistoryChange } from './changes';
-
-const PAGE_SIZE = 20;
+import { callerOf, ChangeTable, subjectOf, type HistoryChange } from './changes';
 
 /** The differences of one change. */
 function ShowChange({ change, onClose }: { change: HistoryChange; onClose: () => void }) {
@@ -50,7 +48,7 @@ function newerThan(seen: HistoryChange[], stored: HistoryChange[]): Fact[] {
   const end = stored.findIndex(({ id }) => ids.has(id));
   return stored.slice(0, end < 0 ? stored.length : end).map((change) => ({
     label: `${time(change.time)} ${subjectOf(change)}`,
-    text: [change.caller ?? i18n._('unknown'), ...change.files].join(', '),
+    text: [callerOf(change), ...change.files].join(', '),
   }));
 }
 
@@ -112,13 +110,9 @@ function Actions({ change, onChoose }: { change: HistoryChange; onChoose: (chose
 }
 
 export default function HistoryPage() {
-  const [page, setPage] = useState(1);
   const [chosen, setChosen] = useState<Chosen | null>(null);
-  const history = useRead(
-    'VORN.Core.FileServ.NFS.History/v1/list',
-    { offset: (page - 1) * PAGE_SIZE, limit: PAGE_SIZE },
-    { keepsPrevious: true },
-  );
+  const pages = usePages('VORN.Core.FileServ.NFS.History/v1/list', {});
+  const history = pages.list;
   const close = () => {
     setChosen(null);
   };
@@ -139,13 +133,7 @@ export default function HistoryPage() {
                 label={i18n._('Changes')}
                 actions={(change) => <Actions change={change} onChoose={setChosen} />}
               />
-              <Pager
-                label={i18n._('Pages of the history')}
-                total={data.total}
-                size={PAGE_SIZE}
-                page={page}
-                onTurn={setPage}
-              />
+              <Pager label={i18n._('Pages of the history')} total={data.total} pages={pages} />
             </>
           )
         }

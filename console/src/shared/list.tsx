@@ -2,6 +2,8 @@
 import { useDeferredValue, useState, type ReactNode } from 'react';
 import { i18n } from '@lingui/core';
 import { Pagination, SearchInput, Toolbar, ToolbarContent, ToolbarItem } from '@patternfly/react-core';
+import type { Parameters } from '../api/call';
+import { useRead } from './use-read';
 
 export interface Filter {
   /** What is typed. */
@@ -51,27 +53,37 @@ export function ListToolbar({
   );
 }
 
-/** Turns the pages of a list. Nothing if it has one page only. */
-export function Pager({
-  label,
-  total,
-  size,
-  page,
-  onTurn,
-}: {
-  label: string;
-  total: number;
-  /** The number of rows of a page. */
-  size: number;
+const PAGE_SIZE = 20; // rows
+
+/** The methods that list something page by page, and tell how much there is. */
+type ListMethod =
+  | 'VORN.Core.FileServ.NFS.Access/v1/matrix'
+  | 'VORN.Core.FileServ.NFS.Client/v1/list'
+  | 'VORN.Core.FileServ.NFS.History/v1/list';
+
+interface Pages {
   /** The page that is shown, from 1. */
   page: number;
-  onTurn: (page: number) => void;
-}) {
-  if (total <= size) return null;
+  turn: (page: number) => void;
+}
+
+/** Reads a list page by page. */
+export function usePages<M extends ListMethod>(method: M, parameters: Parameters<M>) {
+  const [page, turn] = useState(1);
+  const part = { offset: (page - 1) * PAGE_SIZE, limit: PAGE_SIZE };
+  const list = useRead<M>(method, Object.assign(part, parameters), { keepsPrevious: true });
+  return { list, page, turn };
+}
+
+/** Turns the pages of a list. Nothing if it has one page only. */
+export function Pager({ label, total, pages }: { label: string; total: number; pages: Pages }) {
+  if (total <= PAGE_SIZE) return null;
+  // The server takes an offset behind the last entry for the first one: the list became shorter meanwhile.
+  const page = (pages.page - 1) * PAGE_SIZE < total ? pages.page : 1;
   return (
     <Pagination
       itemCount={total}
-      perPage={size}
+      perPage={PAGE_SIZE}
       perPageOptions={[]}
       page={page}
       titles={{
@@ -84,7 +96,7 @@ export function Pager({
         ofWord: i18n._('of'),
       }}
       onSetPage={(_event, next) => {
-        onTurn(next);
+        pages.turn(next);
       }}
     />
   );

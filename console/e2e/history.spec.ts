@@ -5,6 +5,8 @@ import { expect, signIn, test } from './base';
 test('a change is shown and undone', async ({ page, box, axe }) => {
   await box.call('VORN.Core.FileServ.NFS/v1/set', { enable_nfs: false, nfs_v4_domain: 'other.example' });
   await signIn(page, box, '/history');
+  const found = page.getByRole('row', { name: /Content from before the history began/ });
+  await expect(found.first()).toContainText('not recorded');
   const row = page.getByRole('row', { name: /Settings of the service/ });
   await row.getByRole('button', { name: 'Show Settings' }).click();
   const dialog = page.getByRole('dialog');

@@ -49,6 +49,8 @@ test.describe('a refusal', () => {
     await expect(page.getByText('Both daemons need a port of their own.').first()).toBeVisible();
     await lockd.fill('2049');
     await expect(page.getByText('A port is in use by another service')).toBeVisible();
+    await expect(lockd).toHaveAccessibleDescription(/^Another service uses this port\./);
+    await expect(statd).toHaveAccessibleDescription('');
     await axe();
     await lockd.fill('4052');
     await expect(page.getByText('A port is in use by another service')).toBeHidden();

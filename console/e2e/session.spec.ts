@@ -138,10 +138,45 @@ test('speaks German', async ({ page, box }) => {
   await expect(page.getByRole('heading', { name: 'Übersicht' })).toBeVisible();
 });
 
+/** Goes on with the key Tab until something has the focus. */
+async function tabTo(page: Page, control: Locator) {
+  for (let count = 0; count < 60; count += 1) {
+    if (await control.evaluate((element) => element === document.activeElement)) return;
+    await page.keyboard.press('Tab');
+  }
+  throw new Error('the key Tab does not lead there');
+}
+
 test('works by keyboard', async ({ page, box }) => {
   await signIn(page, box);
   await page.keyboard.press('Tab');
   await expect(page.getByRole('link', { name: 'Skip to the content' })).toBeFocused();
+  await tabTo(page, page.getByRole('navigation', { name: 'Pages' }).getByRole('link', { name: 'Service' }));
+  await page.keyboard.press('Enter');
+  const domain = page.getByRole('textbox', { name: 'NFSv4 domain' });
+  await expect(domain).toBeVisible();
+  await page.reload(); // the order of the focus begins anew
+  await page.keyboard.press('Tab');
   await page.keyboard.press('Enter');
   await expect(page.getByRole('main')).toBeFocused();
+  await expect(domain).toBeVisible();
+  await tabTo(page, page.getByRole('switch', { name: 'NFS service' }));
+  await page.keyboard.press('Space');
+  await tabTo(page, domain);
+  await page.keyboard.type('typed.');
+  const review = page.getByRole('button', { name: 'Review and save' });
+  await tabTo(page, review);
+  await page.keyboard.press('Enter');
+  const dialog = page.getByRole('dialog');
+  const save = dialog.getByRole('button', { name: 'Save', exact: true });
+  await expect(save).toBeEnabled();
+  await page.keyboard.press('Escape');
+  await expect(dialog).toBeHidden();
+  await expect(review).toBeFocused();
+  await page.keyboard.press('Enter');
+  await expect(save).toBeEnabled();
+  await tabTo(page, save);
+  await page.keyboard.press('Enter');
+  await expect(dialog).toBeHidden();
+  expect(await box.call('VORN.Core.FileServ.NFS/v1/get', {})).toMatchObject({ enable_nfs: true });
 });

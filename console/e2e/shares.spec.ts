@@ -116,6 +116,11 @@ test('shows the rights of all clients of a folder side by side @view', async ({ 
   await box.call('VORN.Core.FileServ.NFS/v1/set', { enable_nfs: true });
   await signIn(page, box, '/shares/media');
   await page.getByRole('link', { name: 'Who can get in, and why can a client not mount it?' }).click();
+  const folder = page.getByRole('combobox', { name: 'Shared folder' });
+  await expect(folder).toHaveValue('media');
+  await folder.selectOption('backup');
+  await expect(page.getByRole('grid', { name: 'Who can get into backup' })).toBeVisible();
+  await folder.selectOption('media');
   const row = page
     .getByRole('grid', { name: 'Who can get into media' })
     .getByRole('row')
@@ -126,4 +131,6 @@ test('shows the rights of all clients of a folder side by side @view', async ({ 
   await axe();
   await row.getByRole('button', { name: 'Why has 10.20.0.0/16 these rights?' }).click();
   await expect(page.getByRole('heading', { name: 'The client can mount the folder' })).toBeVisible();
+  await expect(page.getByRole('textbox', { name: /^Client/ })).toHaveValue('10.20.0.1');
+  await expect(row).toBeVisible();
 });

@@ -19,7 +19,7 @@ async function fill(box: Box) {
   await box.call('VORN.Core.FileServ.NFS.IDMap/v1/create', {
     idmap: ['alice', 'render-farm.building-seven'].map((name) => ({
       kerberos_principal: `${name}@STORAGE.EXAMPLE`,
-      local_name: 'root',
+      local_name: 'carol',
     })),
   });
   await box.call('VORN.Server.Token/v1/create', { name: 'backup', role: 'reader', shares: ['media'] });

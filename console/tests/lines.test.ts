@@ -10,8 +10,12 @@ test('lines of a CSV file are mappings', () => {
     '"alice@X","alice"',
     '\nalice@X, alice\r\n',
   ]) {
-    expect(parseLines(line), line).toEqual({ mappings: [mapping], faulty: [] });
+    expect(parseLines(line), line).toMatchObject({ mappings: [mapping], faulty: [] });
   }
+});
+
+test('each mapping has the number of its line', () => {
+  expect(parseLines('\na@X,a\n\nb@X,b\n').numbers).toEqual([2, 4]);
 });
 
 test('other lines are named by their numbers', () => {

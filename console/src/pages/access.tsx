@@ -1,4 +1,4 @@
-import { useState } from 'react';
+import { useEffect, useRef, useState } from 'react';
 import { i18n } from '@lingui/core';
 import { Button, Content, Form, FormGroup, Title } from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
@@ -16,12 +16,40 @@ type Question = Omit<Parameters<'VORN.Core.FileServ.NFS.Access/v1/explain'>, 'sh
 const FLAVORS = (['sys', 'krb5', 'krb5i', 'krb5p'] as const).map((value) => ({ value, text: value }));
 const VERSIONS = (['4.2', '4.1', '4.0', '3'] as const).map((value) => ({ value, text: `NFSv${value}` }));
 
-/** Asks for a client, and for how it mounts. */
-function QuestionForm({ onAsk }: { onAsk: (question: Question) => void }) {
-  const [client, setClient] = useState(queryOf(usePath()).get('client') ?? '');
-  const [user, setUser] = useState('');
-  const [flavor, setFlavor] = useState<(typeof FLAVORS)[number]['value']>('sys');
-  const [version, setVersion] = useState<(typeof VERSIONS)[number]['value']>('4.2');
+/** Asks for a shared folder. */
+function FolderChoice({ share }: { share: string }) {
+  const shares = useRead('VORN.Core.Share/v1/list', {});
+  const names = shares.data?.data.shares.map(({ name }) => name) ?? [share];
+  const known = share === '' || names.includes(share) ? names : [share, ...names];
+  return (
+    <Form
+      isWidthLimited
+      onSubmit={(event) => {
+        event.preventDefault();
+      }}
+    >
+      <Choices
+        label={i18n._('Shared folder')}
+        help={i18n._('Shows the rights of all its clients.')}
+        value={share}
+        choices={[
+          { value: '', text: i18n._('Choose a folder') },
+          ...known.filter(Boolean).map((name) => ({ value: name, text: name })),
+        ]}
+        onChange={(name) => {
+          go(name ? linkTo('access', name).slice(1) : '/access');
+        }}
+      />
+    </Form>
+  );
+}
+
+/** Asks for a client, and for how it mounts. It begins with the question that was asked last. */
+function QuestionForm({ last, onAsk }: { last: Question | null; onAsk: (question: Question) => void }) {
+  const [client, setClient] = useState(queryOf(usePath()).get('client') ?? last?.client ?? '');
+  const [user, setUser] = useState(last?.user ?? '');
+  const [flavor, setFlavor] = useState<(typeof FLAVORS)[number]['value']>(last?.flavor ?? 'sys');
+  const [version, setVersion] = useState(VERSIONS.find(({ value }) => value === last?.version)?.value ?? '4.2');
   return (
     <Form
       isWidthLimited
@@ -83,7 +111,7 @@ function Matrix({ question, chosen }: { question: Question; chosen: string | und
                 <Td dataLabel={i18n._('Rule that decides')}>
                   {access.rule ? <code>{access.rule}</code> : i18n._('none')}
                 </Td>
-                <Td isActionCell>
+                <Td className="row-actions">
                   <Button
                     variant="link"
                     isInline
@@ -111,23 +139,34 @@ function Matrix({ question, chosen }: { question: Question; chosen: string | und
 export default function AccessPage({ rest }: { rest: string[] }) {
   const [share] = rest;
   const [question, setQuestion] = useState<Question | null>(null);
+  const answer = useRef<HTMLElement>(null);
+  useEffect(() => {
+    if (question) answer.current?.focus(); // the answer may be out of sight
+  }, [question]);
   return (
     <PageFrame
       title={i18n._('Access check')}
       purpose={i18n._('What a client may do in the shared folders, and why it can or cannot mount one of them.')}
     >
       <div className="stack">
-        {share && !question && (
-          <ShareMatrix
-            share={share}
-            onAsk={({ address, version }) => {
-              if (address !== null) setQuestion({ client: address, flavor: 'sys', version });
-            }}
-          />
-        )}
-        <QuestionForm onAsk={setQuestion} />
+        <section className="stack">
+          <Title headingLevel="h2">{i18n._('Who can get into a folder?')}</Title>
+          <FolderChoice share={share ?? ''} />
+          {share && (
+            <ShareMatrix
+              share={share}
+              onAsk={({ address, version }) => {
+                if (address !== null) setQuestion({ client: address, flavor: 'sys', version });
+              }}
+            />
+          )}
+        </section>
+        <section className="stack">
+          <Title headingLevel="h2">{i18n._('What may a client do, and why?')}</Title>
+          <QuestionForm key={JSON.stringify(question)} last={question} onAsk={setQuestion} />
+        </section>
         {question && (
-          <section aria-live="polite">
+          <section ref={answer} tabIndex={-1} aria-live="polite">
             <Title headingLevel="h2">{i18n._('Rights of {client}', { client: question.client })}</Title>
             <Matrix question={question} chosen={share} />
           </section>

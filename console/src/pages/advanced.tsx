@@ -15,6 +15,8 @@ type Stored = Data<'VORN.Core.FileServ.NFS.AdvancedSetting/v1/get'>;
 
 const PORT_IN_USE = 2303;
 
+const isInUse = ({ error }: { error: unknown }) => error instanceof Failure && error.code === PORT_IN_USE;
+
 const describe = (settings: Stored): Fact[] => [
   { label: i18n._('Fixed ports'), text: yesNo(settings.custom_port_enable !== 0) },
   { label: i18n._('Port of the status daemon (statd)'), text: String(settings.statd_port) },
@@ -29,15 +31,10 @@ export function portFault(port: number, other: number): string | undefined {
 
 /** What the change would do to the firewall, or why the ports cannot be used. */
 function Effect({ preview }: { preview: ReturnType<typeof usePreview> }) {
-  const { error } = preview;
-  if (error instanceof Failure && error.code === PORT_IN_USE) {
+  if (isInUse(preview)) {
     return (
       <Alert variant="danger" isInline component="h2" title={i18n._('A port is in use by another service')}>
-        {error.reasons.map((reason) => (
-          <Content component="p" key={reason} lang="en">
-            {reason}
-          </Content>
-        ))}
+        <Content component="p">{i18n._('Choose a port that nothing else uses.')}</Content>
       </Alert>
     );
   }
@@ -64,8 +61,16 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
   const isValid = faults.every((fault) => !fault);
   // A call without "enable_nfs" would switch the service off.
   const parameters = { ...value, custom_port_enable: fixed, enable_nfs: enabled };
-  const method = 'VORN.Core.FileServ.NFS.AdvancedSetting/v1/set';
+  const method = 'VORN.Core.FileServ.NFS.AdvancedSetting/v1/set' as const;
   const preview = usePreview(draft.dirty && isValid ? { method, parameters, tag: draft.tag } : null);
+  // The server does not say which port it refuses: each is tried alone, while the system chooses the other one.
+  const refused = fixed && isInUse(preview);
+  const tryAlone = (other: { nlm_port: number } | { statd_port: number }) =>
+    refused ? { method, parameters: { ...parameters, ...other }, tag: draft.tag } : null;
+  const statd = usePreview(tryAlone({ nlm_port: 0 }));
+  const lockd = usePreview(tryAlone({ statd_port: 0 }));
+  const faultOf = (alone: typeof statd) =>
+    refused && isInUse(alone) ? i18n._('Another service uses this port.') : undefined;
   return (
     <SettingsForm
       draft={draft}
@@ -87,8 +92,8 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
       />
       <NumberField
         label={i18n._('Port of the status daemon (statd)')}
-        value={value.statd_port}
-        error={faults[0]}
+        value={value.statd_port || NaN}
+        error={faults[0] ?? faultOf(statd)}
         isDisabled={!fixed}
         help={fixed ? undefined : unused}
         onChange={(port) => {
@@ -97,8 +102,8 @@ function AdvancedForm({ answer, enabled }: { answer: Answer<Stored>; enabled: bo
       />
       <NumberField
         label={i18n._('Port of the lock manager (lockd)')}
-        value={value.nlm_port}
-        error={faults[1]}
+        value={value.nlm_port || NaN}
+        error={faults[1] ?? faultOf(lockd)}
         isDisabled={!fixed}
         help={fixed ? undefined : unused}
         onChange={(port) => {

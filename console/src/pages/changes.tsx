@@ -24,7 +24,7 @@ const KINDS: Record<HistoryChange['kind'], string> = {
   change: /*i18n*/ 'Change',
   undo: /*i18n*/ 'Undone change',
   'by hand': /*i18n*/ 'Edit by hand',
-  found: /*i18n*/ 'Found on the box',
+  found: /*i18n*/ 'Content from before the history began',
   late: /*i18n*/ 'Recorded late',
 };
 
@@ -35,7 +35,11 @@ export function subjectOf(change: HistoryChange): string {
   return known ? i18n._(known) : (change.method ?? i18n._(KINDS[change.kind]));
 }
 
-const callerOf = (change: HistoryChange) => change.caller ?? i18n._('unknown');
+/** Who made a change. The history does not see who edits a file by hand, or who wrote it before it was first recorded. */
+export function callerOf({ caller, kind }: HistoryChange): string {
+  if (caller !== null) return caller;
+  return kind === 'found' || kind === 'by hand' ? i18n._('not recorded') : i18n._('unknown');
+}
 
 export function ChangeTable({
   changes,
@@ -65,7 +69,7 @@ export function ChangeTable({
             <Td dataLabel={i18n._('What')}>{subjectOf(change)}</Td>
             <Td dataLabel={i18n._('Who')}>{callerOf(change)}</Td>
             <Td dataLabel={i18n._('Files')}>{change.files.join(', ') || i18n._('none')}</Td>
-            {actions && <Td isActionCell>{actions(change)}</Td>}
+            {actions && <Td className="row-actions">{actions(change)}</Td>}
           </Tr>
         ))}
       </Tbody>

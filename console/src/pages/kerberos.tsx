@@ -1,6 +1,16 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Content, FormGroup, Label, Title } from '@patternfly/react-core';
+import {
+  Alert,
+  Content,
+  Form,
+  FormGroup,
+  FormHelperText,
+  HelperText,
+  HelperTextItem,
+  Label,
+  Title,
+} from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import type { Data } from '../api/call';
 import { useMayWrite } from '../session/session';
@@ -87,7 +97,11 @@ function Upload({ tag }: { tag: string | null }) {
     setFile(null);
   };
   return (
-    <>
+    <Form
+      onSubmit={(event) => {
+        event.preventDefault(); // the choice of a file begins the installation
+      }}
+    >
       <FormGroup label={i18n._('Install a keytab')} fieldId="keytab-filename">
         <FileField
           id="keytab"
@@ -99,6 +113,14 @@ function Upload({ tag }: { tag: string | null }) {
           onChoose={setFile}
           onClear={forget}
         />
+        <FormHelperText>
+          <HelperText>
+            <HelperTextItem>
+              {i18n._('The Kerberos server makes it. What installing it does is shown first.')}{' '}
+              <code>{'kadmin ktadd -k nfs.keytab nfs/box.example'}</code>
+            </HelperTextItem>
+          </HelperText>
+        </FormHelperText>
       </FormGroup>
       {file && (
         <ChangeDialog
@@ -120,7 +142,7 @@ function Upload({ tag }: { tag: string | null }) {
           onClose={forget}
         />
       )}
-    </>
+    </Form>
   );
 }
 

@@ -66,6 +66,40 @@ function SharesCard() {
   );
 }
 
+/** To whom the service serves. */
+function ClientsCard() {
+  const clients = useRead('VORN.Core.FileServ.NFS.Client/v1/list', {});
+  return (
+    <Card>
+      <CardTitle component="h2">{i18n._('Clients')}</CardTitle>
+      <CardBody>
+        <Loaded query={clients}>
+          {({ data }) => {
+            const count = (...states: string[]) =>
+              data.clients.filter(({ state }) => states.includes(state ?? '')).length;
+            const refused = count('refused');
+            return (
+              <>
+                <Content component="p">
+                  {i18n._(
+                    '{n, plural, =0 {No client is connected.} one {# client is connected.} other {# clients are connected.}}',
+                    { n: count('confirmed', 'connected') },
+                  )}{' '}
+                  {refused > 0 &&
+                    i18n._('{n, plural, one {# client was turned away.} other {# clients were turned away.}}', {
+                      n: refused,
+                    })}
+                </Content>
+                <a href="#/clients">{i18n._('Show the clients')}</a>
+              </>
+            );
+          }}
+        </Loaded>
+      </CardBody>
+    </Card>
+  );
+}
+
 function HealthCard() {
   return (
     <Card>
@@ -104,13 +138,14 @@ export default function OverviewPage() {
   return (
     <PageFrame
       title={i18n._('Overview')}
-      purpose={i18n._('Whether NFS serves its clients, what is wrong, and what was changed last.')}
+      purpose={i18n._('Whether NFS serves, and to whom; what is wrong, and what was changed last.')}
     >
       <div className="stack">
         <ReadOnlyNotice />
-        <Gallery hasGutter minWidths={{ default: 'min(24rem, 100%)' }}>
+        <Gallery hasGutter minWidths={{ default: 'min(18rem, 100%)' }}>
           <ServiceCard />
           <SharesCard />
+          <ClientsCard />
         </Gallery>
         <HealthCard />
         <ThroughputCard />

@@ -1,5 +1,6 @@
 // Fields of forms. All of them are switched off for readers.
 import { useId, type ReactNode } from 'react';
+import { i18n } from '@lingui/core';
 import {
   FormGroup,
   FormHelperText,
@@ -24,7 +25,13 @@ function Help({ id, help, error }: { id: string; help?: ReactNode; error?: strin
   return (
     <FormHelperText>
       <HelperText id={id} isLiveRegion={error !== undefined}>
-        {error ? <HelperTextItem variant="error">{error}</HelperTextItem> : <HelperTextItem>{help}</HelperTextItem>}
+        {error ? (
+          <HelperTextItem variant="error" screenReaderText={i18n._('Error')}>
+            {error}
+          </HelperTextItem>
+        ) : (
+          <HelperTextItem>{help}</HelperTextItem>
+        )}
       </HelperText>
     </FormHelperText>
   );

@@ -21,7 +21,8 @@ function remedyOf(error: unknown): string {
 }
 
 /** The principals that are mapped already: the only details that an error of a change has. */
-function conflictsOf({ details }: Failure): string[] {
+export function conflictsOf(error: unknown): string[] {
+  const details = error instanceof Failure && !error.isConflict ? error.details : null;
   const conflicts = (details as { principal_conflict?: string[] } | null | undefined)?.principal_conflict;
   return conflicts ?? [];
 }

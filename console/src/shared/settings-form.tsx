@@ -52,7 +52,7 @@ export function SettingsForm<T, M extends Method>({
           <Button type="submit" isDisabled={!draft.dirty || !isValid}>
             {i18n._('Review and save')}
           </Button>
-          <Button variant="link" isDisabled={!draft.dirty} onClick={draft.reset}>
+          <Button variant="secondary" isDisabled={!draft.dirty} onClick={draft.reset}>
             {i18n._('Discard')}
           </Button>
         </ActionGroup>

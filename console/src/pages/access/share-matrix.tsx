@@ -1,18 +1,15 @@
 // The rights of all clients of one shared folder, side by side: who can get in.
-import { useState } from 'react';
 import { i18n } from '@lingui/core';
 import { Button, Content, Label, Title } from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import type { Data } from '../../api/call';
-import { Pager } from '../../shared/list';
+import { Pager, usePages } from '../../shared/list';
 import { Loaded } from '../../shared/page';
-import { useRead } from '../../shared/use-read';
 import { rightsOf } from './rights';
 
 type Client = Data<'VORN.Core.FileServ.NFS.Access/v1/matrix'>['clients'][number];
 
 const FLAVORS = ['sys', 'krb5', 'krb5i', 'krb5p'] as const;
-const PAGE_SIZE = 20;
 
 function Row({ client, onAsk }: { client: Client; onAsk: (client: Client) => void }) {
   return (
@@ -29,7 +26,7 @@ function Row({ client, onAsk }: { client: Client; onAsk: (client: Client) => voi
           </Td>
         );
       })}
-      <Td isActionCell>
+      <Td className="row-actions">
         {client.address !== null && (
           <Button
             variant="link"
@@ -49,17 +46,17 @@ function Row({ client, onAsk }: { client: Client; onAsk: (client: Client) => voi
 
 /** The clients of the rules of a folder, and those that are connected, with their rights for each security flavour. */
 export function ShareMatrix({ share, onAsk }: { share: string; onAsk: (client: Client) => void }) {
-  const [page, setPage] = useState(1);
-  const matrix = useRead(
-    'VORN.Core.FileServ.NFS.Access/v1/matrix',
-    { share, offset: (page - 1) * PAGE_SIZE, limit: PAGE_SIZE },
-    { keepsPrevious: true },
-  );
+  const pages = usePages('VORN.Core.FileServ.NFS.Access/v1/matrix', { share });
   const title = i18n._('Who can get into {share}', { share });
   return (
     <section>
-      <Title headingLevel="h2">{title}</Title>
-      <Loaded query={matrix}>
+      <Title headingLevel="h3">{title}</Title>
+      <Content component="p">
+        {i18n._(
+          'For each kind of security that a client may mount with: sys believes the user IDs of the client; with krb5, krb5i and krb5p Kerberos proves who the users are.',
+        )}
+      </Content>
+      <Loaded query={pages.list}>
         {({ data }) =>
           data.clients.length === 0 ? (
             <Content component="p">
@@ -87,13 +84,7 @@ export function ShareMatrix({ share, onAsk }: { share: string; onAsk: (client: C
                   ))}
                 </Tbody>
               </Table>
-              <Pager
-                label={i18n._('Pages of the clients')}
-                total={data.total}
-                size={PAGE_SIZE}
-                page={page}
-                onTurn={setPage}
-              />
+              <Pager label={i18n._('Pages of the clients')} total={data.total} pages={pages} />
             </>
           )
         }

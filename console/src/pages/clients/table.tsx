@@ -100,7 +100,7 @@ function Row({ client, onChoose }: { client: Client; onChoose: (chosen: Chosen) 
       </Td>
       <Td dataLabel={i18n._('Open files')}>{countOf(client, client.open_files)}</Td>
       <Td dataLabel={i18n._('Locks')}>{countOf(client, client.locks)}</Td>
-      <Td isActionCell>
+      <Td className="row-actions">
         <Actions client={client} onChoose={onChoose} />
       </Td>
     </Tr>

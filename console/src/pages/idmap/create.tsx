@@ -1,14 +1,17 @@
 import { useState } from 'react';
 import { i18n } from '@lingui/core';
-import { Alert, Button, FormGroup } from '@patternfly/react-core';
+import { Alert, Button, FormGroup, List, ListItem } from '@patternfly/react-core';
 import { ChangeDialog } from '../../shared/change-dialog';
 import { FileField } from '../../shared/file-field';
 import { FormDialog } from '../../shared/form-dialog';
 import { Loaded } from '../../shared/page';
+import { usePreview } from '../../shared/preview';
+import { conflictsOf, Problem } from '../../shared/problem';
 import { useRead } from '../../shared/use-read';
-import { parseLines } from './lines';
+import { parseLines, type Lines } from './lines';
 
-const SHOWN = 20; // suggestions
+const CREATE = 'VORN.Core.FileServ.NFS.IDMap/v1/create';
+const SHOWN = 20; // suggestions, and conflicts
 
 /** Local users with the principals that they probably have; one click adds a line. */
 function Suggestions({ onChoose }: { onChoose: (line: string) => void }) {
@@ -37,12 +40,35 @@ function Suggestions({ onChoose }: { onChoose: (line: string) => void }) {
   );
 }
 
+/** The lines whose principals are mapped already, or why the mappings cannot be added. */
+function Conflicts({ lines: { mappings, numbers }, error }: { lines: Lines; error: unknown }) {
+  if (!error) return null;
+  const mapped = new Set(conflictsOf(error));
+  const conflicts = mappings.flatMap(({ kerberos_principal: principal }, index) =>
+    mapped.has(principal) ? [{ principal, line: numbers[index] ?? 0 }] : [],
+  );
+  if (conflicts.length === 0) return <Problem error={error} />;
+  return (
+    <Alert variant="danger" isInline component="h2" title={i18n._('Some principals are mapped already')}>
+      <List>
+        {conflicts.slice(0, SHOWN).map(({ principal, line }) => (
+          <ListItem key={line}>{i18n._('Line {line}: {principal}', { line, principal })}</ListItem>
+        ))}
+      </List>
+    </Alert>
+  );
+}
+
 /** Asks for mappings, one a line, and then for a confirmation. */
 export function CreateMappings({ onClose }: { onClose: () => void }) {
   const [text, setText] = useState('');
   const [name, setName] = useState('');
   const [reviewed, setReviewed] = useState(false);
-  const { mappings, faulty } = parseLines(text);
+  const lines = parseLines(text);
+  const { mappings, faulty } = lines;
+  const isValid = mappings.length > 0 && faulty.length === 0;
+  const change = { method: CREATE, parameters: { idmap: mappings }, tag: null } as const;
+  const preview = usePreview(isValid && !reviewed ? change : null);
   if (reviewed) {
     return (
       <ChangeDialog
@@ -51,7 +77,7 @@ export function CreateMappings({ onClose }: { onClose: () => void }) {
         })}
         confirm={i18n._('Add')}
         done={i18n._('The mappings were added')}
-        change={{ method: 'VORN.Core.FileServ.NFS.IDMap/v1/create', parameters: { idmap: mappings }, tag: null }}
+        change={change}
         onDone={onClose}
         onClose={() => {
           setReviewed(false);
@@ -64,7 +90,7 @@ export function CreateMappings({ onClose }: { onClose: () => void }) {
       id="create-mappings"
       title={i18n._('Add mappings')}
       submit={i18n._('Review')}
-      isValid={mappings.length > 0 && faulty.length === 0}
+      isValid={isValid}
       isWide
       onSubmit={() => {
         setReviewed(true);
@@ -107,6 +133,7 @@ export function CreateMappings({ onClose }: { onClose: () => void }) {
           title={i18n._('These lines are no mappings: {lines}', { lines: faulty.slice(0, 20).join(', ') })}
         />
       )}
+      {isValid && <Conflicts lines={lines} error={preview.error} />}
       <Suggestions
         onChoose={(line) => {
           setText(text === '' || text.endsWith('\n') ? text + line + '\n' : `${text}\n${line}\n`);

@@ -28,7 +28,7 @@ const options = (width: number): uPlot.Options => ({
         return [now - SPAN, now];
       },
     },
-    y: { range: (_plot, _least, most) => [0, Math.max(most, 1024)] },
+    y: { range: (_plot, _least, most) => [0, Math.max(most * 1.1, 1024)] },
   },
   axes: [
     {

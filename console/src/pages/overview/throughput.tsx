@@ -67,10 +67,14 @@ export function ThroughputCard() {
         <Content component="p">
           <Now state={state} newest={rates.at(-1)} />
         </Content>
-        <Legend />
-        <Suspense fallback={<div className="chart" />}>
-          <Chart rates={rates} />
-        </Suspense>
+        {(rates.length > 0 || state !== 'unknown') && (
+          <>
+            <Legend />
+            <Suspense fallback={<div className="chart" />}>
+              <Chart rates={rates} />
+            </Suspense>
+          </>
+        )}
         <Content component="small">
           {i18n._('The box keeps no history of its throughput: the graph begins when the console is opened.')}
         </Content>

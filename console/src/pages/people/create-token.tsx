@@ -15,6 +15,12 @@ const LIFETIMES = [
   { value: 0, text: /*i18n*/ 'It never expires' },
 ];
 
+const namesIn = (text: string) =>
+  text
+    .split(',')
+    .map((name) => name.trim())
+    .filter(Boolean);
+
 /** The secret of a new token. No other page shows it. */
 function Secret({ secret, onClose }: { secret: string; onClose: () => void }) {
   return (
@@ -45,6 +51,8 @@ function Secret({ secret, onClose }: { secret: string; onClose: () => void }) {
 export function CreateToken({ onClose }: { onClose: () => void }) {
   const [name, setName] = useState('');
   const [role, setRole] = useState<Role>('reader');
+  const [apis, setApis] = useState('');
+  const [shares, setShares] = useState('');
   const [lifetime, setLifetime] = useState(365 * DAY);
   const [secret, setSecret] = useState<string | null>(null);
   const create = useChange<'VORN.Server.Token/v1/create'>(i18n._('The token was created'), ({ data }) => {
@@ -61,7 +69,13 @@ export function CreateToken({ onClose }: { onClose: () => void }) {
       onSubmit={() => {
         create.mutate({
           method: 'VORN.Server.Token/v1/create',
-          parameters: { name, role, ...(lifetime > 0 && { expires_in: lifetime }) },
+          parameters: {
+            name,
+            role,
+            ...(apis.trim() && { apis: namesIn(apis) }),
+            ...(shares.trim() && { shares: namesIn(shares) }),
+            ...(lifetime > 0 && { expires_in: lifetime }),
+          },
           tag: null,
         });
       }}
@@ -81,6 +95,22 @@ export function CreateToken({ onClose }: { onClose: () => void }) {
         value={role}
         choices={(Object.keys(ROLES) as Role[]).map((value) => ({ value, text: i18n._(ROLES[value]) }))}
         onChange={setRole}
+      />
+      <TextField
+        label={i18n._('Only these APIs (optional)')}
+        help={i18n._('Names of APIs, with commas between them, as {example}.', {
+          example: 'VORN.Core.FileServ.NFS.IDMap',
+        })}
+        value={apis}
+        onChange={setApis}
+      />
+      <TextField
+        label={i18n._('Only these shared folders (optional)')}
+        help={i18n._(
+          'Names of shared folders, with commas between them. The token can then only call methods of one folder.',
+        )}
+        value={shares}
+        onChange={setShares}
       />
       <ChoiceField
         label={i18n._('Expires after')}

@@ -25,7 +25,7 @@ function SessionRow({ session, onEnd }: { session: Session; onEnd: () => void })
       <Td dataLabel={i18n._('From')}>{session.address}</Td>
       <Td dataLabel={i18n._('Signed in')}>{time(session.created)}</Td>
       <Td dataLabel={i18n._('Idle for')}>{duration(session.idle_seconds)}</Td>
-      <Td isActionCell>
+      <Td className="row-actions">
         {!own && (
           <Button
             variant="link"
@@ -51,6 +51,11 @@ export function Sessions() {
   return (
     <section>
       <Title headingLevel="h2">{i18n._('Sessions')}</Title>
+      <Content component="p">
+        {i18n._(
+          'Accounts of the box sign in with their passwords. The groups of an account decide its role: an administrator may change everything, a reader nothing.',
+        )}
+      </Content>
       <Loaded query={sessions}>
         {({ data }) => (
           <Table aria-label={i18n._('Sessions')} variant="compact" gridBreakPoint="grid-lg">

@@ -39,7 +39,7 @@ function TokenTable({ tokens, onRevoke }: { tokens: Token[]; onRevoke: (token: T
             <Td dataLabel={i18n._('Limited to')}>{limits(token)}</Td>
             <Td dataLabel={i18n._('Last use')}>{lastUse(token)}</Td>
             <Td dataLabel={i18n._('Expires')}>{expiry(token)}</Td>
-            <Td isActionCell>
+            <Td className="row-actions">
               <Button
                 variant="link"
                 isInline

@@ -34,7 +34,7 @@ function ShareTable({ shares, onDelete }: { shares: Share[]; onDelete: (share: S
             <Td dataLabel={i18n._('Folder on the box')}>{share.path}</Td>
             <Td dataLabel={i18n._('Rules')}>{ruleCount(share.rules)}</Td>
             {mayWrite && (
-              <Td isActionCell modifier="nowrap">
+              <Td className="row-actions" modifier="nowrap">
                 <Button
                   variant="link"
                   isInline

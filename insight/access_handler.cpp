@@ -90,14 +90,20 @@ Json::Value ToJson(const VORN::AccessCheck& check) {
   return item;
 }
 
+// The rights in an answer, or those of a flavor.
+template <typename Access>
+void AddRights(const Access& access, Json::Value* result) {
+  (*result)["mountable"] = access.mountable;
+  (*result)["read"] = access.read;
+  (*result)["write"] = access.write;
+}
+
 Json::Value ToJson(const VORN::AccessAnswer& answer) {
   Json::Value result;
   result["path"] = answer.path;
   result["addresses"] = ArrayOf(answer.addresses);
   result["names"] = ArrayOf(answer.names);
-  result["mountable"] = answer.mountable;
-  result["read"] = answer.read;
-  result["write"] = answer.write;
+  AddRights(answer, &result);
   result["rule"] = answer.rule ? ToJson(*answer.rule) : Json::Value();
   result["others"] = ArrayOf(answer.others, ToJson);
   result["identity"] = answer.identity ? ToJson(*answer.identity) : Json::Value();
@@ -110,9 +116,7 @@ Json::Value ToRow(const std::string& share, const VORN::AccessAnswer& answer) {
   Json::Value row;
   row["share"] = share;
   row["path"] = answer.path;
-  row["mountable"] = answer.mountable;
-  row["read"] = answer.read;
-  row["write"] = answer.write;
+  AddRights(answer, &row);
   row["rule"] = answer.rule ? Json::Value(answer.rule->client) : Json::Value();
   return row;
 }
@@ -120,9 +124,7 @@ Json::Value ToRow(const std::string& share, const VORN::AccessAnswer& answer) {
 Json::Value ToJson(const VORN::FlavorAccess& access) {
   Json::Value item;
   item["flavor"] = access.flavor;
-  item["mountable"] = access.mountable;
-  item["read"] = access.read;
-  item["write"] = access.write;
+  AddRights(access, &item);
   return item;
 }
 

@@ -46,6 +46,15 @@ interface Fixtures {
   axe: () => Promise<void>;
 }
 
+/** Delays all answers and the page's own work, so that a test that acts before the page is ready fails. */
+async function slowDown(page: Page) {
+  const session = await page.context().newCDPSession(page);
+  await session.send('Emulation.setCPUThrottlingRate', { rate: 6 });
+  await session.send('Network.enable');
+  const unlimited = { downloadThroughput: -1, uploadThroughput: -1 };
+  await session.send('Network.emulateNetworkConditions', { offline: false, latency: 700, ...unlimited });
+}
+
 export const test = base.extend<Fixtures>({
   tls: [false, { option: true }],
 
@@ -84,6 +93,7 @@ export const test = base.extend<Fixtures>({
         console.error('policy', event.violatedDirective, event.blockedURI, event.sample);
       });
     });
+    if (process.env.VORN_SLOW) await slowDown(page);
     await use(page);
     expect(said.filter((text) => !foreseen.some((pattern) => pattern.test(text)))).toEqual([]);
   },

@@ -160,6 +160,7 @@ async function limitUpload(page: Page, uploadThroughput: number) {
 }
 
 test('the upload of a keytab shows its progress, and can be given up', async ({ page, box, axe }) => {
+  test.skip(Boolean(process.env.VORN_SLOW), 'it sets the speed of the network itself');
   await signIn(page, box, '/kerberos');
   await limitUpload(page, SLOW);
   const chooser = page.locator('input[type=file]');
@@ -185,6 +186,7 @@ const keysOf = async (box: Box) => {
 };
 
 test('the installation of a keytab can be given up while it is being sent', async ({ page, box }) => {
+  test.skip(Boolean(process.env.VORN_SLOW), 'it sets the speed of the network itself');
   const hole = Buffer.alloc(900_000);
   hole.writeInt32BE(4 - hole.length); // a negative length: the place of a deleted entry
   const large = Buffer.concat([await readFile(box.keytab), hole]);

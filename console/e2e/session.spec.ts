@@ -156,6 +156,7 @@ test('works by keyboard', async ({ page, box }) => {
   const domain = page.getByRole('textbox', { name: 'NFSv4 domain' });
   await expect(domain).toBeVisible();
   await page.reload(); // the order of the focus begins anew
+  await expect(domain).toBeVisible();
   await page.keyboard.press('Tab');
   await page.keyboard.press('Enter');
   await expect(page.getByRole('main')).toBeFocused();

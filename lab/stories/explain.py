@@ -50,14 +50,17 @@ class Access:
 
 
 def network(choose, address):
-    """A network of any size, with the address in it or missed by one bit."""
+    """A network of any size and in any spelling, with the address in it or missed by one bit."""
     host = ipaddress.ip_address(address)
-    length = choose.randint(0, host.max_prefixlen)
+    length = choose.choice([0, *(choose.randint(0, host.max_prefixlen) for _ in range(7))])
     number = int(host)
     bit = choose.choice([None, length, length + 1, choose.randint(1, host.max_prefixlen)])
     if bit and bit <= host.max_prefixlen:
         number ^= 1 << (host.max_prefixlen - bit)
-    return f"{type(host)(number)}/{length}"
+    ones = (1 << host.max_prefixlen) - (1 << (host.max_prefixlen - length))
+    gap = 1 << choose.randrange(host.max_prefixlen)
+    size = choose.choice([length, length, f"0{length}", type(host)(ones), type(host)(ones & ~gap)])
+    return f"{type(host)(number)}/{size}"
 
 
 def clients_of_a_folder(choose, machines):

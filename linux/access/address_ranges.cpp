@@ -3,8 +3,6 @@
 #include <arpa/inet.h>
 
 #include <algorithm>
-#include <charconv>
-#include <system_error>
 
 #include "exports_client.h"
 
@@ -13,15 +11,6 @@ namespace {
 
 int FamilyOf(const AddressBytes& address) { return address[0] == 4 ? AF_INET : AF_INET6; }
 std::size_t SizeOf(const AddressBytes& address) { return address[0] == 4 ? 4 : 16; }
-
-std::optional<AddressBytes> ReadAddress(const std::string& text) {
-  AddressBytes address{};
-  for (const std::uint8_t family : {std::uint8_t{4}, std::uint8_t{6}}) {
-    address[0] = family;
-    if (inet_pton(FamilyOf(address), text.c_str(), &address[1]) == 1) return address;
-  }
-  return std::nullopt;
-}
 
 AddressBytes Next(AddressBytes address) {
   for (std::size_t at = SizeOf(address); at > 0 && ++address[at] == 0; --at) {
@@ -46,19 +35,14 @@ bool IsInside(const AddressRange& range, const AddressRange& network) {
 }  // namespace
 
 std::optional<AddressRange> AddressRangeOf(const std::string& client) {
-  const std::string key = ExportNetworkKey(client);  // "10.0.0.0/24"
-  const std::size_t slash = key.find('/');
-  const std::optional<AddressBytes> first = ReadAddress(key.substr(0, slash));
-  if (!first) return std::nullopt;
-  AddressRange range{*first, *first};
-  std::size_t length = SizeOf(*first) * 8;
-  if (slash != std::string::npos) {
-    const auto [end, error] = std::from_chars(key.data() + slash + 1, key.data() + key.size(), length);
-    if (error != std::errc() || end != key.data() + key.size() || length > SizeOf(*first) * 8) return std::nullopt;
-  }
-  for (std::size_t bit = length; bit < SizeOf(*first) * 8; ++bit) {
-    std::uint8_t& byte = range.last[1 + bit / 8];
-    byte = static_cast<std::uint8_t>(byte | (0x80 >> (bit % 8)));
+  const auto network = ReadExportNetwork(client);
+  if (!network || !PrefixLength(network->mask)) return std::nullopt;
+  AddressRange range{};
+  range.first[0] = range.last[0] = network->family == AF_INET ? 4 : 6;
+  for (std::size_t at = 0; at < SizeOf(range.first); ++at) {
+    const std::uint8_t mask = network->mask[at];
+    range.first[1 + at] = static_cast<std::uint8_t>(network->address[at] & mask);
+    range.last[1 + at] = static_cast<std::uint8_t>(network->address[at] | ~mask);
   }
   return range;
 }

@@ -18,7 +18,7 @@ struct AddressRange {
   AddressBytes last;
 };
 
-// Returns the range of an address or a network of exports(5); nullopt for every other text.
+// Returns the range of an address or a network of exports(5); nullopt for every other text, and for a mask with gaps.
 std::optional<AddressRange> AddressRangeOf(const std::string& client);
 
 // Addresses that export rules name. Not thread-safe.

@@ -42,10 +42,9 @@ bool IsHost(ClientHost* client, const std::string& host, const NameService& serv
 }
 
 bool IsInNetwork(const ClientHost& client, const std::string& network) {
-  const std::string key = ExportNetworkKey(network);
-  const std::size_t slash = key.find('/');
-  if (slash == std::string::npos) return false;
-  return ExportNetworkKey(client.addresses.front() + key.substr(slash)) == key;
+  const auto addresses = ReadExportNetwork(network);
+  const auto address = ReadExportNetwork(client.addresses.front());
+  return addresses && address && Contains(*addresses, *address);
 }
 
 // Without a name, mountd compares the address itself with a pattern.

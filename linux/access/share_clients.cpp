@@ -179,7 +179,7 @@ class ClientTable {
   void ChooseOfNetwork(const std::string& client, VORN::ClientAccess* access) {
     const std::optional<AddressRange> network = AddressRangeOf(client);
     if (!network) {
-      access->text = "The server cannot read this network.";
+      ChooseOfMask(client, access);
       return;
     }
     const AddressBytes first = FirstHostOf(*network);
@@ -189,8 +189,20 @@ class ClientTable {
                         : "Narrower rules name every host of this network; " + access->address + " is one of them.";
   }
 
+  // Chooses an address of a network whose mask has gaps.
+  static void ChooseOfMask(const std::string& client, VORN::ClientAccess* access) {
+    const auto network = ReadExportNetwork(client);
+    if (!network) {
+      access->text = "The server cannot read this network.";
+      return;
+    }
+    const std::string key = ExportNetworkKey(*network);
+    access->address = key.substr(0, key.find('/'));
+    access->text = access->address + " is one of the hosts of this network; others may match further rules.";
+  }
+
   void ChooseOfAll(VORN::ClientAccess* access) {
-    const std::optional<AddressRange> all = AddressRangeOf("0.0.0.0/0");
+    const std::optional<AddressRange> all = AddressRangeOf("0.0.0.0/0.0.0.0");
     const std::optional<AddressRange> any = AddressRangeOf(kAnyHost);
     access->address = TextOf(ranges_.FirstFree(*all, any->first).value_or(any->first));
     access->text = access->address + " stands for the hosts that no other rule names.";

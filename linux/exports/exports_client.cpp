@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <cstdlib>
 #include <memory>
 #include <optional>
 
@@ -30,44 +31,57 @@ Status Refuse(std::string_view client, const std::string& why) {
   return Status::Failure(kRefusedText, "export client \"" + std::string(client) + "\": " + why);
 }
 
-struct Address {
-  int family = AF_UNSPEC;
-  std::array<std::uint8_t, 16> bytes{};
+using Address = ExportNetwork::Address;
 
-  int bits() const { return family == AF_INET ? 32 : 128; }
-};
+// A network of one address.
+ExportNetwork SingleAddress(int family) {
+  ExportNetwork network;
+  network.family = family;
+  network.mask = PrefixMask(network.bits());
+  return network;
+}
 
-std::optional<Address> ReadAddress(std::string_view text) {
+std::optional<ExportNetwork> ReadAddress(std::string_view text) {
   const std::string address_text(text);
   if (text.find('\0') != std::string_view::npos) return std::nullopt;
   for (const int family : {AF_INET, AF_INET6}) {
-    Address address;
-    address.family = family;
-    if (inet_pton(family, address_text.c_str(), address.bytes.data()) == 1) return address;
+    ExportNetwork network = SingleAddress(family);
+    if (inet_pton(family, address_text.c_str(), network.address.data()) == 1) return network;
   }
   return std::nullopt;
 }
 
-// Reads the length of a prefix, which is given as a number or as a mask without gaps.
-std::optional<int> ReadPrefixLength(std::string_view text, const Address& network) {
-  if (const auto mask = ReadAddress(text)) {
-    int length = 0;
-    while (length < network.bits() && (mask->bytes[length / 8] & (0x80 >> (length % 8))) != 0) ++length;
-    int ones = 0;
-    for (const std::uint8_t byte : mask->bytes) ones += __builtin_popcount(byte);
-    return mask->family == network.family && ones == length ? std::optional(length) : std::nullopt;
-  }
-  const bool number = !text.empty() && text.size() <= 3 && std::all_of(text.begin(), text.end(), IsDigit);
-  if (!number || (text.size() > 1 && text[0] == '0')) return std::nullopt;
-  const int length = std::stoi(std::string(text));
-  return length <= network.bits() ? std::optional(length) : std::nullopt;
+// rpc.mountd(8) shifts a word of 32 bits by 32 for a prefix of length 0. Most processors shift by 0 instead, so that
+// the prefix has 32 bits.
+#if defined(__arm__) || defined(__powerpc__) || defined(__s390x__)
+constexpr int kLengthZero = 0;
+#else
+constexpr int kLengthZero = 32;
+#endif
+
+// Reads the length of a prefix as strtoul(3) does, with which rpc.mountd(8) reads it: "08" is 8, and "" is 0.
+std::optional<Address> ReadPrefixMask(const std::string& text, int bits) {
+  char* end = nullptr;
+  const unsigned long length = std::strtoul(text.c_str(), &end, 10);
+  if (*end != '\0' || length > static_cast<unsigned long>(bits)) return std::nullopt;
+  return PrefixMask(length == 0 ? kLengthZero : static_cast<int>(length));
 }
 
+bool IsNumber(std::string_view text) { return !text.empty() && std::all_of(text.begin(), text.end(), IsDigit); }
+
+// Accepts less than rpc.mountd(8) does: only spellings that leave no doubt about what is meant.
 Status CheckNetwork(std::string_view client) {
   const std::size_t slash = client.find('/');
-  const auto network = ReadAddress(client.substr(0, slash));
-  if (!network) return Refuse(client, "what stands before \"/\" is no address");
-  if (!ReadPrefixLength(client.substr(slash + 1), *network)) {
+  const std::string_view size = client.substr(slash + 1);
+  if (!ReadAddress(client.substr(0, slash))) return Refuse(client, "what stands before \"/\" is no address");
+  if (size == "0") {
+    return Refuse(client,
+                  "rpc.mountd does not take a prefix of length 0 for all addresses; \"*\" is every client, "
+                  "\"0.0.0.0/0.0.0.0\" is all of IPv4, and \"::/::\" is all of IPv6");
+  }
+  const auto network = ReadExportNetwork(client);
+  const bool is_clear = IsNumber(size) ? size.front() != '0' : ReadAddress(size).has_value();
+  if (!network || !is_clear || !PrefixLength(network->mask)) {
     return Refuse(client, "what follows \"/\" is no prefix length and no mask of this network");
   }
   return {};
@@ -134,9 +148,9 @@ std::string LowerCase(std::string_view text) {
   return lower;
 }
 
-std::string AddressText(const Address& address) {
+std::string AddressText(int family, const Address& address) {
   std::array<char, INET6_ADDRSTRLEN> text{};
-  return inet_ntop(address.family, address.bytes.data(), text.data(), text.size());
+  return inet_ntop(family, address.data(), text.data(), text.size());
 }
 
 struct FreeAddresses {
@@ -148,7 +162,8 @@ struct FreeAddresses {
 std::optional<std::string> NumericHost(std::string_view client) {
   const bool may_be_number = !client.empty() && (IsDigit(client[0]) || client.find(':') != std::string_view::npos);
   if (!may_be_number || client.find('\0') != std::string_view::npos) return std::nullopt;
-  if (const auto address = ReadAddress(client)) return AddressText(*address);  // the usual spelling, in less time
+  if (const auto one = ReadAddress(client))
+    return AddressText(one->family, one->address);  // the usual spelling, in less time
   addrinfo hints{};
   hints.ai_flags = AI_NUMERICHOST;
   addrinfo* found = nullptr;
@@ -179,18 +194,60 @@ std::string ExportClientKey(std::string_view client) {
   return LowerCase(IsExportHostName(client) ? WithoutFinalDot(client) : client);
 }
 
-std::string ExportNetworkKey(std::string_view client) {
-  const std::size_t slash = client.find('/');
-  auto address = ReadAddress(client.substr(0, slash));
-  if (!address) return ExportClientKey(client);
-  const auto length =
-      slash == std::string_view::npos ? address->bits() : ReadPrefixLength(client.substr(slash + 1), *address);
-  if (!length) return ExportClientKey(client);
-  for (int bit = *length; bit < address->bits(); ++bit) {
-    auto& byte = address->bytes[static_cast<std::size_t>(bit / 8)];
-    byte = static_cast<std::uint8_t>(byte & ~(0x80 >> (bit % 8)));
+ExportNetwork::Address PrefixMask(int length) {
+  Address mask{};
+  for (int bit = 0; bit < length; ++bit) {
+    auto& byte = mask[static_cast<std::size_t>(bit / 8)];
+    byte = static_cast<std::uint8_t>(byte | (0x80 >> (bit % 8)));
   }
-  return AddressText(*address) + "/" + std::to_string(*length);
+  return mask;
+}
+
+std::optional<int> PrefixLength(const Address& mask) {
+  int ones = 0;
+  for (const std::uint8_t byte : mask) ones += __builtin_popcount(byte);
+  return mask == PrefixMask(ones) ? std::optional(ones) : std::nullopt;
+}
+
+std::optional<ExportNetwork> ReadExportNetwork(std::string_view client) {
+  const std::size_t slash = client.find('/');
+  auto network = ReadAddress(client.substr(0, slash));
+  if (!network || slash == std::string_view::npos) return network;
+  const std::string size(client.substr(slash + 1));
+  if (size.find(network->family == AF_INET ? '.' : ':') == std::string::npos) {
+    const auto mask = ReadPrefixMask(size, network->bits());
+    if (!mask) return std::nullopt;
+    network->mask = *mask;
+    return network;
+  }
+  const auto mask = ReadAddress(size);
+  if (!mask || mask->family != network->family) return std::nullopt;
+  network->mask = mask->address;
+  return network;
+}
+
+bool Contains(const ExportNetwork& network, const ExportNetwork& inner) {
+  if (network.family != inner.family) return false;
+  for (std::size_t at = 0; at < network.mask.size(); ++at) {
+    const int mask = network.mask[at];
+    if ((mask & ~inner.mask[at]) != 0 || ((network.address[at] ^ inner.address[at]) & mask) != 0) return false;
+  }
+  return true;
+}
+
+std::string ExportNetworkKey(const ExportNetwork& network) {
+  Address address = network.address;
+  for (std::size_t at = 0; at < address.size(); ++at) {
+    address[at] = static_cast<std::uint8_t>(address[at] & network.mask[at]);
+  }
+  const auto length = PrefixLength(network.mask);
+  return AddressText(network.family, address) + "/" +
+         (length ? std::to_string(*length) : AddressText(network.family, network.mask));
+}
+
+std::string ExportNetworkKey(std::string_view client) {
+  const auto network = ReadExportNetwork(client);
+  return network ? ExportNetworkKey(*network) : ExportClientKey(client);
 }
 
 bool IsExportHostName(std::string_view client) {

@@ -53,23 +53,23 @@ class Networks {
   // none.
   std::optional<Rule> Add(const Rule& rule) {
     if (ExportKindOf(rule.entry->client) != ExportKind::kNetwork) return std::nullopt;
-    const std::string key = ExportNetworkKey(rule.entry->client);
-    const std::size_t slash = key.find('/');
-    if (slash == std::string::npos) return std::nullopt;  // no network that exportfs(8) accepts
-    const int length = std::stoi(key.substr(slash + 1));
+    const auto network = ReadExportNetwork(rule.entry->client);
+    if (!network) return std::nullopt;  // exportfs(8) does not accept it
     std::optional<Rule> found;
-    for (const int wider : lengths_) {
-      if (wider > length) break;
-      const auto network = rules_.find(ExportNetworkKey(key.substr(0, slash + 1) + std::to_string(wider)));
-      if (network != rules_.end()) found = network->second;
+    for (const ExportNetwork::Address& mask : masks_) {
+      ExportNetwork wider = *network;
+      wider.mask = mask;
+      if (!Contains(wider, *network)) continue;
+      const auto earlier = rules_.find(ExportNetworkKey(wider));
+      if (earlier != rules_.end()) found = earlier->second;
     }
-    lengths_.insert(length);
-    rules_.try_emplace(key, rule);
+    masks_.insert(network->mask);
+    rules_.try_emplace(ExportNetworkKey(*network), rule);
     return found;
   }
 
  private:
-  std::set<int> lengths_;  // of the prefixes
+  std::set<ExportNetwork::Address> masks_;
   std::unordered_map<std::string, Rule> rules_;
 };
 

@@ -20,7 +20,7 @@ TEST(AddressRangeOf, ReadsAddressesAndNetworks) {
       {"10.0.0.5", "10.0.0.5 10.0.0.5"},
       {"10.0.0.0/24", "10.0.0.0 10.0.0.255"},
       {"10.0.0.77/255.255.255.192", "10.0.0.64 10.0.0.127"},
-      {"0.0.0.0/0", "0.0.0.0 255.255.255.255"},
+      {"10.0.0.0/0.0.0.0", "0.0.0.0 255.255.255.255"},
       {"fd00::/65", "fd00:: fd00::7fff:ffff:ffff:ffff"},
       {"FD00:0::1", "fd00::1 fd00::1"},
       {"10.0.0.0/33", ""},
@@ -63,7 +63,7 @@ TEST(AddressRanges, FindTheFirstFreeAddressOfANetwork) {
 }
 
 TEST(AddressRanges, DoNotCountForANetworkThatTheyContain) {
-  EXPECT_EQ(FirstFree("10.0.0.0/24", {"10.0.0.0/24", "10.0.0.0/8", "0.0.0.0/0"}), "10.0.0.1");
+  EXPECT_EQ(FirstFree("10.0.0.0/24", {"10.0.0.0/24", "10.0.0.0/8", "0.0.0.0/0.0.0.0"}), "10.0.0.1");
 }
 
 TEST(AddressRanges, LeaveNoAddressFree) {

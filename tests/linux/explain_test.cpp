@@ -163,8 +163,10 @@ TEST_F(Explain, FindsAClientByEachFormOfIPv6) {
                                                 {"fd00:9::8/125", true},
                                                 {"fd00:9::c/126", false},
                                                 {"fd00:9::/ffff:ffff::", true},
-                                                {"::/0", true},
-                                                {"0.0.0.0/0", false},  // the host's other address does not count
+                                                {"::/::", true},
+                                                {"fd00:8::/0", false},  // mountd compares 32 bits
+                                                {"fd00:9:1::/0", true},
+                                                {"0.0.0.0/0.0.0.0", false},  // the host's other address does not count
                                                 {"10.0.0.5", false},
                                                 {"10.0.0.6", false},
                                                 {"c.example", true},
@@ -186,9 +188,9 @@ std::string WithOtherBit(std::size_t bit) {
 }
 
 TEST_F(Explain, ComparesEveryBitOfAnIPv6NetworkAndNoneAfterIt) {
-  for (std::size_t length = 0; length <= 128; ++length) {
+  for (std::size_t length = 1; length <= 128; ++length) {
     for (const std::size_t bit : {length, length + 1}) {
-      if (bit == 0 || bit > 128) continue;
+      if (bit > 128) continue;
       const std::string network = WithOtherBit(bit) + "/" + std::to_string(length);
       Export({{network, "rw"}});
       EXPECT_EQ(Ask("fd00:9::b").mountable, bit > length) << network;

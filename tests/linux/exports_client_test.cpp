@@ -30,7 +30,6 @@ const std::vector<std::string> kOthers = {"*",
                                           "255.255.255.255",
                                           "10.0.0.0/8",
                                           "10.0.0.1/32",
-                                          "0.0.0.0/0",
                                           "10.1.2.3/24",
                                           "10.0.0.0/255.0.0.0",
                                           "10.1.0.0/255.255.128.0",
@@ -41,7 +40,7 @@ const std::vector<std::string> kOthers = {"*",
                                           "2001:DB8:0:0::18",
                                           "::ffff:10.0.0.1",
                                           "2001:db8::/32",
-                                          "::/0",
+                                          "::/::",
                                           "2001:db8::1/128",
                                           "2001:db8::/ffff:ffff::",
                                           "@admins",
@@ -107,6 +106,10 @@ const RefusedClient kRefused[] = {{"", "everybody"},
                                   {"fe80::1%lo", "host name"},
                                   {"[::1]:2049", "bracket"},
                                   {"10.0.0.0/33", "prefix"},
+                                  {"0.0.0.0/0", "0.0.0.0/0.0.0.0"},
+                                  {"10.0.0.1/0", "prefix of length 0"},
+                                  {"::/0", "::/::"},
+                                  {"10.0.0.0/00", "prefix"},
                                   {"10.0.0.0/210", "prefix"},
                                   {"10.0.0.0/-1", "prefix"},
                                   {"10.0.0.0/+8", "prefix"},
@@ -213,12 +216,55 @@ TEST(ExportClientKey, AgreesWithExportfs) {
   }
 }
 
+struct Membership {
+  const char* network;
+  const char* client;
+  bool is_in;
+};
+
+TEST(ReadExportNetwork, HasTheAddressesThatMountdTakes) {
+  const Membership cases[] = {
+      {"10.0.0.0/8", "10.1.2.3", true},
+      {"10.0.0.0/8", "11.0.0.0", false},
+      {"10.9.9.9/08", "10.1.2.3", true},
+      {"10.0.0.0/0.0.0.0", "192.0.2.1", true},
+      {"10.0.0.0/255.0.255.0", "10.7.0.8", true},
+      {"10.0.0.0/255.0.255.0", "10.7.1.8", false},
+      {"fd00::/8", "fdff::1", true},
+      {"fd00::/64", "fd00:0:0:1::1", false},
+      {"fd00::/::", "2001:db8::1", true},
+      {"0.0.0.0/0.0.0.0", "::1", false},
+      {"::/::", "10.0.0.1", false},
+      {"10.0.0.1", "10.0.0.1", true},
+      {"10.0.0.1", "10.0.0.2", false},
+  };
+  for (const Membership& one : cases) {
+    const auto network = ReadExportNetwork(one.network);
+    const auto client = ReadExportNetwork(one.client);
+    ASSERT_TRUE(network && client) << one.network;
+    EXPECT_EQ(Contains(*network, *client), one.is_in) << one.network << " " << one.client;
+  }
+  for (const char* text : {"", "host", "*", "@hosts", "10.0.0.0/33", "10.0.0.0/x", "10.0.0.0/8x",
+                           "10.0.0.0/ffff::", "fd00::/129", "fd00::/255.0.0.0", "host/8"}) {
+    EXPECT_FALSE(ReadExportNetwork(text)) << text;
+  }
+}
+
+#if defined(__x86_64__) || defined(__aarch64__)
+TEST(ReadExportNetwork, TakesAPrefixOfLength0ForOneOf32) {
+  EXPECT_EQ(ExportNetworkKey("10.0.0.1/0"), "10.0.0.1/32");
+  EXPECT_EQ(ExportNetworkKey("10.0.0.1/"), "10.0.0.1/32");
+  EXPECT_EQ(ExportNetworkKey("2001:db8::1/0"), "2001:db8::/32");
+}
+#endif
+
 TEST(ExportNetworkKey, IsOneForTheSameAddresses) {
   EXPECT_EQ(ExportNetworkKey("10.0.0.1"), ExportNetworkKey("10.0.0.1/32"));
   EXPECT_EQ(ExportNetworkKey("10.0.0.0/8"), ExportNetworkKey("10.1.2.3/255.0.0.0"));
   EXPECT_EQ(ExportNetworkKey("2001:db8::/32"), ExportNetworkKey("2001:DB8::1/ffff:ffff::"));
   EXPECT_NE(ExportNetworkKey("10.0.0.0/8"), ExportNetworkKey("10.0.0.0/9"));
-  EXPECT_NE(ExportNetworkKey("::/0"), ExportNetworkKey("0.0.0.0/0"));
+  EXPECT_NE(ExportNetworkKey("::/::"), ExportNetworkKey("0.0.0.0/0.0.0.0"));
+  EXPECT_EQ(ExportNetworkKey("10.0.0.0/255.0.255.0"), ExportNetworkKey("10.1.0.2/255.0.255.0"));
   EXPECT_EQ(ExportNetworkKey("*.Example"), ExportNetworkKey("*.example"));
 }
 

@@ -294,7 +294,8 @@ TEST_F(Health, FindsRulesThatEarlierOnesHide) {
       {"10.0.0.0/8(ro) 10.0.1.0/24(rw)", "10.0.1.0/24"},
       {"10.0.0.0/8(ro) 10.1.0.0/255.0.0.0(rw)", "10.1.0.0/255.0.0.0"},
       {"fd00::/8(ro) 10.0.0.0/8(ro) fd00:1::/64(rw)", "fd00:1::/64"},
-      {"0.0.0.0/0(ro) 10.0.0.0/8(rw)", "10.0.0.0/8"},
+      {"10.0.0.0/0.0.0.0(ro) 10.0.0.0/8(rw)", "10.0.0.0/8"},
+      {"10.0.0.0/255.0.255.0(ro) 10.1.0.0/24(rw)", "10.1.0.0/24"},
       {"backup(ro) Backup.(rw)", "Backup."},
       {"10.0.0.0/8(ro)\n/srv/media 10.0.0.0/8(rw)", "10.0.0.0/8"},
   };
@@ -302,8 +303,9 @@ TEST_F(Health, FindsRulesThatEarlierOnesHide) {
     Export("/srv/data 10.0.0.0/24(rw)\n/srv/media " + std::string(rules) + "\n");
     EXPECT_EQ(FindOne("hidden_rule").subject.client, client) << rules;
   }
-  for (const char* rules : {"10.0.1.0/24(rw) 10.0.0.0/8(ro)", "10.0.0.0/8(ro) 10.0.1.0/24(ro)", "10.0.0.0/8(ro) *(rw)",
-                            "10.0.0.0/8(ro) 10.0.0.1(rw)", "10.0.0.0/8(ro) 11.0.0.0/24(rw)"}) {
+  for (const char* rules :
+       {"10.0.1.0/24(rw) 10.0.0.0/8(ro)", "10.0.0.0/8(ro) 10.0.1.0/24(ro)", "10.0.0.0/8(ro) *(rw)",
+        "10.0.0.0/8(ro) 10.0.0.1(rw)", "10.0.0.0/0(ro) 10.0.0.0/8(rw)", "10.0.0.0/8(ro) 11.0.0.0/24(rw)"}) {
     Export("/srv/data 10.0.0.0/24(rw)\n/srv/media " + std::string(rules) + "\n");
     EXPECT_THAT(Find("hidden_rule"), IsEmpty()) << rules;
   }

@@ -110,6 +110,12 @@ TEST_F(ShareClientsOf, AreStoodForByAHostThatNoNarrowerRuleNames) {
                                   "everybody * - 192.0.3.0 4.2: sys rw, by *"));
 }
 
+TEST_F(ShareClientsOf, HaveAnAddressOfANetworkWhoseMaskHasGaps) {
+  Export("/srv/data 10.7.0.0/255.0.255.0(ro) 10.1.0.0/255.255.0.0(rw)\n");
+  EXPECT_EQ(Rows().front(), "network 10.7.0.0/255.0.255.0 - 10.0.0.0 4.2: sys ro, by 10.7.0.0/255.0.255.0");
+  EXPECT_EQ(Texts().front(), "10.0.0.0 is one of the hosts of this network; others may match further rules.");
+}
+
 TEST_F(ShareClientsOf, SayThatNarrowerRulesNameAllHosts) {
   Export("/srv/data 10.0.0.1(rw) 10.0.0.2(rw) 10.0.0.0/30(ro)\n");
   EXPECT_EQ(Texts().back(), "Narrower rules name every host of this network; 10.0.0.1 is one of them.");

@@ -141,7 +141,10 @@ BREAKS = [
           source=("exports[a].kind < exports[b].kind", "s/exports\\[a\\].kind < exports\\[b\\].kind/"
                   "exports[a].kind > exports[b].kind/")),
     Break("half-of-an-address", "an explanation is what the kernel does", "explain",
-          source=("int bit = *length; bit", "s/int bit = [*]length;/int bit = std::min(*length, 64);/")),
+          source=("at < network.mask.size()", "s/at < network.mask.size()/at < 8/"), select="kernel_does"),
+    Break("names-confirmed", "an explanation is what the kernel does", "explain",
+          source=("client->names = std::move(*names);", "s/client->names = /if (client->is_name_confirmed) &/"),
+          select="lead_back"),
     Break("pending-rules-unseen", "a check finds what is not in force", "health",
           source=("return std::move(update->changed);", "s/return std::move(update->changed);/"
                   "return std::set<std::string>();/"), select="not_in_force"),

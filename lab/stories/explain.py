@@ -7,6 +7,8 @@ import ipaddress
 import os
 import pathlib
 import random
+import subprocess
+import sys
 
 import pytest
 
@@ -23,6 +25,32 @@ USERS = [users.ROOT, users.ALICE, users.BOB, users.NOBODY]
 SHARES = {"first": "/srv/first", "inner": "/srv/first/inner", "second": "/srv/second", "deep": "/srv/way/to/deep"}
 RIGHTS = ("mountable", "read", "write")
 CASES_OF_A_SET = 6
+
+# Answers for the reverse names of two addresses. The first name has another address, and the second has none.
+NAME_SERVER = r"""
+import socket, struct
+REVERSE = {"12.0.9.10.in-addr.arpa": "alien.corp.test", "11.0.9.10.in-addr.arpa": "nowhere.corp.test"}
+FORWARD = {"alien.corp.test": "10.9.0.99"}
+def encoded(name):
+    return b"".join(bytes([len(label)]) + label.encode() for label in name.split(".")) + b"\0"
+server = socket.socket(socket.AF_INET, socket.SOCK_DGRAM)
+server.bind(("127.0.0.1", 53))
+print("ready", flush=True)
+while True:
+    query, client = server.recvfrom(512)
+    at, labels = 12, []
+    while query[at]:
+        labels.append(query[at + 1:at + 1 + query[at]].decode())
+        at += query[at] + 1
+    name, (kind,), end = ".".join(labels).lower(), struct.unpack(">H", query[at + 1:at + 3]), at + 5
+    data = encoded(REVERSE[name]) if kind == 12 and name in REVERSE else b""
+    data = socket.inet_aton(FORWARD[name]) if kind == 1 and name in FORWARD else data
+    flags = 0x8580 if name in REVERSE or name in FORWARD else 0x8583  # an answer, or no such name (RFC 1035)
+    answer = query[:2] + struct.pack(">HHHHH", flags, 1, 1 if data else 0, 0, 0) + query[12:end]
+    if data:
+        answer += b"\xc0\x0c" + struct.pack(">HHIH", kind, 1, 60, len(data)) + data
+    server.sendto(answer, client)
+"""
 
 
 @dataclasses.dataclass(frozen=True)
@@ -47,6 +75,7 @@ class Access:
 
     def __str__(self):
         return f"{self.share} {self.address} {self.user.name} version {self.version} port {self.port}"
+
 
 
 def network(choose, address):
@@ -81,10 +110,11 @@ def options(choose):
 
 
 def write_names(choose, machines, names):
-    """Gives some machines names of their IPv6 addresses, besides the names in /etc/hosts, or none. Returns whether a
-    machine has two addresses now."""
+    """Gives some machines names of their IPv6 addresses and aliases, besides the names in /etc/hosts, or none. Returns
+    whether a machine has two addresses now."""
     named = choose.choice([[], machines[:2], machines])
-    lines = [f"{machine.address6} {machine.name}\n" for machine in named]
+    lines = [f"{machine.address6} {machine.name}{choose.choice(['', ' alias6.elsewhere.test'])}\n" for machine in named]
+    lines += [f"{machine.address} {machine.name} alias.elsewhere.test\n" for machine in choose.choice([[], machines[:1]])]
     pathlib.Path("/etc/hosts").write_text(names + "".join(lines), encoding="ascii")
     return bool(named)
 
@@ -217,3 +247,35 @@ def test_an_explanation_is_what_the_kernel_does(box, client, other, third, names
     print(f"{cases} cases of seed {seed}: {dict(counts)}")
     assert not differences, f"seed {seed}:\n" + "\n".join(differences)
     assert all(cases // 60 <= counts[what] for what in (*RIGHTS, "rows", "IPv6")), "the cases show nearly nothing"
+
+
+@pytest.fixture
+def name_server(names):
+    """A name server with reverse names that do not lead back, for addresses that are not in /etc/hosts."""
+    configuration = pathlib.Path("/etc/resolv.conf")
+    before = configuration.read_text(encoding="ascii")
+    kept = [line for line in names.splitlines(keepends=True) if not line.startswith("10.9.0.1")]
+    pathlib.Path("/etc/hosts").write_text("".join(kept) + f"{BOX_ADDRESS} box.lab.test box\n", encoding="ascii")
+    configuration.write_text("nameserver 127.0.0.1\n", encoding="ascii")
+    with subprocess.Popen([sys.executable, "-c", NAME_SERVER], stdout=subprocess.PIPE, text=True) as server:
+        assert server.stdout.readline() == "ready\n"
+        yield
+        server.kill()
+    configuration.write_text(before, encoding="ascii")
+
+
+@pytest.mark.usefixtures("name_server")
+@pytest.mark.parametrize("rule", ["*.corp.test", "@corp", "@addresses", "10.9.0.1*"])
+def test_a_name_that_does_not_lead_back_is_believed(box, client, other, rule):
+    box.foresees("rpc.mountd|exportfs|Request: |explain")
+    pathlib.Path("/etc/netgroup").write_text(
+        "corp (alien.corp.test,,) (nowhere.corp.test,,)\naddresses (10.9.0.11,,) (10.9.0.12,,)\n", encoding="ascii")
+    box.share("trusting")
+    pathlib.Path("/etc/exports").write_text(f"/srv/trusting {rule}(rw,no_subtree_check)\n", encoding="ascii")
+    reload_exports()
+    for machine in (client, other):
+        answer = api.call("NFS.Access", "explain", share="trusting", client=machine.address)
+        assert answer["mountable"] == (rule != "10.9.0.1*"), answer
+        assert machine.mounts("/srv/trusting") == answer["mountable"]
+        [text] = [check["text"] for check in answer["checks"] if check["check"] == "name"]
+        assert "does not lead back" in text

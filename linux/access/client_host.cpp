@@ -15,16 +15,14 @@ bool Contains(const std::vector<std::string>& list, const std::string& text) {
   return std::find(list.begin(), list.end(), text) != list.end();
 }
 
-// Asks for the client's names and keeps them if the canonical one leads back to the address.
 void FindNames(const NameService& service, ClientHost* client) {
   const std::string& address = client->addresses.front();
-  const std::optional<std::vector<std::string>> names = service.names_of(address);
+  std::optional<std::vector<std::string>> names = service.names_of(address);
   client->is_away = !names.has_value();
   if (!names || names->empty()) return;
   const std::optional<std::vector<std::string>> addresses = service.resolve(names->front());
-  client->is_away = !addresses.has_value();
-  if (!addresses || !Contains(*addresses, address)) return;
-  client->names = *names;
+  client->is_name_confirmed = !addresses || Contains(*addresses, address);
+  client->names = std::move(*names);
 }
 
 bool IsHost(ClientHost* client, const std::string& host, const NameService& service, HostAddresses* hosts) {
@@ -47,25 +45,19 @@ bool IsInNetwork(const ClientHost& client, const std::string& network) {
   return addresses && address && Contains(*addresses, *address);
 }
 
-// Without a name, mountd compares the address itself with a pattern.
-std::vector<std::string> ComparedNames(const ClientHost& client) {
-  return client.names.empty() ? std::vector<std::string>{client.addresses.front()} : client.names;
-}
-
 bool IsInPattern(const ClientHost& client, const std::string& pattern) {
-  const std::vector<std::string> names = ComparedNames(client);
-  return std::any_of(names.begin(), names.end(), [&](const std::string& name) {
+  return std::any_of(client.names.begin(), client.names.end(), [&](const std::string& name) {
     return fnmatch(pattern.c_str(), name.c_str(), FNM_CASEFOLD) == 0;
   });
 }
 
+// mountd looks for the address and the short name, too, but only of a client that has a name.
 bool IsInNetgroup(const ClientHost& client, const std::string& netgroup, const NameService& service) {
-  std::vector<std::string> hosts = ComparedNames(client);
-  const std::string& name = hosts.front();
-  const bool has_domain = !client.names.empty() && name.find('.') != std::string::npos;
-  const std::string short_name = has_domain ? name.substr(0, name.find('.')) : name;
+  if (client.names.empty()) return false;
+  std::vector<std::string> hosts = client.names;
+  const std::string& name = client.names.front();
   hosts.push_back(client.addresses.front());
-  hosts.push_back(short_name);
+  hosts.push_back(name.substr(0, name.find('.')));
   return std::any_of(hosts.begin(), hosts.end(),
                      [&](const std::string& host) { return service.is_member(netgroup, host); });
 }

@@ -15,9 +15,12 @@ struct ClientHost {
   std::vector<std::string> addresses;  // of the question; the first one is the client's; empty if it has none
   bool is_away = false;                // whether the name service did not answer
 
-  // The client's names, the canonical one first. They count only if the first one leads back to the address. mountd
-  // compares only the client's own address with those of rules, not the other addresses of its name.
+  // The client's names, the canonical one first. mountd compares them with patterns and netgroups even if they do not
+  // lead back to the address. It compares only the client's own address with those of rules, not the other addresses
+  // of its name.
   std::vector<std::string> names;
+
+  bool is_name_confirmed = true;  // false if the client's address is none of those that the canonical name has
 };
 
 // Whether one of the exports is for a pattern of names or for a netgroup, which take the names of a client.

@@ -76,6 +76,13 @@ VORN::AccessRule OtherRule(const TableExport& one, const TableExport* decider, E
   return RuleOf(one, "directory", described + why);
 }
 
+// mountd does not ask for the addresses of a client's name.
+std::string UnconfirmedName(const ClientHost& client) {
+  if (client.is_name_confirmed) return "";
+  return " Its name " + Quoted(client.names.front()) +
+         " does not lead back to this address; rpc.mountd takes it all the same for rules of patterns and netgroups.";
+}
+
 }  // namespace
 
 // Answers one question.
@@ -127,7 +134,7 @@ class Explanation {
       checks_.Fail("name", "The name service has no address for " + Quoted(question_.client) + ".",
                    "Enter the host in the name service, or in /etc/hosts of the box.");
     } else {
-      checks_.Pass("name", "The client has the address " + client.addresses.front() + ".");
+      checks_.Pass("name", "The client has the address " + client.addresses.front() + "." + UnconfirmedName(client));
     }
   }
 

@@ -41,6 +41,22 @@ std::optional<Address> ReadAddress(const std::string& text) {
   return address;
 }
 
+// Asks gethostbyname(3), as rpc.mountd(8) does, for the aliases of a name. They may belong to another address of it.
+std::vector<std::string> AliasesOf(const std::string& name) {
+  std::vector<char> buffer(1024);
+  hostent entry{};
+  hostent* found = nullptr;
+  int error = 0;
+  while (gethostbyname_r(name.c_str(), &entry, buffer.data(), buffer.size(), &found, &error) == ERANGE) {
+    buffer.resize(buffer.size() * 2);
+  }
+  std::vector<std::string> aliases;
+  for (char** alias = found == nullptr ? nullptr : found->h_aliases; alias != nullptr && *alias != nullptr; ++alias) {
+    aliases.emplace_back(*alias);
+  }
+  return aliases;
+}
+
 std::optional<std::vector<std::string>> NamesOf(const std::string& text) {
   const std::optional<Address> address = ReadAddress(text);
   if (!address) return std::vector<std::string>();
@@ -52,13 +68,12 @@ std::optional<std::vector<std::string>> NamesOf(const std::string& text) {
                          &found, &error) == ERANGE) {
     buffer.resize(buffer.size() * 2);
   }
-  std::vector<std::string> names;
   if (found == nullptr) {
-    if (error == TRY_AGAIN || error == NO_RECOVERY) return std::nullopt;
-    return names;
+    const bool is_silent = error == TRY_AGAIN || error == NO_RECOVERY;
+    return is_silent ? std::nullopt : std::optional(std::vector<std::string>());
   }
-  names.emplace_back(found->h_name);
-  for (char** alias = found->h_aliases; *alias != nullptr; ++alias) names.emplace_back(*alias);
+  std::vector<std::string> names = AliasesOf(found->h_name);
+  names.insert(names.begin(), found->h_name);
   return names;
 }
 

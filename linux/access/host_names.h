@@ -15,7 +15,8 @@ namespace vorn {
 struct NameService {
   HostResolver resolve = ResolveHost;
 
-  // Returns the names of an address, the canonical one first; none if it has no name. nullopt: no answer.
+  // Returns the names of an address, the canonical one first; none if it has no name. nullopt: no answer. The others
+  // are the aliases of the canonical one.
   std::function<std::optional<std::vector<std::string>>(const std::string& address)> names_of;
 
   // Whether a host, by name or address, belongs to a netgroup (innetgr(3)).

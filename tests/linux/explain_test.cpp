@@ -198,16 +198,24 @@ TEST_F(Explain, ComparesEveryBitOfAnIPv6NetworkAndNoneAfterIt) {
   }
 }
 
-TEST_F(Explain, ComparesAnAddressWithoutANameWithAPattern) {
-  Export({{"10.0.0.*", "rw"}});
-  EXPECT_TRUE(Ask("10.0.0.5").mountable);
+TEST_F(Explain, AdmitsNoClientWithoutANameByAPatternOrANetgroup) {
+  names_.members = {{"trusted", "10.0.0.5"}};
+  Export({{"10.0.0.*", "rw"}, {"*", "ro"}, {"@trusted", "rw"}});
+  EXPECT_EQ(Ask("10.0.0.5").rule->client, "*");
+  names_.hosts = {{"c.example", "10.0.0.5"}};
+  EXPECT_EQ(Ask("10.0.0.5").rule->client, "@trusted") << "of a client with a name, the address counts, too";
 }
 
-TEST_F(Explain, TakesANameOnlyIfItLeadsBackToTheAddress) {
+TEST_F(Explain, TakesANameThatDoesNotLeadBackToTheAddress) {
   Export({{"*.example", "rw"}, {"10.9.0.5", "ro"}});
   names_.hosts = {{"c.example", "10.0.0.5"}, {"c.example", "10.9.0.5"}};
   EXPECT_THAT(Ask("10.0.0.5").names, ElementsAre("c.example"));
   EXPECT_TRUE(Ask("10.0.0.5").write) << "the rule for another address of the host does not count";
+  names_.aliens = {{"c.example", "192.0.2.1"}};
+  const VORN::AccessAnswer answer = Ask("192.0.2.1");
+  EXPECT_TRUE(answer.write);
+  EXPECT_THAT(TextOf(answer, "name"), HasSubstr("does not lead back"));
+  EXPECT_THAT(TextOf(Ask("10.0.0.5"), "name"), testing::Not(HasSubstr("lead")));
 }
 
 TEST_F(Explain, AsksForTheAddressesOfAName) {

@@ -18,7 +18,8 @@ struct NameTable {
   std::multimap<std::string, std::string> hosts;  // name to address; the first name of an address is canonical
   std::set<std::pair<std::string, std::string>> members;
   bool is_away = false;
-  int questions = 0;  // that were asked
+  int questions = 0;                                 // that were asked
+  std::multimap<std::string, std::string> aliens{};  // names of addresses that the names do not lead back to
 
   NameService service() {
     NameService service;
@@ -33,8 +34,10 @@ struct NameTable {
       ++questions;
       if (is_away) return std::nullopt;
       std::vector<std::string> names;
-      for (const auto& [name, of] : hosts) {
-        if (of == address) names.push_back(name);
+      for (const auto* table : {&hosts, &aliens}) {
+        for (const auto& [name, of] : *table) {
+          if (of == address) names.push_back(name);
+        }
       }
       return names;
     };

@@ -6,6 +6,7 @@
 
 #include <array>
 #include <cerrno>
+#include <chrono>
 #include <cstring>
 #include <map>
 #include <memory>
@@ -20,7 +21,7 @@ struct Address {
   std::array<unsigned char, sizeof(in6_addr)> bytes{};
 };
 
-constexpr int kMostSilences = 3;
+constexpr std::chrono::seconds kLongestWait{10};
 constexpr std::array<unsigned char, 12> kMappedPrefix = {0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0xff, 0xff};
 
 std::optional<Address> ReadAddress(const std::string& text) {
@@ -86,7 +87,7 @@ using Answer = std::optional<std::vector<std::string>>;
 // The answers of a name service.
 class Memory {
  public:
-  explicit Memory(NameService service) : service_(std::move(service)) {}
+  Memory(NameService service, NameService::Clock clock) : service_(std::move(service)), clock_(std::move(clock)) {}
 
   Answer Resolve(const std::string& name) { return Ask(service_.resolve, name, &addresses_); }
   Answer NamesOf(const std::string& address) { return Ask(service_.names_of, address, &names_); }
@@ -102,25 +103,27 @@ class Memory {
   Answer Ask(const Question& ask, const std::string& about, std::map<std::string, Answer>* answers) {
     const auto known = answers->find(about);
     if (known != answers->end()) return known->second;
-    if (silences_ >= kMostSilences) return std::nullopt;
+    if (waited_ >= kLongestWait) return std::nullopt;
+    const auto begin = clock_();
     const Answer& answer = answers->emplace(about, ask(about)).first->second;
-    if (!answer) ++silences_;
+    if (!answer) waited_ += clock_() - begin;
     return answer;
   }
 
   NameService service_;
+  NameService::Clock clock_;
   std::map<std::string, Answer> addresses_;
   std::map<std::string, Answer> names_;
   std::map<std::pair<std::string, std::string>, bool> members_;  // by netgroup and host
-  int silences_ = 0;
+  std::chrono::steady_clock::duration waited_{0};                // for answers that did not come
 };
 
 }  // namespace
 
 NameService NameService::OfSystem() { return {ResolveHost, NamesOf, IsMember}; }
 
-NameService NameService::Remembering(const NameService& service) {
-  const auto memory = std::make_shared<Memory>(service);
+NameService NameService::Remembering(const NameService& service, Clock clock) {
+  const auto memory = std::make_shared<Memory>(service, std::move(clock));
   return {[memory](const std::string& name) { return memory->Resolve(name); },
           [memory](const std::string& address) { return memory->NamesOf(address); },
           [memory](const std::string& netgroup, const std::string& host) { return memory->IsMember(netgroup, host); }};

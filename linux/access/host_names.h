@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_ACCESS_HOST_NAMES_H
 #define VORN_LINUX_ACCESS_HOST_NAMES_H
 
+#include <chrono>
 #include <functional>
 #include <optional>
 #include <string>
@@ -25,9 +26,12 @@ struct NameService {
   // The name service of this system.
   static NameService OfSystem();
 
-  // Returns a name service that asks `service` for each thing once, and asks nothing more after three questions without
-  // an answer, each of which may have taken a resolver's time limit. Not thread-safe; copies share the memory.
-  static NameService Remembering(const NameService& service);
+  using Clock = std::function<std::chrono::steady_clock::time_point()>;
+
+  // Returns a name service that asks `service` for each thing once, and asks nothing more after it has waited for ten
+  // seconds altogether for answers that did not come. A server that cannot be reached costs no time, so that the names
+  // in /etc/hosts are still found. Not thread-safe; copies share the memory.
+  static NameService Remembering(const NameService& service, Clock clock = std::chrono::steady_clock::now);
 };
 
 // Returns the usual text of an address, "10.0.0.1" also for "::ffff:10.0.0.1"; nullopt for every other text.

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <optional>
 #include <string>
 #include <utility>
@@ -50,15 +51,32 @@ TEST(NameService, ThatRemembersAsksForEachThingOnce) {
   EXPECT_EQ(table.questions, 5);
 }
 
-TEST(NameService, ThatDoesNotAnswerIsAskedNoMore) {
+TEST(NameService, ThatKeepsTheBoxWaitingIsAskedNoMore) {
   NameTable table{{{"c.example", "10.0.0.5"}}, {}};
-  const NameService service = NameService::Remembering(table.service());
+  std::chrono::steady_clock::time_point now;
+  NameService slow = table.service();
+  slow.names_of = [&now, ask = slow.names_of](const std::string& address) {
+    now += std::chrono::seconds(4);
+    return ask(address);
+  };
+  const NameService service = NameService::Remembering(slow, [&now] { return now; });
   EXPECT_TRUE(service.resolve("c.example"));
+  EXPECT_TRUE(service.names_of("10.0.0.5"));
   table.is_away = true;
-  for (int host = 0; host < 9; ++host) EXPECT_FALSE(service.names_of("10.0.0." + std::to_string(host)));
+  for (int host = 10; host < 19; ++host) EXPECT_FALSE(service.names_of("10.0.0." + std::to_string(host)));
   EXPECT_FALSE(service.resolve("d.example"));
-  EXPECT_EQ(table.questions, 4);
+  EXPECT_EQ(table.questions, 5);
   EXPECT_TRUE(service.resolve("c.example"));  // it is remembered
+}
+
+TEST(NameService, ThatFailsAtOnceIsAskedAgain) {
+  NameTable table{{{"c.example", "10.0.0.5"}}, {}};
+  const NameService service =
+      NameService::Remembering(table.service(), [] { return std::chrono::steady_clock::time_point(); });
+  table.is_away = true;
+  for (int host = 10; host < 19; ++host) EXPECT_FALSE(service.names_of("10.0.0." + std::to_string(host)));
+  table.is_away = false;
+  EXPECT_TRUE(service.names_of("10.0.0.5"));
 }
 
 }  // namespace

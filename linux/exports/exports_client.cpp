@@ -74,7 +74,7 @@ Status CheckNetwork(std::string_view client) {
   const std::size_t slash = client.find('/');
   const std::string_view size = client.substr(slash + 1);
   if (!ReadAddress(client.substr(0, slash))) return Refuse(client, "what stands before \"/\" is no address");
-  if (size == "0") {
+  if (HasPrefixOfLengthZero(client)) {
     return Refuse(client,
                   "rpc.mountd does not take a prefix of length 0 for all addresses; \"*\" is every client, "
                   "\"0.0.0.0/0.0.0.0\" is all of IPv4, and \"::/::\" is all of IPv6");
@@ -224,6 +224,12 @@ std::optional<ExportNetwork> ReadExportNetwork(std::string_view client) {
   if (!mask || mask->family != network->family) return std::nullopt;
   network->mask = mask->address;
   return network;
+}
+
+bool HasPrefixOfLengthZero(std::string_view client) {
+  const std::size_t slash = client.find('/');
+  return slash != std::string_view::npos && ReadAddress(client.substr(0, slash)) &&
+         client.find_first_not_of('0', slash + 1) == std::string_view::npos;
 }
 
 bool Contains(const ExportNetwork& network, const ExportNetwork& inner) {

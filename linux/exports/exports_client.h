@@ -46,6 +46,10 @@ std::optional<int> PrefixLength(const ExportNetwork::Address& mask);
 // CheckExportClient() does, among it masks with gaps. Returns nullopt for every other client.
 std::optional<ExportNetwork> ReadExportNetwork(std::string_view client);
 
+// Whether the client is a network with a prefix of length 0, which rpc.mountd(8) takes for one address, or for 32 bits
+// of IPv6, on most processors.
+bool HasPrefixOfLengthZero(std::string_view client);
+
 // Whether all addresses of `inner` are in the network.
 bool Contains(const ExportNetwork& network, const ExportNetwork& inner);
 

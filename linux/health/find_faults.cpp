@@ -48,6 +48,7 @@ constexpr Check kChecks[] = {
     {"left_share", FindExportsOfLeftShares, true, true},
     {"foreign_export", FindForeignExports, true, true},
     {"linked_export", FindLinkedExports, true, true},
+    {"narrow_network", FindNarrowNetworks, true, false},
     {"hidden_rule", FindHiddenRules, true, false},
     {"crossed_volume", FindCrossedVolumes, true, false},
     {"nested_share", FindNestedShares, true, true},

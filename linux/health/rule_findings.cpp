@@ -137,6 +137,25 @@ struct Export {
 
 }  // namespace
 
+Status FindNarrowNetworks(const HealthInput& input, Findings* findings) {
+  for (const ExportedLine& line : input.exported) {
+    for (const ExportEntry& entry : line.line->entries) {
+      if (!HasPrefixOfLengthZero(entry.client)) continue;
+      VORN::HealthSubject subject = line.Subject();
+      subject.client = entry.client;
+      const bool is_ipv4 = entry.client.find(':') == std::string::npos;
+      findings->Warning(std::move(subject),
+                        line.Name() + " has a rule for " + entry.client + " on " + line.Exported() +
+                            ". rpc.mountd takes a prefix of length 0 for one of 32 bits on most processors, so that " +
+                            (is_ipv4 ? "only this address" : "only this network of 32 bits") + " is admitted.",
+                        std::string("Write ") +
+                            (is_ipv4 ? "0.0.0.0/0.0.0.0 for all of IPv4" : "::/:: for all of IPv6") +
+                            ", or \"*\" for every client.");
+    }
+  }
+  return {};
+}
+
 Status FindHiddenRules(const HealthInput& input, Findings* findings) {
   for (const ExportedLine& first : input.exported) {
     const std::vector<std::size_t>& lines = input.lines_of.at(first.directory);

@@ -8,6 +8,9 @@
 
 namespace vorn {
 
+// Rules for a network with a prefix of length 0, which admit far fewer clients than they seem to.
+Status FindNarrowNetworks(const HealthInput& input, Findings* findings);
+
 // Rules that have no effect, because an earlier rule of the directory has all their addresses.
 Status FindHiddenRules(const HealthInput& input, Findings* findings);
 

@@ -289,6 +289,18 @@ TEST_F(Health, FindsHostsThatHaveMoved) {
   EXPECT_THAT(finding.text, HasSubstr("10.0.0.9"));
 }
 
+TEST_F(Health, FindsNetworksWithAPrefixOfLengthZero) {
+  for (const char* client : {"0.0.0.0/0", "10.0.0.1/00", "10.0.0.1/", "::/0"}) {
+    Export("/srv/data 10.0.0.0/24(rw)\n/srv/media " + std::string(client) + "(ro)\n");
+    const VORN::HealthFinding finding = FindOne("narrow_network");
+    EXPECT_EQ(finding.severity, Severity::kWarning);
+    EXPECT_EQ(finding.subject.client, client);
+    EXPECT_THAT(finding.remedy, HasSubstr(finding.subject.client[0] == ':' ? "::/::" : "0.0.0.0/0.0.0.0"));
+  }
+  Export("/srv/media 0.0.0.0/0.0.0.0(ro) ::/::(ro) 10.0.0.0/8(ro) 10.0.0.10/30(ro) *(ro)\n");
+  EXPECT_THAT(Find("narrow_network"), IsEmpty());
+}
+
 TEST_F(Health, FindsRulesThatEarlierOnesHide) {
   const std::pair<const char*, const char*> hidden[] = {
       {"10.0.0.0/8(ro) 10.0.1.0/24(rw)", "10.0.1.0/24"},

@@ -34,6 +34,7 @@ const TITLES: Record<string, string> = {
   left_share: /*i18n*/ 'A folder is exported and no longer shared',
   foreign_export: /*i18n*/ 'Another file exports a shared folder',
   linked_export: /*i18n*/ 'A shared folder is exported by a symbolic link',
+  narrow_network: /*i18n*/ 'A rule admits fewer clients than it seems to',
   hidden_rule: /*i18n*/ 'A rule has no effect',
   crossed_volume: /*i18n*/ 'A rule opens a volume to further clients',
   nested_share: /*i18n*/ 'The rules of an outer folder decide',

@@ -19,7 +19,8 @@ from harness.programs import ProgramFailed, as_user, run
 CLIENTS = ["client.lab.test", "other.lab.test", "10.9.0.11", "10.9.0.12", "10.9.7.13", "10.9.0.0/24", "10.9.0.8/30",
            "10.9.0.0/255.255.0.0", "fd00:9::b", "fd00:9:0::70d", "FD00:9::/64", "fd00:9::8/125", "fd00:9::/ffff:ffff::",
            "::ffff:10.9.0.11", "::ffff:10.9.0.0/112", "*.lab.test", "?lient.lab.test", "*.elsewhere.test", "10.9.0.1*",
-           "fd00:9::?", "@trusted", "@all", "*"]
+           "fd00:9::?", "[co]*.lab.test", "[^c]*.lab.test", "[!c]*.test", "*.LAB.test", "[C-O]*", "*l?as*", "[b-d]*",
+           "**", "@trusted", "@all", "*"]
 NETGROUPS = "trusted (other.lab.test,,) (third,,)\nall (client.lab.test,,) (10.9.0.12,,) (third.elsewhere.test,,)\n"
 USERS = [users.ROOT, users.ALICE, users.BOB, users.NOBODY]
 SHARES = {"first": "/srv/first", "inner": "/srv/first/inner", "second": "/srv/second", "deep": "/srv/way/to/deep"}

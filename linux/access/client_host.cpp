@@ -1,12 +1,11 @@
 #include "client_host.h"
 
-#include <fnmatch.h>
-
 #include <algorithm>
 #include <optional>
 #include <utility>
 
 #include "exports_client.h"
+#include "host_pattern.h"
 
 namespace vorn {
 namespace {
@@ -46,9 +45,8 @@ bool IsInNetwork(const ClientHost& client, const std::string& network) {
 }
 
 bool IsInPattern(const ClientHost& client, const std::string& pattern) {
-  return std::any_of(client.names.begin(), client.names.end(), [&](const std::string& name) {
-    return fnmatch(pattern.c_str(), name.c_str(), FNM_CASEFOLD) == 0;
-  });
+  return std::any_of(client.names.begin(), client.names.end(),
+                     [&](const std::string& name) { return MatchesHostPattern(name, pattern); });
 }
 
 // mountd looks for the address and the short name, too, but only of a client that has a name.

@@ -98,7 +98,7 @@ Status CheckNetgroup(std::string_view client) {
 // Returns the length of a set of characters such as "[a-z0]" at the beginning of `text`; 0 if it is not well formed.
 std::size_t SetLength(std::string_view text) {
   std::size_t at = 1;
-  if (at < text.size() && (text[at] == '!' || text[at] == '^')) ++at;
+  if (at < text.size() && text[at] == '^') ++at;
   const std::size_t first = at;
   while (at < text.size() && (IsNameCharacter(text[at]) || text[at] == '.')) ++at;
   return at > first && at < text.size() && text[at] == ']' ? at + 1 : 0;
@@ -109,6 +109,7 @@ Status CheckPattern(std::string_view client) {
     const char c = client[at];
     if (IsNameCharacter(c) || c == '.' || c == '*' || c == '?') continue;
     const std::size_t length = c == '[' ? SetLength(client.substr(at)) : 0;
+    if (client.substr(at, 2) == "[!") return Refuse(client, "rpc.mountd negates a set of characters with \"[^\" only");
     if (length == 0) return Refuse(client, c == '[' ? "a bracket without its partner" : "no pattern of host names");
     at += length - 1;
   }

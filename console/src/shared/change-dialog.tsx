@@ -4,7 +4,7 @@ import { i18n } from '@lingui/core';
 import { Button, Modal, ModalBody, ModalFooter, ModalHeader, Progress, Spinner } from '@patternfly/react-core';
 import { call, Failure, type Answer, type Data, type Method, type Options, type Parameters } from '../api/call';
 import { Conflict, type Fact } from './conflict';
-import { readAgain, REHEARSAL } from './read-again';
+import { PREVIEWS, readAgain, REHEARSAL } from './read-again';
 import { Problem, Warnings } from './problem';
 import { RehearsalView } from './rehearsal';
 import { toast } from './toasts';
@@ -58,6 +58,7 @@ export function useChange<M extends Method>(
   return useMutation({
     mutationFn: ({ method, parameters, tag, form }: Change<M>) =>
       call(method, parameters, { ifMatch: tag, ...(form && { form, ...sending }) }),
+    onMutate: () => client.cancelQueries({ queryKey: PREVIEWS }),
     onSuccess: async (answer, { method }) => {
       await readAgain(client);
       toast(done, { warnings: answer.warnings, isRecorded: isRecorded(method) });

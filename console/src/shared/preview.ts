@@ -1,8 +1,8 @@
 import { useEffect, useState } from 'react';
-import { keepPreviousData, useQuery } from '@tanstack/react-query';
+import { keepPreviousData, useIsMutating, useQuery } from '@tanstack/react-query';
 import { call, type Method } from '../api/call';
 import type { Change } from './change-dialog';
-import { REHEARSAL } from './read-again';
+import { PREVIEWS } from './read-again';
 
 const PAUSE = 400; // milliseconds without an edit, after which the server is asked
 
@@ -21,16 +21,20 @@ function useSettled<T>(value: T): T {
   return settled;
 }
 
-/** What a change would do, while it is being edited; null asks for nothing. */
+/**
+ * What a change would do, while it is being edited; null asks for nothing. While a change is being made, nothing is asked
+ * either: the tag of what is edited is outdated as soon as that has succeeded.
+ */
 export function usePreview<M extends Method>(change: Change<M> | null) {
   const settled = useSettled(change);
+  const isChanging = useIsMutating() > 0;
   return useQuery({
-    queryKey: [REHEARSAL, 'preview', settled],
+    queryKey: [...PREVIEWS, settled],
     queryFn: ({ signal }) => {
       if (!settled) throw new Error('nothing to rehearse');
       return call(settled.method, settled.parameters, { ifMatch: settled.tag, rehearse: true, signal });
     },
-    enabled: settled !== null && change !== null,
+    enabled: settled !== null && change !== null && !isChanging,
     placeholderData: keepPreviousData,
     staleTime: Infinity,
     gcTime: 0,

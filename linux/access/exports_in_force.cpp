@@ -99,54 +99,30 @@ std::set<std::string> AddHosts(const std::set<std::string>& names, const NameSer
   return known;
 }
 
-// The single hosts of directories, as pairs of a directory and an address or a name.
-using Hosts = std::set<std::pair<std::string, std::string>>;
-
-// Returns the hosts that the files name, host names by their addresses.
-Hosts HostsOfFiles(const std::vector<SharedExportsFile>& files, const ExportPaths& paths,
-                   const HostAddresses& addresses) {
-  PathResolver resolver(paths);
-  Hosts hosts;
-  for (const SharedExportsFile& file : files) {
-    const auto lines = file->document.Lines();
-    for (const ExportLine& line : *lines) {
-      const std::string directory = resolver.Resolve(line.path);
-      for (const ExportEntry& entry : line.entries) {
-        const std::string key = ExportClientKey(entry.client);
-        hosts.emplace(directory, key);
-        const auto host = addresses.find(key);
-        if (host == addresses.end()) continue;
-        for (const std::string& address : host->second) hosts.emplace(directory, address);
-      }
-    }
-  }
-  return hosts;
-}
-
 // Returns the addresses of the host of a line of the table; the client of the line if it is no known host name.
 // exportfs(8) uses a name of the host also for a rule that names one of its addresses: only this one counts then.
 std::vector<std::string> AddressesOf(const ExportTableLine& line, const HostAddresses& addresses,
-                                     const Hosts& written) {
+                                     const Places& places) {
   const std::string key = ExportClientKey(line.client);
   const auto host = addresses.find(key);
   if (host == addresses.end()) return {key};
   std::vector<std::string> named;
   for (const std::string& address : host->second) {
-    if (written.count({line.path, address}) != 0) named.push_back(address);
+    if (places.count({line.path, address}) != 0) named.push_back(address);
   }
   return named.empty() ? host->second : named;
 }
 
 // Returns the table with the addresses of its host names, as a plan lists them, and with the first rule of each host of
 // a directory, which counts.
-Result<std::string> ByAddress(std::string_view table, const HostAddresses& hosts, const Hosts& written) {
+Result<std::string> ByAddress(std::string_view table, const HostAddresses& hosts, const Places& places) {
   const Result<std::vector<ExportTableLine>> lines = ReadExportTable(table);
   if (!lines.ok()) return lines.status();
   std::string text;
-  Hosts seen;
+  std::set<std::pair<std::string, std::string>> seen;  // directories and addresses
   for (const ExportTableLine& line : *lines) {
     const bool is_name = hosts.count(ExportClientKey(line.client)) != 0;
-    for (const std::string& address : AddressesOf(line, hosts, written)) {
+    for (const std::string& address : AddressesOf(line, hosts, places)) {
       if (!seen.emplace(line.path, address).second) continue;
       text += is_name ? EncodeExportsWord(line.path) + "\t" + address + "(" + std::string(line.options) + ")\n"
                       : std::string(line.text);
@@ -187,7 +163,7 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
 
 Result<std::set<std::string>> FindPendingExports(const std::vector<SharedExportsFile>& files, std::string_view table,
                                                  const ExportPaths& paths, const HostAddresses& hosts) {
-  const Result<std::string> by_address = ByAddress(table, hosts, HostsOfFiles(files, paths, hosts));
+  const Result<std::string> by_address = ByAddress(table, hosts, FindPlaces(files, hosts, paths));
   if (!by_address.ok()) return by_address.status();
   Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
   if (!update.ok()) return update.status();

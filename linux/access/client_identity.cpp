@@ -3,10 +3,10 @@
 #include <strings.h>
 
 #include <algorithm>
-#include <cctype>
 #include <charconv>
 #include <string_view>
 
+#include "ascii.h"
 #include "host_domain.h"
 #include "idmap.h"
 #include "nfs_configuration.h"
@@ -117,15 +117,10 @@ Status ManageGroups(Box& box, const People& people, VORN::AccessIdentity* ids) {
   return {};
 }
 
-std::string UpperCase(std::string text) {
-  for (char& c : text) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-  return text;
-}
-
 // Whether libnfsidmap takes a realm for its own: General/Local-Realms, by default the domain in capital letters.
 bool IsLocalRealm(const IDMap& map, const std::string& realm) {
   const std::optional<IniFound> realms = map.files().Find("General", "Local-Realms");
-  if (!realms) return realm == UpperCase(map.domain() ? *map.domain() : HostDomain::OfThisHost().Get());
+  if (!realms) return realm == UpperAscii(map.domain() ? *map.domain() : HostDomain::OfThisHost().Get());
   std::string_view rest = realms->value;
   while (!rest.empty()) {
     std::string_view one = rest.substr(0, rest.find(','));

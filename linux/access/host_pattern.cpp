@@ -1,11 +1,11 @@
 #include "host_pattern.h"
 
+#include "ascii.h"
+
 namespace vorn {
 namespace {
 
-char UpperCase(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
-
-bool IsSame(char a, char b) { return UpperCase(a) == UpperCase(b); }
+bool IsSame(char a, char b) { return LowerAscii(a) == LowerAscii(b); }
 
 // Whether a character is in the set that begins at `*pattern`, which becomes what follows the set. A set without an end
 // has no characters.

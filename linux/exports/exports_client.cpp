@@ -11,6 +11,7 @@
 #include <memory>
 #include <optional>
 
+#include "ascii.h"
 #include "exports_text.h"
 
 namespace vorn {
@@ -143,12 +144,6 @@ Status CheckHostName(std::string_view client) {
 
 bool IsPattern(std::string_view client) { return client.find_first_of("*?[") != std::string_view::npos; }
 
-std::string LowerCase(std::string_view text) {
-  std::string lower(text);
-  for (char& c : lower) c = c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
-  return lower;
-}
-
 std::string AddressText(int family, const Address& address) {
   std::array<char, INET6_ADDRSTRLEN> text{};
   return inet_ntop(family, address.data(), text.data(), text.size());
@@ -192,7 +187,7 @@ Status CheckExportClient(std::string_view client) {
 
 std::string ExportClientKey(std::string_view client) {
   if (const auto address = NumericHost(client)) return *address;
-  return LowerCase(IsExportHostName(client) ? WithoutFinalDot(client) : client);
+  return LowerAscii(IsExportHostName(client) ? WithoutFinalDot(client) : client);
 }
 
 ExportNetwork::Address PrefixMask(int length) {

@@ -1,5 +1,5 @@
 // Case folding of names that are compared without regard to case in ASCII only, whatever the locale: the names of
-// INI files (nfs.conf(5)), host names (RFC 4343), principals as libnfsidmap compares them.
+// INI files (nfs.conf(5)), host names (RFC 4343), principals as libnfsidmap compares them, realms made of host names.
 #ifndef VORN_LINUX_TEXT_ASCII_H
 #define VORN_LINUX_TEXT_ASCII_H
 
@@ -15,6 +15,14 @@ inline std::string LowerAscii(std::string_view text) {
   std::string lower(text);
   std::transform(lower.begin(), lower.end(), lower.begin(), [](char c) { return LowerAscii(c); });
   return lower;
+}
+
+inline char UpperAscii(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
+
+inline std::string UpperAscii(std::string_view text) {
+  std::string upper(text);
+  std::transform(upper.begin(), upper.end(), upper.begin(), [](char c) { return UpperAscii(c); });
+  return upper;
 }
 
 }  // namespace vorn

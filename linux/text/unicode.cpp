@@ -12,6 +12,8 @@
 #include <cstring>
 #include <memory>
 
+#include "ascii.h"
+
 namespace vorn {
 namespace {
 
@@ -77,16 +79,10 @@ bool IsAscii(std::string_view text) {
   return (all & 0x8080808080808080U) == 0;
 }
 
-char UpperAscii(char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; }
-
 }  // namespace
 
 Result<std::string> UpperCase(std::string_view text) {
-  if (IsAscii(text)) {
-    std::string upper(text);
-    std::transform(upper.begin(), upper.end(), upper.begin(), UpperAscii);
-    return upper;
-  }
+  if (IsAscii(text)) return UpperAscii(text);
   if (u8_check(Bytes(text), text.size()) != nullptr) return Status::Failure(EILSEQ, "the text is not UTF-8");
   std::size_t size = 0;
   const Utf8 upper(u8_toupper(Bytes(text), text.size(), "", nullptr, nullptr, &size), &std::free);

@@ -10,8 +10,8 @@
 #include "configuration_lock.h"
 #include "core.h"
 #include "current_box.h"
+#include "history_support.h"
 #include "injected_failures.h"
-#include "processes.h"
 #include "recovery.h"
 #include "writes.h"
 
@@ -21,19 +21,13 @@ namespace {
 constexpr char kFile[] = "/etc/exports";
 constexpr char kOther[] = "/etc/nfs.conf.d/vorn.conf";
 
-Status Save(const std::string& path, const std::string& text) {
-  Box& box = RealBox();
-  const Result<StoredFile> before = box.Read(path);
-  return before.ok() ? box.Replace(path, text, before->version) : before.status();
-}
-
 void ChangeTwoFiles() {
   VORN::CallDescription description;
   description.caller = "alice";
   description.method = "two files";
   const VORN::CallContext call(description);
   const ConfigurationLock lock(RealBox());
-  static_cast<void>(Save(kFile, "new\n").ok() && Save(kOther, "new\n").ok() && KLIBServiceReload("nfsd") == 0);
+  static_cast<void>(SaveFile(kFile, "new\n").ok() && SaveFile(kOther, "new\n").ok() && KLIBServiceReload("nfsd") == 0);
 }
 
 // The contents of a file over the history, newest first, and who changed it.
@@ -41,22 +35,14 @@ void ExpectAttributed(const TemporaryRoot& root, int count) {
   for (const char* path : {kFile, kOther}) {
     const std::string now = root.Read(path).value();
     int changes = 0;
-    const Status walked = RealHistory().Walk([&](const History::Change& change) {
+    for (const History::Change& change : AllRecorded()) {
       EXPECT_NE(change.message.kind, kByHand) << "call " << count;
-      if (change.message.kind != kByCall) return true;
+      if (change.message.kind != kByCall) continue;
       EXPECT_EQ(change.message.caller, "alice") << "call " << count;
       for (const std::string& file : change.message.files) changes += file == path ? 1 : 0;
-      return true;
-    });
-    EXPECT_TRUE(walked.ok()) << walked.reason() << ", call " << count;
+    }
     EXPECT_EQ(changes, now == "new\n" ? 1 : 0) << path << ", call " << count;
   }
-}
-
-void ExpectValid(const TemporaryRoot& root, int count) {
-  const ProgramResult result =
-      RunProgram({"git", "--git-dir", root.At(kHistoryFolder), "fsck", "--full", "--strict", "--no-dangling"});
-  EXPECT_EQ(result.status, 0) << result.output << result.errors << ", call " << count;
 }
 
 // Kills the change at its system call number `count`. Returns false if it made fewer calls. `with_history`: there is
@@ -74,7 +60,7 @@ bool KilledAt(int count, bool with_history) {
   EXPECT_EQ(VORN::RemoveLeftovers(), 0) << "call " << count;
   for (const LogLine& line : TakeLog()) ADD_FAILURE() << line.text << ", call " << count;
   ExpectAttributed(root, count);
-  if (count % 16 == 0) ExpectValid(root, count);
+  if (count % 16 == 0) ExpectValidHistory(root, ", call " + std::to_string(count));
   return !ended;
 }
 

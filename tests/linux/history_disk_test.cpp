@@ -14,9 +14,8 @@
 #include "call.h"
 #include "captured_log.h"
 #include "change_history.h"
-#include "configuration_lock.h"
 #include "core.h"
-#include "current_box.h"
+#include "history_support.h"
 #include "processes.h"
 #include "recovery.h"
 #include "writes.h"
@@ -96,39 +95,16 @@ VORN::CallDescription CallOf(const char* caller) {
   return call;
 }
 
-int Save(const std::string& path, const std::string& text) {
-  Box& box = RealBox();
-  const ConfigurationLock lock(box);
-  const Result<StoredFile> before = box.Read(path);
-  return before.ok() && box.Replace(path, text, before->version).ok() ? 0 : -1;
-}
-
-std::vector<History::Change> Changes() {
-  std::vector<History::Change> changes;
-  const Status status = RealHistory().Walk([&](const History::Change& change) {
-    changes.push_back(change);
-    return true;
-  });
-  EXPECT_TRUE(status.ok()) << status.reason();
-  return changes;
-}
-
 // The later changes of these files, newest first: "KIND CALLER". No change is taken for an edit by hand.
 std::vector<std::string> ChangesOf(const std::string& path) {
   std::vector<std::string> found;
-  for (const History::Change& change : Changes()) {
+  for (const History::Change& change : AllRecorded()) {
     EXPECT_NE(change.message.kind, kByHand);
     const std::vector<std::string>& files = change.message.files;
     if (change.message.kind == kFound || std::find(files.begin(), files.end(), path) == files.end()) continue;
     found.push_back(change.message.kind + " " + change.message.caller);
   }
   return found;
-}
-
-void ExpectValid(const TemporaryRoot& root) {
-  const ProgramResult result =
-      RunProgram({"git", "--git-dir", root.At(kHistoryFolder), "fsck", "--full", "--strict", "--no-dangling"});
-  EXPECT_EQ(result.status, 0) << result.output << result.errors;
 }
 
 using HistoryDisk = Writes;
@@ -173,11 +149,11 @@ TEST_F(HistoryDisk, FailsNoChangeAndTheNextOneIsRecorded) {
       EXPECT_NE(ContentsOf(disk.root(), change), before);
       (disk.*fault.recover)();
       VORN::CallContext call(CallOf("bob"));
-      for (const char* path : change.files) ASSERT_EQ(Save(path, "later\n"), 0);
+      for (const char* path : change.files) ASSERT_TRUE(SaveFile(path, "later\n").ok());
       call.End();
       EXPECT_THAT(call.warnings(), Each(Not(HasSubstr("history"))));
       for (const char* path : change.files) EXPECT_EQ(ChangesOf(path).front(), "change bob") << path;
-      ExpectValid(disk.root());
+      ExpectValidHistory(disk.root());
     }
   }
   std::cout << "  " << cases << " cases\n";
@@ -190,25 +166,25 @@ TEST_F(HistoryDisk, ThatFillsDuringAChangeHasTheChangeLater) {
     ASSERT_EQ(VORN::RemoveLeftovers(), 0);
     {
       VORN::CallContext call(CallOf("alice"));
-      ASSERT_EQ(Save(kFile, "new\n"), 0);
+      ASSERT_TRUE(SaveFile(kFile, "new\n").ok());
       (disk.*fault.inject)();
       call.End();
       EXPECT_THAT(call.warnings(), Contains(StartsWith("A change is not in the history yet")));
     }
     {
       VORN::CallContext call(CallOf("carol"));
-      EXPECT_EQ(Save(kOther, "new\n"), 0);
+      EXPECT_TRUE(SaveFile(kOther, "new\n").ok());
       call.End();
       EXPECT_THAT(call.warnings(), Contains(StartsWith("The history has no record of a change of ")));
     }
     (disk.*fault.recover)();
     {
       const VORN::CallContext call(CallOf("bob"));
-      ASSERT_EQ(Save(kOther, "later\n"), 0);
+      ASSERT_TRUE(SaveFile(kOther, "later\n").ok());
     }
     EXPECT_THAT(ChangesOf(kFile), ElementsAre("change alice"));
     EXPECT_THAT(ChangesOf(kOther), ElementsAre("change bob", "late "));
-    ExpectValid(disk.root());
+    ExpectValidHistory(disk.root());
   }
 }
 
@@ -218,16 +194,16 @@ TEST_F(HistoryDisk, IsNotForgottenByAnotherProcess) {
     const Disk disk;
     ASSERT_EQ(VORN::RemoveLeftovers(), 0);
     (disk.*fault.inject)();
-    ChildProcess child([] { return Save(kFile, "new\n") == 0 ? 0 : 1; });
+    ChildProcess child([] { return SaveFile(kFile, "new\n").ok() ? 0 : 1; });
     EXPECT_EQ(child.Wait(), 0);
     TakeLog();
     (disk.*fault.recover)();
-    ASSERT_EQ(Save(kOther, "later\n"), 0);
+    ASSERT_TRUE(SaveFile(kOther, "later\n").ok());
     // A full disk may have room for a line of the journal.
     EXPECT_THAT(ChangesOf(kFile), ElementsAre(AnyOf("late ", StartsWith("change "))));
     disk.root().Write(kFile, "by hand\n");
-    ASSERT_EQ(Save(kOther, "more\n"), 0);
-    const std::vector<History::Change> changes = Changes();
+    ASSERT_TRUE(SaveFile(kOther, "more\n").ok());
+    const std::vector<History::Change> changes = AllRecorded();
     EXPECT_TRUE(std::any_of(changes.begin(), changes.end(),
                             [](const History::Change& change) { return change.message.kind == kByHand; }));
   }

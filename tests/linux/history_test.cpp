@@ -13,6 +13,7 @@
 #include "configuration_lock.h"
 #include "core.h"
 #include "current_box.h"
+#include "history_support.h"
 #include "processes.h"
 #include "recovery.h"
 #include "rehearsal.h"
@@ -45,34 +46,10 @@ std::string Git(const TemporaryRoot& root, std::vector<std::string> arguments) {
   return result.output;
 }
 
-// The repository is one that git has nothing to say about.
-void ExpectValid(const TemporaryRoot& root) {
-  const ProgramResult result =
-      RunProgram({"git", "--git-dir", root.At(kHistoryFolder), "fsck", "--full", "--strict", "--no-dangling"});
-  EXPECT_EQ(result.status, 0) << result.output << result.errors;
-}
-
-std::vector<History::Change> Changes() {
-  std::vector<History::Change> changes;
-  const Status status = RealHistory().Walk([&](const History::Change& change) {
-    changes.push_back(change);
-    return true;
-  });
-  EXPECT_TRUE(status.ok()) << status.reason();
-  return changes;
-}
-
 std::vector<std::string> Kinds() {
   std::vector<std::string> kinds;
-  for (const History::Change& change : Changes()) kinds.push_back(change.message.kind);
+  for (const History::Change& change : AllRecorded()) kinds.push_back(change.message.kind);
   return kinds;
-}
-
-Status Save(const std::string& path, const std::string& text) {
-  Box& box = RealBox();
-  const ConfigurationLock lock(box);
-  const Result<StoredFile> before = box.Read(path);
-  return before.ok() ? box.Replace(path, text, before->version) : before.status();
 }
 
 VORN::CallDescription CallOf(const char* caller) {
@@ -99,21 +76,21 @@ class HistoryTest : public Writes {
 
 TEST_F(HistoryTest, IsOffOnATrialRootUnlessItIsSwitchedOn) {
   root.Write(kPlatformFile, "");
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
   EXPECT_FALSE(std::filesystem::exists(root.At(kHistoryFolder)));
   EXPECT_FALSE(std::filesystem::exists(root.At(kHistoryJournal)));
-  EXPECT_THAT(Changes(), IsEmpty());
+  EXPECT_THAT(AllRecorded(), IsEmpty());
 }
 
 TEST_F(HistoryTest, SaysWhoChangedWhichFilesInWhichCall) {
   {
     const VORN::CallContext call(CallOf("alice"));
     const ConfigurationLock lock(RealBox());
-    ASSERT_TRUE(Save(kFile, "/a *(ro)\n").ok());
-    ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
+    ASSERT_TRUE(SaveFile(kFile, "/a *(ro)\n").ok());
+    ASSERT_TRUE(SaveFile(kOther, "[nfsd]\n").ok());
     EXPECT_EQ(KLIBServiceRestart("nfsd"), 0);
   }
-  const std::vector<History::Change> changes = Changes();
+  const std::vector<History::Change> changes = AllRecorded();
   ASSERT_THAT(changes, SizeIs(1));
   const ChangeMessage& message = changes[0].message;
   EXPECT_EQ(message.kind, kByCall);
@@ -125,20 +102,20 @@ TEST_F(HistoryTest, SaysWhoChangedWhichFilesInWhichCall) {
   EXPECT_THAT(message.actions, ElementsAre("restart: done"));
   EXPECT_THAT(Git(root, {"log"}), AllOf(HasSubstr("Author: alice <192.0.2.7>"), HasSubstr("Service: restart: done")));
   EXPECT_EQ(Git(root, {"show", "main:etc/exports"}), "/a *(ro)\n");
-  ExpectValid(root);
+  ExpectValidHistory(root);
 }
 
 TEST_F(HistoryTest, HasAllStepsOfACallAsOneChange) {
   {
     VORN::CallContext call(CallOf("alice"));
-    ASSERT_TRUE(Save(kFile, "/a *(ro)\n").ok());
-    ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
+    ASSERT_TRUE(SaveFile(kFile, "/a *(ro)\n").ok());
+    ASSERT_TRUE(SaveFile(kOther, "[nfsd]\n").ok());
     EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
-    EXPECT_THAT(Changes(), IsEmpty());
+    EXPECT_THAT(AllRecorded(), IsEmpty());
     call.End();
-    EXPECT_THAT(Changes(), SizeIs(1));
+    EXPECT_THAT(AllRecorded(), SizeIs(1));
   }
-  const std::vector<History::Change> changes = Changes();
+  const std::vector<History::Change> changes = AllRecorded();
   ASSERT_THAT(changes, SizeIs(1));
   EXPECT_THAT(changes[0].message.files, ElementsAre(kFile, kOther));
   EXPECT_THAT(changes[0].message.actions, ElementsAre("reload: done"));
@@ -148,16 +125,16 @@ TEST_F(HistoryTest, HasNoChangeForASaveThatChangedNothing) {
   VORN::CallContext call(CallOf("alice"));
   EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
   call.End();
-  EXPECT_THAT(Changes(), IsEmpty());
+  EXPECT_THAT(AllRecorded(), IsEmpty());
 }
 
 TEST_F(HistoryTest, HasAChangeBeforeThoseOfTheNextWriter) {
   VORN::CallContext call(CallOf("alice"));
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
-  std::thread([] { EXPECT_TRUE(Save(kOther, "[nfsd]\n").ok()); }).join();
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
+  std::thread([] { EXPECT_TRUE(SaveFile(kOther, "[nfsd]\n").ok()); }).join();
   EXPECT_EQ(KLIBServiceReload("nfsd"), 0);
   call.End();
-  const std::vector<History::Change> changes = Changes();
+  const std::vector<History::Change> changes = AllRecorded();
   ASSERT_THAT(changes, SizeIs(3));
   EXPECT_THAT(changes[0].message.actions, ElementsAre("reload: done"));
   EXPECT_THAT(changes[1].message.files, ElementsAre(kOther));
@@ -167,56 +144,56 @@ TEST_F(HistoryTest, HasAChangeBeforeThoseOfTheNextWriter) {
 
 TEST_F(HistoryTest, LeavesAChangeThatCannotEndToTheNextWriter) {
   VORN::CallContext call(CallOf("alice"));
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
   const std::string lock = root.At(kConfigurationLockFile);
   std::filesystem::remove(lock);
   std::filesystem::create_directory(lock);
   call.End();
   EXPECT_THAT(call.warnings(), ElementsAre(StartsWith("A change is not in the history yet: ")));
-  EXPECT_THAT(Changes(), IsEmpty());
+  EXPECT_THAT(AllRecorded(), IsEmpty());
   std::filesystem::remove(lock);
   const VORN::CallContext next(CallOf("bob"));
-  std::thread([] { EXPECT_TRUE(Save(kOther, "[nfsd]\n").ok()); }).join();
+  std::thread([] { EXPECT_TRUE(SaveFile(kOther, "[nfsd]\n").ok()); }).join();
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kByCall));
-  EXPECT_EQ(Changes()[1].message.caller, "alice");
+  EXPECT_EQ(AllRecorded()[1].message.caller, "alice");
   TakeLog();
 }
 
 TEST_F(HistoryTest, GoesOnInAFolderThatReplacedItsOwn) {
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
   std::filesystem::remove_all(root.At(kHistoryFolder));
   std::filesystem::remove(root.At(kHistoryJournal));
-  ASSERT_TRUE(Save(kFile, "b\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "b\n").ok());
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kFound));
-  ExpectValid(root);
+  ExpectValidHistory(root);
 }
 
 TEST_F(HistoryTest, NamesTheProgramOfAChangeWithoutACall) {
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
-  EXPECT_EQ(Changes()[0].message.caller, program_invocation_short_name);
-  EXPECT_EQ(Changes()[0].message.origin, "local");
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
+  EXPECT_EQ(AllRecorded()[0].message.caller, program_invocation_short_name);
+  EXPECT_EQ(AllRecorded()[0].message.origin, "local");
 }
 
 TEST_F(HistoryTest, HasAnEditByHandAsAChangeOfItsOwn) {
   root.Write(kFile, "first\n");
-  ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
-  ASSERT_TRUE(Save(kFile, "second\n").ok());
+  ASSERT_TRUE(SaveFile(kOther, "[nfsd]\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "second\n").ok());
   root.Write(kFile, "by an editor\n");
-  ASSERT_TRUE(Save(kOther, "[nfsd]\nvers4=y\n").ok());
+  ASSERT_TRUE(SaveFile(kOther, "[nfsd]\nvers4=y\n").ok());
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kByHand, kByCall, kFound, kByCall));
   EXPECT_EQ(Git(root, {"show", "main~1:etc/exports"}), "by an editor\n");
-  const auto files = RealHistory().FilesOf(Changes()[1]);
+  const auto files = RealHistory().FilesOf(AllRecorded()[1]);
   ASSERT_TRUE(files.ok());
   EXPECT_EQ((*files)[0].before, "second\n");
   EXPECT_EQ((*files)[0].after, "by an editor\n");
 }
 
 TEST_F(HistoryTest, HasAFileThatWasRemovedByHand) {
-  ASSERT_TRUE(Save(kFile, "a\n").ok());
+  ASSERT_TRUE(SaveFile(kFile, "a\n").ok());
   std::filesystem::remove(root.At(kFile));
-  ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
+  ASSERT_TRUE(SaveFile(kOther, "[nfsd]\n").ok());
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kByHand, kByCall));
-  ExpectValid(root);
+  ExpectValidHistory(root);
 }
 
 TEST_F(HistoryTest, FindsEditsWhenTheServerStarts) {
@@ -251,26 +228,26 @@ TEST_F(HistoryTest, HasNoChangeThatFailed) {
 
 TEST_F(HistoryTest, HasAServiceOperationWithoutAChangeOfAFile) {
   EXPECT_EQ(KLIBServiceStop("nfsd", 0), 0);
-  ASSERT_THAT(Changes(), SizeIs(1));
-  EXPECT_THAT(Changes()[0].message.files, IsEmpty());
-  EXPECT_THAT(Changes()[0].message.actions, ElementsAre("stop: done"));
-  ExpectValid(root);
+  ASSERT_THAT(AllRecorded(), SizeIs(1));
+  EXPECT_THAT(AllRecorded()[0].message.files, IsEmpty());
+  EXPECT_THAT(AllRecorded()[0].message.actions, ElementsAre("stop: done"));
+  ExpectValidHistory(root);
 }
 
 TEST_F(HistoryTest, HasEveryKindOfChangeOfThePlatform) {
   WriteAllFiles(root);
   for (const ::Change& change : AllChanges(root)) {
-    const std::size_t before = Changes().size();
+    const std::size_t before = AllRecorded().size();
     WriteAllFiles(root);
     ASSERT_GE(change.make(), 0) << change.name;
     for (const char* file : change.files) {
       if (std::string(file).rfind("/etc/", 0) != 0 || std::string(file).find("keytab") != std::string::npos) continue;
       EXPECT_EQ(Git(root, {"show", std::string("main:") + (file + 1)}), root.Read(file)) << change.name;
     }
-    EXPECT_GT(Changes().size(), before) << change.name;
+    EXPECT_GT(AllRecorded().size(), before) << change.name;
     EXPECT_EQ(Kinds().front(), kByCall) << change.name;
   }
-  ExpectValid(root);
+  ExpectValidHistory(root);
 }
 
 TEST_F(HistoryTest, HasTheNamesInAKeytabAndNoKey) {
@@ -287,7 +264,7 @@ TEST_F(HistoryTest, HasTheNamesInAKeytabAndNoKey) {
 }
 
 TEST_F(HistoryTest, SurvivesALossOfWhatWasNotSynced) {
-  for (int i = 0; i < 5; ++i) ASSERT_TRUE(Save(kFile, std::to_string(i) + "\n").ok());
+  for (int i = 0; i < 5; ++i) ASSERT_TRUE(SaveFile(kFile, std::to_string(i) + "\n").ok());
   const std::string log = Git(root, {"log"});
   TemporaryRoot after;
   std::filesystem::copy(root.At("/etc"), after.At("/etc"), std::filesystem::copy_options::recursive);
@@ -303,23 +280,23 @@ TEST_F(HistoryTest, SurvivesALossOfWhatWasNotSynced) {
   records->front().fields[0] = "an earlier boot";
   ASSERT_TRUE(other.Restart(records->front()).ok());
   for (std::size_t i = 1; i < records->size(); ++i) ASSERT_TRUE(other.Append((*records)[i], false).ok());
-  ASSERT_TRUE(Save(kOther, "[nfsd]\n").ok());
+  ASSERT_TRUE(SaveFile(kOther, "[nfsd]\n").ok());
   EXPECT_EQ(Git(after, {"log", "main~1"}), log);
-  ExpectValid(after);
+  ExpectValidHistory(after);
 }
 
 TEST_F(HistoryTest, IsBoundedAndStaysValid) {
   root.Write(kPlatformFile, std::string(kSettings) + "history_changes = 1000\n");
   for (int i = 0; i < 4800; ++i) {
-    ASSERT_TRUE(Save(kFile, "/volume1/data 10.0.0." + std::to_string(i) + "\n").ok());
-    if (i == 300) ExpectValid(root);
+    ASSERT_TRUE(SaveFile(kFile, "/volume1/data 10.0.0." + std::to_string(i) + "\n").ok());
+    if (i == 300) ExpectValidHistory(root);
   }
-  const std::size_t kept = Changes().size();
+  const std::size_t kept = AllRecorded().size();
   EXPECT_GE(kept, 1000U);
   EXPECT_LE(kept, 1000U + 17 * 256);
-  ExpectValid(root);
+  ExpectValidHistory(root);
   EXPECT_EQ(std::stoul(Git(root, {"rev-list", "--count", "main"})), kept);
-  EXPECT_EQ(RealHistory().FilesOf(Changes().back()).status().code(), kUnsupported);
+  EXPECT_EQ(RealHistory().FilesOf(AllRecorded().back()).status().code(), kUnsupported);
   EXPECT_EQ(Git(root, {"show", "main:etc/exports"}), root.Read(kFile));
   EXPECT_THAT(TakeLog(), Not(Contains(Field(&LogLine::text, HasSubstr("history")))));
 }
@@ -328,12 +305,12 @@ TEST_F(HistoryTest, ThatCannotBeWrittenIsAWarningAndFailsNoChange) {
   root.Write("/var/lib/vorn", "no folder");
   VORN::CallContext call(CallOf("alice"));
   TakeLog();
-  EXPECT_TRUE(Save(kFile, "a\n").ok());
+  EXPECT_TRUE(SaveFile(kFile, "a\n").ok());
   EXPECT_EQ(root.Read(kFile), "a\n");
   EXPECT_THAT(call.warnings(), Contains(StartsWith("The history has no record of a change of /etc/exports: ")));
   EXPECT_THAT(TakeLog(), Contains(Field(&LogLine::text, HasSubstr("The history has no record"))));
   std::filesystem::remove(root.At("/var/lib/vorn"));
-  EXPECT_TRUE(Save(kFile, "b\n").ok());
+  EXPECT_TRUE(SaveFile(kFile, "b\n").ok());
   call.End();
   EXPECT_THAT(Kinds(), ElementsAre(kByCall, kUnrecorded)) << "it was not edited by hand";
 }
@@ -344,7 +321,7 @@ TEST_F(HistoryTest, AttributesTheChangesOfConcurrentProcesses) {
     for (int i = 0; i < kChanges; ++i) {
       const VORN::CallContext call(CallOf(caller));
       const ConfigurationLock lock(RealBox());
-      if (!Save(file, std::string(caller) + std::to_string(i) + "\n").ok()) return 1;
+      if (!SaveFile(file, std::string(caller) + std::to_string(i) + "\n").ok()) return 1;
       if (KLIBServiceReload("nfsd") != 0) return 2;  // others may write meanwhile
     }
     return 0;
@@ -355,7 +332,7 @@ TEST_F(HistoryTest, AttributesTheChangesOfConcurrentProcesses) {
   EXPECT_EQ(bob.Wait(), 0);
   std::map<std::string, int> files;
   int actions = 0;
-  for (const History::Change& change : Changes()) {
+  for (const History::Change& change : AllRecorded()) {
     EXPECT_EQ(change.message.kind, kByCall);
     for (const std::string& file : change.message.files) {
       EXPECT_EQ(change.message.caller, file == kFile ? "alice" : "bob");
@@ -366,7 +343,7 @@ TEST_F(HistoryTest, AttributesTheChangesOfConcurrentProcesses) {
   EXPECT_EQ(files[kFile], kChanges);
   EXPECT_EQ(files[kOther], kChanges);
   EXPECT_EQ(actions, 2 * kChanges);
-  ExpectValid(root);
+  ExpectValidHistory(root);
 }
 
 TEST(ChangeMessage, IsReadBackAndKeepsEachValueOnItsLine) {

@@ -2,10 +2,9 @@
 #include <gmock/gmock.h>
 
 #include "call.h"
-#include "configuration_lock.h"
 #include "core.h"
-#include "current_box.h"
 #include "history.h"
+#include "history_support.h"
 #include "inverse_merge.h"
 #include "rehearsal.h"
 #include "writes.h"
@@ -21,14 +20,6 @@ using testing::SizeIs;
 
 constexpr char kExports[] = "/etc/exports";
 constexpr char kThree[] = "/volume1/a *(ro)\n/volume1/b *(ro)\n/volume1/c *(ro)\n";
-
-void Save(const char* path, const std::string& text) {
-  Box& box = RealBox();
-  const ConfigurationLock lock(box);
-  const Result<StoredFile> before = box.Read(path);
-  ASSERT_TRUE(before.ok());
-  ASSERT_TRUE(box.Replace(path, text, before->version).ok());
-}
 
 std::vector<VORN::HistoryEntry> List(const VORN::HistoryFilter& filter = {}) {
   std::vector<VORN::HistoryEntry> entries;
@@ -64,9 +55,9 @@ class UndoTest : public Writes {
 
 TEST_F(UndoTest, KeepsLaterChangesOfOtherLines) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(ro)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(ro)\n").ok());
   const std::string change = Newest();
-  Save(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(rw)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(rw)\n").ok());
   EXPECT_EQ(Undo(change), 0);
   EXPECT_EQ(root.Read(kExports), "/volume1/a *(ro)\n/volume1/b *(ro)\n/volume1/c *(rw)\n");
   EXPECT_THAT(files, ElementsAre(kExports));
@@ -81,10 +72,10 @@ TEST_F(UndoTest, KeepsLaterChangesOfOtherLines) {
 
 TEST_F(UndoTest, ShowsAConflictAndChangesNothing) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(ro)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n/volume1/b *(ro)\n/volume1/c *(ro)\n").ok());
   const std::string change = Newest();
   const std::string later = "/volume1/a *(sync)\n/volume1/b *(ro)\n/volume1/c *(ro)\n";
-  Save(kExports, later);
+  ASSERT_TRUE(SaveFile(kExports, later).ok());
   EXPECT_EQ(Undo(change), VORN::kHistoryConflict);
   EXPECT_THAT(reasons, Contains(testing::AllOf(HasSubstr("/volume1/a *(sync)"), HasSubstr("/volume1/a *(ro)"))));
   EXPECT_EQ(root.Read(kExports), later);
@@ -93,14 +84,14 @@ TEST_F(UndoTest, ShowsAConflictAndChangesNothing) {
 
 TEST_F(UndoTest, IsRefusedIfAFileWouldBecomeFaulty) {
   root.Write(kExports, "/volume1/a *(nonsense)\n");
-  Save(kExports, "/volume1/a *(ro)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(ro)\n").ok());
   EXPECT_EQ(Undo(Newest()), VORN::kHistoryFaulty);
   EXPECT_THAT(reasons, Contains(HasSubstr("nonsense")));
   EXPECT_EQ(root.Read(kExports), "/volume1/a *(ro)\n");
 }
 
 TEST_F(UndoTest, RemovesAFileThatTheChangeCreated) {
-  Save(kExports, kThree);
+  ASSERT_TRUE(SaveFile(kExports, kThree).ok());
   EXPECT_EQ(Undo(Newest()), 0);
   EXPECT_EQ(root.Read(kExports), std::nullopt);
 }
@@ -118,7 +109,7 @@ TEST_F(UndoTest, OfAnImportOfAKeytabIsRefused) {
 
 TEST_F(UndoTest, OfTheFirstKnownContentIsRefused) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n").ok());
   const VORN::HistoryEntry found = List().back();
   EXPECT_EQ(found.kind, "found");
   EXPECT_EQ(Undo(found.id), VORN::kHistoryFixed) << "or the file would be removed";
@@ -130,7 +121,7 @@ TEST_F(UndoTest, OfAServiceOperationIsRefused) {
 }
 
 TEST_F(UndoTest, OfAnUnknownChangeIsRefused) {
-  Save(kExports, kThree);
+  ASSERT_TRUE(SaveFile(kExports, kThree).ok());
   for (const char* id : {"", "x", "0123456789012345678901234567890123456789", "../../x"}) {
     EXPECT_EQ(Undo(id), VORN::kHistoryNoChange) << id;
   }
@@ -138,7 +129,7 @@ TEST_F(UndoTest, OfAnUnknownChangeIsRefused) {
 
 TEST_F(UndoTest, IsRehearsedWithoutATrace) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n").ok());
   const std::string change = Newest();
   const VORN::Draft draft;
   EXPECT_EQ(Undo(change, &draft), 0);
@@ -150,7 +141,7 @@ TEST_F(UndoTest, IsRehearsedWithoutATrace) {
 
 TEST_F(UndoTest, IsFoundInTheListWithTheOtherChanges) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n").ok());
   EXPECT_EQ(Undo(Newest()), 0);
   EXPECT_THAT(List(), SizeIs(3));
   VORN::HistoryFilter filter;
@@ -178,7 +169,7 @@ TEST_F(UndoTest, IsFoundInTheListWithTheOtherChanges) {
 
 TEST_F(UndoTest, IsShownWithItsFiles) {
   root.Write(kExports, kThree);
-  Save(kExports, "/volume1/a *(rw)\n");
+  ASSERT_TRUE(SaveFile(kExports, "/volume1/a *(rw)\n").ok());
   VORN::HistoryEntry entry;
   std::vector<VORN::HistoryFile> shown;
   EXPECT_EQ(VORN::ShowHistory(Newest(), &entry, &shown), 0);

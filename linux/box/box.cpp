@@ -1,5 +1,8 @@
 #include "box.h"
 
+#include <mutex>
+
+#include "call.h"
 #include "call_rights.h"
 #include "configuration_lock.h"
 
@@ -26,7 +29,7 @@ Result<StoredFile> Box::Read(const std::string& path) {
 Result<std::shared_ptr<const StoredFolder>> Box::List(const std::string& folder) {
   const Result<Version> version = store_->VersionOf(folder);
   if (!version.ok()) return version.status();
-  const Key key{typeid(StoredFolder), folder};
+  const KeyView key{folder, typeid(StoredFolder)};
   const Cached known = Find(key);
   if (known.IsOf(*version)) return std::static_pointer_cast<const StoredFolder>(known.document);
   Result<StoredFolder> listed = store_->List(folder);
@@ -40,7 +43,7 @@ Result<Box::Document> Box::LoadAny(std::type_index type, const std::string& path
                                    const std::function<Result<Document>(StoredFile, const void*)>& parse) {
   const Result<Version> version = store_->VersionOf(path);
   if (!version.ok()) return version.status();
-  const Key key{type, path};
+  const KeyView key{path, type};
   const Cached known = Find(key);
   if (known.IsOf(*version)) {
     FirstReads::Note(*this, path, *version);
@@ -55,32 +58,54 @@ Result<Box::Document> Box::LoadAny(std::type_index type, const std::string& path
   return document;
 }
 
-Box::Cached Box::Find(const Key& key) {
-  const std::lock_guard lock(mutex_);
+bool Box::KeyOrder::operator()(const KeyView& a, const KeyView& b) const {
+  if (a.name.size() != b.name.size()) return a.name.size() < b.name.size();
+  const int order = a.name.compare(b.name);
+  return order != 0 ? order < 0 : a.type < b.type;
+}
+
+Box::Cached Box::Find(const KeyView& key) {
+  const std::shared_lock lock(mutex_);
   const auto found = documents_.find(key);
   return found != documents_.end() ? found->second : Cached{};
 }
 
-void Box::Keep(const Key& key, Cached document) {
+void Box::Keep(const KeyView& key, Cached document) {
   const std::lock_guard lock(mutex_);
-  documents_[key] = std::move(document);
+  documents_.insert_or_assign(Key{std::string(key.name), key.type}, std::move(document));
 }
 
-Box::Document Box::FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources) {
-  const std::lock_guard lock(mutex_);
+std::shared_ptr<const Box::Derived> Box::LastDerived(const KeyView& key) {
+  const std::shared_lock lock(mutex_);
   const auto found = derived_.find(key);
-  return found != derived_.end() && found->second.sources == sources ? found->second.document : nullptr;
+  return found != derived_.end() ? found->second : nullptr;
 }
 
-Box::Document Box::LastDerived(const Key& key) {
+// The document is made in a call context of its own, which has the warnings about it and no others.
+Result<Box::Document> Box::MakeDerived(const KeyView& key, Sources sources,
+                                       const std::function<Result<Document>()>& make) {
+  Derived derived{std::move(sources), nullptr, {}};
+  const auto make_with_warnings = [&] {
+    const VORN::CallContext* const call = VORN::CallContext::Current();
+    const VORN::CallContext making(call == nullptr ? VORN::CallDescription() : call->description());
+    Result<Document> document = make();
+    derived.warnings = making.warnings();
+    return document;
+  };
+  Result<Document> document = make_with_warnings();
+  AddWarnings(derived);
+  if (!document.ok()) return document;
+  derived.document = *document;
+  auto kept = std::make_shared<const Derived>(std::move(derived));
   const std::lock_guard lock(mutex_);
-  const auto found = derived_.find(key);
-  return found != derived_.end() ? found->second.document : nullptr;
+  derived_.insert_or_assign(Key{std::string(key.name), key.type}, std::move(kept));
+  return document;
 }
 
-void Box::KeepDerived(const Key& key, Derived derived) {
-  const std::lock_guard lock(mutex_);
-  derived_[key] = std::move(derived);
+void Box::AddWarnings(const Derived& derived) {
+  VORN::CallContext* const call = VORN::CallContext::Current();
+  if (call == nullptr) return;
+  for (const std::string& warning : derived.warnings) call->AddWarning(warning);
 }
 
 Status Box::Replace(const std::string& path, std::string_view text, const Version& expected, unsigned mode) {

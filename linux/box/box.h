@@ -6,8 +6,8 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
+#include <shared_mutex>
 #include <string>
 #include <string_view>
 #include <typeindex>
@@ -88,17 +88,14 @@ class Box {
   }
 
   // The document of type T that `make` makes of several documents. It is shared and made again when `sources` has
-  // other objects. `name` distinguishes documents of one type.
+  // other objects. `name` distinguishes documents of one type. Each call that gets the document has the warnings
+  // (call.h) of the call that made it.
   template <typename T>
   Result<std::shared_ptr<const T>> Derive(const std::string& name, std::vector<std::shared_ptr<const void>> sources,
                                           const std::function<Result<T>()>& make) {
-    const Key key{typeid(T), name};
-    if (Document document = FindDerived(key, sources)) return std::static_pointer_cast<const T>(std::move(document));
-    Result<T> made = make();
-    if (!made.ok()) return made.status();
-    auto document = std::make_shared<const T>(std::move(*made));
-    KeepDerived(key, {std::move(sources), document});
-    return document;
+    const std::shared_ptr<const Derived> last = LastDerived({name, typeid(T)});
+    if (last != nullptr && last->sources == sources) return SharedAs<T>(*last);
+    return DeriveAnew<T>(name, std::move(sources), make);
   }
 
   // Like Derive, for a document that knows what it was made of: the one made last is shared while `is_current` says so.
@@ -106,14 +103,9 @@ class Box {
   Result<std::shared_ptr<const T>> DeriveWhile(const std::string& name,
                                                const std::function<bool(const T& previous)>& is_current,
                                                const std::function<Result<T>()>& make) {
-    const Key key{typeid(T), name};
-    const auto previous = std::static_pointer_cast<const T>(LastDerived(key));
-    if (previous != nullptr && is_current(*previous)) return previous;
-    Result<T> made = make();
-    if (!made.ok()) return made.status();
-    auto document = std::make_shared<const T>(std::move(*made));
-    KeepDerived(key, {{}, document});
-    return document;
+    const std::shared_ptr<const Derived> last = LastDerived({name, typeid(T)});
+    if (last != nullptr && is_current(*static_cast<const T*>(last->document.get()))) return SharedAs<T>(*last);
+    return DeriveAnew<T>(name, {}, make);
   }
 
   // These change a file as Store says. The calling thread owns the configuration lock.
@@ -133,6 +125,7 @@ class Box {
                 const std::function<Result<Version>()>& write);
 
   using Document = std::shared_ptr<const void>;
+  using Sources = std::vector<std::shared_ptr<const void>>;
   struct Cached {
     Version version;
     bool is_settled = false;  // whether any later change of the file gives another version
@@ -141,27 +134,63 @@ class Box {
     bool IsOf(const Version& current) const { return is_settled && document != nullptr && version == current; }
   };
   struct Derived {
-    std::vector<std::shared_ptr<const void>> sources;
+    Sources sources;
     Document document;
+    std::vector<std::string> warnings;
   };
-  using Key = std::pair<std::type_index, std::string>;  // the document's type, the path
+
+  // The name of a document, which is a path for most, and its type.
+  struct KeyView {
+    std::string_view name;
+    std::type_index type;
+  };
+  struct Key {
+    std::string name;
+    std::type_index type;
+
+    operator KeyView() const { return {name, type}; }
+  };
+  // An order in which most keys differ in the length of their names.
+  struct KeyOrder {
+    using is_transparent = void;
+    bool operator()(const KeyView& a, const KeyView& b) const;
+  };
 
   Result<Document> LoadAny(std::type_index type, const std::string& path,
                            const std::function<Result<Document>(StoredFile file, const void* previous)>& parse);
-  Cached Find(const Key& key);
-  void Keep(const Key& key, Cached document);
-  Document FindDerived(const Key& key, const std::vector<std::shared_ptr<const void>>& sources);
-  Document LastDerived(const Key& key);
-  void KeepDerived(const Key& key, Derived derived);
+  Cached Find(const KeyView& key);
+  void Keep(const KeyView& key, Cached document);
+  std::shared_ptr<const Derived> LastDerived(const KeyView& key);
+  Result<Document> MakeDerived(const KeyView& key, Sources sources, const std::function<Result<Document>()>& make);
+  static void AddWarnings(const Derived& derived);
+
+  template <typename T>
+  static std::shared_ptr<const T> SharedAs(const Derived& derived) {
+    AddWarnings(derived);
+    return std::static_pointer_cast<const T>(derived.document);
+  }
+
+  template <typename T>
+  Result<std::shared_ptr<const T>> DeriveAnew(const std::string& name, Sources sources,
+                                              const std::function<Result<T>()>& make) {
+    const auto make_any = [&make]() -> Result<Document> {
+      Result<T> document = make();
+      if (!document.ok()) return document.status();
+      return Document(std::make_shared<const T>(std::move(*document)));
+    };
+    Result<Document> made = MakeDerived({name, typeid(T)}, std::move(sources), make_any);
+    if (!made.ok()) return made.status();
+    return std::static_pointer_cast<const T>(std::move(*made));
+  }
 
   const Root root_;
   const std::unique_ptr<Store> store_;
   std::unique_ptr<ChangeRecorder> recorder_;
   const EngineChooser choose_engine_;
   std::vector<RehearsedAction>* const actions_;  // null: this is no draft
-  std::mutex mutex_;
-  std::map<Key, Cached> documents_;
-  std::map<Key, Derived> derived_;
+  std::shared_mutex mutex_;
+  std::map<Key, Cached, KeyOrder> documents_;
+  std::map<Key, std::shared_ptr<const Derived>, KeyOrder> derived_;
 };
 
 }  // namespace vorn

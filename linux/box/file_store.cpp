@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <mutex>
 #include <utility>
 
 #include "file_lock.h"
@@ -67,7 +68,7 @@ Result<std::string> FileStore::Locate(const std::string& path) const {
 
 // The location of a path without symbolic links; nullptr if it has some, or is not known yet.
 std::shared_ptr<const std::string> FileStore::KnownLocation(const std::string& path) const {
-  const std::lock_guard lock(mutex_);
+  const std::shared_lock lock(mutex_);
   const auto known = plain_paths_.find(path);
   return known == plain_paths_.end() ? nullptr : known->second;
 }

@@ -3,7 +3,7 @@
 #define VORN_LINUX_BOX_FILE_STORE_H
 
 #include <memory>
-#include <mutex>
+#include <shared_mutex>
 #include <string>
 #include <unordered_map>
 
@@ -39,7 +39,7 @@ class FileStore : public Store {
   std::shared_ptr<const std::string> KnownLocation(const std::string& path) const;
 
   const Root root_;
-  mutable std::mutex mutex_;
+  mutable std::shared_mutex mutex_;
   // The locations of paths that were seen to lead to their file without a symbolic link: their version is one lstat(2).
   mutable std::unordered_map<std::string, std::shared_ptr<const std::string>> plain_paths_;
 };

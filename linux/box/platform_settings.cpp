@@ -53,12 +53,10 @@ Status ReadNumber(const IniFile& file, const char* key, std::size_t least, std::
 
 }  // namespace
 
-Result<PlatformSettings> PlatformSettings::Load(Box& box) {
+Result<std::shared_ptr<const PlatformSettings>> PlatformSettings::Load(Box& box) {
   const Result<SharedIniFile> file = IniFile::Open(box, "/etc/vorn/platform.conf");
   if (!file.ok()) return file.status();
-  const auto settings = box.Derive<PlatformSettings>("", {*file}, [&] { return Read(box, **file); });
-  if (!settings.ok()) return settings.status();
-  return **settings;
+  return box.Derive<PlatformSettings>("", {*file}, [&] { return Read(box, **file); });
 }
 
 Result<PlatformSettings> PlatformSettings::Read(const Box& box, const IniFile& file) {

@@ -2,6 +2,7 @@
 #ifndef VORN_LINUX_BOX_PLATFORM_SETTINGS_H
 #define VORN_LINUX_BOX_PLATFORM_SETTINGS_H
 
+#include <memory>
 #include <string>
 
 #include "box.h"
@@ -35,7 +36,7 @@ struct PlatformSettings {
   std::size_t history_changes = 2000;
 
   // Reads the settings of the box. A value that is not in the list above is a failure that names it.
-  static Result<PlatformSettings> Load(Box& box);
+  static Result<std::shared_ptr<const PlatformSettings>> Load(Box& box);
 
  private:
   static Result<PlatformSettings> Read(const Box& box, const IniFile& file);

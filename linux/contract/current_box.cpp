@@ -25,8 +25,8 @@ struct Registry {
 
 // A configuration that cannot be read records nothing; the operations that need it fail.
 History::Settings HistorySettings(Box& box) {
-  const Result<PlatformSettings> settings = PlatformSettings::Load(box);
-  return settings.ok() ? History::Settings{settings->history, settings->history_changes} : History::Settings{};
+  const auto settings = PlatformSettings::Load(box);
+  return settings.ok() ? History::Settings{(*settings)->history, (*settings)->history_changes} : History::Settings{};
 }
 
 std::unique_ptr<Box> MakeBox(const Root& root) {

@@ -163,8 +163,9 @@ Result<SquashAccounts> SquashAccounts::Load(Box& box) {
   if (!settings.ok()) return settings.status();
   const auto accounts = ReadAccounts(box);
   if (!accounts.ok()) return accounts.status();
-  return SquashAccounts{FindIDs(**accounts, settings->admin_account), FindIDs(**accounts, settings->guest_account),
-                        settings->admin_account, settings->guest_account};
+  return SquashAccounts{FindIDs(**accounts, (*settings)->admin_account),
+                        FindIDs(**accounts, (*settings)->guest_account), (*settings)->admin_account,
+                        (*settings)->guest_account};
 }
 
 ExportRule RuleOf(const ExportEntry& entry, const SquashAccounts& accounts) {

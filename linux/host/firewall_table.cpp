@@ -69,9 +69,9 @@ Status Save(Box& box, const std::string& ruleset) {
 }  // namespace
 
 Status UpdateFirewall(Box& box) {
-  const Result<PlatformSettings> settings = PlatformSettings::Load(box);
+  const auto settings = PlatformSettings::Load(box);
   if (!settings.ok()) return settings.status();
-  if (!settings->firewall) return {};
+  if (!(*settings)->firewall) return {};
   const auto ports = ReadConfiguredPorts(box);
   if (!ports.ok()) return ports.status();
   const std::string ruleset = Ruleset(*ports);

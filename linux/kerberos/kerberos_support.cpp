@@ -45,8 +45,8 @@ bool KernelOffersKerberos(const Root& root) {
 Result<bool> SupportsKerberos(Box& box) {
   const auto settings = PlatformSettings::Load(box);
   if (!settings.ok()) return settings.status();
-  if (settings->kerberos != PlatformSettings::Kerberos::kAuto) {
-    return settings->kerberos == PlatformSettings::Kerberos::kYes;
+  if ((*settings)->kerberos != PlatformSettings::Kerberos::kAuto) {
+    return (*settings)->kerberos == PlatformSettings::Kerberos::kYes;
   }
   return KernelOffersKerberos(box.root());
 }

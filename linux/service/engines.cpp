@@ -18,9 +18,9 @@ struct Engines {
 
 Box::EngineChooser MakeEngineChooser() {
   return [engines = std::make_shared<Engines>()](Box& box) -> Result<Engine*> {
-    const Result<PlatformSettings> settings = PlatformSettings::Load(box);
+    const auto settings = PlatformSettings::Load(box);
     if (!settings.ok()) return settings.status();
-    const bool is_systemd = settings->engine == PlatformSettings::EngineKind::kSystemd;
+    const bool is_systemd = (*settings)->engine == PlatformSettings::EngineKind::kSystemd;
     const std::lock_guard lock(engines->mutex);
     std::unique_ptr<Engine>& engine = is_systemd ? engines->systemd : engines->paper;
     if (engine == nullptr) engine = is_systemd ? MakeSystemdEngine(box) : MakePaperEngine(box);

@@ -84,7 +84,7 @@ Result<ExportedShares> FindExportedShares(Box& box, const ExportsDocument& expor
 }  // namespace
 
 Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports) {
-  const Result<PlatformSettings> settings = PlatformSettings::Load(box);
+  const auto settings = PlatformSettings::Load(box);
   if (!settings.ok()) return settings.status();
   const Result<ExportedShares> exported = FindExportedShares(box, exports);
   if (!exported.ok()) return exported.status();
@@ -94,7 +94,7 @@ Result<bool> CheckLeftShares(Box& box, const ExportsDocument& exports) {
   for (const auto& [directory, is_share] : **exported) {
     directories.insert(directory);
     if (is_share) continue;
-    if (!settings->withdraw_left_shares) {
+    if (!(*settings)->withdraw_left_shares) {
       NameLeft(directory);
     } else if (Status status = Withdraw(box, directory); !status.ok()) {
       return status;

@@ -7,7 +7,6 @@
 #include <string>
 #include <vector>
 
-#include "call.h"
 #include "configuration_lock.h"
 #include "nfs_configuration.h"
 #include "nfs_settings.h"
@@ -68,20 +67,6 @@ NFSConfRecord RecordOf(const NFSConfiguration& configuration) {
   }
   ReadPortsInForce(configuration, &record);
   return record;
-}
-
-// A record, with the warnings about values that are ignored: each call that reads the record has them, also if the
-// record was made for another call.
-struct RecordInForce {
-  NFSConfRecord record;
-  std::vector<std::string> warnings;
-};
-
-RecordInForce ReadInForce(const NFSConfiguration& configuration) {
-  const VORN::CallContext* const call = VORN::CallContext::Current();
-  const VORN::CallContext reading(call == nullptr ? VORN::CallDescription() : call->description());
-  const NFSConfRecord record = RecordOf(configuration);
-  return {record, reading.warnings()};
 }
 
 // ---------------------------------------------------------------------------------------------
@@ -284,13 +269,10 @@ Status Check(const NFSConfiguration& configuration, const NFSConfRecord& now, co
 Result<NFSConfRecord> ReadNFSRecord(Box& box) {
   const Result<NFSConfiguration> configuration = NFSConfiguration::Open(box);
   if (!configuration.ok()) return configuration.status();
-  const auto make = [&] { return Result<RecordInForce>(ReadInForce(*configuration)); };
-  const auto in_force = box.Derive<RecordInForce>("", configuration->files().sources(), make);
-  if (!in_force.ok()) return in_force.status();
-  if (VORN::CallContext* call = VORN::CallContext::Current()) {
-    for (const std::string& warning : (*in_force)->warnings) call->AddWarning(warning);
-  }
-  return (*in_force)->record;
+  const auto record = box.Derive<NFSConfRecord>("", configuration->files().sources(),
+                                                [&] { return Result<NFSConfRecord>(RecordOf(*configuration)); });
+  if (!record.ok()) return record.status();
+  return **record;
 }
 
 Status WriteNFSRecord(Box& box, const NFSConfRecord& record) {

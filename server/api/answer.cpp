@@ -3,7 +3,8 @@
 #include <json/writer.h>
 
 #include <memory>
-#include <sstream>
+#include <ostream>
+#include <streambuf>
 #include <string>
 #include <utility>
 
@@ -12,13 +13,50 @@
 namespace vorn::server {
 namespace {
 
-std::unique_ptr<Json::StreamWriter> NewWriter() {
-  Json::StreamWriterBuilder builder;
-  builder["indentation"] = "";
-  // Everything but ASCII is escaped, so that a string that is not UTF-8 still makes valid JSON.
-  builder["emitUTF8"] = false;
-  return std::unique_ptr<Json::StreamWriter>(builder.newStreamWriter());
-}
+// Appends to a string. A std::stringbuf would copy the text once more.
+class StringSink : public std::streambuf {
+ public:
+  std::string Take() { return std::exchange(text_, {}); }
+
+ protected:
+  std::streamsize xsputn(const char* data, std::streamsize size) override {
+    if (text_.empty()) text_.reserve(kUsualSize);
+    text_.append(data, static_cast<std::size_t>(size));
+    return size;
+  }
+  int_type overflow(int_type c) override {
+    if (c != traits_type::eof()) text_ += traits_type::to_char_type(c);
+    return traits_type::not_eof(c);
+  }
+
+ private:
+  static constexpr std::size_t kUsualSize = 512;  // of an answer, in bytes
+
+  std::string text_;
+};
+
+// Constructing a writer and a stream costs more than writing most answers.
+class JsonWriter {
+ public:
+  JsonWriter() : stream_(&text_) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    // Everything but ASCII is escaped, so that a string that is not UTF-8 still makes valid JSON.
+    builder["emitUTF8"] = false;
+    writer_.reset(builder.newStreamWriter());
+    stream_.exceptions(std::ios::badbit);  // a stream hides std::bad_alloc otherwise
+  }
+
+  std::string Write(const Json::Value& value) {
+    writer_->write(value, &stream_);
+    return text_.Take();
+  }
+
+ private:
+  StringSink text_;
+  std::ostream stream_;
+  std::unique_ptr<Json::StreamWriter> writer_;
+};
 
 // `,"name":["...", ...]`, or an empty string if there are no sentences.
 std::string Member(std::string_view name, const std::vector<std::string>& sentences) {
@@ -37,19 +75,19 @@ std::string Besides(const Remarks& remarks) {
 }  // namespace
 
 std::string WriteJson(const Json::Value& value) {
-  // Constructing a writer costs more than most answers.
-  static Reusable<Json::StreamWriter> writers(NewWriter);
-  return writers.With([&value](Json::StreamWriter& writer) {
-    std::ostringstream text;
-    writer.write(value, &text);
-    return text.str();
-  });
+  static Reusable<JsonWriter> writers([] { return std::make_unique<JsonWriter>(); });
+  return writers.With([&value](JsonWriter& writer) { return writer.Write(value); });
 }
 
 Response Success(const Json::Value& data, const Remarks& remarks) { return SuccessWith(WriteJson(data), remarks); }
 
 Response SuccessWith(std::string_view data, const Remarks& remarks) {
-  return {200, R"({"success":true,"data":)" + std::string(data) + Besides(remarks) + "}", {}};
+  constexpr std::string_view kBegin = R"({"success":true,"data":)";
+  const std::string besides = Besides(remarks);
+  std::string body;
+  body.reserve(kBegin.size() + data.size() + besides.size() + 1);
+  body.append(kBegin).append(data).append(besides).append("}");
+  return {200, std::move(body), {}};
 }
 
 Response Failure(int status, int code, std::string_view text, const Json::Value& details, const Remarks& remarks) {

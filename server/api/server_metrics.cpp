@@ -135,6 +135,7 @@ std::string WriteMetrics(const CallMetrics& calls, const Workers& workers, const
   Append(QueueMetrics(workers), &families);
   for (const MetricsSource& read : sources) Append(read(), &families);
   std::ostringstream text;
+  text.exceptions(std::ios::badbit);  // a stream hides std::bad_alloc otherwise
   prometheus::TextSerializer().Serialize(text, families);
   return text.str();
 }

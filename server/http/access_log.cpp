@@ -8,6 +8,7 @@
 #define SD_JOURNAL_SUPPRESS_LOCATION
 #include <systemd/sd-journal.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cinttypes>
 #include <climits>
@@ -22,18 +23,24 @@ namespace {
 constexpr std::chrono::seconds kSummaryInterval{10};
 constexpr std::chrono::milliseconds kCollectingTime{100};
 constexpr std::size_t kMaxTargetBytes = 1024;
+constexpr std::size_t kMaxOtherBytes = 128;  // of a line, besides its texts: five numbers and the words around them
 constexpr std::string_view kIdentifier = "vornd";
 
+bool IsPlain(char c) {
+  const auto byte = static_cast<unsigned char>(c);
+  return byte >= 0x20 && byte < 0x7f && c != '"' && c != '\\';
+}
+
 std::string Escaped(std::string_view text) {
+  if (text.size() <= kMaxTargetBytes && std::all_of(text.begin(), text.end(), IsPlain)) return std::string(text);
   std::string escaped;
   for (const char c : text.substr(0, kMaxTargetBytes)) {
-    const auto byte = static_cast<unsigned char>(c);
-    if (byte >= 0x20 && byte < 0x7f && c != '"' && c != '\\') {
+    if (IsPlain(c)) {
       escaped += c;
       continue;
     }
     char code[8];
-    std::snprintf(code, sizeof code, "\\x%02x", byte);
+    std::snprintf(code, sizeof code, "\\x%02x", static_cast<unsigned char>(c));
     escaped += code;
   }
   return text.size() > kMaxTargetBytes ? escaped + "..." : escaped;
@@ -215,12 +222,17 @@ void AccessLog::WriteCounts(std::unique_lock<std::mutex>* lock) {
 }
 
 std::string FormatRecord(const AccessRecord& record) {
-  std::string line = record.caller.empty() ? "-" : Escaped(record.caller);
-  line += " " + record.peer.address;
-  if (record.peer.credentials) line += " uid=" + std::to_string(record.peer.credentials->uid);
-  line += " \"" + Escaped(record.method) + " " + Escaped(record.target) + "\" " + std::to_string(record.status);
-  line += " " + std::to_string(record.bytes) + " bytes, queued " + std::to_string(record.queued.count());
-  return line + " us, worked " + std::to_string(record.worked.count()) + " us";
+  const std::string caller = record.caller.empty() ? "-" : Escaped(record.caller);
+  const std::string method = Escaped(record.method);
+  const std::string target = Escaped(record.target);
+  std::string line;
+  line.reserve(caller.size() + record.peer.address.size() + method.size() + target.size() + kMaxOtherBytes);
+  line.append(caller).append(" ").append(record.peer.address);
+  if (record.peer.credentials) line.append(" uid=").append(std::to_string(record.peer.credentials->uid));
+  line.append(" \"").append(method).append(" ").append(target).append("\" ").append(std::to_string(record.status));
+  line.append(" ").append(std::to_string(record.bytes)).append(" bytes, queued ");
+  line.append(std::to_string(record.queued.count())).append(" us, worked ");
+  return line.append(std::to_string(record.worked.count())).append(" us");
 }
 
 AccessLog::Sink JournalSink() {

@@ -66,10 +66,12 @@ class FailingAllocator : public testing::Test {
     Connection client = server_->Connect();
     faults_->countdown = n;
     client.Send(request);
-    const int status = client.Receive().status;
+    const auto answer = client.Receive();
     faults_->countdown = 0;
+    const int status = answer.status;
     const bool failed = faults_->failed > 0;
     EXPECT_TRUE(status >= 200) << "no answer: allocation " << n << " of " << request.substr(0, 60);
+    EXPECT_TRUE(status != 200 || answer.Envelope().isObject()) << "allocation " << n << ": " << answer.body;
     EXPECT_TRUE(failed || status < 500 || request.find("throw") != std::string::npos) << status;
     return failed;
   }

@@ -3,13 +3,13 @@
 #include <cstddef>
 #include <memory>
 #include <set>
-#include <sstream>
 #include <string>
 #include <unordered_map>
 #include <utility>
 #include <vector>
 
 #include "idmap.h"
+#include "lines.h"
 #include "translation_methods.h"
 #include "users.h"
 
@@ -44,16 +44,13 @@ VORN::HealthCall RemoveMapping(const std::string& principal) {
 
 // The sources of accounts in nsswitch.conf(5) other than files of the box.
 std::set<std::string> RemoteSources(const std::string& text) {
-  const std::set<std::string> local = {"files", "compat", "systemd", "db"};
+  const std::set<std::string_view> local = {"files", "compat", "systemd", "db"};
   std::set<std::string> remote;
-  std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line.substr(0, line.find('#')));
-    std::string database;
-    words >> database;
-    if (database != "passwd:") continue;
-    for (std::string source; words >> source;) {
-      if (source.front() != '[' && source.back() != ']' && local.count(source) == 0) remote.insert(source);
+  for (const std::string_view line : LinesOf(text)) {
+    const std::vector<std::string_view> words = WordsOf(line.substr(0, line.find('#')));
+    if (words.empty() || words[0] != "passwd:") continue;
+    for (auto source = words.begin() + 1; source != words.end(); ++source) {
+      if (source->front() != '[' && source->back() != ']' && local.count(*source) == 0) remote.emplace(*source);
     }
   }
   return remote;

@@ -1,9 +1,9 @@
 #include "missed_changes.h"
 
 #include <filesystem>
-#include <sstream>
 
 #include "files.h"
+#include "lines.h"
 
 namespace vorn {
 
@@ -26,8 +26,7 @@ std::set<std::string> MissedChanges::Read() const {
   const Result<FileText> file = ReadFileOrNothing(location_);
   std::set<std::string> paths;
   if (!file.ok()) return paths;
-  std::istringstream lines(file->text);
-  for (std::string line; std::getline(lines, line);) paths.insert(line);
+  for (const std::string_view line : LinesOf(file->text)) paths.emplace(line);
   return paths;
 }
 

@@ -2,7 +2,8 @@
 
 #include <algorithm>
 #include <cctype>
-#include <sstream>
+
+#include "lines.h"
 
 namespace vorn {
 namespace {
@@ -21,10 +22,9 @@ bool Has(std::string_view text, std::string_view part) { return text.find(part) 
 
 std::vector<Table> TablesOf(std::string_view ruleset) {
   std::vector<Table> tables;
-  std::istringstream lines{std::string(ruleset)};
-  for (std::string line; std::getline(lines, line);) {
-    if (BeginsWith(line, "table ")) tables.push_back({line.substr(6, line.find(" {") - 6), ""});
-    if (!tables.empty()) tables.back().rules += line + "\n";
+  for (const std::string_view line : LinesOf(ruleset)) {
+    if (BeginsWith(line, "table ")) tables.push_back({std::string(line.substr(6, line.find(" {") - 6)), ""});
+    if (!tables.empty()) tables.back().rules.append(line).append("\n");
   }
   return tables;
 }
@@ -40,8 +40,7 @@ bool ClosesInput(const Table& table) {
   bool has_input = false;
   bool drops = false;
   bool rejects = false;
-  std::istringstream lines(table.rules);
-  for (std::string line; std::getline(lines, line);) {
+  for (const std::string_view line : LinesOf(table.rules)) {
     const bool is_input = Has(line, "type filter hook input");
     has_input = has_input || is_input;
     drops = drops || (is_input && Has(line, "policy drop"));

@@ -4,10 +4,10 @@
 
 #include <algorithm>
 #include <array>
-#include <sstream>
 #include <utility>
 
 #include "exports_client.h"
+#include "lines.h"
 #include "owned.h"
 #include "state_file.h"
 
@@ -40,12 +40,11 @@ Result<HostAddresses> ReadExportHosts(Box& box) {
   const Result<StoredFile> file = box.Read(kHostsFile);
   if (!file.ok()) return file.status();
   HostAddresses hosts;
-  std::istringstream lines(file->text);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line);
-    std::string name;
-    words >> name;
-    for (std::string address; words >> address;) hosts[name].push_back(address);
+  for (const std::string_view line : LinesOf(file->text)) {
+    const std::vector<std::string_view> words = WordsOf(line);
+    if (words.size() < 2) continue;
+    std::vector<std::string>& addresses = hosts[std::string(words[0])];
+    addresses.insert(addresses.end(), words.begin() + 1, words.end());
   }
   return hosts;
 }
@@ -65,8 +64,7 @@ void AddServedHosts(const KernelCache& addresses, HostAddresses* hosts) {
   const auto entries = addresses.Entries();
   for (const KernelCache::Entry& entry : entries ? *entries : std::vector<KernelCache::Entry>()) {
     if (entry.is_negative || entry.words.size() < 3 || entry.words[0] != "nfsd") continue;
-    std::istringstream names(entry.words[2]);
-    for (std::string name; std::getline(names, name, ',');) {
+    for (const std::string_view name : PartsOf(entry.words[2], ',')) {
       if (IsExportHostName(name)) served[ExportClientKey(name)].push_back(entry.words[1]);
     }
   }

@@ -6,7 +6,6 @@
 #include <map>
 #include <optional>
 #include <set>
-#include <sstream>
 #include <string>
 #include <utility>
 #include <vector>
@@ -14,6 +13,7 @@
 #include "box_paths.h"
 #include "exports_files.h"
 #include "exports_text.h"
+#include "lines.h"
 #include "notice.h"
 #include "path_resolver.h"
 #include "platform_settings.h"
@@ -32,8 +32,7 @@ Result<Directories> ReadRemembered(Box& box) {
   const Result<StoredFile> file = box.Read(kExportedShares);
   if (!file.ok()) return file.status();
   Directories remembered;
-  std::istringstream lines(file->text);
-  for (std::string line; std::getline(lines, line);) remembered.insert(line);
+  for (const std::string_view line : LinesOf(file->text)) remembered.emplace(line);
   return remembered;
 }
 

@@ -1,19 +1,14 @@
 #include "hosts_text.h"
 
-#include <sstream>
-#include <utility>
+#include "lines.h"
 
 namespace vorn {
 
 std::vector<HostsLine> ReadHosts(const std::string& text) {
   std::vector<HostsLine> hosts;
-  std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
-    std::istringstream words(line.substr(0, line.find('#')));
-    HostsLine host;
-    words >> host.address;
-    for (std::string name; words >> name;) host.names.push_back(name);
-    if (!host.names.empty()) hosts.push_back(std::move(host));
+  for (const std::string_view line : LinesOf(text)) {
+    const std::vector<std::string_view> words = WordsOf(line.substr(0, line.find('#')));
+    if (words.size() >= 2) hosts.push_back({std::string(words[0]), {words.begin() + 1, words.end()}});
   }
   return hosts;
 }

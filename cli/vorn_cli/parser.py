@@ -33,6 +33,13 @@ class Parser(argparse.ArgumentParser):
     def error(self, message):
         self.exit(Exit.USAGE, f"vorn: {message}\n  \"{self.prog} --help\" has the usage.\n")
 
+    def parse_args(self, args=None, namespace=None):
+        """As argparse does, but words that a command does not know are an error of that command."""
+        arguments, unknown = self.parse_known_args(args, namespace)
+        if unknown:
+            arguments.parser.error("unrecognized arguments: " + " ".join(unknown))
+        return arguments
+
 
 def build():
     """The parser of all commands."""
@@ -64,7 +71,7 @@ def _add_command(subparsers, name, command):
         parser.add_argument(*one.names, **one.settings)
     if command.needs_box:
         _accept_global_options(parser)
-    parser.set_defaults(command=command)
+    parser.set_defaults(command=command, parser=parser)
 
 
 def _accept_global_options(parser):

@@ -85,6 +85,7 @@ class ServiceTest(BoxTest):
         self.refuses("nfs set --nfs4 maybe", Exit.USAGE, "maybe", "vorn nfs set --help")
         self.refuses("nfs set --read-size many", Exit.USAGE, "many")
         self.refuses("nfs frobnicate", Exit.USAGE, "frobnicate")
+        self.refuses("nfs set --speed high", Exit.USAGE, "--speed high", "vorn nfs set --help")
 
     def test_shows_the_reasons_of_the_box(self):
         self.refuses("advanced set --fixed-ports on --statd-port 4050 --lockd-port 4050", Exit.FAILED, "(code 2302,",
@@ -400,6 +401,7 @@ class StateTest(BoxTest):
         text = yaml.safe_dump(wanted)
         checked = self.refuses("apply - --check", Exit.DIFFERS, "differs from -: 9 steps", stdin=text)
         self.assertIn("Step 1 would do this:", checked.stdout)
+        self.assertIn("enable_nfs: false -> true", checked.stdout)
         self.assertNotIn("photos", self.vorn("share list"))
         self.vorn("apply - --yes", stdin=text)
         self.assertEqual(self.vorn("apply - --check", stdin=text), "The box is in the wanted state.\n")

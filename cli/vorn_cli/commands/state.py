@@ -1,6 +1,7 @@
 """vorn dump, vorn apply: the whole state of the box as one file."""
 
 import dataclasses
+import json
 import sys
 
 import yaml
@@ -155,7 +156,9 @@ def _setting_steps(present, wanted, revisions):
 
 
 def _changes(before, after):
-    return ", ".join(f"{name}: {before.get(name)} -> {value}" for name, value in after.items() if before.get(name) != value)
+    """The changed settings, with their values as the file has them."""
+    return ", ".join(f"{name}: {json.dumps(before.get(name))} -> {json.dumps(value)}"
+                     for name, value in after.items() if before.get(name) != value)
 
 
 def _some(names):

@@ -4,7 +4,6 @@ import argparse
 import concurrent.futures
 import os
 import shutil
-import subprocess
 import sys
 
 from host import guest, report, stories
@@ -17,28 +16,36 @@ from host.process import build, output_of
 _WORK = PROJECT / "build/break"
 
 
+def edited_sources(item):
+    """The sources that the break's edit changes: their names and the edited texts."""
+    text, expression = item.source
+    edited = {}
+    for path in PROJECT.glob("linux/**/*.cpp"):
+        before = path.read_text(encoding="utf-8")
+        after = output_of("sed", expression, str(path)) if text in before else before
+        if after != before:
+            edited[path.relative_to(PROJECT)] = after
+    return edited
+
+
 def broken_packages(item):
     """Builds the packages from sources with the break's edit. Raises LabError where the edit changes nothing."""
-    text, expression = item.source
+    edited = edited_sources(item)
+    if not edited:
+        raise LabError("no source has the text that is to be edited")
     tree = _WORK / item.name
     shutil.rmtree(tree, ignore_errors=True)
     for name in output_of("git", "ls-files", cwd=PROJECT).splitlines():
         (tree / name).parent.mkdir(parents=True, exist_ok=True)
         shutil.copy(PROJECT / name, tree / name)
-    changed = False
-    for path in tree.glob("linux/**/*.cpp"):
-        before = path.read_text(encoding="utf-8")
-        if text in before:
-            subprocess.run(["sed", "-i", expression, str(path)], check=True)
-            changed |= path.read_text(encoding="utf-8") != before
-    if not changed:
-        raise LabError(f"{item.name}: no source has the text that is to be edited")
+    for name, text in edited.items():
+        (tree / name).write_text(text, encoding="utf-8")
     build([str(tree / "packaging/build")], _WORK / f"{item.name}.log")
     return guest.packages_of(tree / "build")
 
 
 def run_break(item, make_guest):
-    """The stories that failed with the break, or None if the guest ended without a verdict."""
+    """The names of the stories that failed with the break."""
     packages = broken_packages(item) if item.source else None
     (story,) = stories.find([item.story])
 
@@ -52,6 +59,15 @@ def run_break(item, make_guest):
     job = stories.Job(f"break-{item.name}", [story], story.boots)
     guest.tell(job, ["-k", item.select] if item.select else [], make, quiet=True)
     return report.failed(job)
+
+
+def try_break(item, make_guest):
+    """The names of the stories that failed with the break; none if it could not be tried, which the others survive."""
+    try:
+        return run_break(item, make_guest)
+    except (LabError, OSError) as error:
+        say(f"{item.name}: {error}")
+        return []
 
 
 def table(results):
@@ -83,7 +99,7 @@ def main():
         library = ["gcc", "-shared", "-fPIC", "-o", str(_WORK / "preload.so"), str(PROJECT / "lab/breaks/preload.c")]
         build([*library, "-ldl"], _WORK / "preload.log")
         with concurrent.futures.ThreadPoolExecutor(options.jobs) as pool:
-            failed = list(pool.map(lambda item: run_break(item, make_guest), items))
+            failed = list(pool.map(lambda item: try_break(item, make_guest), items))
     except LabError as error:
         say(error)
         return error.status

@@ -12,6 +12,7 @@ from host.cache import PROJECT
 from host.log import LabError, say, show
 from host.main import prepare
 from host.process import build, output_of
+from host.release import Release
 
 _WORK = PROJECT / "build/break"
 
@@ -40,8 +41,7 @@ def broken_packages(item):
         shutil.copy(PROJECT / name, tree / name)
     for name, text in edited.items():
         (tree / name).write_text(text, encoding="utf-8")
-    build([str(tree / "packaging/build")], _WORK / f"{item.name}.log")
-    return guest.packages_of(tree / "build")
+    return Release(item.release).packages(_WORK / f"{item.name}.log", tree)
 
 
 def run_break(item, make_guest):
@@ -61,13 +61,24 @@ def run_break(item, make_guest):
     return report.failed(job)
 
 
-def try_break(item, make_guest):
+def try_break(item, make_guests):
     """The names of the stories that failed with the break; none if it could not be tried, which the others survive."""
     try:
-        return run_break(item, make_guest)
+        return run_break(item, make_guests[item.release]) if item.release in make_guests else []
     except (LabError, OSError) as error:
         say(f"{item.name}: {error}")
         return []
+
+
+def prepare_releases(items):
+    """By release, for the releases that the breaks need and that can be prepared: what creates a guest."""
+    make_guests = {}
+    for release in dict.fromkeys(item.release for item in items):
+        try:
+            make_guests[release] = prepare("uml", release)
+        except LabError as error:
+            say(f"{release}: {error}")
+    return make_guests
 
 
 def table(results):
@@ -95,11 +106,11 @@ def main():
         items = chosen_breaks(options.breaks)
         for folder in (guest.WORK, _WORK):
             folder.mkdir(parents=True, exist_ok=True)
-        make_guest = prepare("uml")
+        make_guests = prepare_releases(items)
         library = ["gcc", "-shared", "-fPIC", "-o", str(_WORK / "preload.so"), str(PROJECT / "lab/breaks/preload.c")]
         build([*library, "-ldl"], _WORK / "preload.log")
         with concurrent.futures.ThreadPoolExecutor(options.jobs) as pool:
-            failed = list(pool.map(lambda item: try_break(item, make_guest), items))
+            failed = list(pool.map(lambda item: try_break(item, make_guests), items))
     except LabError as error:
         say(error)
         return error.status

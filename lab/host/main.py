@@ -59,7 +59,7 @@ def prepare(machine, release=DEFAULT_RELEASE):
     made_for = Release(release)
     build([str(PROJECT / "scripts/setup"), "lab", f"lab_{machine}"], guest.WORK / "setup.log")
     say("packing the product")
-    built = made_for.packages()
+    built = made_for.packages(guest.WORK / "package.log")
     kept = cache.Cache(guest.WORK)
     kernel, disk = cache.kernel(kept, machine, made_for), cache.disk(kept, made_for)
     return lambda name, packages=None: guest.Guest(name, machine, kernel, disk, packages or built)

@@ -16,23 +16,25 @@ class Release:
     def __init__(self, name):
         self.name = name
         self.is_here = platform.freedesktop_os_release().get("VERSION_CODENAME") == name
-        systems = pathlib.Path(os.environ.get("VORN_SYSTEMS") or PROJECT / "build/systems").absolute()
-        self._build = systems / name / "build"  # the build folder of the minimal system
+        self._systems = pathlib.Path(os.environ.get("VORN_SYSTEMS") or PROJECT / "build/systems").absolute()
+        self._build = self._systems / name / "build"  # the build folder of the minimal system
 
-    def _run(self, log, *command):
-        system = [] if self.is_here else [str(PROJECT / "scripts/system"), self.name]
-        process.build([*system, *command], log, cwd=PROJECT)
+    def _run(self, log, *command, tree=PROJECT):
+        system = [] if self.is_here else [str(tree / "scripts/system"), self.name]
+        process.build([*system, *command], log, cwd=tree, env={**os.environ, "VORN_SYSTEMS": str(self._systems)})
 
-    def packages(self):
-        """Builds the packages of the product for this release. Returns their paths."""
-        self._run(guest.WORK / "package.log", "packaging/build")
+    def packages(self, log, tree=PROJECT):
+        """Builds the packages of the product in the folder `tree` for this release. Returns their paths."""
         if self.is_here:
-            return guest.packages_of(PROJECT / "build")
-        # Other checkouts may build in the same system.
-        kept = guest.WORK / f"packages-{self.name}"
+            self._run(log, "packaging/build", tree=tree)
+            return guest.packages_of(tree / "build")
+        # Others may build in the same system as soon as the command has ended.
+        made, kept = f"packages-{log.stem}", log.parent / f"{log.stem}-{self.name}"
+        self._run(log, "sh", "-ec", f"packaging/build; rm -rf build/{made}; mkdir -p build/{made}/package; "
+                  f"cp build/package/*.deb build/{made}/package", tree=tree)
         shutil.rmtree(kept, ignore_errors=True)
-        kept.mkdir()
-        return [pathlib.Path(shutil.copy(package, kept)) for package in guest.packages_of(self._build)]
+        shutil.copytree(self._build / made, kept)
+        return guest.packages_of(kept)
 
     def fill(self, folder, program, jobs, log):
         """Runs a program that fills an empty folder and needs what these jobs of scripts/setup install."""

@@ -154,14 +154,22 @@ settle_groups() {
 	[ -n "$root" ] || : >"$mark"
 }
 
+# has_rights "CLIENT DIRECTORY TIME": whether the kernel remembers rights of the client in the directory. It lists them as
+# "DIRECTORY<tab>CLIENT(OPTIONS)", with the same escape sequences.
+has_rights() {
+	directory=${1#* }
+	grep -Fq "${directory% *}	${1%% *}(" /proc/net/rpc/nfsd.export/content
+}
+
 # The platform library writes the entries, one per line. They concern directories in the mount namespace of
-# rpc.mountd(8), which vornd.service does not share.
+# rpc.mountd(8), which vornd.service does not share. The kernel refuses an entry of a client that it has forgotten
+# meanwhile.
 forget_rights() {
 	expired=$root/run/vorn/expired-rights
 	[ -e "$expired" ] || return 0
 	status=0
 	while IFS= read -r entry; do
-		tell /proc/net/rpc/nfsd.export/channel "$entry" || status=1
+		tell /proc/net/rpc/nfsd.export/channel "$entry" 2>/dev/null || ! has_rights "$entry" || status=1
 	done <"$expired"
 	return "$status"
 }

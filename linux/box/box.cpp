@@ -58,12 +58,6 @@ Result<Box::Document> Box::LoadAny(std::type_index type, const std::string& path
   return document;
 }
 
-bool Box::KeyOrder::operator()(const KeyView& a, const KeyView& b) const {
-  if (a.name.size() != b.name.size()) return a.name.size() < b.name.size();
-  const int order = a.name.compare(b.name);
-  return order != 0 ? order < 0 : a.type < b.type;
-}
-
 Box::Cached Box::Find(const KeyView& key) {
   const std::shared_lock lock(mutex_);
   const auto found = documents_.find(key);

@@ -147,13 +147,16 @@ class Box {
   struct Key {
     std::string name;
     std::type_index type;
-
-    operator KeyView() const { return {name, type}; }
   };
   // An order in which most keys differ in the length of their names.
   struct KeyOrder {
     using is_transparent = void;
-    bool operator()(const KeyView& a, const KeyView& b) const;
+    template <typename One, typename Other>
+    bool operator()(const One& a, const Other& b) const {
+      if (a.name.size() != b.name.size()) return a.name.size() < b.name.size();
+      const int order = a.name.compare(b.name);
+      return order != 0 ? order < 0 : a.type < b.type;
+    }
   };
 
   Result<Document> LoadAny(std::type_index type, const std::string& path,
@@ -171,7 +174,7 @@ class Box {
   }
 
   template <typename T>
-  Result<std::shared_ptr<const T>> DeriveAnew(const std::string& name, Sources sources,
+  Result<std::shared_ptr<const T>> DeriveAnew(const std::string& name, Sources&& sources,
                                               const std::function<Result<T>()>& make) {
     const auto make_any = [&make]() -> Result<Document> {
       Result<T> document = make();

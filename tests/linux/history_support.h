@@ -1,4 +1,4 @@
-// What the tests of the history share: saves of files, and the changes that the history has.
+// The parts that the tests of the history share: saves of files, and the changes that the history has.
 #ifndef VORN_TESTS_LINUX_HISTORY_SUPPORT_H
 #define VORN_TESTS_LINUX_HISTORY_SUPPORT_H
 

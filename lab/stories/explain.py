@@ -78,7 +78,6 @@ class Access:
         return f"{self.share} {self.address} {self.user.name} version {self.version} port {self.port}"
 
 
-
 def network(choose, address):
     """A network of any size and in any spelling, with the address in it or missed by one bit."""
     host = ipaddress.ip_address(address)

@@ -9,6 +9,7 @@
 #include "ascii.h"
 #include "host_domain.h"
 #include "idmap.h"
+#include "lines.h"
 #include "nfs_configuration.h"
 #include "translation_methods.h"
 #include "users.h"
@@ -121,10 +122,7 @@ Status ManageGroups(Box& box, const People& people, VORN::AccessIdentity* ids) {
 bool IsLocalRealm(const IDMap& map, const std::string& realm) {
   const std::optional<IniFound> realms = map.files().Find("General", "Local-Realms");
   if (!realms) return realm == UpperAscii(map.domain() ? *map.domain() : HostDomain::OfThisHost().Get());
-  std::string_view rest = realms->value;
-  while (!rest.empty()) {
-    std::string_view one = rest.substr(0, rest.find(','));
-    rest.remove_prefix(std::min(one.size() + 1, rest.size()));
+  for (std::string_view one : PartsOf(realms->value, ',')) {
     one.remove_prefix(std::min(one.find_first_not_of(" \t"), one.size()));
     if (one == realm) return true;
   }

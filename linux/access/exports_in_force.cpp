@@ -131,6 +131,15 @@ Result<std::string> ByAddress(std::string_view table, const HostAddresses& hosts
   return text;
 }
 
+Result<std::set<std::string>> FindPending(const std::vector<SharedExportsFile>& files, std::string_view table,
+                                          const ExportPaths& paths, const HostAddresses& hosts, const Places& places) {
+  const Result<std::string> by_address = ByAddress(table, hosts, places);
+  if (!by_address.ok()) return by_address.status();
+  Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
+  if (!update.ok()) return update.status();
+  return std::move(update->changed);
+}
+
 }  // namespace
 
 Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bool is_serving) {
@@ -144,9 +153,10 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
   result.hosts = std::move(*hosts);
   const std::set<std::string> known = AddHosts(HostNames(*files), names, &result);
   const BoxPaths paths(box.root());
+  const Places places = FindPlaces(*files, result.hosts, paths);
   std::string text = table->text;
   if (is_serving) {
-    Result<std::set<std::string>> pending = FindPendingExports(*files, text, paths, result.hosts);
+    Result<std::set<std::string>> pending = FindPending(*files, text, paths, result.hosts, places);
     if (!pending.ok()) return pending.status();
     result.pending = std::move(*pending);
   } else {
@@ -154,7 +164,6 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
     if (!update.ok()) return update.status();
     text = std::move(update->text);
   }
-  const Places places = FindPlaces(*files, result.hosts, paths);
   Result<ExportList> exports = ReadExports(text, places);
   if (!exports.ok()) return exports.status();
   result.exports = std::move(*exports);
@@ -163,11 +172,7 @@ Result<ExportsInForce> ReadExportsInForce(Box& box, const NameService& names, bo
 
 Result<std::set<std::string>> FindPendingExports(const std::vector<SharedExportsFile>& files, std::string_view table,
                                                  const ExportPaths& paths, const HostAddresses& hosts) {
-  const Result<std::string> by_address = ByAddress(table, hosts, FindPlaces(files, hosts, paths));
-  if (!by_address.ok()) return by_address.status();
-  Result<ExportTableUpdate> update = PlanExportTable(files, *by_address, paths, hosts);
-  if (!update.ok()) return update.status();
-  return std::move(update->changed);
+  return FindPending(files, table, paths, hosts, FindPlaces(files, hosts, paths));
 }
 
 }  // namespace vorn

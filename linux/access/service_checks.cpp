@@ -1,11 +1,11 @@
 #include "service_checks.h"
 
-#include <sstream>
 #include <vector>
 
 #include "configured_ports.h"
 #include "firewall_table.h"
 #include "kernel_statistics.h"
+#include "lines.h"
 #include "nfs_configuration.h"
 
 namespace vorn {
@@ -36,9 +36,8 @@ Status CheckState(Box& box, AccessChecks* checks) {
 std::optional<bool> HasVersion(Box& box, const std::string& version) {
   const Result<StoredFile> file = box.Read(kVersionsInForce);
   if (!file.ok() || !file->version.exists || !IsServing(box)) return std::nullopt;
-  std::istringstream words(file->text);  // "-2 +3 +4 +4.1 +4.2"
-  bool is_implied = false;               // "+4" stands for 4.0, too, unless there is "-4.0"
-  for (std::string word; words >> word;) {
+  bool is_implied = false;                                   // "+4" stands for 4.0, too, unless there is "-4.0"
+  for (const std::string_view word : WordsOf(file->text)) {  // "-2 +3 +4 +4.1 +4.2"
     if (word.substr(1) == version) return word[0] == '+';
     is_implied = is_implied || (word == "+4" && version == "4.0");
   }

@@ -4,6 +4,7 @@
 #include <map>
 
 #include "host_names.h"
+#include "lines.h"
 
 namespace vorn {
 namespace {
@@ -49,11 +50,9 @@ void ReadAddress(std::string_view text, ClientInfo* info) {
 }
 
 // The lines "key: value".
-std::map<std::string_view, std::string_view> LinesOf(std::string_view text) {
+std::map<std::string_view, std::string_view> ValuesOf(std::string_view text) {
   std::map<std::string_view, std::string_view> lines;
-  while (!text.empty()) {
-    const std::string_view line = text.substr(0, text.find('\n'));
-    text.remove_prefix(std::min(text.size(), line.size() + 1));
+  for (const std::string_view line : LinesOf(text)) {
     const std::size_t colon = line.find(": ");
     if (colon != std::string_view::npos) lines.emplace(line.substr(0, colon), line.substr(colon + 2));
   }
@@ -63,7 +62,7 @@ std::map<std::string_view, std::string_view> LinesOf(std::string_view text) {
 }  // namespace
 
 ClientInfo ParseClientInfo(std::string_view text) {
-  std::map<std::string_view, std::string_view> lines = LinesOf(text);
+  std::map<std::string_view, std::string_view> lines = ValuesOf(text);
   ClientInfo info;
   info.client_id = lines["clientid"];
   info.status = lines["status"];

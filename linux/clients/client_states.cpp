@@ -5,6 +5,8 @@
 #include <cstring>
 #include <unordered_set>
 
+#include "lines.h"
+
 namespace vorn {
 namespace {
 
@@ -68,9 +70,7 @@ ClientStates CountClientStates(std::string_view text, const std::string& client_
   std::unordered_set<std::string_view> ids;
   std::unordered_set<std::string_view> files;
   ClientStates states;
-  while (!text.empty()) {
-    const std::string_view line = text.substr(0, text.find('\n'));
-    text.remove_prefix(std::min(text.size(), line.size() + 1));
+  for (const std::string_view line : LinesOf(text)) {
     const State state = ParseState(line);
     if (state.id.empty() || state.id.substr(0, prefix.size()) != prefix || !ids.insert(state.id).second) continue;
     if (state.type == "open") files.insert(state.file.empty() ? state.id : state.file);

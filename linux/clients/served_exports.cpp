@@ -1,10 +1,10 @@
 #include "served_exports.h"
 
 #include <charconv>
-#include <sstream>
 #include <string_view>
 
 #include "host_names.h"
+#include "lines.h"
 
 namespace vorn {
 namespace {
@@ -66,13 +66,12 @@ void ReadRights(const std::vector<KernelCache::Entry>& entries, ServedExports* s
 
 ExportTraffics ParseExportTraffics(const std::string& text) {
   ExportTraffics traffics;
-  std::istringstream lines(text);
   std::optional<ExportKey> key;
   ExportTraffic traffic;
   bool has_read = false;
-  for (std::string line; std::getline(lines, line);) {
+  for (const std::string_view line : LinesOf(text)) {
     if (line.empty() || line[0] == '/') {
-      key = line.empty() ? std::nullopt : ReadHeading(line, &traffic.begun);
+      key = line.empty() ? std::nullopt : ReadHeading(std::string(line), &traffic.begun);
       has_read = false;
     }
     if (ReadCounter(line, "io_read", &traffic.bytes_read)) has_read = true;

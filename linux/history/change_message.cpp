@@ -1,5 +1,6 @@
 #include "change_message.h"
 
+#include "lines.h"
 #include "unicode.h"
 
 namespace vorn {
@@ -71,9 +72,7 @@ ChangeMessage ParseMessage(std::string_view text) {
   const std::size_t subject_end = text.find("\n\n");
   if (subject_end == std::string_view::npos) return message;
   text.remove_prefix(subject_end + 2);
-  while (!text.empty()) {
-    const std::string_view line = text.substr(0, text.find('\n'));
-    text.remove_prefix(std::min(text.size(), line.size() + 1));
+  for (const std::string_view line : LinesOf(text)) {
     const std::size_t colon = line.find(": ");
     if (colon != std::string_view::npos) Read(line.substr(0, colon), line.substr(colon + 2), &message);
   }

@@ -7,6 +7,8 @@
 #include <system_error>
 #include <utility>
 
+#include "lines.h"
+
 namespace vorn {
 namespace {
 
@@ -57,9 +59,7 @@ std::string FormatAnswers(const std::vector<KdcAnswer>& answers) {
 
 Result<std::vector<KdcAnswer>> ParseAnswers(std::string_view text) {
   std::vector<KdcAnswer> answers;
-  while (!text.empty()) {
-    const std::string_view line = text.substr(0, text.find('\n'));
-    text.remove_prefix(std::min(line.size() + 1, text.size()));
+  for (const std::string_view line : LinesOf(text)) {
     std::optional<KdcAnswer> answer = ParseAnswer(line);
     if (!answer) return Status::Failure(kSyntax, "unexpected answer: " + std::string(line));
     answers.push_back(std::move(*answer));

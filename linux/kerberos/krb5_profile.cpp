@@ -12,6 +12,7 @@ extern "C" {
 #include <vector>
 
 #include "files.h"
+#include "lines.h"
 #include "memory_file.h"
 #include "owned.h"
 #include "root.h"
@@ -72,9 +73,7 @@ class Flattener {
 
   Status AddText(std::string_view text) {
     Open open;
-    while (!text.empty()) {
-      const std::string_view line = text.substr(0, text.find('\n'));
-      text.remove_prefix(std::min(line.size() + 1, text.size()));
+    for (const std::string_view line : LinesOf(text)) {
       if (Status status = AddLine(Trimmed(line), &open); !status.ok()) return status;
     }
     return {};

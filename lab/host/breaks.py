@@ -72,6 +72,9 @@ BREAKS = [
                   "(static_cast<void>(environment), Status())/"), select="without_a_rule"),
     Break("read-only-stays", "a withdrawn right ends immediately", "withdrawn_rights",
           f"sed -i 's/^\tforget_rights$/\texit 0/' {_SCRIPT}", select="read_only"),
+    Break("covered-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
+          f"sed -i 's/|| have_expired \"[^;]*; then return; fi/|| true; then return; fi/' {_SCRIPT}",
+          select="covers"),
     Break("unit-decides-over-threads", "a withdrawn right ends immediately", "withdrawn_rights",
           source=("bool HasThreads() const {", "s/bool HasThreads() const {/bool HasThreads() const {\\n"
                   "    if (std::system(\"systemctl is-active --quiet nfs-server\") != 0) return false;/"),

@@ -44,6 +44,35 @@ def test_a_client_without_a_rule_can_use_its_open_files_no_more(box, client, oth
 
 
 @VERSIONS
+def test_a_right_in_a_folder_that_a_mount_covers_ends_too(box, client, other, version):
+    """The kernel looks for the folder by its path, and finds what is mounted there now."""
+    folder = box.share("data")
+    box.allow("data", {"client": client.address}, {"client": other.address})
+    with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file:
+        run("mount", "-t", "tmpfs", "tmpfs", str(folder))
+        try:
+            box.allow("data", {"client": other.address})
+            assert write_error(file) in REFUSED
+        finally:
+            run("umount", str(folder))
+
+
+def test_a_right_ends_although_a_folder_of_the_share_was_deleted(box, client):
+    """The kernel still lists the rights in the deleted folder, and does not find it by its path."""
+    outer = box.share("outer")
+    inner = outer / "inner"
+    inner.mkdir(mode=0o777)
+    box.share_at("inner", inner)
+    box.allow("inner", {"client": client.address})
+    box.allow("outer", {"client": client.address})
+    with client.mounted("/srv/outer/inner", version="3"), client.mounted("/srv/outer") as mounted:
+        inner.rmdir()
+        with open_file(mounted) as file:
+            box.allow("outer", {"client": client.address, "privilege": "ro"})
+            assert write_error(file) in REFUSED
+
+
+@VERSIONS
 def test_a_rule_that_becomes_read_only_stops_writes_to_open_files(box, client, version):
     box.share("data")
     box.allow("data", {"client": client.address})

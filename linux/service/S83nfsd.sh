@@ -154,24 +154,28 @@ settle_groups() {
 	[ -n "$root" ] || : >"$mark"
 }
 
-# has_rights "CLIENT DIRECTORY TIME": whether the kernel remembers rights of the client in the directory. It lists them as
-# "DIRECTORY<tab>CLIENT(OPTIONS)", with the same escape sequences.
-has_rights() {
-	directory=${1#* }
-	grep -Fq "${directory% *}	${1%% *}(" /proc/net/rpc/nfsd.export/content
+# have_expired FILE: whether the kernel grants none of the rights in FILE any more. It lists rights as
+# "DIRECTORY<tab>CLIENT(OPTIONS)", with the same escape sequences, and marks those that have expired with "# ".
+have_expired() {
+	awk 'NR == FNR { expired[$2 "\t" $1]; next }
+		{ sub(/\(.*/, "", $2) }
+		($1 "\t" $2) in expired { granted = 1 }
+		END { exit granted }' "$1" FS='\t' /proc/net/rpc/nfsd.export/content
 }
 
-# The platform library writes the entries, one per line. They concern directories in the mount namespace of
-# rpc.mountd(8), which vornd.service does not share. The kernel refuses an entry of a client that it has forgotten
-# meanwhile.
+# The platform library writes the entries, one per line ("CLIENT DIRECTORY TIME"). They concern directories in the mount
+# namespace of rpc.mountd(8), which vornd.service does not share. The kernel refuses an entry of a client that it has
+# forgotten meanwhile. It does not find rights in a directory that was deleted or that a mount covers: these expire only
+# together with all others, and with the handles that lead to them.
 forget_rights() {
 	expired=$root/run/vorn/expired-rights
 	[ -e "$expired" ] || return 0
-	status=0
 	while IFS= read -r entry; do
-		tell /proc/net/rpc/nfsd.export/channel "$entry" 2>/dev/null || ! has_rights "$entry" || status=1
+		tell /proc/net/rpc/nfsd.export/channel "$entry" 2>/dev/null
 	done <"$expired"
-	return "$status"
+	if [ -n "$root" ] || have_expired "$expired"; then return; fi
+	tell /proc/net/rpc/nfsd.fh/flush 1
+	tell /proc/net/rpc/nfsd.export/flush 1
 }
 
 case "${1-}" in

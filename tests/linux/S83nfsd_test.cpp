@@ -15,7 +15,10 @@ using testing::HasSubstr;
 using std::string_literals::operator""s;
 
 constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
+constexpr char kExportsChannel[] = "/net/rpc/nfsd.export/channel";
+constexpr char kExportsContent[] = "/net/rpc/nfsd.export/content";
 constexpr char kExportsFlush[] = "/net/rpc/nfsd.export/flush";
+constexpr char kHandlesFlush[] = "/net/rpc/nfsd.fh/flush";
 constexpr char kKeytabWithoutKeys[] = "\005\002";
 constexpr char kLimit[] = "/fs/nfsd/max_block_size";
 constexpr char kLockPort[] = "/sys/fs/nfs/nlm_tcpport";
@@ -37,13 +40,15 @@ class Box {
     for (const char* program : {"/bin/systemctl", "/bin/sleep", "/bin/idmap-compile", "/bin/nft"}) {
       chmod(folder_.At(program).c_str(), 0755);
     }
+    // The box's own /etc has no alternatives(7).
+    RunProgram({"sh", "-c", "ln -s \"$(readlink -f \"$(command -v awk)\")\" " + folder_.At("/bin/awk")});
     folder_.Write("/run/empty", "");
     IsConfigured("");
     folder_.Write("/etc/nfs.conf", "");
     folder_.Write("/lib/vorn/idmap/settings", "stored\n");
-    folder_.Write("/proc" + std::string(kFlush), "");
-    folder_.Write("/proc" + std::string(kExportsFlush), "");
-    folder_.Write("/proc" + std::string(kLimit), "");
+    for (const char* file : {kFlush, kExportsFlush, kHandlesFlush, kLimit}) {
+      folder_.Write("/proc" + std::string(file), "");
+    }
     for (const char* port : {kLockPort, kLockUDPPort}) folder_.Write("/proc" + std::string(port), "32803\n");
   }
 
@@ -67,6 +72,16 @@ class Box {
     chmod(folder_.At("/bin/rpc.mountd").c_str(), 0755);
   }
   void HasAMachineKeytab(const std::string& content) const { folder_.Write("/etc/krb5.keytab", content); }
+  // The platform wrote `entries`, and the kernel shows `content` after it was told.
+  void IsToldToForget(const std::string& entries, const std::string& content) const {
+    folder_.Write("/run/vorn/expired-rights", entries);
+    folder_.Write("/proc" + std::string(kExportsChannel), "");
+    folder_.Write("/proc" + std::string(kExportsContent), content);
+  }
+  void CannotFlushExports() const {
+    RunProgram({"rm", folder_.At("/proc" + std::string(kExportsFlush))});
+    RunProgram({"mkdir", folder_.At("/proc" + std::string(kExportsFlush))});
+  }
   void HasServed() const { folder_.Write("/proc" + std::string(kLimit), "65536\n"); }
   void HasOpenedPorts() const { folder_.Write("/lib/vorn/firewall.nft", ""); }
   void LeftGroupsAlone() const { folder_.Write(kMark, ""); }
@@ -252,6 +267,35 @@ TEST(ForgetRights, WritesEachEntryAsItIs) {
   EXPECT_EQ(result.output,
             "S83nfsd: would write 10.0.0.1 /srv/a\\040b 1700000000 to /proc/net/rpc/nfsd.export/channel\n"
             "S83nfsd: would write 10.0.0.1 / 1700000000 to /proc/net/rpc/nfsd.export/channel\n");
+}
+
+TEST(ForgetRights, FlushesAllIfTheKernelStillGrantsThem) {
+  const struct {
+    const char* name;
+    const char* content;
+    bool flushes;
+  } cases[] = {{"expired", "#path domain(flags)\n# /srv/a\\040(b)\t10.0.0.1(rw,sync)\n", false},
+               {"granted", "/srv/other\t10.0.0.1(rw)\n/srv/a\\040(b)\t10.0.0.1(rw,sync)\n", true},
+               {"in a part of the directory", "/srv/a\\040(b)/c\t10.0.0.1(rw,sync)\n", false},
+               {"of another client", "/srv/a\\040(b)\t10.0.0.11(rw,sync)\n", false},
+               {"nothing", "", false}};
+  for (const auto& c : cases) {
+    const Box box;
+    box.IsToldToForget("10.0.0.1 /srv/a\\040(b) 1700000000\n", c.content);
+    const ProgramResult result = box.Run("forgetrights");
+    EXPECT_EQ(result.status, 0) << c.name << result.errors;
+    for (const char* flush : {kExportsFlush, kHandlesFlush}) {
+      EXPECT_EQ(box.Kernel(flush), c.flushes ? "1\n" : "") << c.name;
+    }
+    EXPECT_EQ(box.Kernel(kExportsChannel), "10.0.0.1 /srv/a\\040(b) 1700000000\n") << c.name;
+  }
+}
+
+TEST(ForgetRights, FailsIfTheKernelCannotBeTold) {
+  const Box box;
+  box.IsToldToForget("10.0.0.1 /srv/a 1700000000\n", "/srv/a\t10.0.0.1(rw)\n");
+  box.CannotFlushExports();
+  EXPECT_NE(box.Run("forgetrights").status, 0);
 }
 
 TEST(ForgetRights, HasNothingToDoWithoutEntries) {

@@ -114,7 +114,7 @@ BREAKS = [
     Break("sizes-not-applied", "settings reach the clients", "service",
           f"sed -i 's/^\\ttransfer_sizes$/\\texit 0/' {_SCRIPT}", select="sizes"),
     Break("any-password", "people get in by their password", "people",
-          "sed -i 's/^@include common-auth/auth sufficient pam_permit.so/' /etc/pam.d/vornd", select="others"),
+          "sed -i 's/^@include common-auth/auth sufficient pam_permit.so/' /usr/lib/pam.d/vornd", select="others"),
     Break("passwords-out-of-reach", "people get in by their password", "people",
           "mkdir -p /etc/systemd/system/vornd.service.d; printf '[Service]\\nInaccessiblePaths=/etc/shadow\\n' "
           f">/etc/systemd/system/vornd.service.d/break.conf; {_RELOAD}", select="signs_in"),

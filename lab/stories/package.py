@@ -19,6 +19,7 @@ WRITTEN_BY_THE_PACKAGE = [pathlib.Path(path) for path in (
     "/etc/nfs.conf.d/vorn.conf", "/etc/systemd/system/nfs-server.service.d/vorn.conf", "/etc/nfs/krb5.keytab",
     "/etc/krb5.keytab", "/var/lib/vorn")]
 PAM, SETTINGS = pathlib.Path("/etc/pam.d/vornd"), pathlib.Path("/etc/vorn/vornd.conf")
+OUR_PAM = pathlib.Path("/usr/lib/pam.d/vornd")
 SOCKET_ONLY = "# The configuration of a box that is managed at its socket\n[server]\n#listen =\n"
 TLS_PORT = 8443
 OF_THE_ADMINISTRATOR = {pathlib.Path(path): text for path, text in {
@@ -57,10 +58,11 @@ def next_version():
 
 def single_package():
     """The package of before version 1.1.0, which had everything."""
-    run("sh", "-ec", f"""rm -rf /tmp/single && mkdir -p /tmp/single/DEBIAN /tmp/single/etc/vorn
+    run("sh", "-ec", f"""rm -rf /tmp/single && mkdir -p /tmp/single/DEBIAN /tmp/single/etc/vorn /tmp/single/etc/pam.d
         for package in {" ".join(PACKAGES)}; do dpkg-deb --extract $package /tmp/single; done
         printf '%s' '{SOCKET_ONLY}' >/tmp/single{SETTINGS}
-        printf '%s\\n' /etc/pam.d/vornd /etc/vorn/vornd.conf >/tmp/single/DEBIAN/conffiles
+        mv /tmp/single{OUR_PAM} /tmp/single{PAM}
+        printf '%s\\n' {PAM} {SETTINGS} >/tmp/single/DEBIAN/conffiles
         printf '%s\\n' 'Package: vorn-nfs' 'Version: 1.0.0' 'Architecture: all' 'Description: all in one' \\
           'Maintainer: The VORN NFS developers <nfs@vorn.example>' >/tmp/single/DEBIAN/control
         dpkg-deb -Znone --build /tmp/single /tmp/single.deb""")
@@ -135,9 +137,8 @@ def test_the_single_package_of_before_is_replaced(box, client, settings):
     assert SETTINGS.read_text(encoding="ascii") == SOCKET_ONLY + "# of the site\n"
     assert not listens()
     SETTINGS.write_bytes(before)
-    assert PAM.read_text(encoding="ascii").endswith("# of the site\n")
-    PAM.write_text(PAM.read_text(encoding="ascii").replace("# of the site\n", ""), encoding="ascii")
-    assert run("dpkg", "--search", str(PAM)) == f"vorn-server: {PAM}\n"
+    assert PAM.read_text(encoding="ascii") == OUR_PAM.read_text(encoding="ascii") + "# of the site\n"
+    PAM.unlink()
     assert succeeds("systemctl", "is-enabled", "vornd")
     run("vorn", "token", "revoke", made["data"]["id"])
 
@@ -243,20 +244,18 @@ def members(group):
 
 
 def test_who_may_use_the_server_outlasts_an_upgrade_and_a_purge(box, settings):
-    """The groups stay with their members. The PAM file is a configuration file of the package."""
+    """The groups stay with their members, and the administrator's own PAM service stays."""
     del box, settings
-    pam = pathlib.Path("/etc/pam.d/vornd")
     run("usermod", "--append", "--groups", "vorn-admin", "alice")
-    with open(pam, "a", encoding="ascii") as file:
-        file.write("# of the site\n")
+    PAM.write_text("auth required pam_deny.so\n", encoding="ascii")
     install(next_version())
     assert "alice" in members("vorn-admin")
-    assert pam.read_text(encoding="ascii").endswith("# of the site\n")
     purge()
-    assert not pam.exists()
+    assert PAM.read_text(encoding="ascii") == "auth required pam_deny.so\n"
     assert "alice" in members("vorn-admin")
     install(PACKAGES)
-    assert pam.exists() and members("vorn-readonly") == [""]
+    assert members("vorn-readonly") == [""]
+    PAM.unlink()
     run("gpasswd", "--delete", "alice", "vorn-admin")
 
 

@@ -75,6 +75,9 @@ BREAKS = [
     Break("covered-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
           f"sed -i 's/|| have_expired \"[^;]*; then return; fi/|| true; then return; fi/' {_SCRIPT}",
           select="covers"),
+    Break("moved-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
+          source=("bool HasMoved(", "s/return !IsOneOrAboveOne(path, exported).*/return exported.count(path) > 1;/"),
+          select="moved"),
     Break("unit-decides-over-threads", "a withdrawn right ends immediately", "withdrawn_rights",
           source=("bool HasThreads() const {", "s/bool HasThreads() const {/bool HasThreads() const {\\n"
                   "    if (std::system(\"systemctl is-active --quiet nfs-server\") != 0) return false;/"),

@@ -43,9 +43,33 @@ def test_a_client_without_a_rule_can_use_its_open_files_no_more(box, client, oth
             assert write_error(file) == 0
 
 
+def keep_a_share(box, client):
+    """The kernel goes on knowing the client."""
+    box.share("kept")
+    box.allow("kept", {"client": client.address})
+
+
+@VERSIONS
+def test_a_right_in_a_folder_that_was_moved_ends_too(box, client, other, version):
+    """The kernel follows the folder, and the share's path leads to another one."""
+    keep_a_share(box, client)
+    folder = box.share("data")
+    box.allow("data", {"client": client.address}, {"client": other.address})
+    with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file:
+        folder.rename("/srv/data.old")
+        try:
+            box.share("data")
+            box.allow("data", {"client": other.address})
+            assert write_error(file) in REFUSED
+        finally:
+            folder.rmdir()
+            pathlib.Path("/srv/data.old").rename(folder)
+
+
 @VERSIONS
 def test_a_right_in_a_folder_that_a_mount_covers_ends_too(box, client, other, version):
     """The kernel looks for the folder by its path, and finds what is mounted there now."""
+    keep_a_share(box, client)
     folder = box.share("data")
     box.allow("data", {"client": client.address}, {"client": other.address})
     with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file:

@@ -195,6 +195,7 @@ class Planner {
     Grants after = Wanted(rules, before);
     if (IsKept(path, rules)) AddMissing(before, &after);
     Count(before, after);
+    if (!after.empty()) update_.exported.insert(path);
     if (IsSame(before, after)) {
       for (const Grant& grant : before) update_.text += grant.line;
       return;

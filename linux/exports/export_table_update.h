@@ -19,6 +19,9 @@ using HostAddresses = std::map<std::string, std::vector<std::string>>;
 struct ExportTableUpdate {
   std::string text;  // the new table
 
+  // All directories that the new table exports.
+  std::set<std::string> exported;
+
   // The directories whose exports differ between the two tables; of these, the directories that are not exported
   // any more; and every client that the whole table has gained or lost.
   std::set<std::string> changed;

@@ -11,7 +11,6 @@
 #include <utility>
 #include <vector>
 
-#include "export_table.h"
 #include "exports_client.h"
 #include "folder_path.h"
 #include "kernel_cache.h"
@@ -41,24 +40,52 @@ Status ExpireEntries(const KernelCache& cache, const Expire& expire) {
 // In seconds since the epoch.
 std::string Past() { return std::to_string(std::time(nullptr) - 1); }
 
+std::optional<dev_t> DeviceOf(const std::string& path) {
+  struct stat stat {};
+  if (lstat(path.c_str(), &stat) != 0) return std::nullopt;
+  return stat.st_dev;
+}
+
+bool IsVolume(const std::string& path) {
+  const auto device = DeviceOf(path);
+  return device && device != DeviceOf(path.substr(0, path.rfind('/') + 1));
+}
+
+bool IsOneOrAboveOne(const std::string& path, const std::set<std::string>& directories) {
+  if (directories.count(path) != 0) return true;
+  const auto next = directories.lower_bound(path == "/" ? path : path + "/");
+  return next != directories.end() && IsBelow(*next, path);
+}
+
+bool IsBelowOne(const std::string& path, const std::set<std::string>& directories) {
+  for (std::size_t slash = path.rfind('/'); slash != std::string::npos && slash > 0;
+       slash = path.rfind('/', slash - 1)) {
+    if (directories.count(path.substr(0, slash)) != 0) return true;
+  }
+  return directories.count("/") != 0;
+}
+
 // Whether rights in `path` may depend on the exports of a changed directory: it may be below it on another volume
 // (crossmnt), or above it in the tree that NFSv4 clients see.
 bool IsConcerned(const std::string& path, const std::set<std::string>& changed) {
-  if (changed.count(path) != 0) return true;
-  const auto next = changed.lower_bound(path == "/" ? path : path + "/");
-  if (next != changed.end() && IsBelow(*next, path)) return true;
-  for (std::size_t slash = path.rfind('/'); slash != std::string::npos && slash > 0;
-       slash = path.rfind('/', slash - 1)) {
-    if (changed.count(path.substr(0, slash)) != 0) return true;
-  }
-  return changed.count("/") != 0;
+  return IsOneOrAboveOne(path, changed) || IsBelowOne(path, changed);
+}
+
+// Whether the kernel has rights in `path` although the table gives none there: the directory was moved, and the kernel
+// follows it.
+bool HasMoved(const std::string& path, const std::set<std::string>& exported) {
+  return !IsOneOrAboveOne(path, exported) && !(IsBelowOne(path, exported) && IsVolume(path));
 }
 
 // "/srv/data client(rw,...)"
-Status ForgetRights(const KernelCache& cache, const std::set<std::string>& changed, const RightsWriter& write) {
-  const auto lines = LinesToExpire(cache, [&changed](const KernelCache::Entry& entry) -> std::optional<std::string> {
+Status ForgetRights(const KernelCache& cache, const ExportTableUpdate& update, const RightsWriter& write) {
+  const auto lines = LinesToExpire(cache, [&update](const KernelCache::Entry& entry) -> std::optional<std::string> {
     const auto& words = entry.words;
-    if (words.size() < 2 || !IsConcerned(UnescapeWord(words[0]), changed)) return std::nullopt;
+    if (words.size() < 2) return std::nullopt;
+    const std::string path = UnescapeWord(words[0]);
+    if (!IsConcerned(path, update.changed) && (entry.is_negative || !HasMoved(path, update.exported))) {
+      return std::nullopt;
+    }
     return words[1].substr(0, words[1].rfind('(')) + " " + words[0] + " " + Past();
   });
   if (!lines) return cache.Flush();
@@ -90,7 +117,10 @@ Status ForgetHandles(const KernelCache& cache, const ExportTableUpdate& update) 
     const auto& words = entry.words;
     if (words.size() < 3 || words[2].substr(0, 2) != "0x") return std::nullopt;
     const bool has_directory = !entry.is_negative && words.size() > 3;
-    if (has_directory && !IsConcerned(UnescapeWord(words[3]), update.left)) return std::nullopt;
+    if (has_directory) {
+      const std::string path = UnescapeWord(words[3]);
+      if (!IsConcerned(path, update.left) && !HasMoved(path, update.exported)) return std::nullopt;
+    }
     return words[0] + " " + words[1] + " " + HandleBytes(words[2]) + " " + Past();
   });
 }
@@ -114,12 +144,6 @@ Status ForgetAddresses(const KernelCache& cache, const std::set<std::string>& cl
   });
 }
 
-std::optional<dev_t> DeviceOf(const std::string& path) {
-  struct stat stat {};
-  if (lstat(path.c_str(), &stat) != 0) return std::nullopt;
-  return stat.st_dev;
-}
-
 // Whether a directory that is not exported any more is on a file system without another export.
 bool HasLeftVolume(const ExportTableUpdate& update) {
   std::set<dev_t> left;
@@ -128,11 +152,8 @@ bool HasLeftVolume(const ExportTableUpdate& update) {
     if (!device) return true;
     left.insert(*device);
   }
-  if (left.empty()) return false;
-  const Result<std::vector<ExportTableLine>> table = ReadExportTable(update.text);
-  if (!table.ok()) return true;
-  for (auto line = table->begin(); line != table->end() && !left.empty(); ++line) {
-    if (const auto device = DeviceOf(line->path)) left.erase(*device);
+  for (auto path = update.exported.begin(); path != update.exported.end() && !left.empty(); ++path) {
+    if (const auto device = DeviceOf(*path)) left.erase(*device);
   }
   return !left.empty();
 }
@@ -144,7 +165,7 @@ Status ForgetExports(const std::string& folder, const ExportTableUpdate& update,
   const KernelCache rights(folder, kRightsCache);
   const Status addresses = ForgetAddresses(KernelCache(folder, kAddressesCache), update.clients);
   const Status handles = ForgetHandles(KernelCache(folder, kHandlesCache), update);
-  const Status forgotten = HasLeftVolume(update) ? rights.Flush() : ForgetRights(rights, update.changed, write_rights);
+  const Status forgotten = HasLeftVolume(update) ? rights.Flush() : ForgetRights(rights, update, write_rights);
   return !addresses.ok() ? addresses : !handles.ok() ? handles : forgotten;
 }
 

@@ -15,8 +15,8 @@ namespace vorn {
 using RightsWriter = std::function<Status(const std::string& lines)>;
 
 // Makes the kernel's server forget the entries that the update concerns, so that it asks rpc.mountd(8) at the next
-// request: rights in the changed directories, in those below and above them, and, if a client is new in the table or
-// has left it, to which clients an address belongs. All other entries stay, so other requests are served without
+// request: rights in the changed directories, in those below and above them, and in directories that were moved since
+// they were exported, and, if a client is new in the table or has left it, to which clients an address belongs. All other entries stay, so other requests are served without
 // rpc.mountd, which reads the whole table again first.
 //
 // All of a cache is flushed if its entries cannot be expired one by one. The cache of rights is also flushed if a file

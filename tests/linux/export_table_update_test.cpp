@@ -85,6 +85,7 @@ TEST(ExportTableUpdate, ChangesTheLinesOfTheChangedDirectoryOnly) {
   EXPECT_THAT(update.text, HasSubstr("/a\t10.0.0.1(ro,"));
   EXPECT_THAT(update.text, HasSubstr(other));
   EXPECT_THAT(update.changed, ElementsAre("/a"));
+  EXPECT_THAT(update.exported, ElementsAre("/a", "/b"));
   EXPECT_THAT(update.left, IsEmpty());
   EXPECT_THAT(update.clients, IsEmpty());
 }
@@ -99,6 +100,7 @@ TEST(ExportTableUpdate, RemovesADirectoryThatNoLineHas) {
   const ExportTableUpdate update = Plan("/b *(ro)\n", "/a\t*(ro)\n/b\t*(ro)\n");
   EXPECT_EQ(update.text, "/b\t*(ro)\n");
   EXPECT_THAT(update.changed, ElementsAre("/a"));
+  EXPECT_THAT(update.exported, ElementsAre("/b"));
   EXPECT_THAT(update.left, ElementsAre("/a"));
 }
 

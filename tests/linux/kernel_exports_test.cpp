@@ -8,7 +8,6 @@
 #include <string>
 #include <vector>
 
-#include "exports_text.h"
 #include "kernel_caches.h"
 #include "temporary_root.h"
 
@@ -71,6 +70,7 @@ class KernelExports : public testing::Test {
 ExportTableUpdate Changed(const std::string& path) {
   ExportTableUpdate update;
   update.changed = {path};
+  update.exported = {"/srv/data", "/srv/database"};
   return update;
 }
 
@@ -122,7 +122,7 @@ TEST_F(KernelExports, DoesNotFlushWhereTheVolumeHasOtherExports) {
   folder_.Write("/b/file", "");
   ExportTableUpdate update = Changed(folder_.At("/a"));
   update.left = update.changed;
-  update.text = folder_.At("/b") + "\t*(ro)\n";
+  update.exported = {folder_.At("/b")};
   EXPECT_TRUE(Forget(update).ok());
   EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
 }
@@ -135,23 +135,25 @@ TEST_F(KernelExports, ForgetsTheHandlesOfADirectoryThatHasLeft) {
                                                     "0c0b0a09100f0e0d14131211 PAST"));
 }
 
-// The table's path reads as "/a\\040": the backslash is an escape, and the digits after it are not part of one.
-TEST_F(KernelExports, FindsADirectoryWithABackslashInTheTable) {
-  folder_.Write("/left/file", "");
-  folder_.Write("/a\\040/file", "");
-  ExportTableUpdate update = Changed(folder_.At("/left"));
-  update.left = update.changed;
-  update.text = EncodeExportsWord(folder_.At("/a\\040")) + "\t*(ro)\n";
-  EXPECT_TRUE(Forget(update).ok());
-  EXPECT_FALSE(caches_.IsFlushed("nfsd.export"));
+// The kernel follows a directory that was renamed, and a client uses it with the handles that it has.
+TEST_F(KernelExports, ForgetsTheRightsAndHandlesInADirectoryThatWasMoved) {
+  caches_.Fill("nfsd.export",
+               "/srv/data.old\t10.0.0.1(rw,sec=1)\n"
+               "/srv/data/moved\t10.0.0.1(rw,sec=1)\n"
+               "# /srv/gone\t10.0.0.1()\n"
+               "/srv/database\t10.0.0.1(rw,sec=1)\n");
+  caches_.Fill("nfsd.fh", "10.0.0.1 1 0x00000000 /srv/data.old\n10.0.0.1 1 0x01000000 /srv/database\n");
+  EXPECT_TRUE(Forget(Changed("/volume")).ok());
+  EXPECT_THAT(Expired("nfsd.export"), ElementsAre("10.0.0.1 /srv/data.old PAST", "10.0.0.1 /srv/data/moved PAST"));
+  EXPECT_THAT(Expired("nfsd.fh"), ElementsAre("10.0.0.1 1 \\x00000000 PAST"));
 }
 
-TEST_F(KernelExports, FlushesTheRightsIfTheTableCannotBeRead) {
-  ExportTableUpdate update = Changed(folder_.directory());
-  update.left = update.changed;
-  update.text = "nonsense\n";
+TEST_F(KernelExports, KeepsTheRightsInAVolumeBelowAnExport) {
+  caches_.Fill("nfsd.export", "/proc\t10.0.0.1(rw,crossmnt)\n");
+  ExportTableUpdate update = Changed("/srv/data");
+  update.exported = {"/"};
   EXPECT_TRUE(Forget(update).ok());
-  EXPECT_TRUE(caches_.IsFlushed("nfsd.export"));
+  EXPECT_THAT(Expired("nfsd.export"), IsEmpty());
 }
 
 TEST_F(KernelExports, UnderstandsWordsThatOnlyLookLikeEscapes) {

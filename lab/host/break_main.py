@@ -62,12 +62,12 @@ def run_break(item, make_guest):
 
 
 def try_break(item, make_guests):
-    """The names of the stories that failed with the break; none if it could not be tried, which the others survive."""
+    """The names of the stories that failed with the break; None if it could not be tried, which the others survive."""
     try:
-        return run_break(item, make_guests[item.release]) if item.release in make_guests else []
+        return run_break(item, make_guests[item.release]) if item.release in make_guests else None
     except (LabError, OSError) as error:
         say(f"{item.name}: {error}")
-        return []
+        return None
 
 
 def prepare_releases(items):
@@ -84,7 +84,8 @@ def prepare_releases(items):
 def table(results):
     rows = [f"{'break':22} {'promise':44} noticed by"]
     for item, failed in results:
-        rows.append(f"{item.name:22} {item.promise:44} {', '.join(failed) or 'NONE'}")
+        noticed = "not tried" if failed is None else ", ".join(failed) or "NONE"
+        rows.append(f"{item.name:22} {item.promise:44} {noticed}")
     return "\n".join(rows) + "\n"
 
 

@@ -76,7 +76,7 @@ BREAKS = [
           f"sed -i 's/|| have_expired \"[^;]*; then return; fi/|| true; then return; fi/' {_SCRIPT}",
           select="covers"),
     Break("moved-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
-          source=("bool HasMoved(", "s/return !IsOneOrAboveOne(path, exported).*/return exported.count(path) > 1;/"),
+          source=("bool HasMoved(", "s/return !IsOneOrAboveOne/return exported.empty() \\&\\& !IsOneOrAboveOne/"),
           select="moved"),
     Break("unit-decides-over-threads", "a withdrawn right ends immediately", "withdrawn_rights",
           source=("bool HasThreads() const {", "s/bool HasThreads() const {/bool HasThreads() const {\\n"

@@ -34,6 +34,10 @@ def seconds_of(action):
     return time.monotonic() - begun
 
 
+def apply_whole_table():
+    return seconds_of(lambda: run("exportfs", "-r", timeout=1200))
+
+
 def compute(seconds):
     """Occupies the guest's only processor, as a save does, and changes nothing."""
     run("sh", "-c", f"timeout {seconds:.3f} sh -c 'while :; do :; done'; true")
@@ -51,7 +55,7 @@ def test_a_save_among_thousands_of_shares_is_in_force_and_nobody_else_waits(box,
 
     few = statistics.median(seconds_of(lambda p=privilege: save(p)) for privilege in ("ro", "rw") * 3)
     add_shares(box, count)
-    whole_table = seconds_of(lambda: run("exportfs", "-r", timeout=1200))
+    whole_table = [apply_whole_table()]
     save("ro")  # reads the large file for the first time
     with client.mounted("/srv/data", options="hard") as mounted, other.mounted("/srv/another") as changing:
         writer = Writer(mounted / "file")
@@ -64,7 +68,8 @@ def test_a_save_among_thousands_of_shares_is_in_force_and_nobody_else_waits(box,
             assert writable(changing) == (privilege == "rw"), "a save was answered before it was in force"
             computing.append(writer.longest_gap_while(lambda: compute(seconds[-1])))
         writer.finish()
-    for name, figures in (("few", [few]), ("exportfs -r", [whole_table]), ("seconds", seconds), ("gaps", gaps),
+    whole_table.append(apply_whole_table())  # the load of the host may have changed
+    for name, figures in (("few", [few]), ("exportfs -r", whole_table), ("seconds", seconds), ("gaps", gaps),
                           ("computing", computing)):
         record_property(name, sorted(figures))
         print(name, [round(figure, 3) for figure in sorted(figures)])
@@ -72,7 +77,7 @@ def test_a_save_among_thousands_of_shares_is_in_force_and_nobody_else_waits(box,
     # All bounds depend on measurements of the same guest, because its processor is shared with the writer and with
     # other programs of the host.
     assert statistics.median(gaps) < 0.1 + 1.5 * statistics.median(computing)
-    assert statistics.median(seconds) < few + whole_table / 3
+    assert statistics.median(seconds) < few + statistics.mean(whole_table) / 3
 
 
 def writable(folder):

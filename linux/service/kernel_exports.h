@@ -16,8 +16,8 @@ using RightsWriter = std::function<Status(const std::string& lines)>;
 
 // Makes the kernel's server forget the entries that the update concerns, so that it asks rpc.mountd(8) at the next
 // request: rights in the changed directories, in those below and above them, and in directories that were moved since
-// they were exported, and, if a client is new in the table or has left it, to which clients an address belongs. All other entries stay, so other requests are served without
-// rpc.mountd, which reads the whole table again first.
+// they were exported, and, if a client is new in the table or has left it, to which clients an address belongs. All
+// other entries stay, so other requests are served without rpc.mountd, which reads the whole table again first.
 //
 // All of a cache is flushed if its entries cannot be expired one by one. The cache of rights is also flushed if a file
 // system has lost its last export: an expired entry keeps a reference to its directory, and the file system could not

@@ -12,7 +12,7 @@ namespace {
 [[maybe_unused]] const bool kRequired = RequirePrivateNamespaces();
 
 using testing::HasSubstr;
-using std::string_literals::operator""s;
+using std::string_literals::operator""s;  // NOLINT(misc-unused-using-decls): it is used
 
 constexpr char kFlush[] = "/net/rpc/auth.rpcsec.context/flush";
 constexpr char kExportsChannel[] = "/net/rpc/nfsd.export/channel";

@@ -74,7 +74,7 @@ BREAKS = [
           f"sed -i 's/^\tforget_rights$/\texit 0/' {_SCRIPT}", select="read_only"),
     Break("covered-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
           f"sed -i 's/|| have_expired \"[^;]*; then return; fi/|| true; then return; fi/' {_SCRIPT}",
-          select="covers"),
+          select="covered"),
     Break("moved-folders-keep-rights", "a withdrawn right ends immediately", "withdrawn_rights",
           source=("bool HasMoved(", "s/return !IsOneOrAboveOne/return exported.empty() \\&\\& !IsOneOrAboveOne/"),
           select="moved"),

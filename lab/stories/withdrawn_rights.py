@@ -1,5 +1,6 @@
 """A right that is withdrawn ends at once, for clients that have the share mounted and files open, too."""
 
+import contextlib
 import errno
 import os
 import pathlib
@@ -43,42 +44,39 @@ def test_a_client_without_a_rule_can_use_its_open_files_no_more(box, client, oth
             assert write_error(file) == 0
 
 
-def keep_a_share(box, client):
-    """The kernel goes on knowing the client."""
+@contextlib.contextmanager
+def moved(folder):
+    """The kernel follows the folder, and the share's path leads to another one."""
+    old = folder.rename(f"{folder}.old")
+    folder.mkdir(mode=0o777)
+    try:
+        yield
+    finally:
+        folder.rmdir()
+        old.rename(folder)
+
+
+@contextlib.contextmanager
+def covered(folder):
+    """The kernel looks for the folder by its path, and finds what is mounted there now."""
+    run("mount", "-t", "tmpfs", "tmpfs", str(folder))
+    try:
+        yield
+    finally:
+        run("umount", str(folder))
+
+
+@VERSIONS
+@pytest.mark.parametrize("displaced", [moved, covered])
+def test_a_right_in_a_displaced_folder_ends_too(box, client, other, version, displaced):
+    """Also where the kernel goes on knowing the client, which keeps another share."""
     box.share("kept")
     box.allow("kept", {"client": client.address})
-
-
-@VERSIONS
-def test_a_right_in_a_folder_that_was_moved_ends_too(box, client, other, version):
-    """The kernel follows the folder, and the share's path leads to another one."""
-    keep_a_share(box, client)
     folder = box.share("data")
     box.allow("data", {"client": client.address}, {"client": other.address})
-    with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file:
-        folder.rename("/srv/data.old")
-        try:
-            box.share("data")
-            box.allow("data", {"client": other.address})
-            assert write_error(file) in REFUSED
-        finally:
-            folder.rmdir()
-            pathlib.Path("/srv/data.old").rename(folder)
-
-
-@VERSIONS
-def test_a_right_in_a_folder_that_a_mount_covers_ends_too(box, client, other, version):
-    """The kernel looks for the folder by its path, and finds what is mounted there now."""
-    keep_a_share(box, client)
-    folder = box.share("data")
-    box.allow("data", {"client": client.address}, {"client": other.address})
-    with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file:
-        run("mount", "-t", "tmpfs", "tmpfs", str(folder))
-        try:
-            box.allow("data", {"client": other.address})
-            assert write_error(file) in REFUSED
-        finally:
-            run("umount", str(folder))
+    with client.mounted("/srv/data", version=version) as mounted, open_file(mounted) as file, displaced(folder):
+        box.allow("data", {"client": other.address})
+        assert write_error(file) in REFUSED
 
 
 def test_a_right_ends_although_a_folder_of_the_share_was_deleted(box, client):

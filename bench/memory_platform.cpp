@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <string>
 #include <utility>
 
 #include "core.h"
@@ -65,16 +66,15 @@ int VORNNFSConfSet(const NFSConfRecord* record) {
   return 0;
 }
 
+// Always the same record, because its memory would be a cost of the platform.
 _tag_nfs_id_map_* VORNNFSIDMapGet(void) {
-  auto* const record = static_cast<_tag_nfs_id_map_*>(calloc(1, sizeof(_tag_nfs_id_map_)));
-  record->domain = strdup(kDomain);
-  return record;
+  static std::string domain = kDomain;
+  static _tag_nfs_id_map_ record = {};
+  record.domain = domain.data();
+  return &record;
 }
 
-void VORNNFSIDMapFree(_tag_nfs_id_map_* record) {
-  free(record->domain);
-  free(record);
-}
+void VORNNFSIDMapFree(_tag_nfs_id_map_* /*record*/) {}
 
 struct VORNSHARE {};
 

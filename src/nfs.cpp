@@ -1,13 +1,14 @@
 #include "nfs.h"
 
-#include <algorithm>
 #include <array>
 #include <cstdlib>
 #include <cstring>
 #include <iterator>
 #include <string>
+#include <string_view>
 
 #include "core.h"
+#include "json_members.h"
 #include "json_text.h"
 #include "log.h"
 #include "nfsconf.h"
@@ -23,24 +24,34 @@ constexpr char kIDMapFile[] = "/etc/idmapd.conf";
 constexpr Setting kEnableNFSv4 = {"enable_nfs_v4", Setting::Kind::kSwitch, &NFSConfRecord::enable_nfs_v4,
                                   &SettingsChange::service_affected};
 
-// The parameters of "set". Each key is looked up once, for the check and for the change.
-struct ServiceParameters {
-  explicit ServiceParameters(const Json::Value& params)
-      : enable_nfs(params["enable_nfs"]),
-        enable_nfs_v4(params[kEnableNFSv4.key]),
-        nfs_v4_domain(params["nfs_v4_domain"]) {
-    std::transform(std::begin(kLiveSettings), std::end(kLiveSettings), live.begin(),
-                   [&](const Setting& setting) { return &params[setting.key]; });
+constexpr auto ParameterNames() {
+  std::array<std::string_view, 3 + std::size(kLiveSettings)> names = {"enable_nfs", kEnableNFSv4.key, "nfs_v4_domain"};
+  for (size_t i = 0; i < std::size(kLiveSettings); ++i) names[3 + i] = kLiveSettings[i].key;
+  return names;
+}
+
+constexpr auto kParameters = ParameterNames();
+
+// The parameters of "set".
+class ServiceParameters {
+ public:
+  explicit ServiceParameters(const Json::Value& params) {
+    FindMembers(params, kParameters.begin(), kParameters.end(), members_.data());
   }
 
-  const Json::Value& enable_nfs;
-  const Json::Value& enable_nfs_v4;
-  const Json::Value& nfs_v4_domain;
-  std::array<const Json::Value*, std::size(kLiveSettings)> live;  // in the order of kLiveSettings
+  const Json::Value& enable_nfs() const { return *members_[0]; }
+  const Json::Value& enable_nfs_v4() const { return *members_[1]; }
+  const Json::Value& nfs_v4_domain() const { return *members_[2]; }
+
+  // The value of kLiveSettings[index].
+  const Json::Value& Live(size_t index) const { return *members_[3 + index]; }
+
+ private:
+  std::array<const Json::Value*, kParameters.size()> members_{};  // in the order of kParameters
 };
 
 bool CheckServiceSwitch(const ServiceParameters& given) {
-  if (given.enable_nfs.isBool()) return true;
+  if (given.enable_nfs().isBool()) return true;
   LOG_ERROR("bool variable 'enable_nfs' is missing.");
   return false;
 }
@@ -50,14 +61,15 @@ bool IsAcceptedOrAbsent(const Setting& setting, const Json::Value& given) {
 }
 
 bool HasNFSv4Types(const ServiceParameters& given) {
-  return IsAcceptedOrAbsent(kEnableNFSv4, given.enable_nfs_v4) &&
-         (given.nfs_v4_domain.isNull() || given.nfs_v4_domain.isString());
+  return IsAcceptedOrAbsent(kEnableNFSv4, given.enable_nfs_v4()) &&
+         (given.nfs_v4_domain().isNull() || given.nfs_v4_domain().isString());
 }
 
 bool HasLiveTypes(const ServiceParameters& given) {
-  return std::equal(
-      std::begin(kLiveSettings), std::end(kLiveSettings), given.live.begin(),
-      [](const Setting& setting, const Json::Value* value) { return IsAcceptedOrAbsent(setting, *value); });
+  for (size_t i = 0; i < std::size(kLiveSettings); ++i) {
+    if (!IsAcceptedOrAbsent(kLiveSettings[i], given.Live(i))) return false;
+  }
+  return true;
 }
 
 bool CheckTypes(bool accepted) {
@@ -86,8 +98,8 @@ bool ReadSettings(NFSConfRecord* record, IDMap* id_map) {
 
 void PlanServiceAndNFSv4(const ServiceParameters& given, SettingsChange* change) {
   change->enabled = IsServiceEnabled();
-  change->wanted = given.enable_nfs.asBool();
-  kEnableNFSv4.Plan(given.enable_nfs_v4, change);
+  change->wanted = given.enable_nfs().asBool();
+  kEnableNFSv4.Plan(given.enable_nfs_v4(), change);
 }
 
 bool ReplaceDomain(const std::string& domain, _tag_nfs_id_map_* id_map) {
@@ -129,8 +141,8 @@ bool ApplyParameters(const ServiceParameters& given) {
   change.working = change.stored;
   PlanServiceAndNFSv4(given, &change);
   IDMap id_map;
-  if (!SaveDomain(given.nfs_v4_domain, &change, &id_map)) return false;
-  for (size_t i = 0; i < std::size(kLiveSettings); ++i) kLiveSettings[i].Plan(*given.live[i], &change);
+  if (!SaveDomain(given.nfs_v4_domain(), &change, &id_map)) return false;
+  for (size_t i = 0; i < std::size(kLiveSettings); ++i) kLiveSettings[i].Plan(given.Live(i), &change);
   return StoreRecord(HERE, change.working) && ApplyLive(HERE, change) && DriveService(HERE, change);
 }
 
@@ -192,6 +204,6 @@ bool NFSServiceHandler::SetDataV2(const Json::Value& params) {
   const ServiceParameters given(params);
   PlanServiceAndNFSv4(given, &change);
   IDMap id_map;
-  if (!SaveDomain(given.nfs_v4_domain, &change, &id_map)) return Fail(kPlatformFailure);
+  if (!SaveDomain(given.nfs_v4_domain(), &change, &id_map)) return Fail(kPlatformFailure);
   return (StoreRecord(HERE, change.working) && DriveService(HERE, change)) || Fail(kPlatformFailure);
 }

@@ -6,6 +6,7 @@
 #include <iterator>
 #include <set>
 #include <string>
+#include <string_view>
 
 #include "api_table.h"
 #include "fake_platform.h"
@@ -93,9 +94,21 @@ TEST(Contract, DescribesExactlyTheParametersThatTheModuleReads) {
 
 }  // namespace
 
-// ld(1), "--wrap": replaces Json::Value::operator[](const char*) const, by which the module looks parameters up.
+// ld(1), "--wrap": replaces the functions by which the module looks parameters up: FindMembers and
+// Json::Value::operator[](const char*) const.
 extern "C" const Json::Value& __real__ZNK4Json5ValueixEPKc(const Json::Value* object, const char* key);
 extern "C" const Json::Value& __wrap__ZNK4Json5ValueixEPKc(const Json::Value* object, const char* key) {
   looked_up.insert(key);
   return __real__ZNK4Json5ValueixEPKc(object, key);
+}
+
+extern "C" void __real__Z11FindMembersRKN4Json5ValueEPKSt17basic_string_viewIcSt11char_traitsIcEES8_PPS1_(
+    const Json::Value& object, const std::string_view* first, const std::string_view* last,
+    const Json::Value** members);
+extern "C" void __wrap__Z11FindMembersRKN4Json5ValueEPKSt17basic_string_viewIcSt11char_traitsIcEES8_PPS1_(
+    const Json::Value& object, const std::string_view* first, const std::string_view* last,
+    const Json::Value** members) {
+  for (const std::string_view* name = first; name != last; ++name) looked_up.emplace(*name);
+  __real__Z11FindMembersRKN4Json5ValueEPKSt17basic_string_viewIcSt11char_traitsIcEES8_PPS1_(object, first, last,
+                                                                                            members);
 }

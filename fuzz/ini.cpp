@@ -44,7 +44,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   std::string_view text(reinterpret_cast<const char*>(data), size);
   const auto key = vorn::IniKey::From(TakeLine(&text));
   const auto value = vorn::IniValue::From(TakeLine(&text));
-  IniDocument document = IniDocument::Parse(text);
+  IniDocument document = IniDocument::Parse(std::string(text));
   Require(document.Text() == text);
   if (!key || !value) return 0;
   const auto last = document.FindLast("Static", key->text());

@@ -5,11 +5,12 @@ namespace vorn {
 Result<SharedIniFile> IniFile::Open(Box& box, const std::string& path) { return box.Load<IniFile>(path, Parse); }
 
 SharedIniFile IniFile::FromText(std::string location, std::string_view text) {
-  return std::shared_ptr<const IniFile>(new IniFile(std::move(location), Version{}, IniDocument::Parse(text)));
+  return std::shared_ptr<const IniFile>(
+      new IniFile(std::move(location), Version{}, IniDocument::Parse(std::string(text))));
 }
 
 Result<IniFile> IniFile::Parse(StoredFile file) {
-  return IniFile(std::move(file.location), file.version, IniDocument::Parse(file.text));
+  return IniFile(std::move(file.location), file.version, IniDocument::Parse(std::move(file.text)));
 }
 
 Status IniFile::Refuse(std::string_view section, std::string_view key, const std::string& why) const {

@@ -224,6 +224,7 @@ std::optional<IniFound> IniFiles::FindStored(std::string_view section, std::stri
 }
 
 IniFiles::Resolved IniFiles::Resolve(std::string_view value) const {
+  if (value.empty() || value.front() != '$') return {value};
   std::set<std::string> passed;
   while (!value.empty() && value.front() == '$') {
     if (!passed.insert(LowerAscii(value)).second) return {std::nullopt, true};
@@ -264,10 +265,12 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
   int contributing = 0;
   for (const Source& source : sources_) {
     const auto add = [&](std::string_view name) {
-      const std::vector<IniSetting> own = source.file->document().Settings(name);
-      contributing += source.file->document().HasSection(name) ? 1 : 0;
-      settings.reserve(settings.size() + own.size());
-      for (const IniSetting& s : own) settings.push_back({s.key, s.value, s.value, source.file.get(), s.line});
+      const IniDocument& document = source.file->document();
+      contributing += document.HasSection(name) ? 1 : 0;
+      settings.reserve(settings.size() + document.SettingsAtMost());
+      document.VisitSettings(name, [&](const IniSetting& s) {
+        settings.push_back({s.key, s.value, s.value, source.file.get(), s.line});
+      });
     };
     if (Inherits(source, section)) {
       contributing += source.inherited->has_argument ? 1 : 0;  // its lines only hide others
@@ -276,22 +279,22 @@ std::vector<IniFound> IniFiles::Settings(std::string_view section) const {
     add(section);
   }
   std::set<std::string> seen;  // a file that is included twice gives a key twice
-  const auto is_void = [&](IniFound& setting) {
-    if (contributing > 1) {
-      const std::optional<IniFound> deciding = FindStored(section, setting.key);
-      if (!deciding || deciding->file != setting.file || deciding->line != setting.line) return true;
-      if (!seen.insert(LowerAscii(setting.key)).second) return true;
-    }
-    const std::optional<std::string_view> value = Resolve(setting.stored).value;
-    setting.value = value.value_or("");
-    return !value.has_value();
+  const auto is_in_force = [&](const IniFound& setting) {
+    if (contributing <= 1) return true;
+    const std::optional<IniFound> deciding = FindStored(section, setting.key);
+    if (!deciding || deciding->file != setting.file || deciding->line != setting.line) return false;
+    return seen.insert(LowerAscii(setting.key)).second;
   };
-  std::vector<IniFound> in_force;
-  in_force.reserve(settings.size());
-  for (IniFound& setting : settings) {
-    if (!is_void(setting)) in_force.push_back(setting);
+  auto end = settings.begin();
+  for (const IniFound& setting : settings) {
+    const std::optional<std::string_view> value = Resolve(setting.stored).value;
+    if (!value || !is_in_force(setting)) continue;
+    if (&*end != &setting) *end = setting;
+    end->value = *value;
+    ++end;
   }
-  return in_force;
+  settings.erase(end, settings.end());
+  return settings;
 }
 
 std::vector<const IniFile*> IniFiles::files() const {

@@ -20,8 +20,8 @@ std::shared_ptr<const TextPairs> Shown(const std::vector<IniFound>& stored) {
   pairs.reserve(stored.size());
   std::vector<std::size_t> repaired;
   for (const IniFound& mapping : stored) {
+    if (!IsValidUtf8(mapping.key)) repaired.push_back(pairs.size());
     pairs.emplace_back(ToValidUtf8(mapping.key), ToValidUtf8(mapping.value));
-    if (pairs.back().first != mapping.key) repaired.push_back(pairs.size() - 1);
   }
   if (!repaired.empty()) {
     std::unordered_set<std::string> taken;

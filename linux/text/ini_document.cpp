@@ -1,6 +1,7 @@
 #include "ini_document.h"
 
 #include <algorithm>
+#include <cstring>
 #include <utility>
 
 #include "ascii.h"
@@ -14,81 +15,116 @@ bool IsSame(std::string_view a, std::string_view b) {
                     [](char x, char y) { return LowerAscii(x) == LowerAscii(y); });
 }
 
+constexpr std::size_t kAhead = 32;  // slots that are fetched before they are used
+
 bool HasMeaning(IniLine::Kind kind) { return kind == IniLine::Kind::kAssignment || kind == IniLine::Kind::kInclude; }
 
 // Whether a line consists of several, of which each but the last one ends with a backslash.
 bool IsJoined(std::string_view line) { return line.find("\\\n") != std::string_view::npos; }
 
-// FNV-1a over the key in lower case.
+// Eight characters in lower case, as a number.
+std::uint64_t LowerWord(const char* text) {
+  char bytes[sizeof(std::uint64_t)];
+  std::memcpy(bytes, text, sizeof bytes);
+  for (char& c : bytes) c = LowerAscii(c);
+  std::uint64_t word = 0;
+  std::memcpy(&word, bytes, sizeof word);
+  return word;
+}
+
+// FNV-1a, but by words: the upper half of each product is mixed into the lower half, which does not depend on it.
+std::uint64_t Mix(std::uint64_t hash, std::uint64_t word) {
+  hash = (hash ^ word) * 1099511628211U;
+  return hash ^ hash >> 32;
+}
+
+// A hash of the key in lower case.
 std::uint32_t HashOf(std::uint32_t section, std::string_view key) {
   std::uint64_t hash = 14695981039346656037U ^ section;
-  for (const char c : key) hash = (hash ^ static_cast<unsigned char>(LowerAscii(c))) * 1099511628211U;
-  return static_cast<std::uint32_t>(hash ^ hash >> 32);
+  for (; key.size() >= sizeof hash; key.remove_prefix(sizeof hash)) hash = Mix(hash, LowerWord(key.data()));
+  std::uint64_t rest = 0;
+  for (const char c : key) rest = rest << 8U | static_cast<unsigned char>(LowerAscii(c));
+  return static_cast<std::uint32_t>(Mix(hash, rest));
+}
+
+std::vector<IniLineExtent> SplitIniLines(std::string_view text) {
+  std::vector<IniLineExtent> lines;
+  for (;;) {
+    const IniLineExtent line = FirstIniLine(text);
+    if (line.length == 0) return lines;
+    lines.push_back(line);
+    text.remove_prefix(line.length);
+  }
 }
 
 }  // namespace
 
-IniDocument IniDocument::Parse(std::string_view text) {
+IniDocument IniDocument::Parse(std::string text) {
   IniDocument document;
   document.current_ = document.NumberOf(kInherited);
-  std::string_view rest = document.texts_.emplace_back(text);
+  std::string_view rest = document.texts_.emplace_back(std::move(text));
   const std::string_view read = rest.substr(0, rest.find('\0'));
   const std::size_t first_end = read.find('\n');
   if (first_end != std::string_view::npos && first_end > 0 && read[first_end - 1] == '\r') document.line_end_ = "\r\n";
-  const auto lines = static_cast<std::size_t>(std::count(read.begin(), read.end(), '\n'));
-  document.lines_.reserve(lines);
-  document.Rehash(lines);
+  const std::vector<IniLineExtent> lines = SplitIniLines(read);
+  document.lines_.reserve(lines.size());
+  document.Rehash(lines.size());
+  std::vector<Slot> assignments;
   std::size_t at = 0;
-  while (const std::size_t length = IniLineLength(read.substr(at))) {
-    document.Append(read.substr(at, length));
-    at += length;
+  for (const IniLineExtent& extent : lines) {
+    document.Append(read.substr(at, extent.length), extent.line_feeds);
+    at += extent.length;
+    const Line& line = document.lines_.back();
+    if (!line.GivesValue()) continue;
+    assignments.push_back({HashOf(line.section, line.name), document.last_});
+    document.FetchSlot(assignments.back().hash);
+    if (assignments.size() == kAhead) document.DecideAll(&assignments);
   }
   document.tail_ = rest.substr(at);
+  document.DecideAll(&assignments);
   return document;
 }
 
 // Appends a line to those that the reader reads.
-void IniDocument::Append(std::string_view text) {
-  Line line = MakeLine(text, kNoSection);
+void IniDocument::Append(std::string_view text, int line_feeds) {
+  const auto place = static_cast<Place>(lines_.size());
+  Line& line = lines_.emplace_back();
+  const bool has_argument = Fill(text, line_feeds > 1, &line);
   line.number = line_number_;
-  line_number_ += IsJoined(text) ? static_cast<int>(std::count(text.begin(), text.end(), '\n')) : 1;
+  line_number_ += line_feeds;
   if (line.kind == IniLine::Kind::kBadSection) current_ = kNoSection;
   if (line.kind == IniLine::Kind::kSection) {
     current_ = NumberOf(line.name);
-    current_has_argument_ = line.has_argument;
+    current_has_argument_ = has_argument;
   }
   if (line.kind == IniLine::Kind::kSection || HasMeaning(line.kind)) line.section = current_;
   line.has_argument = current_has_argument_;
-  const auto place = static_cast<Place>(lines_.size());
-  lines_.push_back(line);
   LinkAfter(last_, place);
-  if (line.section != kNoSection) Index(place);
+  if (line.section != kNoSection) Enlist(place);
 }
 
-// has_argument is true for the header of a section with an argument.
-IniDocument::Line IniDocument::MakeLine(std::string_view text, SectionNumber section) {
-  std::string_view joined = text;
-  if (IsJoined(text)) joined = texts_.emplace_back(JoinIniLine(text));
-  const IniLine content = ReadIniLine(joined);
-  Line line;
-  line.text = text;
-  line.name = content.name;
-  line.value = content.value;
-  line.kind = content.kind;
-  line.section = section;
-  line.has_argument = content.argument.has_value();
-  return line;
+// Returns whether the line is the header of a section with an argument.
+bool IniDocument::Fill(std::string_view text, bool is_joined, Line* line) {
+  const IniLine content = ReadIniLine(is_joined ? texts_.emplace_back(JoinIniLine(text)) : text);
+  line->text = text;
+  line->name = content.name;
+  line->value = content.value;
+  line->kind = content.kind;
+  return content.argument.has_value();
 }
 
-void IniDocument::Index(Place place) {
-  Line& line = lines_[place];
+// Whether the line gives its key a value, or hides one.
+bool IniDocument::Line::GivesValue() const {
+  const bool counts = !has_argument || kArgumentsHideValues;
+  return section != kNoSection && kind == IniLine::Kind::kAssignment && !value.empty() && counts;
+}
+
+// Adds a line with meaning to what the document knows of its section.
+void IniDocument::Enlist(Place place) {
+  const Line& line = lines_[place];
   if (!line.has_argument) sections_[line.section].last = place;
-  if (line.value.empty()) return;
-  if (line.kind == IniLine::Kind::kInclude) includes_.push_back(place);
-  const bool counts = !line.has_argument || kArgumentsHideValues;
-  if (line.kind != IniLine::Kind::kAssignment || !counts) return;
-  has_reference_ = has_reference_ || line.value.front() == '$';
-  Decide(place);
+  if (line.kind == IniLine::Kind::kInclude && !line.value.empty()) includes_.push_back(place);
+  has_reference_ = has_reference_ || (line.GivesValue() && line.value.front() == '$');
 }
 
 // Inserts a line behind another one, or as the first line.
@@ -118,17 +154,30 @@ std::size_t IniDocument::FindSlot(SectionNumber section, std::string_view key, s
   return at;
 }
 
-// Makes the line the one that gives its key the value that counts.
-void IniDocument::Decide(Place place) {
+// Makes the line of an assignment the one that gives its key the value that counts.
+void IniDocument::Decide(const Slot& assignment) {
   if (2 * used_slots_ >= slots_.size()) Rehash(2 * used_slots_);
-  Line& line = lines_[place];
-  const std::uint32_t hash = HashOf(line.section, line.name);
-  Slot& slot = slots_[FindSlot(line.section, line.name, hash)];
+  Line& line = lines_[assignment.line];
+  Slot& slot = slots_[FindSlot(line.section, line.name, assignment.hash)];
   line.decides = true;
   line.earlier = slot.line;
   if (slot.line == kNowhere) ++used_slots_;
   if (slot.line != kNowhere) lines_[slot.line].decides = false;
-  slot = {hash, place};
+  slot = assignment;
+}
+
+void IniDocument::DecideAll(std::vector<Slot>* assignments) {
+  for (const Slot& assignment : *assignments) Decide(assignment);
+  assignments->clear();
+}
+
+// Mostly the slot of a key is not in the processor's cache, and takes longer to fetch than a line takes to parse.
+void IniDocument::FetchSlot(std::uint32_t hash) const { __builtin_prefetch(&slots_[hash & (slots_.size() - 1)], 1); }
+
+void IniDocument::Index(Place place) {
+  Enlist(place);
+  const Line& line = lines_[place];
+  if (line.GivesValue()) Decide({HashOf(line.section, line.name), place});
 }
 
 // Makes room for this number of keys.
@@ -198,24 +247,11 @@ std::optional<std::string> IniDocument::Get(std::string_view section, std::strin
   return std::string(setting->value);
 }
 
-std::vector<IniSetting> IniDocument::Settings(std::string_view section) const {
-  std::vector<IniSetting> settings;
-  const SectionNumber number = Known(section);
-  if (number == kNoSection) return settings;
-  settings.reserve(used_slots_);
-  for (Place place = first_; place != kNowhere; place = lines_[place].next) {
-    const Line& line = lines_[place];
-    if (line.section != number || !line.decides || line.has_argument) continue;
-    settings.push_back({line.name, line.value, line.number});
-  }
-  return settings;
-}
-
 std::vector<IniEntry> IniDocument::Entries(std::string_view section) const {
   std::vector<IniEntry> entries;
-  for (const IniSetting& setting : Settings(section)) {
+  VisitSettings(section, [&](const IniSetting& setting) {
     entries.push_back({std::string(setting.key), std::string(setting.value)});
-  }
+  });
   return entries;
 }
 
@@ -257,19 +293,18 @@ void IniDocument::Replace(Place place, const IniValue& value) {
   // Text after the quotes of the old value is dropped if it is not a comment.
   const bool is_read = ReadIniLine(JoinIniLine(text)).value == value.text();
   if (!is_read) text = std::string(line.name) + " = " + Rendered(value) + line_end_;
-  const Line changed = MakeLine(texts_.emplace_back(std::move(text)), line.section);
-  line.text = changed.text;
-  line.name = changed.name;
-  line.value = changed.value;
+  const bool is_joined = IsJoined(text);
+  Fill(texts_.emplace_back(std::move(text)), is_joined, &line);
 }
 
 void IniDocument::Insert(SectionNumber section, const IniKey& key, const IniValue& value) {
   const Place after = sections_[section].last;
   const std::string& text = texts_.emplace_back(key.text() + " = " + Rendered(value) + line_end_);
-  Line line = MakeLine(text, section);
-  line.number = lines_[after].number;
   const auto place = static_cast<Place>(lines_.size());
-  lines_.push_back(line);
+  Line& line = lines_.emplace_back();
+  Fill(text, IsJoined(text), &line);
+  line.section = section;
+  line.number = lines_[after].number;
   LinkAfter(after, place);
   Index(place);
 }
@@ -277,8 +312,8 @@ void IniDocument::Insert(SectionNumber section, const IniKey& key, const IniValu
 IniDocument::SectionNumber IniDocument::AddSection(const IniSection& section) {
   const bool below_text =
       last_ != kNowhere && lines_[last_].text.find_first_not_of(" \t\r\n") != std::string_view::npos;
-  if (below_text) Append(line_end_);
-  Append(texts_.emplace_back("[" + section.text() + "]" + line_end_));
+  if (below_text) Append(line_end_, 1);
+  Append(texts_.emplace_back("[" + section.text() + "]" + line_end_), 1);
   return current_;
 }
 

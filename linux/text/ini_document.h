@@ -50,11 +50,11 @@ struct IniReference {
 // The reader ignores a last line without line feed, and everything from a NUL byte on. An edit leaves that tail at
 // the end of the file, without effect.
 //
-// Parsing takes time in proportion to the text, and every other operation but Settings and Entries takes
+// Parsing takes time in proportion to the text, and every other operation but VisitSettings and Entries takes
 // constant time plus the time for the lines of its key. Reading is thread-safe; editing is not.
 class IniDocument {
  public:
-  static IniDocument Parse(std::string_view text);
+  static IniDocument Parse(std::string text);
 
   IniDocument(IniDocument&&) = default;  // the lines refer to the texts: a document is moved, never copied
   IniDocument& operator=(IniDocument&&) = default;
@@ -78,9 +78,21 @@ class IniDocument {
 
   std::optional<std::string> Get(std::string_view section, std::string_view key) const;
 
-  // The settings of a section that count, in file order.
-  std::vector<IniSetting> Settings(std::string_view section) const;
+  // Passes the settings of a section that count to `visit`, in file order.
+  template <typename Visit>
+  void VisitSettings(std::string_view section, const Visit& visit) const {
+    const SectionNumber number = Known(section);
+    if (number == kNoSection) return;
+    for (Place place = first_; place != kNowhere; place = lines_[place].next) {
+      const Line& line = lines_[place];
+      if (line.section == number && line.decides && !line.has_argument) visit({line.name, line.value, line.number});
+    }
+  }
+
   std::vector<IniEntry> Entries(std::string_view section) const;
+
+  // At least the number of settings of all sections together.
+  std::size_t SettingsAtMost() const { return used_slots_; }
 
   std::vector<IniInclude> Includes() const;
 
@@ -117,6 +129,8 @@ class IniDocument {
     IniLine::Kind kind = IniLine::Kind::kOther;
     bool has_argument = false;  // whether its section has one
     bool decides = false;       // whether it gives its key the value that counts
+
+    bool GivesValue() const;
   };
 
   // An entry of the hash table of keys, which is probed linearly.
@@ -131,8 +145,9 @@ class IniDocument {
     Place last = kNowhere;  // its last assignment without an argument, or its header if it has no assignment
   };
 
-  void Append(std::string_view text);
-  Line MakeLine(std::string_view text, SectionNumber section);
+  void Append(std::string_view text, int line_feeds);
+  bool Fill(std::string_view text, bool is_joined, Line* line);
+  void Enlist(Place place);
   void Index(Place place);
   SectionNumber NumberOf(std::string_view name);
   SectionNumber Known(std::string_view name) const;
@@ -145,7 +160,9 @@ class IniDocument {
   void Unlink(Place place);
 
   std::size_t FindSlot(SectionNumber section, std::string_view key, std::uint32_t hash) const;
-  void Decide(Place place);
+  void Decide(const Slot& assignment);
+  void DecideAll(std::vector<Slot>* assignments);
+  void FetchSlot(std::uint32_t hash) const;
   void Rehash(std::size_t keys);
 
   std::deque<std::string> texts_;  // the file, and the lines that were joined or changed; the views point into them

@@ -82,11 +82,13 @@ IniLine ReadAssignment(std::string_view line, std::size_t begin) {
 
 }  // namespace
 
-std::size_t IniLineLength(std::string_view text) {
+IniLineExtent FirstIniLine(std::string_view text) {
+  int line_feeds = 0;
   for (std::size_t at = 0; (at = text.find('\n', at)) != kNone; ++at) {
-    if (at == 0 || text[at - 1] != '\\') return at + 1;
+    ++line_feeds;
+    if (at == 0 || text[at - 1] != '\\') return {at + 1, line_feeds};
   }
-  return 0;
+  return {};
 }
 
 std::string JoinIniLine(std::string_view line) {

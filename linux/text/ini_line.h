@@ -28,9 +28,14 @@ struct IniLine {
   std::size_t value_end = 0;
 };
 
-// The length of the first line of `text`, including the line feed that ends it and every line feed before that one
-// that a backslash escapes. 0 if the text does not end its first line: the reader ignores such a line.
-std::size_t IniLineLength(std::string_view text);
+// The extent of a line: with the line feed that ends it, and every line feed before that one that a backslash escapes.
+struct IniLineExtent {
+  std::size_t length = 0;
+  int line_feeds = 0;
+};
+
+// The first line of `text`. It is empty if the text does not end its first line: the reader ignores such a line.
+IniLineExtent FirstIniLine(std::string_view text);
 
 // The line with each escaped line feed replaced by two blanks, which is how the reader joins its parts. The result
 // has the length of `line`.

@@ -1,6 +1,9 @@
 #include "text_pairs.h"
 
+#include <endian.h>
+
 #include <algorithm>
+#include <cstring>
 
 namespace vorn {
 namespace {
@@ -25,6 +28,10 @@ std::size_t CommonPrefix(const std::vector<TextPairs::Pair>& pairs) {
 // The eight bytes at `begin`, the first one as the most significant one; bytes behind the end count as 0.
 std::uint64_t WordAt(std::string_view key, std::size_t begin) {
   std::uint64_t word = 0;
+  if (begin + sizeof word <= key.size()) {
+    std::memcpy(&word, key.data() + begin, sizeof word);
+    return be64toh(word);
+  }
   for (std::size_t at = begin; at < begin + sizeof word; ++at) {
     word = word << 8U | (at < key.size() ? static_cast<unsigned char>(key[at]) : 0U);
   }

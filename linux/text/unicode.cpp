@@ -114,6 +114,8 @@ std::string ToValidUtf8(std::string_view text) {
   return valid.append(text);
 }
 
+bool IsValidUtf8(std::string_view text) { return IsAscii(text) || u8_check(Bytes(text), text.size()) == nullptr; }
+
 bool IsPlainText(std::string_view text) {
   // Most texts consist of printable ASCII only.
   if (std::all_of(text.begin(), text.end(), [](char c) { return c >= ' ' && c <= '~'; })) return true;

@@ -13,7 +13,7 @@ namespace {
 
 using testing::ElementsAre;
 
-IniDocument Parsed(std::string_view text) { return IniDocument::Parse(text); }
+IniDocument Parsed(std::string_view text) { return IniDocument::Parse(std::string(text)); }
 
 void Set(IniDocument* document, std::string_view section, std::string_view key, std::string_view value) {
   document->Set(*IniSection::From(section), *IniKey::From(key), *IniValue::From(value));

@@ -28,14 +28,14 @@ bool HasFault(const vorn::ExportsDocument& document, const std::string& path) {
 
 void TryEdit(const vorn::ExportsDocument& document, const std::string& path,
              const std::vector<vorn::ExportEntry>& entries) {
-  const auto text = document.Replace(path, entries, kPaths);
-  if (!text.ok()) return;
+  const auto replaced = document.Replace(path, entries, kPaths);
+  if (!replaced.ok()) return;
   Require(entries.empty() || !HasFault(document, path));
-  const vorn::ExportsDocument edited(*text);
+  const vorn::ExportsDocument edited(replaced->text());
   Require(edited.Entries(path, kPaths) == entries);
   Require(Faults(edited) <= Faults(document));
   const auto again = edited.Replace(path, edited.Entries(path, kPaths), kPaths);
-  Require(again.ok() && vorn::ExportsDocument(*again).Entries(path, kPaths) == entries);
+  Require(again.ok() && vorn::ExportsDocument(again->text()).Entries(path, kPaths) == entries);
 }
 
 }  // namespace

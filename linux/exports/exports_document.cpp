@@ -43,16 +43,12 @@ bool IsSameLastLine(const ExportsLines& old, const ExportSpan& last, const Expor
   return !EndsFile(now.text(), line) || EndsFile(old.text(), last);
 }
 
-// Whether the line number `b` of `now`, which was read after `old`, is the line number `a` of `old`.
-bool IsSameLine(const ExportsLines& old, std::size_t a, const ExportsLines& now, std::size_t b) {
-  const std::size_t a_left = old.spans().size() - a;
-  const std::size_t b_left = now.spans().size() - b;
-  if ((a == b && a < now.shared_head()) || (a_left == b_left && a_left <= now.shared_tail())) return true;
-  const ExportSpan& line = old.spans()[a];
-  const bool inherits = line.inherited != std::string_view::npos;
-  if (inherits != (now.spans()[b].inherited != std::string_view::npos)) return false;
-  if (line.end == old.text().size()) return IsSameLastLine(old, line, now, now.spans()[b]);
-  return old.TextOf(line) == now.TextOf(now.spans()[b]);
+// Whether the line `b` of `now` is the line `a` of `old`.
+bool IsSameLine(const ExportsLines& old, const ExportSpan& a, const ExportsLines& now, const ExportSpan& b) {
+  const bool inherits = a.inherited != std::string_view::npos;
+  if (inherits != (b.inherited != std::string_view::npos)) return false;
+  if (a.end == old.text().size()) return IsSameLastLine(old, a, now, b);
+  return old.TextOf(a) == now.TextOf(b);
 }
 
 std::vector<ExportLine> ReadLines(std::string_view text, const ExportSpans& spans) {
@@ -67,6 +63,9 @@ std::vector<ExportLine> ReadLines(std::string_view text, const ExportSpans& span
 class ExportsDocument::Content {
  public:
   explicit Content(std::string text) : lines_(std::move(text)) {}
+
+  Content(std::string text, const Content& previous, const CommonText& common)
+      : lines_(std::move(text), previous.lines_, common) {}
 
   Content(std::string text, const Content& previous) : lines_(std::move(text), previous.lines_) {
     const std::lock_guard lock(previous.mutex_);
@@ -122,48 +121,56 @@ std::vector<ExportEntry> ExportsDocument::Entries(const std::string& path, const
   return EntriesOf(LinesOf(path, paths));
 }
 
-Result<std::string> ExportsDocument::Replace(const std::string& path, const std::vector<ExportEntry>& entries,
-                                             const ExportPaths& paths) const {
+Result<ExportsDocument> ExportsDocument::Replace(const std::string& path, const std::vector<ExportEntry>& entries,
+                                                 const ExportPaths& paths) const {
   const std::string normal = NormalExportPath(path);
   const std::string where = "the exports of " + normal + " cannot be written: ";
   const ExportSpans own = content_->LinesOf(normal, paths);
-  Result<std::string> rendered = Rendered(own, normal, entries);
-  if (!rendered.ok()) return rendered;
-  const ExportsDocument edited(std::move(*rendered), *this);
-  const auto added = Added(own, edited);
+  Result<ExportsDocument> edited = Edited(own, normal, entries);
+  if (!edited.ok()) return edited;
+  const auto added = Added(own, *edited);
   if (!added) return Status::Failure(kRefusedText, where + "the file's other lines would change");
-  const std::vector<ExportLine> lines = edited.Read(*added);
+  const std::vector<ExportLine> lines = edited->Read(*added);
   const auto is_own = [&](const ExportLine& line) { return line.path == normal; };
   if (!std::all_of(lines.begin(), lines.end(), is_own) || !(EntriesOf(lines) == entries)) {
     return Status::Failure(kRefusedText, where + "they do not read back");
   }
-  return edited.text();
+  return edited;
 }
 
 // Returns the lines that the edited file has beside those of this file that are not `own`, or nullopt if one of
-// those is missing.
+// those is missing. No own line is among those that both files are known to have at the beginning and at the end.
 std::optional<ExportSpans> ExportsDocument::Added(const ExportSpans& own, const ExportsDocument& edited) const {
   const ExportsLines& old = content_->lines();
   const ExportsLines& now = edited.content_->lines();
-  const std::size_t count = now.spans().size();
+  const auto head = static_cast<std::ptrdiff_t>(now.shared_head());
+  const auto tail = static_cast<std::ptrdiff_t>(now.shared_tail());
+  const auto end = now.spans().end() - tail;
   ExportSpans added;
   auto mine = own.begin();
-  std::size_t next = 0;
-  for (std::size_t line = 0; line < old.spans().size(); ++line) {
-    if (mine != own.end() && mine->begin == old.spans()[line].begin) {
+  auto next = now.spans().begin() + head;
+  for (auto line = old.spans().begin() + head; line != old.spans().end() - tail; ++line) {
+    if (mine != own.end() && mine->begin == line->begin) {
       ++mine;
       continue;
     }
-    while (next < count && !IsSameLine(old, line, now, next)) added.push_back(now.spans()[next++]);
-    if (next == count) return std::nullopt;
+    while (next != end && !IsSameLine(old, *line, now, *next)) added.push_back(*next++);
+    if (next == end) return std::nullopt;
     ++next;
   }
-  added.insert(added.end(), now.spans().begin() + static_cast<std::ptrdiff_t>(next), now.spans().end());
+  added.insert(added.end(), next, end);
   return added;
 }
 
-Result<std::string> ExportsDocument::Rendered(const ExportSpans& own, const std::string& path,
-                                              const std::vector<ExportEntry>& entries) const {
+// Returns the parts of the text around all `own` lines.
+CommonText ExportsDocument::AroundAll(const ExportSpans& own) const {
+  const std::size_t begin = own.empty() ? text().size() : own.front().begin;
+  const std::size_t head = std::string_view{text()}.substr(0, begin).rfind('\n') + 1;  // npos + 1 is 0
+  return {head, own.empty() ? 0 : text().size() - own.back().end};
+}
+
+Result<ExportsDocument> ExportsDocument::Edited(const ExportSpans& own, const std::string& path,
+                                                const std::vector<ExportEntry>& entries) const {
   std::string line;
   std::string comments;
   for (const ExportLine& present : entries.empty() ? std::vector<ExportLine>() : Read(own)) {
@@ -190,7 +197,7 @@ Result<std::string> ExportsDocument::Rendered(const ExportSpans& own, const std:
   }
   out.append(text(), copied);
   if (missing) out.append(Separator(out)).append(line);
-  return out;
+  return ExportsDocument(std::make_shared<const Content>(std::move(out), *content_, AroundAll(own)));
 }
 
 std::string ExportsDocument::Place(std::size_t position) const {

@@ -6,10 +6,12 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "export_paths.h"
 #include "exports_line.h"
+#include "exports_lines.h"
 #include "status.h"
 
 namespace vorn {
@@ -35,12 +37,12 @@ class ExportsDocument {
   // Returns EntriesOf(LinesOf(path, paths)).
   std::vector<ExportEntry> Entries(const std::string& path, const ExportPaths& paths) const;
 
-  // Returns the text in which `entries` are the only ones of `path`. They are one line, in place of the first
+  // Returns the file in which `entries` are the only ones of `path`. They are one line, in place of the first
   // line of `path` or at the end, with the comments of all its lines. Without entries all its lines are removed.
   // Every other byte stays. Fails with kRefusedText if the new text would not read back as exactly that, and if
   // a line of `path` has a fault, unless it is removed.
-  Result<std::string> Replace(const std::string& path, const std::vector<ExportEntry>& entries,
-                              const ExportPaths& paths) const;
+  Result<ExportsDocument> Replace(const std::string& path, const std::vector<ExportEntry>& entries,
+                                  const ExportPaths& paths) const;
 
   // Returns the line and column of a position, from 1: "12:7". A column is a byte of the line.
   std::string Place(std::size_t position) const;
@@ -48,9 +50,12 @@ class ExportsDocument {
  private:
   class Content;
 
+  explicit ExportsDocument(std::shared_ptr<const Content> content) : content_(std::move(content)) {}
+
   std::vector<ExportLine> Read(const ExportSpans& spans) const;
-  Result<std::string> Rendered(const ExportSpans& own, const std::string& path,
-                               const std::vector<ExportEntry>& entries) const;
+  Result<ExportsDocument> Edited(const ExportSpans& own, const std::string& path,
+                                 const std::vector<ExportEntry>& entries) const;
+  CommonText AroundAll(const ExportSpans& own) const;
   std::optional<ExportSpans> Added(const ExportSpans& own, const ExportsDocument& edited) const;
 
   std::shared_ptr<const Content> content_;

@@ -90,13 +90,7 @@ std::size_t CommonSuffix(std::string_view a, std::string_view b) {
 
 bool BeginsLine(std::string_view text, std::size_t position) { return position == 0 || text[position - 1] == '\n'; }
 
-// The sizes of the parts at the beginning and at the end that two texts have in common, in whole lines.
-struct Common {
-  std::size_t head;
-  std::size_t tail;
-};
-
-Common CommonLines(std::string_view a, std::string_view b) {
+CommonText CommonLines(std::string_view a, std::string_view b) {
   const std::size_t prefix = CommonPrefix(a, b);
   const std::size_t head = a.substr(0, prefix).rfind('\n') + 1;  // npos + 1 is 0
   std::size_t tail = CommonSuffix(a.substr(head), b.substr(head));
@@ -112,7 +106,12 @@ Common CommonLines(std::string_view a, std::string_view b) {
 ExportsLines::ExportsLines(std::string text) : text_(std::move(text)) { FindAll(); }
 
 ExportsLines::ExportsLines(std::string text, const ExportsLines& previous) : text_(std::move(text)) {
-  if (!previous.is_plain_ || !FindChanged(previous)) FindAll();
+  if (!previous.is_plain_ || !FindChanged(previous, CommonLines(previous.text_, text_))) FindAll();
+}
+
+ExportsLines::ExportsLines(std::string text, const ExportsLines& previous, const CommonText& common)
+    : text_(std::move(text)) {
+  if (!previous.is_plain_ || !FindChanged(previous, common)) FindAll();
 }
 
 void ExportsLines::FindAll() {
@@ -125,8 +124,7 @@ void ExportsLines::FindAll() {
 
 // Finds the lines between those that `previous` has as well. Returns false if one of them may continue in another
 // line, and if `previous` has such lines.
-bool ExportsLines::FindChanged(const ExportsLines& previous) {
-  const Common common = CommonLines(previous.text_, text_);
+bool ExportsLines::FindChanged(const ExportsLines& previous, const CommonText& common) {
   const std::size_t tail_begin = text_.size() - common.tail;
   const auto up_to_tail = std::string_view{text_}.substr(0, tail_begin);
   if (!IsPlain(up_to_tail.substr(common.head))) return false;
@@ -144,8 +142,11 @@ bool ExportsLines::FindChanged(const ExportsLines& previous) {
   is_plain_ = !finder.has_left_over();
   if (!is_plain_) return false;
   const std::size_t shift = text_.size() - previous.text_.size();  // modulo 2^64 if the text is shorter
-  for (auto line = tail; line != old.end(); ++line) {
-    spans_.push_back({line->begin + shift, line->path + shift, line->end + shift, kNone});
+  spans_.insert(spans_.end(), tail, old.end());
+  for (auto line = spans_.end() - (old.end() - tail); shift != 0 && line != spans_.end(); ++line) {
+    line->begin += shift;
+    line->path += shift;
+    line->end += shift;
   }
   shared_head_ = static_cast<std::size_t>(head_end - old.begin());
   shared_tail_ = static_cast<std::size_t>(old.end() - tail);

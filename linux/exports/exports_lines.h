@@ -10,12 +10,21 @@
 
 namespace vorn {
 
+// The sizes of the parts at the beginning and at the end that two texts have in common, in whole lines.
+struct CommonText {
+  std::size_t head = 0;
+  std::size_t tail = 0;
+};
+
 // Finding the lines takes time in proportion to the size of the text. The lines of another version of a text are
 // found in the time of comparing both, because nearly all of them stay. Immutable.
 class ExportsLines {
  public:
   explicit ExportsLines(std::string text);
   ExportsLines(std::string text, const ExportsLines& previous);
+
+  // Reads a text that is known to have these parts in common with `previous`. Nothing is compared.
+  ExportsLines(std::string text, const ExportsLines& previous, const CommonText& common);
 
   // The spans refer to positions, so this class can be moved.
   ExportsLines(ExportsLines&&) = default;
@@ -33,7 +42,7 @@ class ExportsLines {
   std::size_t shared_tail() const { return shared_tail_; }
 
  private:
-  bool FindChanged(const ExportsLines& previous);
+  bool FindChanged(const ExportsLines& previous, const CommonText& common);
   void FindAll();
 
   std::string text_;

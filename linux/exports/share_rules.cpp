@@ -142,8 +142,8 @@ Status WriteEntries(Box& box, const ExportsFile& file, const std::string& path, 
   const bool removes_line = removes_all && !share.own_lines.empty();
   if (share.own == entries && !removes_line) return box.Confirm(kExportsFile);
   if (Status status = removes_all ? Status() : CheckUnderstood(file, share.own_lines); !status.ok()) return status;
-  const Result<std::string> text = file.document.Replace(path, entries, BoxPaths(box.root()));
-  return text.ok() ? box.Replace(kExportsFile, *text, file.version) : text.status();
+  const Result<ExportsDocument> edited = file.document.Replace(path, entries, BoxPaths(box.root()));
+  return edited.ok() ? box.Replace(kExportsFile, edited->text(), file.version) : edited.status();
 }
 
 Result<std::vector<SharedExportsFile>> OpenExports(Box& box, const std::string& path) {

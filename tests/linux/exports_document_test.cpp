@@ -245,6 +245,14 @@ TEST(ExportsDocument, ReadsRandomFilesAsExportfsDoes) {
   }
 }
 
+// The text in which `entries` are the only ones of `path`.
+Result<std::string> Replace(const ExportsDocument& document, const std::string& path,
+                            const std::vector<ExportEntry>& entries, const ExportPaths& paths) {
+  const Result<ExportsDocument> edited = document.Replace(path, entries, paths);
+  if (!edited.ok()) return edited.status();
+  return edited->text();
+}
+
 // Rewriting one path preserves every other line and its meaning to exportfs.
 TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
   const ExportfsJudge judge;
@@ -254,13 +262,13 @@ TEST(ExportsDocument, WritesWhatItReadsBackAndTouchesNothingElse) {
     const ExportsDocument document(FileMaker(seed).Make());
     std::vector<ExportEntry> entries = document.Entries("/mnt/b", paths);
     entries.push_back(Entry("fresh-" + std::to_string(seed), "rw,sec=krb5:sys,anonuid=5"));
-    const auto text = document.Replace("/mnt/b", entries, paths);
+    const auto text = Replace(document, "/mnt/b", entries, paths);
     if (!text.ok()) continue;
     const ExportsDocument again(*text);
-    const auto same = again.Replace("/mnt/b", again.Entries("/mnt/b", paths), paths);
+    const auto same = Replace(again, "/mnt/b", again.Entries("/mnt/b", paths), paths);
     ASSERT_TRUE(same.ok()) << "seed " << seed;
     EXPECT_EQ(*same, *text) << "seed " << seed;
-    const auto without = again.Replace("/mnt/b", {}, paths);
+    const auto without = Replace(again, "/mnt/b", {}, paths);
     ASSERT_TRUE(without.ok()) << "seed " << seed;
     EXPECT_THAT(Clients(ExportsDocument(*without), "/mnt/b"), testing::IsEmpty()) << "seed " << seed;
     edited.push_back(*text);
@@ -316,7 +324,7 @@ TEST(ExportsDocument, FindsTheLinesWhosePathIsALink) {
 
 TEST(ExportsDocument, WritesThePathOfTheDirectoryInPlaceOfALink) {
   const ExportsDocument document("/link b # one\n/b x\n/a c # two\n");
-  const auto text = document.Replace("/a", {Entry("h", "rw")}, LinkedPaths());
+  const auto text = Replace(document, "/a", {Entry("h", "rw")}, LinkedPaths());
   ASSERT_TRUE(text.ok()) << text.status().reason();
   EXPECT_EQ(*text, "/a h(rw,sync,root_squash,sec=sys) # one # two\n/b x\n");
 }
@@ -350,7 +358,7 @@ TEST(ExportsDocument, ReplacesTheLinesOfAPathByOne) {
       {"faulty lines of others", "/b x(foo)\n/a y\n/c z(\n", one, "/b x(foo)\n" + line + "/c z(\n"},
   };
   for (const EditCase& c : cases) {
-    const auto text = ExportsDocument(c.before).Replace("/a", c.entries, ExportPaths());
+    const auto text = Replace(ExportsDocument(c.before), "/a", c.entries, ExportPaths());
     ASSERT_TRUE(text.ok()) << c.name << ": " << text.status().reason();
     EXPECT_EQ(*text, c.after) << c.name;
   }
@@ -358,21 +366,27 @@ TEST(ExportsDocument, ReplacesTheLinesOfAPathByOne) {
 
 TEST(ExportsDocument, FindsTheSameEntriesAfterEditsAsWithoutThem) {
   const char* const paths[] = {"/a", "/b", "/c", "/b c", "/d"};
+  const char* const lines[] = {"/a h1(ro)\n", "/b h2 # note\n", "\n", "  /c h3\n", "# comment\n", "/d h1(rw) h4(ro)\n"};
   std::mt19937 random(3);
   const auto below = [&](std::size_t limit) { return random() % limit; };
-  for (int file = 0; file < 50; ++file) {
-    ExportsDocument edited("/a h1(ro)\n/b h2 # note\n\n/c h3");
-    for (int edit = 0; edit < 20; ++edit) {
+  for (int file = 0; file < 300; ++file) {
+    std::string made;
+    for (std::size_t line = below(8); line > 0; --line) made += lines[below(std::size(lines))];
+    if (below(3) == 0) made += "/c h5";
+    ExportsDocument edited(made);
+    for (int edit = 0; edit < 8; ++edit) {
       std::vector<ExportEntry> entries;
       for (std::size_t client = below(3); client > 0; --client) {
         entries.push_back(Entry("h" + std::to_string(client), below(2) == 0 ? "rw" : "ro"));
       }
-      const Result<std::string> text = edited.Replace(paths[below(5)], entries, ExportPaths());
-      ASSERT_TRUE(text.ok()) << text.status().reason();
-      edited = ExportsDocument(*text, edited);
-      const ExportsDocument alone(*text);
+      const Result<ExportsDocument> replaced = edited.Replace(paths[below(5)], entries, ExportPaths());
+      ASSERT_TRUE(replaced.ok()) << replaced.status().reason();
+      const std::string text = replaced->text();
+      edited = ExportsDocument(text, edited);
+      const ExportsDocument alone(text);
       for (const char* path : paths) {
-        ASSERT_EQ(edited.Entries(path, ExportPaths()), alone.Entries(path, ExportPaths())) << path << " in " << *text;
+        ASSERT_EQ(edited.Entries(path, ExportPaths()), alone.Entries(path, ExportPaths())) << path << " in " << text;
+        ASSERT_EQ(replaced->Entries(path, ExportPaths()), alone.Entries(path, ExportPaths())) << path << " in " << text;
       }
     }
   }
@@ -380,14 +394,14 @@ TEST(ExportsDocument, FindsTheSameEntriesAfterEditsAsWithoutThem) {
 
 TEST(ExportsDocument, KeepsTheWordsOfEntriesThatStay) {
   const ExportsDocument document("/a \"b\"(rw,async) -no_wdelay c\n");
-  const auto text = document.Replace("/a", document.Entries("/a", ExportPaths()), ExportPaths());
+  const auto text = Replace(document, "/a", document.Entries("/a", ExportPaths()), ExportPaths());
   ASSERT_TRUE(text.ok());
   EXPECT_EQ(*text, "/a \"b\"(rw,async) c(ro,sync,no_wdelay,root_squash,sec=sys)\n");
 }
 
 TEST(ExportsDocument, EscapesWhatThePathNeeds) {
   for (const char* path : {"/a b", "/new\nline", "/qu\"ote", "/back\\101slash", "/back\\541slash", "/#"}) {
-    const auto text = ExportsDocument("").Replace(path, {Entry("h", "")}, ExportPaths());
+    const auto text = Replace(ExportsDocument(""), path, {Entry("h", "")}, ExportPaths());
     ASSERT_TRUE(text.ok()) << path;
     EXPECT_THAT(Clients(ExportsDocument(*text), path), ElementsAre("h")) << path;
   }
@@ -403,7 +417,7 @@ TEST(ExportsDocument, RefusesWhatWouldNotReadBack) {
                                               {{"h", {}, "h(ro) # "}, Entry("i", "")},
                                               {{"h", {}, "h(ro)\n/b z"}}};
   for (const auto& entries : refused) {
-    const auto text = ExportsDocument("/b x\n").Replace("/a", entries, ExportPaths());
+    const auto text = Replace(ExportsDocument("/b x\n"), "/a", entries, ExportPaths());
     EXPECT_EQ(text.status().code(), kRefusedText) << entries.front().client;
   }
 }
@@ -412,8 +426,8 @@ TEST(ExportsDocument, RefusesToRewriteALineThatItDoesNotUnderstand) {
   for (const char* text :
        {"/a h1(rw) h2(rw, sync) h3(ro)\n", "/a x\n/a \"y\n", "/a x \\\n/b y(rw)\n", "/a x(sec=)\n"}) {
     const ExportsDocument document(text);
-    EXPECT_EQ(document.Replace("/a", {Entry("h", "")}, ExportPaths()).status().code(), kRefusedText) << text;
-    const auto removed = document.Replace("/a", {}, ExportPaths());
+    EXPECT_EQ(Replace(document, "/a", {Entry("h", "")}, ExportPaths()).status().code(), kRefusedText) << text;
+    const auto removed = Replace(document, "/a", {}, ExportPaths());
     ASSERT_TRUE(removed.ok()) << text;
     EXPECT_EQ(*removed, "") << text;
   }
@@ -422,17 +436,17 @@ TEST(ExportsDocument, RefusesToRewriteALineThatItDoesNotUnderstand) {
 TEST(ExportsDocument, RefusesToChangeWhatExportfsAppliesToTheNextLine) {
   const ExportsDocument document("/a -ro -all_squash\n/b x(rw)\n/c\n/d -ro -rw\n/e\n");
   const ExportPaths paths;
-  EXPECT_TRUE(document.Replace("/c", {Entry("h", "")}, paths).ok());
-  EXPECT_FALSE(document.Replace("/e", {Entry("h", "")}, paths).ok()) << "its access is an accident";
-  EXPECT_FALSE(document.Replace("/d", {}, paths).ok()) << "/e would lose the options";
-  EXPECT_TRUE(document.Replace("/b", {Entry("x", "ro")}, paths).ok());
-  EXPECT_FALSE(document.Replace("/b", {}, paths).ok()) << "/c would get the options";
-  EXPECT_TRUE(document.Replace("/e", {}, paths).ok());
+  EXPECT_TRUE(Replace(document, "/c", {Entry("h", "")}, paths).ok());
+  EXPECT_FALSE(Replace(document, "/e", {Entry("h", "")}, paths).ok()) << "its access is an accident";
+  EXPECT_FALSE(Replace(document, "/d", {}, paths).ok()) << "/e would lose the options";
+  EXPECT_TRUE(Replace(document, "/b", {Entry("x", "ro")}, paths).ok());
+  EXPECT_FALSE(Replace(document, "/b", {}, paths).ok()) << "/c would get the options";
+  EXPECT_TRUE(Replace(document, "/e", {}, paths).ok());
 }
 
 TEST(ExportsDocument, RefusesToWriteIntoAnOpenQuotation) {
   for (const char* text : {"\"/b x", "/b \"x", "/b x\n/c \"y(rw)"}) {
-    const auto edited = ExportsDocument(text).Replace("/a", {Entry("h", "")}, ExportPaths());
+    const auto edited = Replace(ExportsDocument(text), "/a", {Entry("h", "")}, ExportPaths());
     EXPECT_EQ(edited.status().code(), kRefusedText) << text;
   }
 }
@@ -488,7 +502,7 @@ TEST(ExportsDocument, HoldsTenThousandPathsInLinearTime) {
   for (int i = 0; i < 10000; ++i) text += "/volume1/share" + std::to_string(i) + " 10.0.0.1(rw) 10.0.0.2(ro)\n";
   const ExportsDocument document(text);
   EXPECT_EQ(document.Lines()->size(), 10000U);
-  const auto without = document.Replace("/volume1/share5000", {}, ExportPaths());
+  const auto without = Replace(document, "/volume1/share5000", {}, ExportPaths());
   ASSERT_TRUE(without.ok());
   EXPECT_EQ(ExportsDocument(*without).Lines()->size(), 9999U);
 }

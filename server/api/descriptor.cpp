@@ -78,7 +78,7 @@ std::optional<Descriptor> Descriptor::Parse(std::string_view json, std::string* 
   const Json::Value& read = descriptor.document_;
   const Json::Value* schemas = Find(read, {"components", "schemas"});
   if (!descriptor.ReadErrorCodes(read["x-error-codes"], error) ||
-      !descriptor.ReadSchemas(schemas == nullptr ? Json::Value() : *schemas, error) ||
+      !descriptor.ReadSchemas(schemas == nullptr ? Json::Value::nullSingleton() : *schemas, error) ||
       !descriptor.ReadPaths(read["paths"], error)) {
     return std::nullopt;
   }

@@ -46,7 +46,7 @@ Descriptor ReadDescriptor(const std::string& path) {
   std::string error;
   std::optional<Descriptor> descriptor = Descriptor::Parse(text, &error);
   if (!descriptor) syslog(LOG_ERR, "%s: descriptor ignored: %s", path.c_str(), error.c_str());
-  return descriptor.value_or(Descriptor());
+  return std::move(descriptor).value_or(Descriptor());
 }
 
 std::optional<std::vector<APIRow>> ReadTable(void* library, std::string* error) {

@@ -188,7 +188,6 @@ WebApi::WebApi(Parts parts, Limits limits)
     : parts_(parts),
       limits_(limits),
       list_(Unchanging(Success(parts.routes.List()))),
-      open_api_(Unchanging(File(WriteJson(OpenApiDocument(parts.routes)), "application/json"))),
       docs_(Unchanging(File(kDocsPage, "text/html; charset=utf-8"))),
       docs_style_(Unchanging(File(kDocsStyle, "text/css; charset=utf-8"))) {}
 
@@ -266,7 +265,12 @@ WebApi::Begun WebApi::BeginConsole(const Head& head) const {
 }
 
 WebApi::Begun WebApi::List(const Head& /*head*/) const { return list_; }
-WebApi::Begun WebApi::OpenApi(const Head& /*head*/) const { return open_api_; }
+
+WebApi::Begun WebApi::OpenApi(const Head& /*head*/) const {
+  if (!open_api_) open_api_ = Unchanging(File(WriteJson(OpenApiDocument(parts_.routes)), "application/json"));
+  return *open_api_;
+}
+
 WebApi::Begun WebApi::Docs(const Head& /*head*/) const { return docs_; }
 WebApi::Begun WebApi::DocsStyle(const Head& /*head*/) const { return docs_style_; }
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <functional>
 #include <unordered_set>
+#include <utility>
 
 namespace vorn {
 namespace {
@@ -39,6 +40,7 @@ ExportsIndex::ExportsIndex(const ExportsLines& lines) {
   std::size_t slots = 16;
   while (slots < 2 * count) slots *= 2;
   slots_.resize(slots);
+  earlier_.resize(count);
   std::unordered_set<std::string_view> folders;
   for (std::size_t line = 0; line < count; ++line) {
     const std::string_view path = PlainPath(lines, line);
@@ -46,17 +48,19 @@ ExportsIndex::ExportsIndex(const ExportsLines& lines) {
       unusual_.push_back(static_cast<std::uint32_t>(line));
       continue;
     }
-    std::size_t slot = Slot(path);
-    while (slots_[slot] != 0) slot = (slot + 1) % slots;
-    slots_[slot] = static_cast<std::uint32_t>(line + 1);
+    std::uint32_t& last = slots_[FindSlot(lines, path)];
+    earlier_[line] = std::exchange(last, static_cast<std::uint32_t>(line + 1));
     const std::string_view folder = FolderOf(path);
     const bool is_last = !folders_.empty() && folders_.back() == folder;
     if (!is_last && folders.insert(folder).second) folders_.emplace_back(folder);
   }
 }
 
-std::size_t ExportsIndex::Slot(std::string_view path) const {
-  return std::hash<std::string_view>()(path) % slots_.size();
+// The slot of the path, or else the free slot at which its search ends.
+std::size_t ExportsIndex::FindSlot(const ExportsLines& lines, std::string_view path) const {
+  std::size_t slot = std::hash<std::string_view>()(path) % slots_.size();
+  while (slots_[slot] != 0 && PlainPath(lines, slots_[slot] - 1) != path) slot = (slot + 1) % slots_.size();
+  return slot;
 }
 
 // One search. Collects the lines that it finds.
@@ -77,10 +81,8 @@ class ExportsIndex::Search {
  private:
   // Appends the lines with this path, as it is written.
   void Append(std::string_view path) {
-    const std::vector<std::uint32_t>& slots = index_.slots_;
-    for (std::size_t slot = index_.Slot(path); slots[slot] != 0; slot = (slot + 1) % slots.size()) {
-      if (PlainPath(lines_, slots[slot] - 1) == path) found_.push_back(slots[slot] - 1);
-    }
+    const std::uint32_t last = index_.slots_[index_.FindSlot(lines_, path)];
+    for (std::uint32_t line = last; line != 0; line = index_.earlier_[line - 1]) found_.push_back(line - 1);
   }
 
   // Appends the lines in `folder`, as it is written, that lead to the target by a link.

@@ -26,9 +26,10 @@ class ExportsIndex {
  private:
   class Search;
 
-  std::size_t Slot(std::string_view path) const;
+  std::size_t FindSlot(const ExportsLines& lines, std::string_view path) const;
 
-  std::vector<std::uint32_t> slots_;    // a hash table of the plain paths: line + 1, or 0
+  std::vector<std::uint32_t> slots_;    // a hash table of the plain paths: the last line of each, plus 1; or 0
+  std::vector<std::uint32_t> earlier_;  // for each line the line before with the same path, plus 1; or 0
   std::vector<std::string> folders_;    // the parent folders of the plain paths, each once
   std::vector<std::uint32_t> unusual_;  // lines whose path must be decoded or normalised before it is compared
 };

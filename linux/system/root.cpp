@@ -6,16 +6,14 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <climits>
 #include <cstdlib>
-#include <filesystem>
 #include <vector>
 
 #include "file_descriptor.h"
 
 namespace vorn {
 namespace {
-
-namespace fs = std::filesystem;
 
 constexpr int kMaxLinks = 40;  // as path_resolution(7)
 
@@ -47,53 +45,66 @@ bool HasOnlyNames(std::string_view path) {
   return true;
 }
 
+// The target of a symbolic link: readlink(2). Fails with EINVAL if the file is no link.
+Result<std::string> ReadLink(const std::string& path) {
+  std::string target(PATH_MAX, '\0');
+  const ssize_t size = readlink(path.c_str(), target.data(), target.size());
+  if (size < 0) return Status::System(errno, path);
+  if (static_cast<std::size_t>(size) == target.size()) return Status::System(ENAMETOOLONG, path);
+  target.resize(static_cast<std::size_t>(size));
+  return target;
+}
+
 // Resolves a path component by component, below a folder that it never leaves.
 class Resolver {
  public:
-  Resolver(fs::path top, std::string_view path) : top_(std::move(top)) { Push(fs::path(path).relative_path()); }
+  // `top` has no slash at its end.
+  Resolver(std::string top, std::string_view path) : top_(std::move(top)) { Push(path); }
 
   Result<std::string> Resolve() {
     while (!pending_.empty()) {
-      const fs::path name = std::move(pending_.back());
+      const std::string name = std::move(pending_.back());
       pending_.pop_back();
       if (Status status = Step(name); !status.ok()) return status;
     }
-    return (top_ / reached_).string();
+    return top_ + (reached_.empty() ? "/" : reached_);
   }
 
  private:
   // The component to visit next is the last one of pending_.
-  void Push(const fs::path& path) {
-    const std::vector<fs::path> names(path.begin(), path.end());
-    pending_.insert(pending_.end(), names.rbegin(), names.rend());
+  void Push(std::string_view path) {
+    while (!path.empty()) {
+      const std::size_t begin = path.rfind('/') + 1;  // npos + 1 is 0
+      pending_.emplace_back(path.substr(begin));
+      path = path.substr(0, begin == 0 ? 0 : begin - 1);
+    }
   }
 
-  Status Step(const fs::path& name) {
+  Status Step(const std::string& name) {
     if (name.empty() || name == ".") return {};
     if (name == "..") {
-      reached_ = reached_.parent_path();
+      if (!reached_.empty()) reached_.erase(reached_.rfind('/'));
       return {};
     }
-    std::error_code error;
-    const fs::path here = top_ / reached_ / name;
-    const fs::path target = fs::read_symlink(here, error);
-    if (!error) return Follow(here, target);
-    reached_ /= name;
+    const std::string here = top_ + reached_ + "/" + name;
+    const Result<std::string> target = ReadLink(here);
+    if (target.ok()) return Follow(here, *target);
+    reached_ += "/" + name;
     // Not a link, or nothing there: opening the file will tell.
-    if (error.value() == EINVAL || error.value() == ENOENT || error.value() == ENOTDIR) return {};
-    return Status::System(error.value(), here.string());
+    const int error = target.status().code();
+    return error == EINVAL || error == ENOENT || error == ENOTDIR ? Status() : target.status();
   }
 
-  Status Follow(const fs::path& link, const fs::path& target) {
-    if (++links_ > kMaxLinks) return Status::System(ELOOP, link.string());
-    if (target.is_absolute()) reached_.clear();
-    Push(target.relative_path());
+  Status Follow(const std::string& link, const std::string& target) {
+    if (++links_ > kMaxLinks) return Status::System(ELOOP, link);
+    if (target[0] == '/') reached_.clear();
+    Push(target);
     return {};
   }
 
-  const fs::path top_;
-  fs::path reached_;  // below top_
-  std::vector<fs::path> pending_;
+  const std::string top_;
+  std::string reached_;  // below top_, each name after a slash
+  std::vector<std::string> pending_;
   int links_ = 0;
 };
 
@@ -115,7 +126,7 @@ Result<std::string> Root::Locate(std::string_view path) const {
   }
   const std::string top = is_box() ? "" : directory_;
   if (HasOnlyNames(path) && IsWithoutLinks(directory_, std::string(path).c_str() + 1)) return top + std::string(path);
-  return Resolver(directory_, path).Resolve();
+  return Resolver(top, path).Resolve();
 }
 
 std::string Root::OnBox(const std::string& located) const {

@@ -59,7 +59,7 @@ Result<int> GetSectionValue(const char* path, const char* section, const char* k
   if (!value.ok()) return value.status();
   const std::string name = std::string(path) + ": " + key + " in [" + section + "]";
   if (!*value) return Status::System(ENOENT, name);
-  if (ToValidUtf8(**value) != **value) return Status::Failure(EILSEQ, name + " is not UTF-8");
+  if (!IsValidUtf8(**value)) return Status::Failure(EILSEQ, name + " is not UTF-8");
   return CopyText(**value, name, buffer, size);
 }
 

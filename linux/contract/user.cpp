@@ -21,7 +21,7 @@ Status AppendUsers(KLIBSZLIST** list, int type, const IsWanted& is_wanted) {
   const Result<Accounts> users = ReadLocalUsers(CurrentBox());
   if (!users.ok()) return users.status();
   for (const Account& user : *users) {
-    const bool can_be_named = ToValidUtf8(user.name) == user.name;  // callers name accounts in JSON
+    const bool can_be_named = IsValidUtf8(user.name);  // callers name accounts in JSON
     if (!can_be_named || !is_wanted(user.name)) continue;
     if (Status status = Append(list, user.name.c_str()); !status.ok()) return status;
   }

@@ -81,9 +81,11 @@ bool IsAscii(std::string_view text) {
 
 }  // namespace
 
+bool IsValidUtf8(std::string_view text) { return IsAscii(text) || u8_check(Bytes(text), text.size()) == nullptr; }
+
 Result<std::string> UpperCase(std::string_view text) {
   if (IsAscii(text)) return UpperAscii(text);
-  if (u8_check(Bytes(text), text.size()) != nullptr) return Status::Failure(EILSEQ, "the text is not UTF-8");
+  if (!IsValidUtf8(text)) return Status::Failure(EILSEQ, "the text is not UTF-8");
   std::size_t size = 0;
   const Utf8 upper(u8_toupper(Bytes(text), text.size(), "", nullptr, nullptr, &size), &std::free);
   if (upper == nullptr) return Status::System(errno, "upper case");
@@ -114,12 +116,10 @@ std::string ToValidUtf8(std::string_view text) {
   return valid.append(text);
 }
 
-bool IsValidUtf8(std::string_view text) { return IsAscii(text) || u8_check(Bytes(text), text.size()) == nullptr; }
-
 bool IsPlainText(std::string_view text) {
   // Most texts consist of printable ASCII only.
   if (std::all_of(text.begin(), text.end(), [](char c) { return c >= ' ' && c <= '~'; })) return true;
-  if (u8_check(Bytes(text), text.size()) != nullptr) return false;
+  if (!IsValidUtf8(text)) return false;
   const std::u32string characters = Characters(text);
   return std::none_of(characters.begin(), characters.end(), IsHidden) && !MixesAlphabets(characters) && IsNormal(text);
 }

@@ -31,6 +31,7 @@ class CaselessSubstring {
 // around such a part is preserved; valid UTF-8 is returned as it is. JSON can carry the result (RFC 8259).
 std::string ToValidUtf8(std::string_view text);
 
+// Whether ToValidUtf8 returns the string as it is.
 bool IsValidUtf8(std::string_view text);
 
 // Returns whether the string is what it looks like: it is UTF-8 and contains none of the characters that RFC 8264
